@@ -1,0 +1,231 @@
+#include <cutils/properties.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <stdint.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <mutex>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "core/system_paths.h"
+
+namespace {
+
+const char FILE_NAME[] = "/default.prop";
+const off_t MAX_FILE_SIZE = 1 << 20;
+
+// File systems stamp changes with a clock that advances in ticks of up to 10 ms, so a
+// file changed twice in one tick has the same stamp after both. A stamp proves the
+// content only when it was this old at the time the content was read.
+const int64_t SETTLE_NS = 50 * 1000 * 1000;
+
+int64_t nanoseconds(const struct timespec& t) {
+    return static_cast<int64_t>(t.tv_sec) * 1000000000 + t.tv_nsec;
+}
+
+int64_t now(clockid_t clock) {
+    struct timespec t;
+    clock_gettime(clock, &t);
+    return nanoseconds(t);
+}
+
+// What tells one state of a file from another.
+struct Stamp {
+    dev_t dev;
+    ino_t ino;
+    off_t size;
+    int64_t mtime;
+    int64_t ctime;
+
+    explicit Stamp(const struct stat& st)
+        : dev(st.st_dev),
+          ino(st.st_ino),
+          size(st.st_size),
+          mtime(nanoseconds(st.st_mtim)),
+          ctime(nanoseconds(st.st_ctim)) {}
+    Stamp() : dev(0), ino(0), size(-1), mtime(0), ctime(0) {}
+
+    bool operator==(const Stamp& o) const {
+        return dev == o.dev && ino == o.ino && size == o.size && mtime == o.mtime &&
+               ctime == o.ctime;
+    }
+};
+
+bool acceptable(const struct stat& st) {
+    return S_ISREG(st.st_mode) && st.st_size <= MAX_FILE_SIZE;
+}
+
+// The parsed file of one root.
+class PropertyFile {
+public:
+    // The value of a property, or false. The view is valid until the next call.
+    bool find(const char* root, const char* key, std::string_view& value);
+
+private:
+    struct Entry {
+        std::string_view key;
+        std::string_view value;
+    };
+
+    bool refresh();
+    bool load();
+    bool read_content(int fd);
+    void parse();
+    void parse_line(std::string_view line);
+
+    std::string m_root;
+    std::string m_path;
+    Stamp m_stamp;
+    bool m_settled = false;      // m_stamp was old enough when the content was read
+    int64_t m_first_seen = 0;    // monotonic time of the first load with m_stamp
+    std::string m_content;       // what the entries point into
+    std::vector<Entry> m_table;  // sorted by key, each key once
+};
+
+bool PropertyFile::find(const char* root, const char* key, std::string_view& value) {
+    if (m_path.empty() || m_root != root) {
+        m_root = root;
+        m_path = m_root + FILE_NAME;
+        m_settled = false;
+    }
+    if (!refresh()) {
+        return false;
+    }
+    const std::string_view wanted(key);
+    const auto it =
+        std::lower_bound(m_table.begin(), m_table.end(), wanted,
+                         [](const Entry& entry, std::string_view k) { return entry.key < k; });
+    if (it == m_table.end() || it->key != wanted) {
+        return false;
+    }
+    value = it->value;
+    return true;
+}
+
+// Makes the table that of the file as it is now; false when there is no usable file.
+bool PropertyFile::refresh() {
+    struct stat st;
+    if (stat(m_path.c_str(), &st) < 0 || !acceptable(st)) {
+        return false;
+    }
+    return (m_settled && Stamp(st) == m_stamp) || load();
+}
+
+bool PropertyFile::load() {
+    m_settled = false;
+    // Non-blocking: a FIFO may have taken the file's place since the stat.
+    const int fd = open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    if (fd < 0) {
+        return false;
+    }
+    // The times and the stamp come before the content: a change while it is being read
+    // gives a later stamp.
+    const int64_t monotonic = now(CLOCK_MONOTONIC);
+    const int64_t realtime = now(CLOCK_REALTIME);
+    struct stat st;
+    const bool usable = fstat(fd, &st) == 0 && acceptable(st) && read_content(fd);
+    close(fd);
+    if (!usable) {
+        m_stamp = Stamp();
+        return false;
+    }
+    parse();
+    const Stamp stamp(st);
+    if (!(stamp == m_stamp)) {
+        m_stamp = stamp;
+        m_first_seen = monotonic;
+    }
+    // Either the change lies back far enough by the wall clock or, when that was set
+    // back, the stamp has been known for long enough.
+    m_settled = realtime - stamp.ctime >= SETTLE_NS || monotonic - m_first_seen >= SETTLE_NS;
+    return true;
+}
+
+bool PropertyFile::read_content(int fd) {
+    m_content.clear();
+    char buf[4096];
+    for (;;) {
+        const ssize_t n = read(fd, buf, sizeof(buf));
+        if (n == 0) {
+            return true;
+        }
+        if (n < 0) {
+            if (errno == EINTR) {
+                continue;
+            }
+            return false;
+        }
+        m_content.append(buf, static_cast<size_t>(n));
+        if (m_content.size() > static_cast<size_t>(MAX_FILE_SIZE)) {
+            return false;
+        }
+    }
+}
+
+void PropertyFile::parse() {
+    m_table.clear();
+    std::string_view rest(m_content);
+    while (!rest.empty()) {
+        const size_t end = std::min(rest.find('\n'), rest.size());
+        parse_line(rest.substr(0, end));
+        rest.remove_prefix(std::min(end + 1, rest.size()));
+    }
+    // Of equal keys the last line counts: reversed, it comes first and unique keeps it.
+    std::reverse(m_table.begin(), m_table.end());
+    std::stable_sort(m_table.begin(), m_table.end(),
+                     [](const Entry& a, const Entry& b) { return a.key < b.key; });
+    m_table.erase(std::unique(m_table.begin(), m_table.end(),
+                              [](const Entry& a, const Entry& b) { return a.key == b.key; }),
+                  m_table.end());
+}
+
+void PropertyFile::parse_line(std::string_view line) {
+    if (!line.empty() && line.back() == '\r') {
+        line.remove_suffix(1);
+    }
+    const size_t equals = line.find('=');
+    if (equals == 0 || equals == std::string_view::npos || line[0] == '#' ||
+        line.find('\0') != std::string_view::npos) {
+        return;
+    }
+    m_table.push_back(Entry{line.substr(0, equals), line.substr(equals + 1)});
+}
+
+// Stores text, which must fit, as the NUL-terminated result.
+int give(char* value, std::string_view text) {
+    memmove(value, text.data(), text.size());  // the default may be the buffer itself
+    value[text.size()] = '\0';
+    return static_cast<int>(text.size());
+}
+
+}  // namespace
+
+int property_get(const char* key, char* value, const char* default_value) {
+    static std::mutex lock;
+    // Never destroyed: threads may still read properties while the process exits.
+    static PropertyFile* const file = new PropertyFile;
+
+    const int saved_errno = errno;
+    const char* root = getenv(ENV_ROOT);
+    int len = -1;
+    {
+        const std::lock_guard<std::mutex> guard(lock);
+        std::string_view found;
+        if (key && file->find(root ? root : "", key, found) && found.size() < PROPERTY_VALUE_MAX) {
+            len = give(value, found);
+        }
+    }
+    if (len < 0) {
+        const std::string_view fallback(default_value ? default_value : "");
+        len = give(value, fallback.substr(0, PROPERTY_VALUE_MAX - 1));
+    }
+    errno = saved_errno;
+    return len;
+}

@@ -1,0 +1,264 @@
+#include <cutils/properties.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <stdarg.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <string>
+#include <thread>
+
+#include "platform/alloc_count.h"
+#include "support/TestRoot.h"
+
+namespace {
+
+std::atomic<int> g_opens;
+std::atomic<int> g_stats;
+time_t g_wall_clock_shift;
+
+// Newer kernels give finer times to a file that is being watched; the common tick is 10 ms.
+void coarsen(struct stat* st) {
+    for (struct timespec* t : {&st->st_mtim, &st->st_ctim}) {
+        t->tv_nsec -= t->tv_nsec % 10000000;
+    }
+}
+
+}  // namespace
+
+extern "C" {
+int __real_open(const char* path, int flags, mode_t mode);
+int __real_openat(int dir, const char* path, int flags, mode_t mode);
+FILE* __real_fopen(const char* path, const char* mode);
+int __real_stat(const char* path, struct stat* st);
+int __real_fstat(int fd, struct stat* st);
+int __real_clock_gettime(clockid_t clock, struct timespec* t);
+
+// The mode is passed on whether it was given or not; without O_CREAT nobody reads it.
+int __wrap_open(const char* path, int flags, mode_t mode) {
+    ++g_opens;
+    return __real_open(path, flags, mode);
+}
+int __wrap_openat(int dir, const char* path, int flags, mode_t mode) {
+    ++g_opens;
+    return __real_openat(dir, path, flags, mode);
+}
+FILE* __wrap_fopen(const char* path, const char* mode) {
+    ++g_opens;
+    return __real_fopen(path, mode);
+}
+int __wrap_stat(const char* path, struct stat* st) {
+    ++g_stats;
+    const int result = __real_stat(path, st);
+    if (result == 0) {
+        coarsen(st);
+    }
+    return result;
+}
+int __wrap_fstat(int fd, struct stat* st) {
+    const int result = __real_fstat(fd, st);
+    if (result == 0) {
+        coarsen(st);
+    }
+    return result;
+}
+int __wrap_clock_gettime(clockid_t clock, struct timespec* t) {
+    const int result = __real_clock_gettime(clock, t);
+    if (clock != CLOCK_MONOTONIC) {
+        t->tv_sec += g_wall_clock_shift;
+    }
+    return result;
+}
+}
+
+namespace {
+
+std::string get(const char* key, const char* fallback = "DEFAULT") {
+    char value[PROPERTY_VALUE_MAX + 8];
+    memset(value, '#', sizeof(value));
+    const int len = property_get(key, value, fallback);
+    EXPECT_EQ(static_cast<size_t>(len), strlen(value));
+    EXPECT_EQ(std::string(value + PROPERTY_VALUE_MAX, 8), "########");
+    return value;
+}
+
+int opens_of_one_read() {
+    const int before = g_opens;
+    get("k");
+    return g_opens - before;
+}
+
+// Replaces bytes of the file, keeping its inode and its size.
+void overwrite(const TestRoot& root, off_t at, const std::string& bytes) {
+    const int fd = __real_open(root.path("default.prop").c_str(), O_WRONLY | O_CLOEXEC, 0);
+    ASSERT_EQ(pwrite(fd, bytes.data(), bytes.size(), at), static_cast<ssize_t>(bytes.size()));
+    close(fd);
+}
+
+class Properties : public testing::Test {
+protected:
+    ~Properties() override { g_wall_clock_shift = 0; }
+
+    TestRoot m_root;
+};
+
+TEST_F(Properties, FileGrammar) {
+    using namespace std::string_literals;
+    const std::string v91(91, 'x');
+    const struct {
+        std::string file;
+        std::string expected;  // of the property "k"
+    } cases[] = {
+        {"", "DEFAULT"},
+        {"k=v\n", "v"},
+        {"k=v", "v"},
+        {"k=v\r\n", "v"},
+        {"a=1\n\nk=v\nz=2\n", "v"},
+        {"k=\n", ""},
+        {"k=a=b\n", "a=b"},
+        {"k= v w #x\n", " v w #x"},
+        {"k=old\na=1\nk=new\n", "new"},
+        {"#k=v\n", "DEFAULT"},
+        {"#\nk=v\n", "v"},
+        {"k =v\nkk=v\nK=v\n k=v\n", "DEFAULT"},
+        {"k\n", "DEFAULT"},
+        {"=v\n=k\n", "DEFAULT"},
+        {"k=" + v91 + "\n", v91},
+        {"k=" + v91 + "\r\n", v91},
+        {"k=" + v91 + "x\n", "DEFAULT"},
+        {"k=v\nk=" + v91 + "x\n", "DEFAULT"},
+        {std::string(300000, 'a') + "=" + std::string(300000, 'b') + "\nk=v\n", "v"},
+        {"k=a\0b\n"s, "DEFAULT"},
+        {"k\0=a\nk=v\n\0"s, "v"},
+        {"#" + std::string((1 << 20) - 5, 'c') + "\nk=v\n", "DEFAULT"},  // a byte too long
+        {"#" + std::string((1 << 20) - 6, 'c') + "\nk=v\n", "v"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.file.substr(0, 100));
+        m_root.write_file("default.prop", c.file);
+        EXPECT_EQ(get("k"), c.expected);
+        EXPECT_EQ(get(""), "DEFAULT");
+    }
+}
+
+TEST_F(Properties, DefaultValue) {
+    EXPECT_EQ(get("k", nullptr), "");
+    EXPECT_EQ(get("k", std::string(200, 'd').c_str()), std::string(91, 'd'));
+    EXPECT_EQ(get(nullptr), "DEFAULT");
+    char value[PROPERTY_VALUE_MAX] = "itself";
+    errno = ENOSPC;
+    EXPECT_EQ(property_get("k", value, value), 6);
+    EXPECT_STREQ(value, "itself");
+    EXPECT_EQ(errno, ENOSPC);
+}
+
+TEST_F(Properties, OnlyARegularFileIsRead) {
+    m_root.make_dir("default.prop");
+    EXPECT_EQ(get("k"), "DEFAULT");
+    ASSERT_EQ(rmdir(m_root.path("default.prop").c_str()), 0);
+    ASSERT_EQ(mkfifo(m_root.path("default.prop").c_str(), 0600), 0);
+    EXPECT_EQ(get("k"), "DEFAULT");  // and does not wait for a writer
+    ASSERT_EQ(unlink(m_root.path("default.prop").c_str()), 0);
+    m_root.write_file("default.prop", "k=v\n");
+    ASSERT_EQ(truncate(m_root.path("default.prop").c_str(), off_t(1) << 40), 0);
+    const size_t before = open_descriptors();
+    EXPECT_EQ(get("k"), "DEFAULT");
+    EXPECT_EQ(open_descriptors(), before);
+}
+
+// Many changes fall into one tick of the file system's clock, so neither size nor
+// times nor the inode tell them apart.
+TEST_F(Properties, EveryChangeIsSeenByTheNextRead) {
+    m_root.write_file("default.prop", "k=0000\n");
+    ASSERT_EQ(get("k"), "0000");
+    for (int i = 1000; i < 1500; ++i) {
+        overwrite(m_root, 2, std::to_string(i));
+        ASSERT_EQ(get("k"), std::to_string(i));
+    }
+    for (int i = 1000; i < 1200; ++i) {
+        m_root.set_prop("k", std::to_string(i));
+        ASSERT_EQ(get("k"), std::to_string(i));
+        ASSERT_EQ(unlink(m_root.path("default.prop").c_str()), 0);
+        ASSERT_EQ(get("k"), "DEFAULT");
+        m_root.write_file("default.prop", "k=made\n");
+        ASSERT_EQ(get("k"), "made");
+    }
+}
+
+TEST_F(Properties, SteadyStateCostsOneStat) {
+    m_root.write_file("default.prop", "k=value that is longer than a short string\n");
+    ASSERT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
+    char value[PROPERTY_VALUE_MAX];
+    const int opens = g_opens;
+    const int stats = g_stats;
+    const size_t allocations = allocation_count();
+    for (int i = 0; i < 1000; ++i) {
+        property_get("k", value, "");
+        property_get("a key that is missing and longer than a short string", value, "");
+    }
+    EXPECT_EQ(g_opens, opens);
+    EXPECT_LE(g_stats, stats + 2000);
+    EXPECT_EQ(allocation_count(), allocations);
+
+    // A change is still seen, and the state then becomes steady again.
+    overwrite(m_root, 2, "VALUE");
+    EXPECT_EQ(get("k"), "VALUE that is longer than a short string");
+    EXPECT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
+}
+
+TEST_F(Properties, OldFileIsReadOnce) {
+    m_root.write_file("default.prop", "k=v\n");
+    g_wall_clock_shift = 3600;
+    EXPECT_EQ(opens_of_one_read(), 1);
+    EXPECT_EQ(opens_of_one_read(), 0);
+}
+
+TEST_F(Properties, ClockSetBackDoesNotKeepTheFileFromSettling) {
+    m_root.write_file("default.prop", "k=v\n");
+    g_wall_clock_shift = -3600;
+    EXPECT_EQ(opens_of_one_read(), 1);
+    EXPECT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
+}
+
+TEST_F(Properties, ChangedRootIsSeenByTheNextRead) {
+    m_root.write_file("default.prop", "k=one\n");
+    m_root.write_file("other/default.prop", "k=two\n");
+    ASSERT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
+    EXPECT_EQ(get("k"), "one");
+    setenv("KESTMODEM_ROOT", m_root.path("other").c_str(), 1);
+    EXPECT_EQ(get("k"), "two");
+    setenv("KESTMODEM_ROOT", m_root.path("none").c_str(), 1);
+    EXPECT_EQ(get("k"), "DEFAULT");
+    setenv("KESTMODEM_ROOT", m_root.root().c_str(), 1);
+    EXPECT_EQ(get("k"), "one");
+}
+
+TEST_F(Properties, ReadersInSeveralThreadsGetWholeValues) {
+    const std::string a(91, 'a');
+    const std::string b(40, 'b');
+    m_root.set_prop("k", a);
+    std::atomic<bool> stop(false);
+    std::atomic<int> wrong(0);
+    auto reader = [&] {
+        while (!stop) {
+            const std::string value = get("k");
+            wrong += value != a && value != b;
+        }
+    };
+    std::thread first(reader), second(reader);
+    for (int i = 0; i < 200; ++i) {
+        m_root.set_prop("k", i % 2 ? a : b);
+    }
+    stop = true;
+    first.join();
+    second.join();
+    EXPECT_EQ(wrong, 0);
+}
+
+}  // namespace

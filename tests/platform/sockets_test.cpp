@@ -1,0 +1,149 @@
+#include <cutils/sockets.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <stddef.h>
+#include <stdlib.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "support/TestRoot.h"
+
+namespace {
+bool g_close_spoils_errno;
+}  // namespace
+
+extern "C" int __real_close(int fd);
+extern "C" int __wrap_close(int fd) {
+    const int result = __real_close(fd);
+    if (g_close_spoils_errno) {
+        errno = EIO;
+    }
+    return result;
+}
+
+namespace {
+
+int server(const std::string& name, int name_space = ANDROID_SOCKET_NAMESPACE_ABSTRACT) {
+    return socket_local_server(name.c_str(), name_space, SOCK_STREAM);
+}
+int client(const std::string& name, int name_space = ANDROID_SOCKET_NAMESPACE_ABSTRACT) {
+    return socket_local_client(name.c_str(), name_space, SOCK_STREAM);
+}
+
+// The name a socket is bound to, without the NUL in front.
+std::string bound_name(int fd) {
+    struct sockaddr_un address;
+    socklen_t len = sizeof(address);
+    EXPECT_EQ(getsockname(fd, reinterpret_cast<struct sockaddr*>(&address), &len), 0);
+    EXPECT_EQ(address.sun_path[0], '\0');
+    return std::string(address.sun_path + 1, len - offsetof(struct sockaddr_un, sun_path) - 1);
+}
+
+class Sockets : public testing::Test {
+protected:
+    Sockets() : m_name("t" + std::to_string(getpid())), m_descriptors(open_descriptors()) {
+        unsetenv("KESTMODEM_ROOT");
+        g_close_spoils_errno = true;
+    }
+    ~Sockets() override {
+        g_close_spoils_errno = false;
+        unsetenv("KESTMODEM_ROOT");
+        EXPECT_EQ(open_descriptors(), m_descriptors);
+    }
+
+    std::string m_name;
+    size_t m_descriptors;
+};
+
+TEST_F(Sockets, NameIsThatOfTheRoot) {
+    const struct {
+        const char* root;
+        std::string expected;
+    } cases[] = {
+        {nullptr, m_name},
+        {"", m_name},
+        {"/tmp/h1", m_name + "@/tmp/h1"},
+        {"rel/../h1//", m_name + "@rel/../h1//"},
+    };
+    for (const auto& c : cases) {
+        if (c.root) {
+            setenv("KESTMODEM_ROOT", c.root, 1);
+        }
+        const int fd = server(m_name);
+        ASSERT_GE(fd, 0);
+        EXPECT_EQ(bound_name(fd), c.expected);
+        EXPECT_TRUE(fcntl(fd, F_GETFD) & FD_CLOEXEC);
+        EXPECT_FALSE(fcntl(fd, F_GETFL) & O_NONBLOCK);
+        close(fd);
+    }
+}
+
+TEST_F(Sockets, RootsDoNotMeetAndDataFlows) {
+    const char* roots[] = {"/tmp/h1", "/tmp/h2"};
+    int servers[2];
+    for (int i : {0, 1}) {
+        setenv("KESTMODEM_ROOT", roots[i], 1);
+        servers[i] = server(m_name);
+        ASSERT_GE(servers[i], 0);
+    }
+    for (int i : {0, 1}) {
+        setenv("KESTMODEM_ROOT", roots[i], 1);
+        const int near = client(m_name);
+        ASSERT_GE(near, 0);
+        EXPECT_TRUE(fcntl(near, F_GETFD) & FD_CLOEXEC);
+        const int far = accept4(servers[i], nullptr, nullptr, SOCK_CLOEXEC);
+        ASSERT_GE(far, 0);
+        char buf[8];
+        EXPECT_EQ(write(near, "ping", 4), 4);
+        EXPECT_EQ(read(far, buf, sizeof(buf)), 4);
+        EXPECT_EQ(write(far, "pong!", 5), 5);
+        EXPECT_EQ(read(near, buf, sizeof(buf)), 5);
+        close(near);
+        close(far);
+    }
+    close(servers[0]);
+    close(servers[1]);
+}
+
+TEST_F(Sockets, LongestName) {
+    const size_t longest = sizeof(sockaddr_un::sun_path) - 1;
+    for (const size_t root_len : {size_t(0), size_t(50)}) {
+        setenv("KESTMODEM_ROOT", std::string(root_len, 'r').c_str(), 1);
+        std::string name = m_name;
+        name.resize(longest - (root_len ? root_len + 1 : 0), 'n');
+        const int listening = server(name);
+        const int connected = client(name);
+        EXPECT_EQ(bound_name(listening).size(), longest);
+        EXPECT_GE(connected, 0);
+        close(listening);
+        close(connected);
+        name += 'n';
+        EXPECT_TRUE(server(name) == -1 && errno == ENAMETOOLONG);
+        EXPECT_TRUE(client(name) == -1 && errno == ENAMETOOLONG);
+    }
+    setenv("KESTMODEM_ROOT", std::string(5000, 'r').c_str(), 1);
+    EXPECT_TRUE(server(m_name) == -1 && errno == ENAMETOOLONG);
+}
+
+TEST_F(Sockets, FailuresTellTheReason) {
+    EXPECT_TRUE(client(m_name) == -1 && errno == ECONNREFUSED);
+    const int fd = server(m_name);
+    ASSERT_GE(fd, 0);
+    EXPECT_TRUE(server(m_name) == -1 && errno == EADDRINUSE);
+    close(fd);
+    EXPECT_TRUE(client(m_name) == -1 && errno == ECONNREFUSED);
+    EXPECT_TRUE(server("") == -1 && errno == EINVAL);
+    for (int name_space :
+         {ANDROID_SOCKET_NAMESPACE_RESERVED, ANDROID_SOCKET_NAMESPACE_FILESYSTEM}) {
+        EXPECT_TRUE(server(m_name, name_space) == -1 && errno == EINVAL);
+        EXPECT_TRUE(client(m_name, name_space) == -1 && errno == EINVAL);
+    }
+    EXPECT_EQ(socket_local_server(m_name.c_str(), ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_RDM), -1);
+    EXPECT_EQ(errno, ESOCKTNOSUPPORT);
+}
+
+}  // namespace

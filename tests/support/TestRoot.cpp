@@ -1,0 +1,200 @@
+#include "support/TestRoot.h"
+
+#include <dirent.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+
+namespace fs = std::filesystem;
+
+namespace {
+
+[[noreturn]] void die(const char* what) {
+    fprintf(stderr, "test support: %s: %s\n", what, strerror(errno));
+    abort();
+}
+
+}  // namespace
+
+TestRoot::TestRoot() {
+    char name[] = "/tmp/kestmodem-test-XXXXXX";
+    if (!mkdtemp(name)) {
+        die("mkdtemp");
+    }
+    m_root = name;
+    setenv("KESTMODEM_ROOT", name, 1);
+    make_dir("data");
+}
+
+TestRoot::~TestRoot() {
+    unsetenv("KESTMODEM_ROOT");
+    std::error_code ec;
+    for (const auto& entry : fs::recursive_directory_iterator(m_root, ec)) {
+        if (entry.is_directory(ec) && !entry.is_symlink(ec)) {
+            fs::permissions(entry.path(), fs::perms::owner_all, fs::perm_options::add, ec);
+        }
+    }
+    fs::remove_all(m_root, ec);
+}
+
+void TestRoot::make_dir(const std::string& rel) const {
+    fs::create_directories(path(rel));
+}
+
+void TestRoot::write_file(const std::string& rel, const std::string& content) const {
+    fs::create_directories(fs::path(path(rel)).parent_path());
+    std::ofstream out(path(rel), std::ios::binary | std::ios::trunc);
+    out << content;
+    out.close();
+    if (!out) {
+        die("write_file");
+    }
+}
+
+std::string TestRoot::read_file(const std::string& rel) const {
+    std::ifstream in(path(rel), std::ios::binary);
+    std::ostringstream text;
+    text << in.rdbuf();
+    return text.str();
+}
+
+bool TestRoot::exists(const std::string& rel) const {
+    return access(path(rel).c_str(), F_OK) == 0;
+}
+
+std::vector<std::string> TestRoot::list(const std::string& rel) const {
+    std::vector<std::string> names;
+    std::error_code ec;
+    for (const auto& entry : fs::directory_iterator(path(rel), ec)) {
+        names.push_back(entry.path().filename());
+    }
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+std::vector<std::string> TestRoot::tree(const std::string& rel) const {
+    std::vector<std::string> names;
+    std::error_code ec;
+    for (const auto& entry : fs::recursive_directory_iterator(path(rel), ec)) {
+        if (!entry.is_directory(ec)) {
+            names.push_back(fs::relative(entry.path(), path(rel)));
+        }
+    }
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+void TestRoot::set_prop(const std::string& key, const std::string& value) {
+    m_props.erase(std::remove_if(m_props.begin(), m_props.end(),
+                                 [&](const auto& prop) { return prop.first == key; }),
+                  m_props.end());
+    if (!value.empty()) {
+        m_props.emplace_back(key, value);
+    }
+    std::string text;
+    for (const auto& prop : m_props) {
+        text += prop.first + "=" + prop.second + "\n";
+    }
+    write_file("default.prop.new", text);
+    if (rename(path("default.prop.new").c_str(), path("default.prop").c_str()) != 0) {
+        die("rename default.prop");
+    }
+}
+
+LogCapture::LogCapture()
+    : m_saved(fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 3)),
+      m_file(memfd_create("log", MFD_CLOEXEC)) {
+    if (m_saved < 0 || m_file < 0 || dup2(m_file, STDERR_FILENO) < 0) {
+        die("LogCapture");
+    }
+}
+
+LogCapture::~LogCapture() {
+    dup2(m_saved, STDERR_FILENO);
+    close(m_saved);
+    close(m_file);
+}
+
+std::string LogCapture::text() const {
+    std::string all;
+    char buf[4096];
+    ssize_t n;
+    while ((n = pread(m_file, buf, sizeof(buf), static_cast<off_t>(all.size()))) > 0) {
+        all.append(buf, static_cast<size_t>(n));
+    }
+    return all;
+}
+
+bool LogCapture::has(const std::string& part) const {
+    return text().find(part) != std::string::npos;
+}
+
+size_t LogCapture::count(const std::string& part) const {
+    const std::string all = text();
+    size_t n = 0;
+    for (size_t at = all.find(part); at != std::string::npos; at = all.find(part, at + 1)) {
+        ++n;
+    }
+    return n;
+}
+
+void LogCapture::clear() {
+    // dup2 made standard error share this file's position.
+    if (ftruncate(m_file, 0) != 0 || lseek(m_file, 0, SEEK_SET) != 0) {
+        die("LogCapture::clear");
+    }
+}
+
+bool wait_until(const std::function<bool()>& condition, int timeout_ms) {
+    struct timespec start;
+    clock_gettime(CLOCK_MONOTONIC, &start);
+    for (;;) {
+        if (condition()) {
+            return true;
+        }
+        struct timespec now;
+        clock_gettime(CLOCK_MONOTONIC, &now);
+        const long elapsed =
+            (now.tv_sec - start.tv_sec) * 1000 + (now.tv_nsec - start.tv_nsec) / 1000000;
+        if (elapsed > timeout_ms) {
+            return false;
+        }
+        usleep(2000);
+    }
+}
+
+size_t open_descriptors() {
+    size_t n = 0;
+    DIR* dir = opendir("/proc/self/fd");
+    if (!dir) {
+        die("/proc/self/fd");
+    }
+    while (readdir(dir)) {
+        ++n;
+    }
+    closedir(dir);
+    return n - 3;  // ".", ".." and the descriptor of the listing itself
+}
+
+std::string pattern_bytes(size_t len, uint32_t seed) {
+    std::string bytes(len, '\0');
+    uint32_t x = seed * 2654435761u + 1;
+    for (char& c : bytes) {
+        x ^= x << 13;
+        x ^= x >> 17;
+        x ^= x << 5;
+        c = static_cast<char>(x >> 24);
+    }
+    return bytes;
+}
