@@ -1,0 +1,340 @@
+#include "core/Multiplexer.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <functional>
+#include <memory>
+#include <new>
+#include <string>
+#include <vector>
+
+#include "core/FdHandler.h"
+#include "support/TestRoot.h"
+
+namespace {
+
+// What the loop handed to the last poll, and an error to give instead of polling.
+std::vector<struct pollfd> g_polled;
+int g_timeout;
+int g_poll_error;
+size_t g_allocations;
+
+}  // namespace
+
+extern "C" int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
+extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout);
+extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
+    const size_t allocations = g_allocations;
+    g_polled.assign(fds, fds + num);
+    g_allocations = allocations;
+    g_timeout = timeout;
+    if (g_poll_error) {
+        errno = g_poll_error;
+        return -1;
+    }
+    return __real_poll(fds, num, timeout);
+}
+
+void* operator new(size_t size) {
+    ++g_allocations;
+    void* const p = malloc(size);
+    if (!p) {
+        abort();
+    }
+    return p;
+}
+void operator delete(void* p) noexcept {
+    free(p);
+}
+void operator delete(void* p, size_t) noexcept {
+    free(p);
+}
+
+namespace {
+
+// A handler on one end of a socket pair; records its calls and runs an action in them.
+class Probe : public FdHandler {
+public:
+    Probe(Multiplexer* mux, int events) : FdHandler(-1, nullptr, mux) {
+        open();
+        if (events) {
+            EXPECT_EQ(0, add_events(events));
+        }
+    }
+    ~Probe() override { ::close(m_peer); }
+
+    void open() {
+        int fds[2];
+        ASSERT_EQ(0, socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, fds));
+        m_fd = fds[0];
+        m_peer = fds[1];
+    }
+    void reopen() {
+        close();
+        hang_up();
+        open();
+    }
+    void make_ready() const { ASSERT_EQ(1, write(m_peer, "x", 1)); }
+    void hang_up() {
+        ::close(m_peer);
+        m_peer = -1;
+    }
+
+    void process(int events) override {
+        calls.push_back(events);
+        const std::function<void()> run = action;  // which may destroy this
+        if (run) {
+            run();
+        }
+    }
+
+    std::vector<int> calls;
+    std::function<void()> action;
+
+private:
+    int m_peer = -1;
+};
+
+class MultiplexerTest : public testing::Test {
+protected:
+    ~MultiplexerTest() override { g_poll_error = 0; }
+    // A pass that does not wait, whatever is ready.
+    void pass() {
+        mux.timer_mgr().add_timer(
+            0, [](void*) {}, nullptr);
+        mux.run_once();
+    }
+    std::unique_ptr<Probe> ready_probe() {
+        std::unique_ptr<Probe> probe(new Probe(&mux, POLLIN));
+        probe->make_ready();
+        return probe;
+    }
+    Multiplexer mux;
+};
+
+const std::vector<int> ONE_INPUT(1, POLLIN);
+
+}  // namespace
+
+TEST_F(MultiplexerTest, TableTakesTwentyHandlers) {
+    std::vector<std::unique_ptr<Probe>> probes;
+    for (size_t i = 0; i < Multiplexer::MAX_HANDLERS; ++i) {
+        probes.push_back(ready_probe());
+    }
+    Probe extra(&mux, 0);
+    extra.make_ready();
+    EXPECT_EQ(-1, extra.add_events(POLLIN));
+    EXPECT_EQ(0, probes[19]->add_events(POLLOUT));
+    pass();
+    EXPECT_EQ(20u, g_polled.size());
+    EXPECT_EQ(ONE_INPUT, probes[0]->calls);
+    EXPECT_EQ(std::vector<int>(1, POLLIN | POLLOUT), probes[19]->calls);
+    EXPECT_TRUE(extra.calls.empty());
+
+    probes.erase(probes.begin());
+    EXPECT_EQ(0, extra.add_events(POLLIN));
+    mux.run_once();
+    EXPECT_EQ(ONE_INPUT, extra.calls);
+    EXPECT_EQ(extra.fd(), g_polled[19].fd);
+    EXPECT_EQ(probes[0]->fd(), g_polled[0].fd);
+}
+
+TEST_F(MultiplexerTest, EventsAreAddedAndDroppedBitByBit) {
+    Probe probe(&mux, POLLIN | POLLOUT);
+    probe.make_ready();
+    const struct {
+        int drop, add, polled;
+    } steps[] = {
+        {POLLPRI, 0, POLLIN | POLLOUT}, {POLLIN | POLLPRI, 0, POLLOUT},
+        {0, POLLIN, POLLIN | POLLOUT},  {POLLOUT, 0, POLLIN},
+        {POLLOUT, 0, POLLIN},
+    };
+    for (const auto& step : steps) {
+        probe.del_events(step.drop);
+        if (step.add) {
+            EXPECT_EQ(0, probe.add_events(step.add));
+        }
+        probe.calls.clear();
+        mux.run_once();
+        ASSERT_EQ(1u, g_polled.size());
+        EXPECT_EQ(step.polled, g_polled[0].events);
+        EXPECT_EQ(std::vector<int>(1, step.polled), probe.calls);
+    }
+    probe.del_events(POLLIN);
+    pass();
+    EXPECT_TRUE(g_polled.empty());
+}
+
+TEST_F(MultiplexerTest, DescriptorIsReadOnlyWhenThePollSetIsRebuilt) {
+    Probe probe(&mux, 0);
+    probe.close();
+    EXPECT_EQ(0, probe.close());
+    EXPECT_EQ(0, probe.add_events(POLLIN));
+    pass();
+    EXPECT_EQ(-1, g_polled[0].fd);
+    probe.hang_up();
+    probe.open();
+    probe.make_ready();
+    EXPECT_EQ(0, probe.add_events(POLLIN));  // held already: no rebuild
+    pass();
+    EXPECT_EQ(-1, g_polled[0].fd);
+    EXPECT_TRUE(probe.calls.empty());
+    probe.del_events(POLLIN);
+    EXPECT_EQ(0, probe.add_events(POLLIN));
+    mux.run_once();
+    EXPECT_EQ(ONE_INPUT, probe.calls);
+}
+
+TEST_F(MultiplexerTest, ErrorEventsAreDispatched) {
+    Probe hung(&mux, POLLIN);
+    hung.hang_up();
+    Probe invalid(&mux, POLLIN);
+    ::close(invalid.fd());
+    mux.run_once();
+    EXPECT_EQ(std::vector<int>(1, POLLIN | POLLHUP), hung.calls);
+    EXPECT_EQ(std::vector<int>(1, POLLNVAL), invalid.calls);
+    EXPECT_EQ(-1, invalid.close());
+    EXPECT_EQ(EBADF, errno);
+    EXPECT_EQ(-1, invalid.fd());
+}
+
+TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
+    std::unique_ptr<Probe> probe = ready_probe();
+    mux.run_once();  // leaves returned events in the poll array
+    EXPECT_EQ(-1, g_timeout);
+    int fired = 0;
+    mux.timer_mgr().add_timer(
+        0, [](void* n) { ++*static_cast<int*>(n); }, &fired);
+    g_poll_error = EINTR;
+    LogCapture log;
+    mux.run_once();
+    EXPECT_EQ(1, fired);
+    EXPECT_EQ(ONE_INPUT, probe->calls);
+    EXPECT_EQ("", log.text());
+}
+
+TEST_F(MultiplexerTest, WaitsForTheEarliestTimerOrWithoutLimit) {
+    struct timespec start, end;
+    int fired = 0;
+    mux.timer_mgr().add_timer(
+        60000, [](void*) { FAIL(); }, nullptr);
+    mux.timer_mgr().add_timer(
+        30, [](void* n) { ++*static_cast<int*>(n); }, &fired);
+    Probe idle(&mux, POLLIN);
+    clock_gettime(CLOCK_BOOTTIME, &start);
+    while (!fired) {
+        mux.run_once();
+        EXPECT_LE(g_timeout, 30);
+    }
+    clock_gettime(CLOCK_BOOTTIME, &end);
+    EXPECT_GE(TimerManager::diff_ms(end, start), 29);
+    EXPECT_TRUE(idle.calls.empty());
+
+    Multiplexer empty;
+    g_poll_error = EINTR;  // it would wait for ever
+    empty.run_once();
+    EXPECT_EQ(-1, g_timeout);
+    EXPECT_TRUE(g_polled.empty());
+}
+
+TEST_F(MultiplexerTest, TimersRunBeforeHandlersAndMayDestroyThem) {
+    std::vector<std::unique_ptr<Probe>> probes;
+    probes.push_back(ready_probe());
+    probes.push_back(ready_probe());
+    mux.timer_mgr().add_timer(
+        0,
+        [](void* data) {
+            auto& list = *static_cast<std::vector<std::unique_ptr<Probe>>*>(data);
+            EXPECT_TRUE(list[1]->calls.empty());
+            list.erase(list.begin());
+        },
+        &probes);
+    mux.run_once();
+    EXPECT_EQ(2u, g_polled.size());
+    ASSERT_EQ(1u, probes.size());
+    EXPECT_EQ(ONE_INPUT, probes[0]->calls);
+}
+
+TEST_F(MultiplexerTest, HandlerMayDestroyItselfAndOthers) {
+    const size_t descriptors = open_descriptors();
+    Probe* self = ready_probe().release();
+    std::unique_ptr<Probe> victim = ready_probe();
+    std::unique_ptr<Probe> last = ready_probe();
+    self->action = [&] {
+        delete self;
+        victim.reset();
+        // A new handler, likely at an address just freed, waits for the next pass.
+        victim = ready_probe();
+    };
+    mux.run_once();
+    EXPECT_EQ(3u, g_polled.size());
+    EXPECT_TRUE(victim->calls.empty());
+    EXPECT_EQ(ONE_INPUT, last->calls);
+    mux.run_once();
+    EXPECT_EQ(2u, g_polled.size());
+    EXPECT_EQ(ONE_INPUT, victim->calls);
+    victim.reset();
+    last.reset();
+    EXPECT_EQ(descriptors, open_descriptors());
+}
+
+TEST_F(MultiplexerTest, RegistrationChangedWhileDispatchingCountsFromTheNextPass) {
+    std::unique_ptr<Probe> first = ready_probe();
+    std::unique_ptr<Probe> removed = ready_probe();
+    std::unique_ptr<Probe> reopened = ready_probe();
+    std::unique_ptr<Probe> narrowed(new Probe(&mux, POLLIN | POLLOUT));
+    Probe added(&mux, 0);
+    added.make_ready();
+    first->action = [&] {
+        first->action = nullptr;
+        removed->del_events(POLLIN);
+        reopened->del_events(POLLIN);
+        reopened->reopen();
+        EXPECT_EQ(0, reopened->add_events(POLLIN));
+        reopened->make_ready();
+        narrowed->del_events(POLLOUT);
+        EXPECT_EQ(0, added.add_events(POLLIN));
+    };
+    mux.run_once();
+    EXPECT_TRUE(removed->calls.empty());
+    EXPECT_TRUE(reopened->calls.empty());
+    EXPECT_TRUE(added.calls.empty());
+    EXPECT_EQ(std::vector<int>(1, POLLOUT), narrowed->calls);  // still registered: as polled
+    mux.run_once();
+    EXPECT_TRUE(removed->calls.empty());
+    EXPECT_EQ(ONE_INPUT, reopened->calls);
+    EXPECT_EQ(ONE_INPUT, added.calls);
+    EXPECT_EQ(1u, narrowed->calls.size());
+}
+
+// A handler destroyed with events other than POLLIN, or with its descriptor closed
+// already, left an entry that was read after its end.
+TEST_F(MultiplexerTest, DestructorLeavesNoRegistration) {
+    std::unique_ptr<Probe> writer(new Probe(&mux, POLLIN | POLLOUT));
+    std::unique_ptr<Probe> closed = ready_probe();
+    closed->close();
+    writer.reset();
+    closed.reset();
+    pass();
+    EXPECT_TRUE(g_polled.empty());
+}
+
+TEST_F(MultiplexerTest, SteadyLoopDoesNotAllocate) {
+    TimerManager& mgr = mux.timer_mgr();
+    TimerManager::Timer* const timer = mgr.create_timer(60000, nullptr, nullptr);
+    TimerManager::Timer* const other = mgr.create_timer(60000, nullptr, nullptr);
+    std::unique_ptr<Probe> probe = ready_probe();
+    probe->calls.reserve(200);
+    mux.run_once();
+    const size_t before = g_allocations;
+    for (int i = 0; i < 100; ++i) {
+        mux.run_once();
+        EXPECT_EQ(0, mgr.set_new_due_time(i % 2 ? timer : other, 60000));
+    }
+    EXPECT_EQ(before, g_allocations);
+    EXPECT_EQ(101u, probe->calls.size());
+}

@@ -1,0 +1,262 @@
+#include "core/TimerManager.h"
+
+#include <errno.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/time.h>
+
+#include <functional>
+#include <string>
+
+#include "core/Multiplexer.h"
+#include "support/TestRoot.h"
+
+namespace {
+
+enum ClockMode { CLOCK_REAL, CLOCK_FROZEN, CLOCK_FAILS };
+ClockMode g_mode = CLOCK_REAL;
+struct timespec g_now;
+volatile sig_atomic_t g_signals;
+
+}  // namespace
+
+extern "C" int __real_clock_gettime(clockid_t id, struct timespec* now);
+extern "C" int __wrap_clock_gettime(clockid_t id, struct timespec* now);
+extern "C" int __wrap_clock_gettime(clockid_t id, struct timespec* now) {
+    if (id != CLOCK_BOOTTIME || g_mode == CLOCK_REAL) {
+        return __real_clock_gettime(id, now);
+    }
+    if (g_mode == CLOCK_FAILS) {
+        errno = EINVAL;
+        return -1;
+    }
+    *now = g_now;
+    return 0;
+}
+
+namespace {
+
+// Timers on a clock that the test moves; each timer logs its name when it fires.
+class TimerManagerTest : public testing::Test {
+protected:
+    struct Client {
+        std::string* fired;
+        char name;
+        std::function<void()> action;
+        TimerManager::Timer* timer;
+    };
+
+    TimerManagerTest() {
+        g_mode = CLOCK_FROZEN;
+        g_now = {1000, 999999999};
+    }
+    ~TimerManagerTest() override { g_mode = CLOCK_REAL; }
+
+    static void fire(void* data) {
+        Client* const client = static_cast<Client*>(data);
+        *client->fired += client->name;
+        if (client->action) {
+            client->action();
+        }
+    }
+    // Creates the timer "a", "b", ... for client 0, 1, ...
+    void create(size_t i, unsigned int ms) {
+        m_clients[i].fired = &m_fired;
+        m_clients[i].name = static_cast<char>('a' + i);
+        m_clients[i].timer = m_mgr.create_timer(ms, fire, &m_clients[i]);
+        ASSERT_NE(nullptr, m_clients[i].timer);
+    }
+    // Moves the clock and runs one pass; the names of the timers that fired, in order.
+    std::string after(unsigned int ms) {
+        g_now = TimerManager::add_ms(g_now, ms);
+        m_fired.clear();
+        m_mgr.process_timers();
+        return m_fired;
+    }
+
+    Client m_clients[8];
+    std::string m_fired;
+    TimerManager m_mgr;
+};
+
+}  // namespace
+
+TEST(TimerArithmetic, AddMilliseconds) {
+    const struct {
+        struct timespec t;
+        unsigned int ms;
+        struct timespec sum;
+    } table[] = {
+        {{5, 0}, 0, {5, 0}},
+        {{5, 500000000}, 499, {5, 999000000}},
+        {{5, 500000000}, 500, {6, 0}},
+        {{5, 500000000}, 1999, {7, 499000000}},
+        {{5, 999999999}, 1, {6, 999999}},
+        {{5, 1}, 3000, {8, 1}},
+        {{5, 0}, 2147483647u, {2147488, 647000000}},
+        {{5, 900000000}, 4294967295u, {5, 899000000}},  // as a signed value: -1
+    };
+    for (const auto& row : table) {
+        const struct timespec sum = TimerManager::add_ms(row.t, row.ms);
+        EXPECT_EQ(row.sum.tv_sec, sum.tv_sec) << row.ms;
+        EXPECT_EQ(row.sum.tv_nsec, sum.tv_nsec) << row.ms;
+    }
+}
+
+TEST(TimerArithmetic, DifferenceAndOrder) {
+    const struct {
+        struct timespec a, b;
+        int ms;
+        bool earlier;
+    } table[] = {
+        {{5, 0}, {5, 0}, 0, false},
+        {{5, 1999999}, {5, 0}, 1, false},
+        {{5, 0}, {5, 1999999}, -1, true},
+        {{6, 0}, {5, 999999999}, 1, false},  // -999 ms of the nanoseconds, cut towards zero
+        {{5, 999999999}, {6, 0}, -1, true},
+        {{8, 500000000}, {5, 250000000}, 3250, false},
+        {{5, 250000000}, {8, 500000000}, -3250, true},
+        {{5, 900000000}, {6, 100000000}, -200, true},
+    };
+    for (const auto& row : table) {
+        EXPECT_EQ(row.ms, TimerManager::diff_ms(row.a, row.b)) << row.a.tv_nsec;
+        EXPECT_EQ(row.earlier, TimerManager::is_earlier(row.a, row.b)) << row.a.tv_nsec;
+    }
+}
+
+TEST_F(TimerManagerTest, FireInOrderOfExpiryThenOfInsertion) {
+    const unsigned int periods[] = {20, 10, 20, 0, 30, 10, 20};
+    for (size_t i = 0; i < 7; ++i) {
+        create(i, periods[i]);
+    }
+    EXPECT_EQ("d", after(0));
+    EXPECT_EQ("", after(9));
+    EXPECT_EQ("bf", after(1));
+    EXPECT_EQ("acge", after(50));
+    EXPECT_EQ("", after(50));
+}
+
+TEST_F(TimerManagerTest, TimeoutIsThatOfTheEarliest) {
+    int ms = 7;
+    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
+    EXPECT_EQ(-1, ms);
+    create(0, 3000);
+    create(1, 1500);
+    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
+    EXPECT_EQ(1500, ms);
+    g_now = {1002, 499999998};  // one nanosecond before the earliest
+    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
+    EXPECT_EQ(0, ms);
+    EXPECT_EQ("", after(0));
+    g_now = {1100, 0};
+    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
+    EXPECT_EQ(0, ms);
+}
+
+TEST_F(TimerManagerTest, CancelAndRearm) {
+    const struct {
+        size_t timer;
+        int ms;  // -1: cancel
+        const char* fired;
+    } table[] = {
+        {0, -1, "bcd"},  {1, -1, "acd"},  {3, -1, "abc"},   {0, 40, "bcda"}, {0, 25, "bcad"},
+        {1, 20, "acbd"}, {3, 50, "abcd"}, {2, 100, "abdc"}, {3, 5, "dabc"},  {2, 0, "cabd"},
+    };
+    for (const auto& row : table) {
+        const unsigned int periods[] = {10, 20, 20, 40};
+        for (size_t i = 0; i < 4; ++i) {
+            create(i, periods[i]);
+        }
+        TimerManager::Timer* const t = m_clients[row.timer].timer;
+        if (row.ms < 0) {
+            m_mgr.del_timer(t);
+            m_mgr.del_timer(t);  // not pending any more
+            EXPECT_EQ(-1, m_mgr.set_new_due_time(t, 10));
+        } else {
+            EXPECT_EQ(0, m_mgr.set_new_due_time(t, static_cast<unsigned int>(row.ms)));
+        }
+        EXPECT_EQ(row.fired, after(200));
+    }
+}
+
+// The timer that would run next is cancelled or re-armed by a callback.
+TEST_F(TimerManagerTest, CallbackMayChangeAnyTimer) {
+    for (size_t i = 0; i < 6; ++i) {
+        create(i, 10);
+    }
+    m_clients[0].action = [&] {
+        m_mgr.del_timer(m_clients[1].timer);
+        EXPECT_EQ(0, m_mgr.set_new_due_time(m_clients[2].timer, 10));
+        // Its own timer is not pending.
+        m_mgr.del_timer(m_clients[0].timer);
+        EXPECT_EQ(-1, m_mgr.set_new_due_time(m_clients[0].timer, 0));
+    };
+    m_clients[3].action = [&] {
+        m_mgr.del_timer(m_clients[5].timer);
+        EXPECT_EQ(0, m_mgr.set_new_due_time(m_clients[4].timer, 0));
+    };
+    EXPECT_EQ("ade", after(10));
+    EXPECT_EQ("c", after(10));
+}
+
+TEST_F(TimerManagerTest, TimerAddedByACallbackWaitsForTheNextPass) {
+    create(0, 10);
+    create(1, 10);
+    m_clients[0].action = [&] { create(0, 0); };  // re-creates itself for ever
+    for (int i = 0; i < 3; ++i) {
+        EXPECT_EQ(i ? "a" : "ab", after(i ? 0 : 10));
+    }
+    // Due before a timer that is run later in the same pass.
+    create(1, 5);
+    m_clients[0].action = [&] { m_clients[0].action = [&] { create(2, 0); }, create(0, 0); };
+    EXPECT_EQ("ab", after(5));
+    EXPECT_EQ("a", after(0));
+    EXPECT_EQ("c", after(0));
+}
+
+TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
+    create(0, 10);
+    int ms = 7;
+    LogCapture log;
+    g_mode = CLOCK_FAILS;
+    EXPECT_EQ(nullptr, m_mgr.create_timer(0, fire, nullptr));
+    EXPECT_EQ(-1, m_mgr.set_new_due_time(m_clients[0].timer, 100));
+    EXPECT_EQ(-1, m_mgr.get_timeout(&ms));
+    EXPECT_EQ(7, ms);
+    EXPECT_EQ("", after(10));
+    EXPECT_EQ("", log.text());
+    EXPECT_EQ(-1, m_mgr.add_timer(0, fire, nullptr));
+    EXPECT_TRUE(log.has("TimerManager::add_timer(unsigned int, "));
+    EXPECT_TRUE(log.has("): clock_gettime CLOCK_BOOTTIME error [22(Invalid argument)]\n"));
+    g_mode = CLOCK_FROZEN;
+    EXPECT_EQ("a", after(0));
+    EXPECT_EQ(0, m_mgr.add_timer(0, fire, &m_clients[0]));
+    EXPECT_EQ("a", after(0));
+}
+
+// With a due timer but no clock, the loop waits until a descriptor or a signal ends it.
+TEST_F(TimerManagerTest, LoopWithoutClockWaitsWithoutLimit) {
+    Multiplexer mux;
+    EXPECT_EQ(0, mux.timer_mgr().add_timer(
+                     0, [](void*) { FAIL(); }, nullptr));
+    struct sigaction action = {}, saved;
+    action.sa_handler = [](int) { g_signals = g_signals + 1; };
+    g_signals = 0;
+    ASSERT_EQ(0, sigaction(SIGALRM, &action, &saved));
+    const struct itimerval every = {{0, 20000}, {0, 20000}};
+    const struct itimerval off = {{0, 0}, {0, 0}};
+    ASSERT_EQ(0, setitimer(ITIMER_REAL, &every, nullptr));
+    g_mode = CLOCK_FAILS;
+    mux.run_once();
+    ASSERT_EQ(0, setitimer(ITIMER_REAL, &off, nullptr));
+    EXPECT_GE(g_signals, 1);
+    ASSERT_EQ(0, sigaction(SIGALRM, &saved, nullptr));
+}
+
+TEST_F(TimerManagerTest, DestructorCallsNobody) {
+    {
+        TimerManager mgr;
+        EXPECT_EQ(0, mgr.add_timer(
+                         0, [](void*) { FAIL(); }, nullptr));
+    }
+}

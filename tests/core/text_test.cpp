@@ -1,0 +1,137 @@
+#include "core/text.h"
+
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace {
+
+// An exact copy on the heap, so that a sanitizer sees a read outside the range.
+class Bytes {
+public:
+    explicit Bytes(const std::string& text) : m_size(text.size()), m_data(new uint8_t[m_size]) {
+        text.copy(reinterpret_cast<char*>(m_data.get()), m_size);
+    }
+    const uint8_t* data() const { return m_data.get(); }
+    size_t size() const { return m_size; }
+
+private:
+    size_t m_size;
+    std::unique_ptr<uint8_t[]> m_data;
+};
+
+std::vector<std::string> tokens(const std::string& text) {
+    const Bytes bytes(text);
+    const uint8_t* const end = bytes.data() + bytes.size();
+    std::vector<std::string> result;
+    size_t len = 0;
+    for (const uint8_t* at = bytes.data(); (at = get_token(at, static_cast<size_t>(end - at), len));
+         at += len) {
+        result.emplace_back(reinterpret_cast<const char*>(at), len);
+    }
+    return result;
+}
+
+}  // namespace
+
+TEST(Text, Tokens) {
+    typedef std::vector<std::string> List;
+    const std::string nul("a\0b c", 5);
+    const struct {
+        std::string text;
+        List expected;
+    } table[] = {
+        {"", {}},
+        {" \t\r\n", {}},
+        {"one", {"one"}},
+        {"\t one\rtwo\nthree  four\t", {"one", "two", "three", "four"}},
+        {nul, {nul.substr(0, 3), "c"}},
+        {"a\vb\fc \xff", {"a\vb\fc", "\xff"}},  // only four separators
+    };
+    for (const auto& row : table) {
+        EXPECT_EQ(row.expected, tokens(row.text)) << row.text;
+    }
+}
+
+TEST(Text, TokenEqualsTheWholeWordOnly) {
+    const struct {
+        const char* token;
+        const char* word;
+        bool equal;
+    } table[] = {
+        {"ON", "ON", true},  {"ON", "ONE", false}, {"ONE", "ON", false},
+        {"on", "ON", false}, {"", "", true},       {"", "ON", false},
+    };
+    for (const auto& row : table) {
+        const Bytes token(row.token);
+        EXPECT_EQ(row.equal, token_equals(token.data(), token.size(), row.word)) << row.word;
+    }
+    const Bytes nul(std::string("ON\0", 3));
+    EXPECT_FALSE(token_equals(nul.data(), nul.size(), "ON"));
+}
+
+TEST(Text, FindBytes) {
+    const struct {
+        std::string text, pattern;
+        int at;
+    } table[] = {
+        {"Modem Assert", "Assert", 6},
+        {"Modem Assert", "Modem", 0},
+        {"aaab", "aab", 1},
+        {"abab", "ab", 0},
+        {"Modem Asser", "Assert", -1},
+        {"As", "Assert", -1},
+        {"", "A", -1},
+        {"abc", "", -1},
+        {std::string("a\0b\0c", 5), std::string("\0c", 2), 3},
+    };
+    for (const auto& row : table) {
+        const Bytes text(row.text);
+        const uint8_t* const found =
+            find_bytes(text.data(), text.size(), row.pattern.data(), row.pattern.size());
+        EXPECT_EQ(row.at, found ? found - text.data() : -1) << row.text;
+    }
+}
+
+TEST(Text, Numbers) {
+    const struct {
+        const char* text;
+        int whole;       // result of parse_number
+        int leading;     // result of parse_leading_number
+        uint32_t value;  // of those that succeed
+        size_t digits;
+    } table[] = {
+        {"", 0, -1, 0, 0},
+        {"0", 0, 0, 0, 1},
+        {"007", 0, 0, 7, 3},
+        {"12x", -1, 0, 12, 2},
+        {"12 ", -1, 0, 12, 2},
+        {"x12", -1, -1, 0, 0},
+        {"-1", -1, -1, 0, 0},
+        {"+1", -1, -1, 0, 0},
+        {" 1", -1, -1, 0, 0},
+        {"/", -1, -1, 0, 0},
+        {":", -1, -1, 0, 0},
+        {"4294967295", 0, 0, 4294967295u, 10},
+        {"4294967295x", -1, 0, 4294967295u, 10},
+        {"42949672950", -1, -1, 0, 0},  // another digit after the largest value
+        {"4294967296", 0, 0, 0, 10},    // other values wrap
+        {"99999999999", 0, 0, 1215752191, 11},
+        {"99999999999z", -1, 0, 1215752191, 11},
+    };
+    const uint32_t untouched = 77;
+    for (const auto& row : table) {
+        const Bytes text(row.text);
+        uint32_t value = untouched;
+        EXPECT_EQ(row.whole, parse_number(text.data(), text.size(), value)) << row.text;
+        EXPECT_EQ(row.whole ? untouched : row.value, value) << row.text;
+        size_t digits = untouched;
+        value = untouched;
+        EXPECT_EQ(row.leading, parse_leading_number(text.data(), text.size(), value, digits))
+            << row.text;
+        EXPECT_EQ(row.leading ? untouched : row.value, value) << row.text;
+        EXPECT_EQ(row.leading ? untouched : row.digits, digits) << row.text;
+    }
+}
