@@ -1,0 +1,40 @@
+// The surroundings of a configuration test: a root whose properties and environment
+// let a configuration be read without a message, and a command line.
+#ifndef TESTS_CONFIG_CONFIGFIXTURE_H_
+#define TESTS_CONFIG_CONFIGFIXTURE_H_
+
+#include <gtest/gtest.h>
+#include <stdlib.h>
+
+#include <string>
+#include <vector>
+
+#include "config/LogConfig.h"
+#include "support/TestRoot.h"
+
+class ConfigFixture : public testing::Test {
+protected:
+    ConfigFixture() {
+        LogConfig::set_wan_modem_type(CT_UNKNOWN);
+        root.set_prop("persist.modem.w.enable", "1");
+        root.set_prop("persist.storage.type", "1");
+        setenv("EXTERNAL_STORAGE", "/storage/sdcard0", 1);
+        unsetenv("SECONDARY_STORAGE");
+    }
+
+    static int read(LogConfig& config, std::vector<std::string> args = {}) {
+        args.insert(args.begin(), "kestmodem");
+        std::vector<char*> argv;
+        for (std::string& arg : args) {
+            argv.push_back(&arg[0]);
+        }
+        argv.push_back(nullptr);
+        return config.read_config(static_cast<int>(args.size()), argv.data());
+    }
+
+    TestRoot root;
+    LogCapture log;
+    const std::string file = root.path("kest_modem.conf");
+};
+
+#endif  // TESTS_CONFIG_CONFIGFIXTURE_H_

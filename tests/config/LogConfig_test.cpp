@@ -1,0 +1,279 @@
+#include "config/LogConfig.h"
+
+#include <sstream>
+
+#include "config/ConfigFixture.h"
+
+namespace {
+
+const char DEFAULTS[] =
+    "minidump disable\texternal\n"
+    "log_file_size 5\n"
+    "data_log_size 25\n"
+    "sd_log_size 250\n"
+    "log_overwrite enable\n"
+    "\n"
+    "\n"
+    "#Type\tName\tState\tSize\tLevel\n";
+
+class LogConfigTest : public ConfigFixture {
+protected:
+    // What the settings are, as the lines of a saved file that the defaults do not have.
+    std::string changes(LogConfig& config) const {
+        EXPECT_EQ(config.save(), 0);
+        std::istringstream saved(root.read_file("kest_modem.conf"));
+        std::string result;
+        for (std::string line; std::getline(saved, line);) {
+            if (("\n" + std::string(DEFAULTS)).find("\n" + line + "\n") == std::string::npos) {
+                result += (result.empty() ? "" : "|") + line;
+            }
+        }
+        return result;
+    }
+};
+
+TEST_F(LogConfigTest, LineGrammar) {
+    static const char INVALID[] = "invalid line: 1\n [";
+    static const char STREAM[] = "stream\tcp_wcdma\ton\t100\t3";
+    static const char BIG[] = "log_file_size 4294967295";
+    static const struct {
+        std::string line;
+        const char* message;  // "": nothing may be logged
+        const char* changes;
+    } CASES[] = {
+        {"stream cp_wcdma on 100 3\n", "", STREAM},
+        {"stream\tcp_wcdma\ton\t100\t3\n", "", STREAM},
+        {"  stream cp_wcdma on 100 3\n", "", STREAM},
+        {"stream cp_wcdma on 0x64 03 more\r\n", "", STREAM},
+        {"stream cp_wcdma on 100 3", "", STREAM},  // the last line, not ended
+        {std::string("stream cp_wcdma on 100 3\0x\n", 27), "", STREAM},
+        {std::string("stream cp_wcdma on\0 100 3\n", 26), INVALID, ""},
+        {"stream cp_wcdma ON 100 3\n", "", "stream\tcp_wcdma\toff\t100\t3"},
+        {"stream agdsp on -1 -0x1\n", "", "stream\tagdsp\ton\t4294967295\t4294967295"},
+        {"stream cp_wcdma on 100\n", INVALID, ""},
+        {"stream cp_wcdma on 100x 3\n", INVALID, ""},
+        {"stream cp_wcdma on 100 3x\n", INVALID, ""},
+        {"stream cp_wcdma on 100\v3 3\n", INVALID, ""},
+        {"stream cp_wcdma on x 3\n", INVALID, ""},
+        {"stream cp_wcdma on 4294967296 3\n", INVALID, ""},
+        {"stream cp_wcdma on 100 18446744073709551616\n", INVALID, ""},
+        {"stream cp_wcdma on\n", INVALID, ""},
+        {"stream cp_wcdma\n", INVALID, ""},
+        {"stream\n", INVALID, ""},
+        {"stream cp_tdd-lte on 100 3\n", "", ""},
+        {"stream cp_nobody\n", "", ""},
+        {"iq cp_wcdma GSM WCDMA\n", "", "iq cp_wcdma GSM WCDMA"},
+        {"iq cp_wcdma WCDMA GSM GSM\n", "", "iq cp_wcdma GSM WCDMA"},
+        {"iq cp_3mode GSM\n", "", "iq cp_3mode GSM "},
+        {"iq cp_wcdma\n", ": no I/Q type [", ""},
+        {"iq cp_wcdma WCDMA LTE\n", ": invalid I/Q type [", ""},
+        {"iq cp_td-lte WCDMA\n", ": invalid I/Q CP type [", ""},
+        {"iq\n", INVALID, ""},
+        {"minidump enable internal\n", "", "minidump enable\tinternal"},
+        {"minidump Enable internal\n", "", "minidump disable\tinternal"},
+        {"minidump enable sdcard\n", "", "minidump enable\texternal"},
+        {"minidump enable\n", INVALID, "minidump enable\texternal"},
+        {"minidump\n", INVALID, ""},
+        {"log_file_size 0x20\n", "", "log_file_size 32"},
+        {"log_file_size 010\v\n", "", "log_file_size 8"},
+        {"log_file_size 7 MB\n", "", "log_file_size 7"},
+        {"log_file_size abc\n", "", "log_file_size 0"},
+        {"log_file_size\n", "", "log_file_size 0"},
+        {"log_file_size", INVALID, ""},
+        {"log_file_size 7", INVALID, ""},
+        {std::string("log_file_size 7\0\n", 17), INVALID, ""},
+        {"log_file_size 7M\n", INVALID, ""},
+        {"log_file_size 4294967295\n", "", BIG},
+        {"log_file_size -1\n", "", BIG},
+        {"log_file_size 4294967296\n", INVALID, ""},
+        {"log_file_size -4294967296\n", INVALID, ""},
+        {"log_file_size 18446744073709551615\n", INVALID, ""},
+        {"log_file_size -99999999999999999999\n", INVALID, ""},
+        {"log_file_size 99999999999999999999\n", INVALID, ""},
+        {"data_log_size 26\n", "", "data_log_size 26"},
+        {"data_log_size 26,\n", INVALID, ""},
+        {"sd_log_size\t251\r\n", "", "sd_log_size 251"},
+        {"sd_log_size 1.5\n", INVALID, ""},
+        {"log_overwrite yes\n", "", "log_overwrite disable"},
+        {"log_overwrite enable\n", "", ""},
+        {"log_overwrite\n", INVALID, ""},
+        {"foo 1\n", INVALID, ""},
+        {"Stream cp_wcdma on 100 3\n", INVALID, ""},
+        {"log_file_sizes 7\n", INVALID, ""},
+        {"#stream cp_wcdma on 100 3\n", "", ""},
+        {" \t\r\n", "", ""},
+        {"", "", ""},
+    };
+    for (const auto& c : CASES) {
+        SCOPED_TRACE(testing::PrintToString(c.line));
+        root.write_file("kest_modem.conf", c.line);
+        log.clear();
+        LogConfig config(file.c_str());
+        EXPECT_EQ(read(config), 0);
+        EXPECT_TRUE(c.message[0] ? log.has(c.message) : log.text().empty()) << log.text();
+        EXPECT_EQ(changes(config), c.changes);
+    }
+}
+
+TEST_F(LogConfigTest, WritesTheExactFileAndReadsItBack) {
+    const std::string text =
+        "minidump enable\tinternal\nlog_file_size 6\ndata_log_size 26\nsd_log_size 251\n"
+        "log_overwrite disable\n\niq cp_wcdma WCDMA\niq cp_td-scdma GSM \n\n"
+        "#Type\tName\tState\tSize\tLevel\n"
+        "stream\tcp_wcdma\ton\t100\t3\nstream\tcp_wcn\toff\t50\t1\n";
+    root.write_file("kest_modem.conf", text);
+    LogConfig config(file.c_str());
+    ASSERT_EQ(read(config), 0);
+    EXPECT_FALSE(config.dirty());
+    EXPECT_TRUE(config.save_md() && config.md_int_stor() && !config.log_overwrite());
+    EXPECT_EQ(config.log_file_size(), 6u);
+    EXPECT_EQ(config.data_log_size(), 26u);
+    EXPECT_EQ(config.sd_log_size(), 251u);
+    EXPECT_EQ(config.sd_root(), "/storage/sdcard0");
+    EXPECT_FALSE(config.wcdma_iq_enabled(CT_TD));
+    EXPECT_EQ(log.text(), "");
+
+    // An older and longer file leaves nothing behind.
+    root.write_file("kest_modem.conf", std::string(5000, 'x'));
+    ASSERT_EQ(config.save(), 0);
+    EXPECT_EQ(root.read_file("kest_modem.conf"), text);
+
+    // A capture switched off is written without a type and dropped when read back.
+    config.disable_iq(CT_WCDMA, LogConfig::IQ_WCDMA);
+    ASSERT_EQ(config.save(), 0);
+    EXPECT_NE(root.read_file("kest_modem.conf").find("\niq cp_wcdma \n"), std::string::npos);
+    LogConfig again(file.c_str());
+    ASSERT_EQ(read(again), 0);
+    EXPECT_EQ(log.count(": no I/Q type ["), 1u);
+
+    root.write_file("kest_modem.conf", "");
+    LogConfig empty(file.c_str());
+    ASSERT_EQ(read(empty), 0);
+    EXPECT_TRUE(empty.stream_entries().empty());
+    ASSERT_EQ(empty.save(), 0);
+    EXPECT_EQ(root.read_file("kest_modem.conf"), DEFAULTS);
+}
+
+TEST_F(LogConfigTest, DuplicatesKeepTheFirstPlaceAndInvalidLinesTheirNumber) {
+    root.write_file("kest_modem.conf",
+                    "stream cp_wcn on 1 1\nfoo\nstream agdsp on 2 2\nstream cp_wcn off 3 4\n"
+                    "iq cp_wcdma GSM\niq cp_wcdma WCDMA\n\nbar\n");
+    LogConfig config(file.c_str());
+    ASSERT_EQ(read(config), 0);
+    EXPECT_TRUE(log.has("kestcp: duplicate CP cp_wcn in config file ["));
+    EXPECT_TRUE(log.has("int LogConfig::read_config(int, char**): invalid line: 2\n ["));
+    EXPECT_TRUE(log.has("invalid line: 8\n ["));
+    EXPECT_FALSE(config.wcdma_iq_enabled(CT_WCDMA)) << "the first I/Q entry decides";
+    EXPECT_EQ(
+        changes(config),
+        "iq cp_wcdma GSM |iq cp_wcdma WCDMA|stream\tcp_wcn\toff\t3\t4|stream\tagdsp\ton\t2\t2");
+}
+
+TEST_F(LogConfigTest, LongLinesAreReadInPieces) {
+    const std::string number = "log_file_size 12";
+    root.write_file("kest_modem.conf", "#" + std::string(1022, 'x') + "data_log_size 9\n" +  // 1, 2
+                                           std::string(1023 - number.size(), ' ') + number +
+                                           "34\n" +  // 3, 4
+                                           "\n");
+    LogConfig config(file.c_str());
+    ASSERT_EQ(read(config), 0);
+    EXPECT_EQ(log.count("invalid line:"), 2u);
+    EXPECT_TRUE(log.has("invalid line: 3\n") && log.has("invalid line: 4\n")) << log.text();
+    EXPECT_EQ(changes(config), "data_log_size 9");
+}
+
+TEST_F(LogConfigTest, MissingFileIsCopiedFromTheDefault) {
+    const size_t before = open_descriptors();
+    {
+        LogConfig config(file.c_str());
+        EXPECT_EQ(read(config), -1);  // no default either
+        EXPECT_TRUE(log.has("can not open " + file + " ["));
+    }
+    root.write_file("system/etc/kest_modem.conf", "stream cp_wcn on 1 2\n");
+    log.clear();
+    LogConfig config(file.c_str());
+    EXPECT_EQ(read(config), 0);
+    EXPECT_EQ(log.text(), "");
+    EXPECT_EQ(root.read_file("kest_modem.conf"), "stream cp_wcn on 1 2\n");
+    ASSERT_NE(config.find_stream(CT_WCN), nullptr);
+
+    // A file that is there wins over the default.
+    root.write_file("kest_modem.conf", "log_file_size 1\n");
+    LogConfig own(file.c_str());
+    EXPECT_EQ(read(own), 0);
+    EXPECT_EQ(changes(own), "log_file_size 1");
+
+    LogConfig astray((file + "/below_a_file").c_str());
+    EXPECT_EQ(read(astray), -1);
+    EXPECT_EQ(open_descriptors(), before);
+}
+
+TEST_F(LogConfigTest, Options) {
+    root.write_file("kest_modem.conf", "");
+    static const struct {
+        std::vector<std::string> args;
+        int result;
+        bool kest_dir;
+    } CASES[] = {
+        {{}, 0, false},           {{"-s"}, 0, true},        {{"-x"}, -1, false},
+        {{"-sxs"}, -1, true},     {{"word"}, 0, false},     {{"word", "-s"}, 0, true},
+        {{"--", "-x"}, 0, false}, {{"-s", "-x"}, -1, true}, {{"-s"}, 0, true},
+    };
+    for (const auto& c : CASES) {
+        SCOPED_TRACE(testing::PrintToString(c.args));
+        log.clear();
+        LogConfig config(file.c_str());
+        EXPECT_EQ(read(config, c.args), c.result);
+        EXPECT_EQ(config.kest_dir(), c.kest_dir);
+        EXPECT_EQ(log.count("option:-s Modem log will be saved in kest directory!\n"),
+                  c.kest_dir ? 1u : 0u);
+        EXPECT_EQ(log.count("parameters passed to kestmodem are unrecognised! ["),
+                  c.result < 0 ? 1u : 0u);
+        EXPECT_FALSE(log.has("option --")) << "getopt spoke itself";
+        EXPECT_FALSE(log.has("invalid option"));
+    }
+}
+
+TEST_F(LogConfigTest, SettersAreDirtyOnAChangeOnly) {
+    root.write_file("kest_modem.conf", "stream cp_wcn off 1 1\n");
+    LogConfig config(file.c_str());
+    ASSERT_EQ(read(config), 0);
+    typedef void (*Change)(LogConfig&);
+    static const struct {
+        Change change;
+        const char* line;
+    } CASES[] = {
+        {[](LogConfig& c) { c.set_md(true); }, "minidump enable\texternal\n"},
+        {[](LogConfig& c) { c.set_md_int_stor(true); }, "minidump enable\tinternal\n"},
+        {[](LogConfig& c) { c.set_log_file_size(7); }, "log_file_size 7\n"},
+        {[](LogConfig& c) { c.set_data_log_size(8); }, "data_log_size 8\n"},
+        {[](LogConfig& c) { c.set_sd_log_size(9); }, "sd_log_size 9\n"},
+        {[](LogConfig& c) { c.set_log_overwrite(false); }, "log_overwrite disable\n"},
+        {[](LogConfig& c) { c.set_stream(CT_WCN, true); }, "stream\tcp_wcn\ton\t1\t1\n"},
+        {[](LogConfig& c) { c.enable_iq(CT_TD, LogConfig::IQ_WCDMA); }, "iq cp_td-scdma WCDMA\n"},
+        {[](LogConfig& c) { c.enable_iq(CT_TD, LogConfig::IQ_GSM); }, "iq cp_td-scdma GSM WCDMA\n"},
+        {[](LogConfig& c) { c.disable_iq(CT_TD, LogConfig::IQ_WCDMA); }, "iq cp_td-scdma GSM \n"},
+        {[](LogConfig& c) { c.disable_iq(CT_TD, LogConfig::IQ_GSM); }, "iq cp_td-scdma \n"},
+    };
+    for (const auto& c : CASES) {
+        SCOPED_TRACE(c.line);
+        c.change(config);
+        EXPECT_TRUE(config.dirty());
+        ASSERT_EQ(config.save(), 0);
+        EXPECT_FALSE(config.dirty());
+        EXPECT_NE(root.read_file("kest_modem.conf").find(c.line), std::string::npos);
+        c.change(config);
+        EXPECT_FALSE(config.dirty());
+    }
+    config.set_stream(CT_GNSS, true);  // no such entry
+    config.disable_iq(CT_WCDMA, LogConfig::IQ_WCDMA);
+    EXPECT_FALSE(config.dirty());
+    EXPECT_EQ(config.find_stream(CT_GNSS), nullptr);
+
+    LogConfig homeless((file + "/below_a_file").c_str());
+    homeless.set_md(true);
+    EXPECT_EQ(homeless.save(), -1);
+    EXPECT_TRUE(homeless.dirty() && homeless.save_md());
+}
+
+}  // namespace
