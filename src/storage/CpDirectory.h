@@ -1,0 +1,88 @@
+// The directory of one CP inside one set directory. Owns the LogFile objects of the
+// files in it, keeps them in the order in which trimming deletes them (unknown files,
+// then timed files from oldest to newest, then version records; files made at run time
+// at the end), knows their total size, and makes, renumbers and trims them.
+//
+// Owned by its CpSetDirectory. Every change of size made through add_size and dec_size
+// is passed on to the set and the medium; trim and trim_working_dir return what they
+// removed and leave that to their callers. Main thread only.
+#ifndef STORAGE_CPDIRECTORY_H_
+#define STORAGE_CPDIRECTORY_H_
+
+#include <stdint.h>
+#include <utils/List.h>
+#include <utils/String8.h>
+
+#include "core/ObjectRef.h"
+#include "storage/LogType.h"
+
+class CpSetDirectory;
+class LogFile;
+
+class CpDirectory {
+public:
+    CpDirectory(CpSetDirectory* set, const android::String8& name);
+    // Closes and deletes every file object; nothing on the medium changes.
+    ~CpDirectory();
+    CpDirectory(const CpDirectory&) = delete;
+    CpDirectory& operator=(const CpDirectory&) = delete;
+
+    const android::String8& name() const { return m_name; }
+    const android::String8& path() const { return m_path; }
+    uint64_t size() const { return m_size; }
+    CpSetDirectory* set() const { return m_set; }
+    bool empty() const { return m_files.empty(); }
+    const android::List<LogFile*>& files() const { return m_files; }
+
+    // Makes the directory on the medium; 0 also when it exists. -1 on failure.
+    int create();
+    // Deletes the directory on the medium with everything in it.
+    int remove();
+    // Scans the directory on the medium. 0, or -1 when it cannot be opened.
+    int stat();
+
+    // Makes, opens and appends a new log file numbered 0, which becomes the current
+    // one. The caller renumbers the older ones first (rotate_logs). Null on failure.
+    LogFile* create_log_file();
+    // Makes, opens and appends another file. Null on failure. Owned by this directory.
+    LogFile* create_file(const android::String8& name, LogType type);
+    // Drops a file from the list and deletes it, on the medium too. The object is gone
+    // when this returns 0; -1 when it is not in the list.
+    int remove_file(LogFile* file);
+    // The file vanished from the medium: drops the object. Only this directory's size
+    // changes, not the set's and the medium's.
+    void file_removed(LogFile* file);
+    // Closes the current log file; the next one starts fresh.
+    void close_log_file();
+    // Adds 1 to the number of every log file.
+    void rotate_logs();
+
+    void add_size(uint32_t num);
+    void dec_size(uint32_t num);
+
+    // Deletes files from the front until at least the bytes wanted are gone (at least
+    // one file is deleted, if there is one). Returns the bytes removed.
+    uint64_t trim(uint64_t wanted);
+    // As trim, but spares the first and the current log file, version records and I/Q
+    // captures; renumbers the first log file to follow the oldest one left.
+    uint64_t trim_working_dir(uint64_t wanted);
+
+private:
+    typedef android::List<LogFile*>::iterator FileIter;
+
+    FileIter find(LogFile* file);
+    FileIter drop(FileIter it);
+    bool is_protected(const LogFile* file) const;
+    void renumber_first_log();
+    void insert_scanned(LogFile** files, size_t num);
+
+    CpSetDirectory* m_set;
+    android::String8 m_name;
+    android::String8 m_path;
+    uint64_t m_size = 0;
+    ObjectRef<LogFile> m_first_log;
+    android::List<LogFile*> m_files;
+    ObjectRef<LogFile> m_cur_log;
+};
+
+#endif  // STORAGE_CPDIRECTORY_H_

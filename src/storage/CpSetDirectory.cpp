@@ -1,0 +1,143 @@
+#include "storage/CpSetDirectory.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <string.h>
+#include <sys/stat.h>
+
+#include "storage/CpDirectory.h"
+#include "storage/MediaStorage.h"
+#include "storage/paths.h"
+
+CpSetDirectory::CpSetDirectory(MediaStorage* media, const android::String8& path)
+    : m_media(media), m_path(path) {}
+
+CpSetDirectory::~CpSetDirectory() {
+    for (CpDirectory* dir : m_dirs) {
+        delete dir;
+    }
+}
+
+int CpSetDirectory::create() {
+    return make_log_dir(m_path);
+}
+
+int CpSetDirectory::remove() {
+    return remove_tree(m_path);
+}
+
+int CpSetDirectory::stat() {
+    DIR* dir = opendir(m_path.string());
+    if (!dir) {
+        return -1;
+    }
+    while (const struct dirent* entry = readdir(dir)) {
+        struct stat st;
+        // Links are not followed, as in CpDirectory::stat.
+        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..") ||
+            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
+            !S_ISDIR(st.st_mode)) {
+            continue;
+        }
+        CpDirectory* cp_dir = new CpDirectory(this, android::String8(entry->d_name));
+        if (cp_dir->stat() < 0) {
+            delete cp_dir;
+            continue;
+        }
+        m_dirs.push_back(cp_dir);
+        m_size += cp_dir->size();
+    }
+    closedir(dir);
+    return 0;
+}
+
+CpDirectory* CpSetDirectory::get_cp_dir(const android::String8& cp_name) const {
+    for (CpDirectory* dir : m_dirs) {
+        if (dir->name() == cp_name) {
+            return dir;
+        }
+    }
+    return nullptr;
+}
+
+CpDirectory* CpSetDirectory::prepare_cp_dir(const android::String8& cp_name, bool& new_dir) {
+    for (android::List<CpDirectory*>::iterator it = m_dirs.begin(); it != m_dirs.end(); ++it) {
+        CpDirectory* dir = *it;
+        if (dir->name() != cp_name) {
+            continue;
+        }
+        if (dir_usable(dir->path())) {
+            return dir;
+        }
+        m_dirs.erase(it);
+        m_size -= dir->size();
+        delete dir;
+        break;
+    }
+    CpDirectory* dir = new CpDirectory(this, cp_name);
+    if (dir->create() < 0) {
+        delete dir;
+        return nullptr;
+    }
+    new_dir = true;
+    m_dirs.push_back(dir);
+    return dir;
+}
+
+LogFile* CpSetDirectory::create_file(const android::String8& cp_name, const android::String8& name,
+                                     LogType type) {
+    bool new_dir = false;
+    CpDirectory* dir = prepare_cp_dir(cp_name, new_dir);
+    return dir ? dir->create_file(name, type) : nullptr;
+}
+
+LogFile* CpSetDirectory::create_log_file(const android::String8& cp_name, bool& new_dir) {
+    bool created = false;
+    CpDirectory* dir = prepare_cp_dir(cp_name, created);
+    LogFile* file = dir ? dir->create_log_file() : nullptr;
+    if (file) {
+        new_dir = created;
+    }
+    return file;
+}
+
+void CpSetDirectory::add_size(uint32_t num) {
+    m_size += num;
+    m_media->add_size(num);
+}
+
+void CpSetDirectory::dec_size(uint32_t num) {
+    m_size -= num;
+    m_media->dec_size(num);
+}
+
+uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted) {
+    uint64_t removed = 0;
+    android::List<CpDirectory*>::iterator it = m_dirs.begin();
+    while (it != m_dirs.end()) {
+        CpDirectory* dir = *it;
+        const uint64_t n = (dir->*trim_dir)(wanted);
+        removed += n;
+        if (dir->empty()) {
+            it = m_dirs.erase(it);
+            dir->remove();
+            delete dir;
+        } else {
+            ++it;
+        }
+        if (n >= wanted) {
+            break;
+        }
+        wanted -= n;
+    }
+    m_size -= removed;
+    return removed;
+}
+
+uint64_t CpSetDirectory::trim(uint64_t wanted) {
+    return trim_with(&CpDirectory::trim, wanted);
+}
+
+uint64_t CpSetDirectory::trim_working_dir(uint64_t wanted) {
+    return trim_with(&CpDirectory::trim_working_dir, wanted);
+}

@@ -1,0 +1,73 @@
+// The single door through which one CP's channel and the savers of its crash material
+// reach the storage. Every write follows a change of medium, notices a log file that
+// vanished, renumbers and starts log files at the size limit, calls the channel back
+// for new directories and files, and keeps the quota.
+//
+// Made by StorageManager::create_storage for one channel, destroyed by delete_storage.
+// The channel's name names the CP's directory. Main thread only.
+#ifndef STORAGE_CPSTORAGE_H_
+#define STORAGE_CPSTORAGE_H_
+
+#include <stddef.h>
+#include <utils/String8.h>
+
+#include "core/ObjectRef.h"
+#include "storage/LogFile.h"
+#include "storage/LogType.h"
+#include "storage/MediaType.h"
+#include "storage/StorageManager.h"
+
+class LogPipeHandler;
+
+class CpStorage {
+public:
+    typedef void (*new_log_callback)(LogPipeHandler* channel, LogFile* file);
+    typedef void (*new_dir_callback)(LogPipeHandler* channel);
+
+    CpStorage(StorageManager* manager, LogPipeHandler* channel);
+    // Closes the current file.
+    ~CpStorage();
+    CpStorage(const CpStorage&) = delete;
+    CpStorage& operator=(const CpStorage&) = delete;
+
+    // Called after a new log file was started, before its first data; may be null.
+    void set_new_log_callback(new_log_callback callback) { m_new_log_cb = callback; }
+    // Called after a CP directory was made for a new log file; may be null.
+    void set_new_dir_callback(new_dir_callback callback) { m_new_dir_cb = callback; }
+
+    // Writes log data. Returns the bytes taken, 0, -1 on failure or -2 for a full
+    // medium; what was not taken is lost.
+    int write(const void* data, size_t len);
+    // Hands what is staged in the current file to the system.
+    void flush();
+    // Closes and forgets the current file; it stays in its directory.
+    void stop();
+
+    // An open file of another kind in the CP's directory on the given medium (MT_NONE:
+    // the one in use, after a check for a change). Owned by its directory: keep an
+    // ObjectRef. Null on failure.
+    LogFile* create_file(const android::String8& name, LogType type, MediaType media);
+    // Trims the medium to its quota. 0 when it is within it now or there is no such
+    // medium, else -1.
+    int check_quota(MediaType media);
+
+    void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
+    void unsubscribe_media_change_evt(void* client);
+    void subscribe_ext_stor_umount_evt(void* client, StorageManager::ext_umount_callback callback);
+    void unsubscribe_ext_stor_umount_evt(void* client);
+
+    LogFile* current_file() const { return m_cur_file.get(); }
+
+private:
+    bool prepare_file();
+    bool open_log_file(MediaStorage* media);
+
+    StorageManager* m_manager;
+    LogPipeHandler* m_channel;
+    new_log_callback m_new_log_cb = nullptr;
+    new_dir_callback m_new_dir_cb = nullptr;
+    ObjectRef<LogFile> m_cur_file;
+    bool m_quota_pending = false;  // the next write has to pass the quota check first
+};
+
+#endif  // STORAGE_CPSTORAGE_H_

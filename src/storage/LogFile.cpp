@@ -1,0 +1,245 @@
+#include "storage/LogFile.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <stdio.h>
+#include <string.h>
+#include <sys/uio.h>
+#include <unistd.h>
+
+#include "core/log.h"
+#include "storage/CpDirectory.h"
+#include "storage/paths.h"
+
+namespace {
+
+android::String8 with_number(const android::String8& name, uint32_t number, size_t old_digits) {
+    android::String8 result = android::String8::format("%u", number);
+    result.append(name.string() + old_digits);
+    return result;
+}
+
+}  // namespace
+
+LogFile::LogFile(const android::String8& name, CpDirectory* dir, LogType type, uint32_t size)
+    : m_dir(dir), m_name(name), m_type(type), m_size(size) {}
+
+LogFile::LogFile(const android::String8& name, CpDirectory* dir, const struct tm& t)
+    : m_dir(dir), m_name(name), m_type(LT_LOG), m_time(LogTime::from_tm(t)), m_size(0) {}
+
+LogFile::~LogFile() {
+    close();
+}
+
+int LogFile::open() {
+    if (m_fd >= 0) {
+        return -1;
+    }
+    m_fd = ::open(JoinedPath(m_dir->path(), m_name).string(), O_RDWR | O_CREAT | O_CLOEXEC, 0644);
+    if (m_fd < 0) {
+        return -1;
+    }
+    m_buffer = new uint8_t[BUFFER_SIZE];
+    m_capacity = BUFFER_SIZE;
+    m_staged = 0;
+    return 0;
+}
+
+int LogFile::close() {
+    if (m_fd < 0) {
+        return 0;
+    }
+    flush();
+    ::close(m_fd);
+    m_fd = -1;
+    delete[] m_buffer;
+    m_buffer = nullptr;
+    m_capacity = 0;
+    return 0;
+}
+
+void LogFile::flush() {
+    if (m_fd >= 0 && m_staged > 0) {
+        write_data(m_buffer, m_staged);
+        m_staged = 0;
+    }
+}
+
+void LogFile::grow(size_t len) {
+    m_size += static_cast<uint32_t>(len);
+    m_dir->add_size(static_cast<uint32_t>(len));
+}
+
+void LogFile::set_size(uint32_t size) {
+    m_size = size;
+    m_dir->add_size(size);
+}
+
+ssize_t LogFile::write(const void* data, size_t len) {
+    if (m_fd < 0) {
+        return -1;
+    }
+    if (m_staged + len < m_capacity) {
+        memcpy(m_buffer + m_staged, data, len);
+        m_staged += len;
+        grow(len);
+        return static_cast<ssize_t>(len);
+    }
+    ssize_t n;
+    if (m_staged == 0) {
+        n = write_data(data, len);
+        if (n > 0) {
+            grow(static_cast<size_t>(n));
+        }
+    } else {
+        n = write_staged_with(data, len);
+    }
+    if (n < 0) {
+        const bool full = errno == ENOSPC;
+        err_log("write file failed");
+        return full ? -2 : n;
+    }
+    return n;
+}
+
+// One writev of what is staged and the new data; the number of new bytes that went
+// out, 0 when not even all of the staged ones did, negative on failure.
+ssize_t LogFile::write_staged_with(const void* data, size_t len) {
+    struct iovec pieces[2];
+    pieces[0].iov_base = m_buffer;
+    pieces[0].iov_len = m_staged;
+    pieces[1].iov_base = const_cast<void*>(data);
+    pieces[1].iov_len = len;
+    const ssize_t n = writev(m_fd, pieces, 2);
+    if (n <= 0) {
+        return n;
+    }
+    const size_t written = static_cast<size_t>(n);
+    if (written < m_staged) {
+        m_staged -= written;
+        memmove(m_buffer, m_buffer + written, m_staged);
+        return 0;
+    }
+    const size_t taken = written - m_staged;
+    m_staged = 0;
+    grow(taken);
+    return static_cast<ssize_t>(taken);
+}
+
+ssize_t LogFile::write_data(const void* data, size_t len) {
+    if (m_fd < 0) {
+        err_log("write file not opened");
+        return -1;
+    }
+    const uint8_t* rest = static_cast<const uint8_t*>(data);
+    size_t left = len;
+    while (left > 0) {
+        const ssize_t n = ::write(m_fd, rest, left);
+        if (n < 0) {
+            return n;
+        }
+        if (n == 0) {
+            // Nothing was taken and no reason given: trying again could go on for ever.
+            errno = EIO;
+            return -1;
+        }
+        rest += n;
+        left -= static_cast<size_t>(n);
+    }
+    return static_cast<ssize_t>(len);
+}
+
+ssize_t LogFile::write_raw(const void* data, size_t len) {
+    const ssize_t n = write_data(data, len);
+    return n < 0 && errno == ENOSPC ? -2 : n;
+}
+
+int LogFile::copy(const char* source) {
+    if (m_fd < 0) {
+        return -1;
+    }
+    const int src = ::open(source, O_RDONLY | O_CLOEXEC);
+    if (src < 0) {
+        err_log("open %s error", source);
+        return -1;
+    }
+    int result = -1;
+    size_t copied = 0;
+    for (;;) {
+        const ssize_t n = read(src, m_buffer, m_capacity);
+        if (n <= 0) {
+            result = n < 0 ? -1 : 0;
+            break;
+        }
+        const ssize_t written = ::write(m_fd, m_buffer, static_cast<size_t>(n));
+        if (written > 0) {
+            copied += static_cast<size_t>(written);
+        }
+        if (written != n) {
+            break;
+        }
+    }
+    const int saved_errno = errno;
+    grow(copied);
+    ::close(src);
+    errno = saved_errno;
+    return result;
+}
+
+int LogFile::rename_to(const android::String8& dir_path, const android::String8& new_name) {
+    if (rename(JoinedPath(dir_path, m_name).string(), JoinedPath(dir_path, new_name).string()) <
+        0) {
+        return -1;
+    }
+    m_name = new_name;
+    return 0;
+}
+
+int LogFile::rotate(const android::String8& dir_path) {
+    uint32_t number;
+    size_t digits;
+    // The largest number has no successor: it would wrap to 0 and could replace the
+    // newest file.
+    if (parse_log_number(m_name, number, digits) < 0 || number == UINT32_MAX) {
+        err_log("invalid log file name %s", m_name.string());
+        return -1;
+    }
+    if (rename_to(dir_path, with_number(m_name, number + 1, digits)) < 0) {
+        err_log("rename %s failed", m_name.string());
+        return -1;
+    }
+    return 0;
+}
+
+int LogFile::change_name_num(unsigned int num) {
+    uint32_t number;
+    size_t digits;
+    if (parse_log_number(m_name, number, digits) < 0) {
+        return -1;
+    }
+    if (number == num) {
+        return 0;
+    }
+    if (rename_to(m_dir->path(), with_number(m_name, num, digits)) < 0) {
+        err_log("rename number in %s failed", m_name.string());
+        return -1;
+    }
+    return 0;
+}
+
+int LogFile::remove(const android::String8& dir_path) {
+    const JoinedPath path(dir_path, m_name);
+    if (unlink(path.string()) < 0 && errno != ENOENT) {
+        err_log("delete %s error", path.string());
+        return -1;
+    }
+    return 0;
+}
+
+bool LogFile::exists() const {
+    return access(JoinedPath(m_dir->path(), m_name).string(), R_OK | W_OK) == 0;
+}
+
+void LogFile::parse_name() {
+    m_type = parse_log_name(m_name.string(), m_name.length(), m_time);
+}

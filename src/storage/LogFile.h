@@ -1,0 +1,91 @@
+// One file in a CP directory: a rotating log file or one of the other files kept
+// beside the logs. While open it owns a descriptor and a staging buffer that turns
+// many small pieces of log data into few writes.
+//
+// Created, owned and destroyed by its CpDirectory only. Everybody else holds an
+// ObjectRef<LogFile>, which becomes null when the directory destroys the file
+// (trimmed, removed, vanished from the medium). Main thread only, except write_raw.
+#ifndef STORAGE_LOGFILE_H_
+#define STORAGE_LOGFILE_H_
+
+#include <stdint.h>
+#include <sys/types.h>
+#include <time.h>
+#include <utils/String8.h>
+
+#include "core/ObjectRef.h"
+#include "storage/LogType.h"
+#include "storage/log_name.h"
+
+class CpDirectory;
+
+class LogFile : public RefTarget {
+public:
+    static constexpr size_t BUFFER_SIZE = 65536;
+
+    // A file found by a scan or made by a saver: no time, closed.
+    LogFile(const android::String8& name, CpDirectory* dir, LogType type, uint32_t size);
+    // A new log file (LT_LOG) made at the given local time, closed.
+    LogFile(const android::String8& name, CpDirectory* dir, const struct tm& t);
+    // Closes the file.
+    ~LogFile();
+
+    const android::String8& name() const { return m_name; }
+    LogType type() const { return m_type; }
+    const LogTime& time() const { return m_time; }
+    uint32_t size() const { return m_size; }
+    CpDirectory* dir() const { return m_dir; }
+    int fd() const { return m_fd; }
+
+    // Opens the file for writing from its start, creating it when missing. 0, or -1
+    // when it is open already or cannot be opened.
+    int open();
+    // Writes out what is staged and closes. Does nothing on a closed file. Always 0.
+    int close();
+
+    // Buffered write. Returns the bytes taken (they count in the sizes from now on),
+    // 0 when none of the new data was taken, -1 on failure, -2 when the medium is full.
+    ssize_t write(const void* data, size_t len);
+    // Writes all bytes past the staging buffer and the sizes: len, or a negative value.
+    ssize_t write_data(const void* data, size_t len);
+    // As write_data, with -2 for a full medium. Touches nothing but the descriptor, so
+    // that the I/Q thread may call it while it alone uses the file.
+    ssize_t write_raw(const void* data, size_t len);
+    // Hands what is staged to the system; dropped when that fails.
+    void flush();
+    // Accounts for a file that was filled with write_raw. Once per file.
+    void set_size(uint32_t size);
+
+    // Fills this freshly opened file with the source file's content. 0 or -1; what was
+    // copied before a failure stays and counts.
+    int copy(const char* source);
+
+    // Adds 1 to the number at the head of the name, on the medium and here. 0 or -1.
+    int rotate(const android::String8& dir_path);
+    // Sets that number. 0 or -1; does nothing when the name carries it already.
+    int change_name_num(unsigned int num);
+    // Deletes the file from the medium; one that is gone already counts as deleted.
+    int remove(const android::String8& dir_path);
+    // True when the file can be read and written on the medium.
+    bool exists() const;
+
+    // Sets type and time from the name.
+    void parse_name();
+
+private:
+    ssize_t write_staged_with(const void* data, size_t len);
+    void grow(size_t len);
+    int rename_to(const android::String8& dir_path, const android::String8& new_name);
+
+    CpDirectory* m_dir;
+    android::String8 m_name;
+    LogType m_type;
+    LogTime m_time;
+    uint32_t m_size;
+    int m_fd = -1;
+    uint8_t* m_buffer = nullptr;
+    size_t m_capacity = 0;
+    size_t m_staged = 0;
+};
+
+#endif  // STORAGE_LOGFILE_H_

@@ -1,0 +1,241 @@
+#include "storage/MediaStorage.h"
+
+#include <dirent.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <vector>
+
+#include "core/log.h"
+#include "core/system_paths.h"
+#include "storage/CpSetDirectory.h"
+#include "storage/StorageManager.h"
+#include "storage/log_name.h"
+#include "storage/paths.h"
+
+MediaStorage::MediaStorage(StorageManager* manager) : m_manager(manager) {}
+
+MediaStorage::~MediaStorage() {
+    forget_sets();
+}
+
+void MediaStorage::set_dirs(const android::String8& top_dir) {
+    m_top_dir = top_dir;
+    m_log_root = top_dir;
+    m_log_root.append(DIR_MODEM_LOG);
+}
+
+void MediaStorage::forget_sets() {
+    m_working_set = nullptr;
+    for (CpSetDirectory* set : m_sets) {
+        delete set;
+    }
+    m_sets.clear();
+    m_size = 0;
+}
+
+// The kest directory belongs to another service, which may not have made it yet.
+int MediaStorage::prepare_top_dir() const {
+    if (!m_manager->kest_layout() || access(m_top_dir.string(), F_OK) == 0) {
+        return 0;
+    }
+    return make_log_dir(m_top_dir);
+}
+
+int MediaStorage::stat() {
+    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0) {
+        return -1;
+    }
+    DIR* dir = opendir(m_log_root.string());
+    if (!dir) {
+        return -1;
+    }
+    std::vector<CpSetDirectory*> found;
+    while (const struct dirent* entry = readdir(dir)) {
+        struct stat st;
+        // Links are not followed, as in CpDirectory::stat.
+        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..") ||
+            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
+            !S_ISDIR(st.st_mode)) {
+            continue;
+        }
+        CpSetDirectory* set = new CpSetDirectory(
+            this,
+            android::String8(JoinedPath(m_log_root, android::String8(entry->d_name)).string()));
+        if (set->stat() < 0) {
+            delete set;
+            continue;
+        }
+        found.push_back(set);
+    }
+    closedir(dir);
+    // Ascending order: each insertion finds its place at the end of the list at once.
+    std::sort(found.begin(), found.end(), [](const CpSetDirectory* a, const CpSetDirectory* b) {
+        return strcmp(a->path().string(), b->path().string()) < 0;
+    });
+    for (CpSetDirectory* set : found) {
+        insert_scanned(set);
+    }
+    m_scanned = true;
+    return 0;
+}
+
+// Puts a scanned set in front of the first one whose path compares greater. A set
+// that is listed already (it was started before the medium was scanned) stays as it is.
+void MediaStorage::insert_scanned(CpSetDirectory* set) {
+    android::List<CpSetDirectory*>::iterator it = m_sets.end();
+    while (it != m_sets.begin()) {
+        android::List<CpSetDirectory*>::iterator before = it;
+        --before;
+        const int order = strcmp((*before)->path().string(), set->path().string());
+        if (order == 0) {
+            delete set;
+            return;
+        }
+        if (order < 0) {
+            break;
+        }
+        it = before;
+    }
+    m_sets.insert(it, set);
+    m_size += set->size();
+}
+
+CpSetDirectory* MediaStorage::create_cp_set() {
+    struct tm t;
+    if (get_local_time(t) < 0) {
+        return nullptr;
+    }
+    const LogTime time = LogTime::from_tm(t);
+    android::String8 path(m_log_root);
+    path.appendFormat("/%04d-%02d-%02d-%02d-%02d-%02d", time.year, time.month, time.day, time.hour,
+                      time.minute, time.second);
+    for (CpSetDirectory* set : m_sets) {
+        if (set->path() == path) {
+            if (set->create() < 0) {
+                err_log("create CP set %s failed", path.string());
+                return nullptr;
+            }
+            m_working_set = set;
+            return set;
+        }
+    }
+    CpSetDirectory* set = new CpSetDirectory(this, path);
+    if (set->create() < 0) {
+        delete set;
+        err_log("create CP set %s failed", path.string());
+        return nullptr;
+    }
+    m_sets.push_back(set);
+    m_working_set = set;
+    return set;
+}
+
+CpSetDirectory* MediaStorage::prepare_cur_set() {
+    if (prepare_top_dir() < 0) {
+        err_log("create parent dir error");
+        return nullptr;
+    }
+    if (!dir_usable(m_log_root)) {
+        m_manager->media_vanished(this);
+        forget_sets();
+        if (make_log_dir(m_log_root) < 0) {
+            err_log("create top dir error");
+            return nullptr;
+        }
+    }
+    if (!m_working_set) {
+        return create_cp_set();
+    }
+    if (dir_usable(m_working_set->path())) {
+        return m_working_set;
+    }
+    m_manager->media_vanished(this);
+    CpSetDirectory* vanished = m_working_set;
+    m_working_set = nullptr;
+    m_sets.erase(std::find(m_sets.begin(), m_sets.end(), vanished));
+    m_size -= vanished->size();
+    delete vanished;
+    return create_cp_set();
+}
+
+LogFile* MediaStorage::create_file(const android::String8& cp_name, LogType type, bool& new_dir,
+                                   const android::String8& name) {
+    CpSetDirectory* set = prepare_cur_set();
+    if (!set) {
+        return nullptr;
+    }
+    return type == LT_LOG ? set->create_log_file(cp_name, new_dir)
+                          : set->create_file(cp_name, name, type);
+}
+
+CpDirectory* MediaStorage::get_cp_dir(const android::String8& cp_name) const {
+    return m_working_set ? m_working_set->get_cp_dir(cp_name) : nullptr;
+}
+
+uint64_t MediaStorage::trim(uint64_t wanted) {
+    uint64_t removed = 0;
+    android::List<CpSetDirectory*>::iterator it = m_sets.begin();
+    while (it != m_sets.end()) {
+        CpSetDirectory* set = *it;
+        if (set == m_working_set) {
+            ++it;
+            continue;
+        }
+        const uint64_t n = set->trim(wanted);
+        removed += n;
+        if (set->empty()) {
+            it = m_sets.erase(it);
+            set->remove();
+            delete set;
+        } else {
+            ++it;
+        }
+        if (n >= wanted) {
+            wanted = 0;
+            break;
+        }
+        wanted -= n;
+    }
+    m_size -= removed;
+    if (wanted > 0 && m_working_set) {
+        const uint64_t n = m_working_set->trim_working_dir(wanted);
+        m_size -= n;
+        removed += n;
+    }
+    return removed;
+}
+
+int MediaStorage::check_quota() {
+    if (m_quota == 0 || m_size <= m_quota) {
+        return 0;
+    }
+    if (!m_overwrite) {
+        return -1;
+    }
+    info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
+             static_cast<unsigned int>(m_quota >> 20));
+    trim(m_size - m_quota);
+    return m_size <= m_quota ? 0 : -1;
+}
+
+int MediaStorage::free_space() {
+    if (!m_overwrite) {
+        return -1;
+    }
+    return trim(m_file_size) >= m_file_size / 2 ? 0 : -1;
+}
+
+void MediaStorage::clear() {
+    forget_sets();
+    m_scanned = false;
+}
+
+void MediaStorage::clear_all() {
+    forget_sets();
+    remove_numbered_entries(m_log_root);
+}

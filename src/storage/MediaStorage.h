@@ -1,0 +1,99 @@
+// The log tree on one medium: scans the sets that earlier runs left, starts new sets,
+// hands out files in the set being written (the working set), keeps the total size
+// and frees space oldest data first, by a quota and when the medium is full. The
+// protected files of the working set are never deleted.
+//
+// Owned by the StorageManager, one object a medium. Main thread only.
+//
+// Set names resolve to a second. A set that is started within the second of another
+// one on the same medium is that set: create_cp_set() makes the existing object the
+// working set again, so that one directory never has two objects.
+#ifndef STORAGE_MEDIASTORAGE_H_
+#define STORAGE_MEDIASTORAGE_H_
+
+#include <stdint.h>
+#include <utils/List.h>
+#include <utils/String8.h>
+
+#include "storage/LogType.h"
+
+class CpDirectory;
+class CpSetDirectory;
+class LogFile;
+class StorageManager;
+
+class MediaStorage {
+public:
+    explicit MediaStorage(StorageManager* manager);
+    // Deletes the set objects; nothing on the medium changes.
+    ~MediaStorage();
+    MediaStorage(const MediaStorage&) = delete;
+    MediaStorage& operator=(const MediaStorage&) = delete;
+
+    // Sets the top directory and, below it, the log root.
+    void set_dirs(const android::String8& top_dir);
+    // Limits, in bytes. A quota of 0 means no limit. They apply from the next check.
+    void set_quota(uint64_t quota) { m_quota = quota; }
+    void set_file_size(uint32_t size) { m_file_size = size; }
+    // Whether old data may be deleted to stay within the limits.
+    void set_overwrite(bool overwrite) { m_overwrite = overwrite; }
+
+    const android::String8& top_dir() const { return m_top_dir; }
+    const android::String8& log_root() const { return m_log_root; }
+    uint64_t quota() const { return m_quota; }
+    uint32_t file_size() const { return m_file_size; }
+    bool overwrite() const { return m_overwrite; }
+    bool scanned() const { return m_scanned; }
+    uint64_t size() const { return m_size; }
+    CpSetDirectory* working_set() const { return m_working_set; }
+    const android::List<CpSetDirectory*>& sets() const { return m_sets; }
+
+    // Makes the log root if needed and scans it. 0 or -1.
+    int stat();
+    // Starts a new working set, named by the local time. Null on failure.
+    CpSetDirectory* create_cp_set();
+    // A usable working set: the present one, or a new one when there is none, when it
+    // vanished or when the whole log root vanished. Null on failure.
+    CpSetDirectory* prepare_cur_set();
+    // An open file in the CP's directory of the working set: a new log file for
+    // LT_LOG (name unused; new_dir tells whether the CP's directory was made for it),
+    // else a file of that name. Null on failure.
+    LogFile* create_file(const android::String8& cp_name, LogType type, bool& new_dir,
+                         const android::String8& name);
+    // The CP's directory in the working set, or null.
+    CpDirectory* get_cp_dir(const android::String8& cp_name) const;
+
+    void add_size(uint32_t num) { m_size += num; }
+    void dec_size(uint32_t num) { m_size -= num; }
+
+    // Frees at least the bytes wanted, if possible; returns the bytes freed.
+    uint64_t trim(uint64_t wanted);
+    // Trims to the quota. 0 when the total is within it now, else -1.
+    int check_quota();
+    // Frees one file size after the medium ran full. 0 when at least half of it could
+    // be freed, else -1.
+    int free_space();
+
+    // Forgets all sets, so that the next use scans again; nothing on the medium changes.
+    void clear();
+    // Deletes all sets, on the medium too.
+    void clear_all();
+
+private:
+    int prepare_top_dir() const;
+    void forget_sets();
+    void insert_scanned(CpSetDirectory* set);
+
+    StorageManager* m_manager;
+    bool m_scanned = false;
+    uint64_t m_quota = 0;
+    uint32_t m_file_size = 512u << 20;
+    bool m_overwrite = true;
+    android::String8 m_top_dir;
+    android::String8 m_log_root;
+    android::List<CpSetDirectory*> m_sets;
+    CpSetDirectory* m_working_set = nullptr;
+    uint64_t m_size = 0;
+};
+
+#endif  // STORAGE_MEDIASTORAGE_H_

@@ -1,0 +1,174 @@
+#include "storage/StorageManager.h"
+
+#include <cutils/properties.h>
+#include <string.h>
+
+#include <algorithm>
+
+#include "config/property_names.h"
+#include "core/log.h"
+#include "core/system_paths.h"
+#include "storage/CpStorage.h"
+
+StorageManager::StorageManager() : m_internal(this), m_external(this) {}
+
+StorageManager::~StorageManager() {
+    for (CpStorage* storage : m_storages) {
+        delete storage;
+    }
+}
+
+int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*/,
+                         Multiplexer* /*mux*/) {
+    android::String8 internal_top = system_path(PATH_DATA_PARTITION);
+    // Without a known SD card the external log root is a path that the service fixes.
+    android::String8 external_top = sd_root.isEmpty() ? system_path("") : sd_root;
+    if (m_kest_layout) {
+        internal_top.append(DIR_KEST);
+        external_top.append(DIR_KEST);
+        info_log("modem log in store manager in kest/modem_log!!!");
+    }
+    m_internal.set_dirs(internal_top);
+    m_external.set_dirs(external_top);
+    if (m_internal.stat() < 0) {
+        return -1;
+    }
+    if (is_sd_mounted() && m_external.stat() < 0) {
+        err_log("init external storage failure");
+    }
+    return 0;
+}
+
+void StorageManager::set_overwrite(bool overwrite) {
+    m_overwrite = overwrite;
+    m_internal.set_overwrite(overwrite);
+    m_external.set_overwrite(overwrite);
+}
+
+void StorageManager::set_file_size(uint32_t size) {
+    m_internal.set_file_size(size);
+    m_external.set_file_size(size);
+}
+
+MediaStorage* StorageManager::get_media(MediaType type) {
+    switch (type) {
+        case MT_INTERNAL:
+            return &m_internal;
+        case MT_EXTERNAL:
+            return &m_external;
+        default:
+            return nullptr;
+    }
+}
+
+bool StorageManager::is_sd_mounted() const {
+    char value[PROPERTY_VALUE_MAX];
+    property_get(PROP_SD_SERVICE, value, "");
+    return strcmp(value, SD_SERVICE_RUNNING) == 0;
+}
+
+void StorageManager::change_media(MediaType type) {
+    m_media_type = type;
+    m_media_change_clients.notify(type);
+}
+
+bool StorageManager::check_media_change() {
+    if (is_sd_mounted()) {
+        if (m_media_type == MT_EXTERNAL) {
+            return false;
+        }
+        info_log("Storage changing to external SD");
+        bool usable = m_external.scanned();
+        if (!usable) {
+            usable = m_external.stat() == 0;
+            if (!usable) {
+                err_log("init SD card failed");
+            }
+        }
+        return (usable && use_external()) || use_internal();
+    }
+    if (m_media_type == MT_INTERNAL) {
+        return false;
+    }
+    if (m_media_type == MT_EXTERNAL) {
+        info_log("sd card is umounted!");
+        m_ext_umount_clients.notify();
+        stop_all_storages();
+        m_external.clear();
+    }
+    m_internal.create_cp_set();
+    change_media(MT_INTERNAL);
+    return true;
+}
+
+// Takes the SD card into use with a new set. False when no set can be started there.
+bool StorageManager::use_external() {
+    if (!m_external.create_cp_set()) {
+        return false;
+    }
+    if (m_media_type == MT_INTERNAL) {
+        stop_all_storages();
+    }
+    change_media(MT_EXTERNAL);
+    return true;
+}
+
+// Falls back to the internal medium while the SD card cannot be used. False when it is
+// in use already or no set can be started there.
+bool StorageManager::use_internal() {
+    if (m_media_type == MT_INTERNAL || !m_internal.create_cp_set()) {
+        return false;
+    }
+    change_media(MT_INTERNAL);
+    return true;
+}
+
+CpStorage* StorageManager::create_storage(LogPipeHandler* channel) {
+    CpStorage* storage = new CpStorage(this, channel);
+    m_storages.push_back(storage);
+    return storage;
+}
+
+void StorageManager::delete_storage(CpStorage* storage) {
+    android::List<CpStorage*>::iterator it =
+        std::find(m_storages.begin(), m_storages.end(), storage);
+    if (it != m_storages.end()) {
+        m_storages.erase(it);
+        delete storage;
+    }
+}
+
+void StorageManager::stop_all_storages() {
+    for (CpStorage* storage : m_storages) {
+        storage->stop();
+    }
+}
+
+void StorageManager::media_vanished(MediaStorage* media) {
+    if (media == get_media_stor()) {
+        stop_all_storages();
+    }
+}
+
+void StorageManager::clear_all() {
+    stop_all_storages();
+    m_internal.clear_all();
+    m_external.clear_all();
+    m_media_type = MT_NONE;
+}
+
+void StorageManager::subscribe_media_change_evt(void* client, media_change_callback callback) {
+    m_media_change_clients.add(client, callback);
+}
+
+void StorageManager::unsubscribe_media_change_evt(void* client) {
+    m_media_change_clients.remove(client);
+}
+
+void StorageManager::subscribe_ext_stor_umount_evt(void* client, ext_umount_callback callback) {
+    m_ext_umount_clients.add(client, callback);
+}
+
+void StorageManager::unsubscribe_ext_stor_umount_evt(void* client) {
+    m_ext_umount_clients.remove(client);
+}

@@ -1,0 +1,76 @@
+#include "storage/paths.h"
+
+#include <errno.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+bool is_ordinary(char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') ||
+           strchr("/._-+,:@%=", c);
+}
+
+}  // namespace
+
+JoinedPath::JoinedPath(const android::String8& dir, const android::String8& name) {
+    const size_t dir_len = dir.length();
+    const size_t name_len = name.length();
+    if (dir_len + 1 + name_len >= sizeof(m_path)) {
+        m_path[0] = '\0';
+        return;
+    }
+    memcpy(m_path, dir.string(), dir_len);
+    m_path[dir_len] = '/';
+    memcpy(m_path + dir_len + 1, name.string(), name_len + 1);
+}
+
+android::String8 shell_path(const android::String8& path) {
+    const char* text = path.string();
+    android::String8 result;
+    if (text[0] == '-') {
+        result.append("./");
+    }
+    bool ordinary = true;
+    for (const char* p = text; *p && ordinary; ++p) {
+        ordinary = is_ordinary(*p);
+    }
+    if (ordinary) {
+        result.append(text);
+        return result;
+    }
+    result.append("'");
+    for (const char* p = text; *p; ++p) {
+        // A quote cannot stand inside quotes: close them, add it escaped, open again.
+        if (*p == '\'') {
+            result.append("'\\''");
+        } else {
+            result.append(p, 1);
+        }
+    }
+    result.append("'");
+    return result;
+}
+
+int remove_tree(const android::String8& path) {
+    android::String8 command("rm -fr ");
+    command.append(shell_path(path));
+    return system(command.string());
+}
+
+int remove_numbered_entries(const android::String8& dir) {
+    android::String8 command("rm -fr ");
+    command.append(shell_path(dir));
+    command.append("/[0-9]*");
+    return system(command.string());
+}
+
+int make_log_dir(const android::String8& path) {
+    return mkdir(path.string(), 0775) == 0 || errno == EEXIST ? 0 : -1;
+}
+
+bool dir_usable(const android::String8& path) {
+    return access(path.string(), R_OK | W_OK | X_OK) == 0;
+}

@@ -1,0 +1,37 @@
+// Paths of the log tree: joining without allocation, and the removal of directories.
+#ifndef STORAGE_PATHS_H_
+#define STORAGE_PATHS_H_
+
+#include <limits.h>
+#include <utils/String8.h>
+
+// dir + "/" + name on the stack. A path that does not fit becomes "", which no file
+// system call accepts.
+class JoinedPath {
+public:
+    JoinedPath(const android::String8& dir, const android::String8& name);
+    const char* string() const { return m_path; }
+
+private:
+    char m_path[PATH_MAX];
+};
+
+// The text that makes a shell read exactly this path as one argument. An ordinary
+// path stands as it is; any other is quoted, and one that could be read as an option
+// gets "./" in front.
+android::String8 shell_path(const android::String8& path);
+
+// Deletes a directory with everything below it; returns what system() returns.
+int remove_tree(const android::String8& path);
+
+// As remove_tree, for every entry of the directory whose name begins with a digit.
+int remove_numbered_entries(const android::String8& dir);
+
+// mkdir with mode 0775; 0 when the directory was made or something of this name
+// exists already, else -1.
+int make_log_dir(const android::String8& path);
+
+// True when the directory can be read, written and searched.
+bool dir_usable(const android::String8& path);
+
+#endif  // STORAGE_PATHS_H_
