@@ -1,0 +1,17 @@
+#include "channels/DataConsumer.h"
+
+DataConsumer::DataConsumer(const char* cp_name, CpStorage* storage)
+    : m_cp_name(cp_name), m_storage(storage) {}
+
+DataConsumer::~DataConsumer() {}
+
+void DataConsumer::set_callback(void* client, trans_result_callback callback) {
+    m_client = client;
+    m_callback = callback;
+}
+
+void DataConsumer::notify_result(LogProcResult result) {
+    if (m_callback) {
+        m_callback(m_client, result);
+    }
+}

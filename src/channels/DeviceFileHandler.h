@@ -1,0 +1,58 @@
+// Reads a device into a buffer and hands each chunk to its subclass. Made for the
+// duration of one exchange with a CP and owned by the channel that runs it. The device
+// is opened from a path and closed with the handler, or borrowed from the channel and
+// left open.
+#ifndef CHANNELS_DEVICEFILEHANDLER_H_
+#define CHANNELS_DEVICEFILEHANDLER_H_
+
+#include <stddef.h>
+#include <stdint.h>
+#include <utils/String8.h>
+
+#include "core/FdHandler.h"
+
+class DeviceFileHandler : public FdHandler {
+public:
+    struct DataBuffer {
+        explicit DataBuffer(size_t size)
+            : buffer(new uint8_t[size]), capacity(size), data_start(0), data_len(0) {}
+        ~DataBuffer() { delete[] buffer; }
+        DataBuffer(const DataBuffer&) = delete;
+        DataBuffer& operator=(const DataBuffer&) = delete;
+
+        // The unconsumed bytes: data_len of them at data().
+        const uint8_t* data() const { return buffer + data_start; }
+        void consume_all() { data_start = data_len = 0; }
+
+        uint8_t* buffer;
+        size_t capacity;
+        size_t data_start;
+        size_t data_len;
+    };
+
+    // On a device that open() opens.
+    DeviceFileHandler(const android::String8& path, size_t capacity, LogController* ctrl,
+                      Multiplexer* mux);
+    // On a descriptor that belongs to somebody else.
+    DeviceFileHandler(int fd, size_t capacity, LogController* ctrl, Multiplexer* mux);
+    ~DeviceFileHandler() override;
+
+    // Opens the device; the descriptor or -1.
+    int open();
+
+    // Reads until the device has no more data or process_data wants no more now.
+    void process(int events) override;
+
+    // Takes what the buffer holds. True: stop reading now; the handler may be destroyed
+    // already. False: read more.
+    virtual bool process_data(DataBuffer& buf) = 0;
+
+    const android::String8& path() const { return m_path; }
+
+private:
+    bool m_own_fd;
+    android::String8 m_path;
+    DataBuffer m_buf;
+};
+
+#endif  // CHANNELS_DEVICEFILEHANDLER_H_

@@ -1,0 +1,109 @@
+#include "channels/DiagFrameParser.h"
+
+#include <string.h>
+
+namespace {
+
+constexpr uint8_t FLAG = 0x7E;
+constexpr uint8_t ESCAPE = 0x7D;
+constexpr uint8_t ESCAPE_XOR = 0x20;
+
+}  // namespace
+
+void DiagFrameParser::init() {
+    m_state = HUNTING;
+    m_len = 0;
+}
+
+void DiagFrameParser::append(uint8_t byte) {
+    if (m_len < MAX_FRAME) {
+        m_frame[m_len++] = byte;
+    } else {
+        m_len = MAX_FRAME + 1;
+    }
+}
+
+bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame, size_t& frame_len,
+                               size_t& consumed) {
+    frame = nullptr;
+    frame_len = 0;
+    size_t pos = 0;
+    while (pos < len) {
+        switch (m_state) {
+            case HUNTING:
+                if (data[pos++] == FLAG) {
+                    m_state = AFTER_FLAG;
+                }
+                break;
+            case AFTER_FLAG:
+                if (data[pos] == FLAG) {
+                    ++pos;
+                } else {
+                    m_state = IN_FRAME;
+                }
+                break;
+            case ESCAPE_PENDING:
+                m_state = IN_FRAME;
+                append(data[pos++] ^ ESCAPE_XOR);
+                break;
+            case IN_FRAME: {
+                const uint8_t byte = data[pos++];
+                if (byte == ESCAPE) {
+                    if (pos == len) {
+                        m_state = ESCAPE_PENDING;
+                    } else {
+                        append(data[pos++] ^ ESCAPE_XOR);
+                    }
+                } else if (byte != FLAG) {
+                    append(byte);
+                } else {
+                    const size_t body_len = m_len;
+                    init();
+                    if (body_len > MAX_FRAME) {
+                        break;
+                    }
+                    frame = m_frame;
+                    frame_len = body_len;
+                    consumed = pos;
+                    return true;
+                }
+                break;
+            }
+        }
+    }
+    consumed = len;
+    return false;
+}
+
+size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {
+    size_t n = 0;
+    for (size_t i = 0; i < len; ++i) {
+        if (src[i] == FLAG || src[i] == ESCAPE) {
+            dst[n++] = ESCAPE;
+            dst[n++] = src[i] ^ ESCAPE_XOR;
+        } else {
+            dst[n++] = src[i];
+        }
+    }
+    return n;
+}
+
+void DiagFrameParser::frame(uint8_t type, uint8_t sub_type, const uint8_t* payload,
+                            size_t payload_len, uint8_t*& buf, size_t& len) {
+    DiagHeader header;
+    header.seq_num = 0;
+    header.len = static_cast<uint16_t>(sizeof(header) + payload_len);
+    header.type = type;
+    header.sub_type = sub_type;
+    uint8_t raw[sizeof(header)];
+    memcpy(raw, &header, sizeof(header));
+
+    buf = new uint8_t[(payload_len + sizeof(header)) * 2 + 2];
+    len = 0;
+    buf[len++] = FLAG;
+    len += escape(raw, sizeof(raw), buf + len);
+    if (payload && payload_len > 0) {
+        len += escape(payload, payload_len, buf + len);
+    }
+    buf[len++] = FLAG;
+}

@@ -1,0 +1,141 @@
+// The log channel of one CP. Owns the CP's log device and copies everything it yields
+// into the CP's storage, reopens the device when it fails, reacts to the CP's assert
+// and alive events and runs the exchanges over the CP's diag device.
+//
+// Made by the LogController, one per configured CP, which owns it for the life of the
+// process, sets its device paths, starts and stops it and forwards events to it. Owns
+// the running transaction (diag handler and consumer) and its I/Q manager; its CpStorage
+// is made on first need and handed back in the destructor. Loop thread only.
+#ifndef CHANNELS_LOGPIPEHANDLER_H_
+#define CHANNELS_LOGPIPEHANDLER_H_
+
+#include <stddef.h>
+#include <stdint.h>
+#include <time.h>
+#include <utils/String8.h>
+
+#include "channels/DataConsumer.h"
+#include "client/CpDumpEvent.h"
+#include "config/CpType.h"
+#include "config/LogConfig.h"
+#include "core/FdHandler.h"
+#include "core/ObjectRef.h"
+#include "core/TimerManager.h"
+#include "iq/WcdmaIqManager.h"
+
+class CpStorage;
+class DiagDeviceHandler;
+class LogFile;
+class StorageManager;
+
+enum CpWorkState : int {
+    CWS_NOT_WORKING = 0,  // the CP asserted; its log device is closed
+    CWS_WORKING = 1,
+    CWS_DUMP = 2,
+    CWS_SAVE_SLEEP_LOG = 3,
+    CWS_SAVE_RINGBUF = 4
+};
+
+class LogPipeHandler : public FdHandler, public RefTarget {
+public:
+    // How long a device that cannot be opened is left alone.
+    static constexpr unsigned int REOPEN_MS = 3000;
+
+    LogPipeHandler(LogController* ctrl, Multiplexer* mux, const LogConfig::ConfigEntry* entry,
+                   StorageManager* stor_mgr);
+    ~LogPipeHandler() override;
+
+    bool enabled() const { return m_enabled; }
+    CpType type() const { return m_type; }
+    const android::String8& name() const { return m_name; }
+    CpWorkState state() const { return m_state; }
+    CpStorage* storage() const { return m_storage; }
+
+    // The devices, set before start: two, or one that carries log and diag traffic.
+    void set_dev_paths(const android::String8& log, const android::String8& diag);
+    void set_log_diag_dev_path(const android::String8& path);
+
+    // Switches the CP's logging on and off. 0 or -1.
+    virtual int start() = 0;
+    virtual int stop() = 0;
+
+    // The CP asserted or is blocked; save_md: a mini dump is wanted.
+    void process_assert(bool save_md);
+    // The CP runs again.
+    void process_alive();
+
+    int enable_wcdma_iq();
+    int disable_wcdma_iq();
+    int pause_wcdma_iq();
+    int resume_wcdma_iq();
+
+    // Hands buffered log data to the system.
+    void flush();
+
+    // Reads the log device once into the storage.
+    void process(int events) override;
+
+protected:
+    static constexpr size_t IO_BUFFER_SIZE = 32768;
+    // Shared by all channels: only one read is in progress at any time.
+    static uint8_t s_io_buffer[IO_BUFFER_SIZE];
+
+    int start_logging();
+    int stop_logging();
+    int create_storage();
+
+    // Opens the log device; 0 or -1. Nothing happens when it is open.
+    int open_dev();
+    void close_dev();
+    // Stops polling a log device that failed, and opens it again now or in a while.
+    void recover_dev();
+
+    // Starts the exchange that saves the CP's memory. 0 or -1.
+    virtual int start_dump(const struct tm& t) = 0;
+
+    // The diag device of a transaction, opened or borrowed; null on failure.
+    DiagDeviceHandler* create_diag_device(DataConsumer* consumer);
+    void start_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
+    void stop_transaction(CpWorkState new_state);
+    // Registers the diag handler, binds it and starts the consumer as a transaction. Takes
+    // both over; on failure (-1) they are destroyed.
+    int run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
+    // Ends a dump: the CP counts as not working until it is alive again.
+    void end_dump();
+    void notify_cp_dump(CpDumpEvent event);
+
+private:
+    static void reopen_log_dev(void* handler);
+    static void new_log_cb(LogPipeHandler* handler, LogFile* file);
+    static void new_dir_cb(LogPipeHandler* handler);
+
+    void poll_dev();
+    void arm_reopen();
+    void cancel_reopen();
+    // For the crash path, which may come before the first log data: makes the storage
+    // with the hook for new log files only. False when there is none.
+    bool need_storage();
+    bool will_be_reset() const;
+    bool is_modem() const { return m_type >= CT_WCDMA && m_type <= CT_5MODE; }
+    void close_on_assert();
+    bool save_version();
+    bool save_timestamp(LogFile* file);
+
+    bool m_enabled = false;
+    bool m_save_wcdma_iq = false;
+    android::String8 m_name;
+    CpType m_type;
+    bool m_log_diag_same = false;
+    android::String8 m_log_dev_path;
+    android::String8 m_diag_dev_path;
+    const char* m_reset_prop;
+    CpWorkState m_state = CWS_WORKING;
+    DiagDeviceHandler* m_diag_handler = nullptr;
+    DataConsumer* m_consumer = nullptr;
+    StorageManager* m_stor_mgr;
+    CpStorage* m_storage = nullptr;
+    TimerManager::Timer* m_reopen_timer = nullptr;
+    WcdmaIqManager m_iq;
+};
+
+#endif  // CHANNELS_LOGPIPEHANDLER_H_

@@ -1,0 +1,163 @@
+#include "control/LogController.h"
+
+#include <stdio.h>
+
+#include "channels/AgDspLogHandler.h"
+#include "channels/ExtWcnLogHandler.h"
+#include "channels/GnssCpLogHandler.h"
+#include "channels/WanModemLogHandler.h"
+#include "core/log.h"
+#include "core/system_paths.h"
+#include "storage/CpDirectory.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+constexpr int MB_SHIFT = 20;
+
+}  // namespace
+
+LogController::LogController() {}
+
+LogController::~LogController() {
+    for (LogPipeHandler* pipe : m_log_pipes) {
+        delete pipe;
+    }
+    m_log_pipes.clear();
+}
+
+int LogController::init(LogConfig* config) {
+    m_stor_mgr.set_data_part_size(static_cast<uint64_t>(config->data_log_size()) << MB_SHIFT);
+    m_stor_mgr.set_sd_size(static_cast<uint64_t>(config->sd_log_size()) << MB_SHIFT);
+    m_stor_mgr.set_file_size(config->log_file_size() << MB_SHIFT);
+    m_stor_mgr.set_overwrite(config->log_overwrite());
+    if (config->kest_dir()) {
+        info_log("modem log will be placed in kest dir!");
+        m_stor_mgr.set_kest_layout(true);
+    }
+    if (m_stor_mgr.init(config->sd_root(), this, &m_multiplexer) < 0) {
+        err_log("init storage manager error");
+        return -1;
+    }
+    m_config = config;
+    m_save_md = config->save_md();
+    for (const LogConfig::ConfigEntry* entry : config->stream_entries()) {
+        m_log_pipes.push_back(create_handler(entry));
+    }
+    return 0;
+}
+
+void LogController::run() {
+    m_multiplexer.run();
+}
+
+LogPipeHandler* LogController::create_handler(const LogConfig::ConfigEntry* entry) {
+    LogPipeHandler* handler;
+    switch (entry->type) {
+        case CT_WCN:
+            handler = new ExtWcnLogHandler(this, &m_multiplexer, entry, &m_stor_mgr);
+            break;
+        case CT_GNSS:
+            handler = new GnssCpLogHandler(this, &m_multiplexer, entry, &m_stor_mgr);
+            break;
+        case CT_AGDSP:
+            handler = new AgDspLogHandler(this, &m_multiplexer, entry, &m_stor_mgr);
+            break;
+        default:
+            handler = new WanModemLogHandler(this, &m_multiplexer, entry, &m_stor_mgr,
+                                             cp_mem_path(entry->type));
+            break;
+    }
+    if (m_config->wcdma_iq_enabled(entry->type)) {
+        handler->enable_wcdma_iq();
+    }
+    if (!entry->enable) {
+        return handler;
+    }
+    const char* name = entry->name.string();
+    bool same;
+    android::String8 log_path;
+    android::String8 diag_path;
+    if (m_config->get_dev_paths(entry->type, same, log_path, diag_path) < 0) {
+        err_log("Can not get log/diag path for %s", name);
+        return handler;
+    }
+    if (same) {
+        info_log("CP %s dev %s", name, log_path.string());
+        handler->set_log_diag_dev_path(log_path);
+    } else {
+        info_log("CP %s dev %s %s", name, log_path.string(), diag_path.string());
+        handler->set_dev_paths(log_path, diag_path);
+    }
+    if (handler->start() < 0) {
+        err_log("kestcp: start %s log failed", name);
+    }
+    return handler;
+}
+
+LogPipeHandler* LogController::get_cp(CpType type) const {
+    for (LogPipeHandler* pipe : m_log_pipes) {
+        if (pipe->type() == type) {
+            return pipe;
+        }
+    }
+    return nullptr;
+}
+
+// There are no clients to tell while the service has no control server.
+void LogController::notify_cp_dump(CpType /*type*/, CpDumpEvent /*event*/) {}
+
+int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType type) {
+    const LogTime t = LogTime::from_tm(time);
+    char name[80];
+    snprintf(name, sizeof(name), "mini_dump_%04d-%02d-%02d_%02d-%02d-%02d.bin", t.year, t.month,
+             t.day, t.hour, t.minute, t.second);
+    const MediaType media = m_config->md_int_stor() ? MT_INTERNAL : MT_NONE;
+    if (storage->check_quota(media) < 0) {
+        err_log("no space for mini dump");
+        return -1;
+    }
+    LogFile* file = storage->create_file(android::String8(name), LT_MINI_DUMP, media);
+    if (!file) {
+        err_log("create mini dump file %s failed", name);
+        return -1;
+    }
+    const int result = file->copy(system_path(cp_mini_dump_path(type)).string());
+    const int copy_errno = errno;
+    file->close();
+    if (result < 0) {
+        errno = copy_errno;
+        err_log("save mini dump error");
+        file->dir()->remove_file(file);
+    }
+    return result;
+}
+
+int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
+    const LogTime t = LogTime::from_tm(time);
+    const struct {
+        const char* record;
+        const char* path;
+    } sources[] = {
+        {"smsg", PATH_DIPX_SMSG}, {"sbuf", PATH_DIPX_SBUF}, {"sblock", PATH_DIPX_SBLOCK}};
+    int result = 0;
+    for (const auto& source : sources) {
+        char name[64];
+        snprintf(name, sizeof(name), "%s_%04d-%02d-%02d_%02d-%02d-%02d.log", source.record, t.year,
+                 t.month, t.day, t.hour, t.minute, t.second);
+        LogFile* file = storage->create_file(android::String8(name), LT_IPC_INFO, MT_NONE);
+        if (!file) {
+            continue;
+        }
+        const bool copied = file->copy(system_path(source.path).string()) == 0;
+        const int copy_errno = errno;
+        file->close();
+        if (!copied) {
+            errno = copy_errno;
+            err_log("kestcp: save DIPX %s info failed", source.record);
+            file->dir()->remove_file(file);
+            result = -1;
+        }
+    }
+    return result;
+}
