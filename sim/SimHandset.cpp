@@ -1,0 +1,208 @@
+#include "sim/SimHandset.h"
+
+#include <errno.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <filesystem>
+
+#include "sim/LogCollector.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+// The CPs that can be simulated and the properties that announce them.
+struct CpKind {
+    const char* name;
+    const char* log_prop;  // null: the diag device carries the log as well
+    const char* diag_prop;
+    const char* enable_prop;
+};
+
+const CpKind CP_KINDS[] = {
+    {"cp_wcdma", "ro.modem.w.log", "ro.modem.w.diag", "persist.modem.w.enable"},
+    {"cp_td-scdma", "ro.modem.t.log", "ro.modem.t.diag", "persist.modem.t.enable"},
+    {"cp_3mode", "ro.modem.tl.log", "ro.modem.tl.diag", "persist.modem.tl.enable"},
+    {"cp_4mode", "ro.modem.lf.log", "ro.modem.lf.diag", "persist.modem.lf.enable"},
+    {"cp_5mode", "ro.modem.l.log", "ro.modem.l.diag", "persist.modem.l.enable"},
+    {"cp_wcn", nullptr, "ro.modem.wcn.diag", nullptr},
+    {"cp_gnss", nullptr, "ro.modem.gnss.diag", nullptr},
+};
+
+const char SD_STATE_PROP[] = "init.svc.fuse_sdcard0";
+
+// Readers never see half a file: it is written beside the old one and moved over it.
+bool replace_file(const std::string& path, const std::string& text) {
+    const std::string temp = path + ".new";
+    FILE* f = fopen(temp.c_str(), "we");
+    if (!f) {
+        return false;
+    }
+    const bool written = fwrite(text.data(), 1, text.size(), f) == text.size();
+    return fclose(f) == 0 && written && rename(temp.c_str(), path.c_str()) == 0;
+}
+
+}  // namespace
+
+size_t SimCp::feed(size_t len) {
+    uint8_t buf[16384];
+    size_t done = 0;
+    while (done < len) {
+        const size_t n = std::min(len - done, sizeof buf);
+        stream.fill(fed, buf, n);
+        const ssize_t taken = log.feed(buf, n);
+        if (taken <= 0) {
+            break;
+        }
+        fed += static_cast<size_t>(taken);
+        done += static_cast<size_t>(taken);
+    }
+    return done;
+}
+
+bool SimHandset::fail(const std::string& what) {
+    m_error = what + ": " + strerror(errno);
+    return false;
+}
+
+bool SimHandset::create(const std::string& dir, const SimSizes& sizes) {
+    m_sizes = sizes;
+    std::error_code ec;
+    if (dir.empty()) {
+        const char* tmp = getenv("TMPDIR");
+        std::string made = std::string(tmp && *tmp ? tmp : "/tmp") + "/kestsim.XXXXXX";
+        if (!mkdtemp(made.data())) {
+            return fail("cannot make " + made);
+        }
+        m_root = made;
+    } else {
+        fs::create_directories(dir, ec);
+        if (!ec && !fs::is_empty(dir, ec) && !ec) {
+            m_error = dir + " is not empty";
+            return false;
+        }
+        // Devices are announced by absolute paths.
+        const fs::path absolute = ec ? fs::path() : fs::canonical(dir, ec);
+        if (ec) {
+            m_error = "cannot use " + dir + ": " + ec.message();
+            return false;
+        }
+        m_root = absolute.string();
+    }
+    for (const char* rel : {"data/local/tmp/kestmodem", "system/etc", "dev", "storage/sdcard0"}) {
+        fs::create_directories(path(rel), ec);
+        if (ec) {
+            m_error = "cannot make " + path(rel) + ": " + ec.message();
+            return false;
+        }
+    }
+    if (!m_time.start(m_root)) {
+        return fail("cannot start the time service of " + m_root);
+    }
+    return set_prop("gsm.version.baseband", "simulated baseband 1.0") &&
+           set_prop("persist.storage.type", "1") && set_prop(SD_STATE_PROP, "stopped") &&
+           write_config();
+}
+
+SimCp* SimHandset::add_cp(const std::string& name) {
+    const CpKind* kind = std::find_if(std::begin(CP_KINDS), std::end(CP_KINDS),
+                                      [&](const CpKind& k) { return name == k.name; });
+    if (kind == std::end(CP_KINDS)) {
+        m_error = "no CP is called " + name;
+        return nullptr;
+    }
+    const bool modem = kind->log_prop != nullptr;
+    auto cp = std::make_unique<SimCp>(name, modem, static_cast<uint8_t>(kind - CP_KINDS));
+    const std::string log_path = path("dev/" + name + "_log");
+    const std::string diag_path = path("dev/" + name + "_diag");
+    if (!cp->log.create(log_path) || (modem && !cp->diag.create(diag_path))) {
+        fail("cannot make the devices of " + name);
+        return nullptr;
+    }
+    m_cps.push_back(std::move(cp));
+    const bool announced = modem ? set_prop(kind->log_prop, log_path) &&
+                                       set_prop(kind->diag_prop, diag_path) &&
+                                       set_prop(kind->enable_prop, "1")
+                                 : set_prop(kind->diag_prop, log_path);
+    return announced && write_config() ? m_cps.back().get() : nullptr;
+}
+
+bool SimHandset::write_config() {
+    std::string text = "minidump disable\texternal\n";
+    text += "log_file_size " + std::to_string(m_sizes.log_file) + "\n";
+    text += "data_log_size " + std::to_string(m_sizes.data) + "\n";
+    text += "sd_log_size " + std::to_string(m_sizes.sd) + "\n";
+    text += std::string("log_overwrite ") + (m_sizes.overwrite ? "enable" : "disable") + "\n\n";
+    text += "#Type\tName\tState\tSize\tLevel\n";
+    for (const auto& cp : m_cps) {
+        text += "stream\t" + cp->name + "\ton\t100\t3\n";
+    }
+    const std::string file = path("system/etc/kest_modem.conf");
+    return replace_file(file, text) || fail("cannot write " + file);
+}
+
+bool SimHandset::set_prop(const std::string& key, const std::string& value) {
+    auto prop =
+        std::find_if(m_props.begin(), m_props.end(), [&](auto& p) { return p.first == key; });
+    if (prop == m_props.end()) {
+        m_props.emplace_back(key, value);
+    } else {
+        prop->second = value;
+    }
+    std::string text = "# Properties of the simulated handset\n";
+    for (const auto& p : m_props) {
+        if (!p.second.empty()) {
+            text += p.first + "=" + p.second + "\n";
+        }
+    }
+    const std::string file = path("default.prop");
+    return replace_file(file, text) || fail("cannot write " + file);
+}
+
+bool SimHandset::insert_sd() {
+    m_sd = true;
+    return set_prop(SD_STATE_PROP, "running");
+}
+
+bool SimHandset::remove_sd() {
+    m_sd = false;
+    return set_prop(SD_STATE_PROP, "stopped");
+}
+
+bool SimHandset::settle(LogCollector& logs, int timeout_ms) {
+    const size_t step = 4096;
+    const int wait_ms = 20;
+    for (int left = timeout_ms; left > 0;) {
+        bool all = true;
+        logs.scan();
+        for (const auto& cp : m_cps) {
+            // The service writes its buffer out together with the piece that fills it:
+            // then everything that was fed is on the medium.
+            if (logs.end_position(*cp) != cp->fed) {
+                all = false;
+                if (cp->log.pending() == 0) {
+                    cp->feed(step);
+                }
+            }
+        }
+        if (all) {
+            // The write is followed by the quota's housekeeping, which should end as well.
+            usleep(100 * 1000);
+            return true;
+        }
+        usleep(wait_ms * 1000);
+        left -= wait_ms;
+    }
+    return false;
+}
+
+void SimHandset::remove_root() {
+    std::error_code ec;
+    if (!m_root.empty()) {
+        fs::remove_all(m_root, ec);
+    }
+}

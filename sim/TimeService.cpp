@@ -1,0 +1,90 @@
+#include "sim/TimeService.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <string.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+bool TimeService::start(const std::string& root) {
+    stop();
+    const std::string name = "cp_time_sync_server@" + root;
+    sockaddr_un addr = {};
+    addr.sun_family = AF_UNIX;
+    // The abstract namespace: a NUL, then the name without a terminator.
+    if (name.size() + 1 > sizeof addr.sun_path) {
+        errno = ENAMETOOLONG;
+        return false;
+    }
+    memcpy(addr.sun_path + 1, name.data(), name.size());
+    const size_t len = offsetof(sockaddr_un, sun_path) + 1 + name.size();
+    m_listen = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    if (m_listen < 0 ||
+        bind(m_listen, reinterpret_cast<sockaddr*>(&addr), static_cast<socklen_t>(len)) != 0 ||
+        listen(m_listen, 8) != 0 || pipe2(m_wake, O_CLOEXEC) != 0) {
+        const int error = errno;
+        stop();
+        errno = error;
+        return false;
+    }
+    m_thread = std::thread(&TimeService::run, this);
+    return true;
+}
+
+void TimeService::stop() {
+    if (m_wake[1] >= 0) {
+        close(m_wake[1]);
+        m_wake[1] = -1;
+    }
+    if (m_thread.joinable()) {
+        m_thread.join();
+    }
+    for (int* fd : {&m_listen, &m_wake[0]}) {
+        if (*fd >= 0) {
+            close(*fd);
+            *fd = -1;
+        }
+    }
+}
+
+void TimeService::run() {
+    pollfd p[2] = {{m_wake[0], POLLIN, 0}, {m_listen, POLLIN, 0}};
+    for (;;) {
+        if (poll(p, 2, -1) < 0) {
+            continue;
+        }
+        if (p[0].revents != 0) {
+            return;
+        }
+        const int fd = accept4(m_listen, nullptr, nullptr, SOCK_CLOEXEC);
+        if (fd >= 0) {
+            answer(fd);
+            close(fd);
+        }
+    }
+}
+
+void TimeService::answer(int fd) {
+    pollfd wake = {m_wake[0], POLLIN, 0};
+    if (m_delay_ms > 0 && poll(&wake, 1, m_delay_ms) > 0) {
+        return;
+    }
+    const uint32_t now = m_seconds != 0 ? m_seconds.load() : static_cast<uint32_t>(time(nullptr));
+    const uint64_t count = m_served + 1u;
+    uint8_t reply[REPLY_SIZE];
+    for (size_t i = 0; i < 4; ++i) {
+        reply[i] = static_cast<uint8_t>(now >> (8 * i));
+    }
+    for (size_t i = 0; i < 8; ++i) {
+        reply[4 + i] = static_cast<uint8_t>(count >> (8 * i));
+    }
+    const size_t size = std::min(m_reply_size.load(), sizeof reply);
+    if (send(fd, reply, size, MSG_NOSIGNAL) == static_cast<ssize_t>(size)) {
+        ++m_served;
+    }
+}
