@@ -27,6 +27,8 @@ public:
     // The descriptor, -1 when none is open.
     int fd() const { return m_fd; }
 
+    Multiplexer* multiplexer() const { return m_multiplexer; }
+
     // Adds poll events to the registration, or makes it. 0, or -1 when the loop's table
     // is full. The descriptor is the one open at the next pass of the loop.
     int add_events(int events);

@@ -1,6 +1,7 @@
 #include "storage/CpDirectory.h"
 
 #include <dirent.h>
+#include <errno.h>
 #include <fcntl.h>
 #include <string.h>
 #include <sys/stat.h>
@@ -68,12 +69,13 @@ void CpDirectory::insert_scanned(LogFile** files, size_t num) {
     auto group = [](const LogFile* file) {
         return file->type() == LT_UNKNOWN ? 0 : file->type() == LT_VERSION ? 2 : 1;
     };
-    // Of log files made within one second the one with the larger number is older.
+    // Of log files made within one second the one with the larger number is older. Other
+    // files count as number 0, so that the order stays a strict one among mixed kinds.
     auto number = [](const LogFile* file) {
         uint32_t value = 0;
         size_t digits;
-        parse_log_number(file->name(), value, digits);
-        return value;
+        return file->type() == LT_LOG && parse_log_number(file->name(), value, digits) == 0 ? value
+                                                                                            : 0;
     };
     std::stable_sort(files, files + num, [&](const LogFile* a, const LogFile* b) {
         if (group(a) != group(b)) {
@@ -85,8 +87,11 @@ void CpDirectory::insert_scanned(LogFile** files, size_t num) {
         if (a->time() < b->time() || b->time() < a->time()) {
             return a->time() < b->time();
         }
-        return a->type() == LT_LOG && b->type() == LT_LOG && number(a) > number(b);
+        return number(a) > number(b);
     });
+    // Unknown files each go ahead of those found before.
+    std::reverse(files, std::find_if(files, files + num,
+                                     [&](const LogFile* file) { return group(file) != 0; }));
     for (size_t i = 0; i < num; ++i) {
         m_files.push_back(files[i]);
     }
@@ -118,6 +123,15 @@ LogFile* CpDirectory::create_log_file() {
     const android::String8 name = android::String8::format(
         "0-%s-%04d-%02d-%02d_%02d-%02d-%02d.log", m_name.string(), time.year, time.month, time.day,
         time.hour, time.minute, time.second);
+    // A file of this second that could not be renumbered still has the name: writing on
+    // would overwrite it.
+    for (const LogFile* listed : m_files) {
+        if (listed->name() == name) {
+            errno = EEXIST;
+            err_log("log file %s exists already", name.string());
+            return nullptr;
+        }
+    }
     LogFile* file = new LogFile(name, this, t);
     if (file->open() < 0) {
         delete file;
@@ -174,9 +188,18 @@ void CpDirectory::close_log_file() {
 }
 
 void CpDirectory::rotate_logs() {
+    // A file that could not be renumbered keeps its name. A younger one of the same second
+    // would take that very name and so replace it on the medium: it stays as well.
+    const LogFile* stuck = nullptr;
     for (LogFile* file : m_files) {
-        if (file->type() == LT_LOG) {
-            file->rotate(m_path);
+        if (file->type() != LT_LOG) {
+            continue;
+        }
+        if (stuck && file->next_name() == stuck->name()) {
+            err_log("%s is in the way of %s", stuck->name().string(), file->name().string());
+            stuck = file;
+        } else if (file->rotate(m_path) < 0) {
+            stuck = file;
         }
     }
 }

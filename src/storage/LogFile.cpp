@@ -28,6 +28,9 @@ LogFile::LogFile(const android::String8& name, CpDirectory* dir, const struct tm
     : m_dir(dir), m_name(name), m_type(LT_LOG), m_time(LogTime::from_tm(t)), m_size(0) {}
 
 LogFile::~LogFile() {
+    if (m_destroy_hook) {
+        m_destroy_hook(m_destroy_client);
+    }
     close();
 }
 
@@ -35,7 +38,9 @@ int LogFile::open() {
     if (m_fd >= 0) {
         return -1;
     }
-    m_fd = ::open(JoinedPath(m_dir->path(), m_name).string(), O_RDWR | O_CREAT | O_CLOEXEC, 0644);
+    // A link on a card must not lead the writing out of the log tree.
+    m_fd = ::open(JoinedPath(m_dir->path(), m_name).string(),
+                  O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
     if (m_fd < 0) {
         return -1;
     }
@@ -195,16 +200,24 @@ int LogFile::rename_to(const android::String8& dir_path, const android::String8&
     return 0;
 }
 
-int LogFile::rotate(const android::String8& dir_path) {
+android::String8 LogFile::next_name() const {
     uint32_t number;
     size_t digits;
     // The largest number has no successor: it would wrap to 0 and could replace the
     // newest file.
     if (parse_log_number(m_name, number, digits) < 0 || number == UINT32_MAX) {
+        return android::String8();
+    }
+    return with_number(m_name, number + 1, digits);
+}
+
+int LogFile::rotate(const android::String8& dir_path) {
+    const android::String8 new_name = next_name();
+    if (new_name.isEmpty()) {
         err_log("invalid log file name %s", m_name.string());
         return -1;
     }
-    if (rename_to(dir_path, with_number(m_name, number + 1, digits)) < 0) {
+    if (rename_to(dir_path, new_name) < 0) {
         err_log("rename %s failed", m_name.string());
         return -1;
     }

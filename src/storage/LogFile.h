@@ -62,12 +62,21 @@ public:
 
     // Adds 1 to the number at the head of the name, on the medium and here. 0 or -1.
     int rotate(const android::String8& dir_path);
+    // The name that rotate would give; empty when the name has no number to add to.
+    android::String8 next_name() const;
     // Sets that number. 0 or -1; does nothing when the name carries it already.
     int change_name_num(unsigned int num);
     // Deletes the file from the medium; one that is gone already counts as deleted.
     int remove(const android::String8& dir_path);
     // True when the file can be read and written on the medium.
     bool exists() const;
+
+    // A hook that runs at the start of the object's destruction, while the file is still
+    // open: for a user on another thread, who has to let go first. Null: none.
+    void set_destroy_hook(void (*hook)(void* client), void* client) {
+        m_destroy_hook = hook;
+        m_destroy_client = client;
+    }
 
     // Sets type and time from the name.
     void parse_name();
@@ -86,6 +95,8 @@ private:
     uint8_t* m_buffer = nullptr;
     size_t m_capacity = 0;
     size_t m_staged = 0;
+    void (*m_destroy_hook)(void*) = nullptr;
+    void* m_destroy_client = nullptr;
 };
 
 #endif  // STORAGE_LOGFILE_H_

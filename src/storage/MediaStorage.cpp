@@ -130,6 +130,10 @@ CpSetDirectory* MediaStorage::create_cp_set() {
         err_log("create CP set %s failed", path.string());
         return nullptr;
     }
+    // Normally the directory is new and empty. One that was there already, unlisted, is
+    // taken over with what it holds, so that nothing in it is overwritten or uncounted.
+    set->stat();
+    m_size += set->size();
     m_sets.push_back(set);
     m_working_set = set;
     return set;
