@@ -10,8 +10,11 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include "channels/CpRingBufConsumer.h"
+#include "channels/CpSleepLogConsumer.h"
 #include "channels/DiagDeviceHandler.h"
 #include "channels/TimeSyncRecord.h"
+#include "client/ClientHandler.h"
 #include "config/property_names.h"
 #include "control/LogController.h"
 #include "core/Multiplexer.h"
@@ -133,6 +136,8 @@ int LogPipeHandler::stop_logging() {
         // The CP has asserted and stays so until it is alive again.
         stop_transaction(CWS_NOT_WORKING);
         notify_cp_dump(CDE_END);
+    } else if (client_transaction_runs()) {
+        end_client_transaction(-1);
     }
     close_dev();
     return 0;
@@ -213,6 +218,9 @@ void LogPipeHandler::process_assert(bool save_md) {
     if (m_state == CWS_NOT_WORKING || m_state == CWS_DUMP) {
         return;
     }
+    if (client_transaction_runs()) {
+        end_client_transaction(-1);
+    }
     const bool reset = will_be_reset();
     if (reset && !save_md) {
         m_state = CWS_NOT_WORKING;
@@ -254,6 +262,9 @@ void LogPipeHandler::process_alive() {
         // The CP was restarted under the dump: what arrived so far is kept.
         end_dump();
         notify_cp_dump(CDE_END);
+    } else if (client_transaction_runs()) {
+        // A CP that has just come up knows nothing of the request.
+        end_client_transaction(-1);
     }
     m_state = CWS_WORKING;
     if (!m_enabled) {
@@ -275,6 +286,9 @@ void LogPipeHandler::notify_cp_dump(CpDumpEvent event) {
 
 DiagDeviceHandler* LogPipeHandler::create_diag_device(DataConsumer* consumer) {
     if (m_log_diag_same) {
+        if (m_fd < 0) {
+            return nullptr;
+        }
         return new DiagDeviceHandler(m_fd, consumer, m_log_ctrl, m_multiplexer);
     }
     DiagDeviceHandler* diag =
@@ -324,6 +338,85 @@ void LogPipeHandler::stop_transaction(CpWorkState new_state) {
 void LogPipeHandler::end_dump() {
     stop_transaction(CWS_NOT_WORKING);
     close_on_assert();
+}
+
+// ---- Transactions for clients
+
+// 0 when a client's transaction can start, else the result that refuses it.
+int LogPipeHandler::check_client_transaction() const {
+    if (!m_enabled) {
+        return -3;
+    }
+    if (m_state == CWS_NOT_WORKING) {
+        return -6;
+    }
+    return m_state == CWS_WORKING ? 0 : -2;
+}
+
+int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState state,
+                                             ClientHandler* client) {
+    consumer->set_callback(this, diag_transaction_notify);
+    if (run_transaction(create_diag_device(consumer), consumer, state) < 0) {
+        return -1;
+    }
+    m_trans_client = client;
+    return 1;
+}
+
+int LogPipeHandler::save_sleep_log(ClientHandler* client) {
+    const int refusal = check_client_transaction();
+    if (refusal < 0) {
+        return refusal;
+    }
+    if (!m_storage && create_storage() < 0) {
+        return -1;
+    }
+    return begin_client_transaction(new CpSleepLogConsumer(m_name.string(), m_storage),
+                                    CWS_SAVE_SLEEP_LOG, client);
+}
+
+int LogPipeHandler::save_ringbuf(ClientHandler* client) {
+    const int refusal = check_client_transaction();
+    if (refusal < 0) {
+        return refusal;
+    }
+    if (!m_storage && create_storage() < 0) {
+        return -1;
+    }
+    return begin_client_transaction(new CpRingBufConsumer(m_name.string(), m_storage),
+                                    CWS_SAVE_RINGBUF, client);
+}
+
+void LogPipeHandler::cancel_trans_result_notify(ClientHandler* client) {
+    if (m_trans_client.get() == client) {
+        m_trans_client = nullptr;
+    }
+}
+
+void LogPipeHandler::end_client_transaction(int result) {
+    stop_transaction(CWS_WORKING);
+    ClientHandler* client = m_trans_client.get();
+    m_trans_client = nullptr;
+    if (client) {
+        client->notify_trans_result(result);
+    }
+}
+
+void LogPipeHandler::diag_transaction_notify(void* client, DataConsumer::LogProcResult result) {
+    LogPipeHandler* handler = static_cast<LogPipeHandler*>(client);
+    if (!handler->client_transaction_runs()) {
+        err_log("Receive diag notify %d under state %d, ignore", result, handler->m_state);
+        return;
+    }
+    int client_result = -1;
+    if (result == DataConsumer::LPR_SUCCESS) {
+        client_result = 0;
+    } else if (result == DataConsumer::LPR_SLEEPLOG_NO_SUPPORT) {
+        client_result = -4;
+    } else if (result == DataConsumer::LPR_RINGBUF_NO_SUPPORT) {
+        client_result = -5;
+    }
+    handler->end_client_transaction(client_result);
 }
 
 // ---- WCDMA I/Q capture

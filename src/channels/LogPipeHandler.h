@@ -23,6 +23,7 @@
 #include "core/TimerManager.h"
 #include "iq/WcdmaIqManager.h"
 
+class ClientHandler;
 class CpStorage;
 class DiagDeviceHandler;
 class LogFile;
@@ -64,6 +65,14 @@ public:
     // The CP runs again.
     void process_alive();
 
+    // Start fetching the CP's sleep log or ring buffer for a client. 1 when the transaction
+    // runs: the client is told its result through notify_trans_result. Else -1 (failure),
+    // -2 (busy), -3 (logging is off) or -6 (the CP is not working).
+    int save_sleep_log(ClientHandler* client);
+    int save_ringbuf(ClientHandler* client);
+    // The client does not wait for its result any more.
+    void cancel_trans_result_notify(ClientHandler* client);
+
     int enable_wcdma_iq();
     int disable_wcdma_iq();
     int pause_wcdma_iq();
@@ -79,6 +88,8 @@ protected:
     static constexpr size_t IO_BUFFER_SIZE = 32768;
     // Shared by all channels: only one read is in progress at any time.
     static uint8_t s_io_buffer[IO_BUFFER_SIZE];
+
+    StorageManager* stor_mgr() const { return m_stor_mgr; }
 
     int start_logging();
     int stop_logging();
@@ -100,15 +111,23 @@ protected:
     // Registers the diag handler, binds it and starts the consumer as a transaction. Takes
     // both over; on failure (-1) they are destroyed.
     int run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
+    // Ends a transaction that a client waits for; the client gets the result.
+    void end_client_transaction(int result);
     // Ends a dump: the CP counts as not working until it is alive again.
     void end_dump();
     void notify_cp_dump(CpDumpEvent event);
 
 private:
+    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
     static void reopen_log_dev(void* handler);
     static void new_log_cb(LogPipeHandler* handler, LogFile* file);
     static void new_dir_cb(LogPipeHandler* handler);
 
+    int check_client_transaction() const;
+    int begin_client_transaction(DataConsumer* consumer, CpWorkState state, ClientHandler* client);
+    bool client_transaction_runs() const {
+        return m_state == CWS_SAVE_SLEEP_LOG || m_state == CWS_SAVE_RINGBUF;
+    }
     void poll_dev();
     void arm_reopen();
     void cancel_reopen();
@@ -132,6 +151,7 @@ private:
     CpWorkState m_state = CWS_WORKING;
     DiagDeviceHandler* m_diag_handler = nullptr;
     DataConsumer* m_consumer = nullptr;
+    ObjectRef<ClientHandler> m_trans_client;
     StorageManager* m_stor_mgr;
     CpStorage* m_storage = nullptr;
     TimerManager::Timer* m_reopen_timer = nullptr;

@@ -6,30 +6,37 @@
 #include "channels/ExtWcnLogHandler.h"
 #include "channels/GnssCpLogHandler.h"
 #include "channels/WanModemLogHandler.h"
+#include "client/ClientManager.h"
 #include "core/log.h"
 #include "core/system_paths.h"
+#include "state/ExtWcnStateHandler.h"
+#include "state/ModemStateHandler.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 
 namespace {
 
-constexpr int MB_SHIFT = 20;
+constexpr size_t MAX_CLIENTS = 3;
 
 }  // namespace
 
 LogController::LogController() {}
 
 LogController::~LogController() {
+    delete m_wcn_state;
+    delete m_modem_state;
     for (LogPipeHandler* pipe : m_log_pipes) {
         delete pipe;
     }
     m_log_pipes.clear();
+    delete m_cli_mgr;
 }
 
 int LogController::init(LogConfig* config) {
-    m_stor_mgr.set_data_part_size(static_cast<uint64_t>(config->data_log_size()) << MB_SHIFT);
-    m_stor_mgr.set_sd_size(static_cast<uint64_t>(config->sd_log_size()) << MB_SHIFT);
-    m_stor_mgr.set_file_size(config->log_file_size() << MB_SHIFT);
+    m_stor_mgr.set_data_part_size(static_cast<uint64_t>(config->data_log_size())
+                                  << MB_TO_BYTES_SHIFT);
+    m_stor_mgr.set_sd_size(static_cast<uint64_t>(config->sd_log_size()) << MB_TO_BYTES_SHIFT);
+    m_stor_mgr.set_file_size(config->log_file_size() << MB_TO_BYTES_SHIFT);
     m_stor_mgr.set_overwrite(config->log_overwrite());
     if (config->kest_dir()) {
         info_log("modem log will be placed in kest dir!");
@@ -44,11 +51,38 @@ int LogController::init(LogConfig* config) {
     for (const LogConfig::ConfigEntry* entry : config->stream_entries()) {
         m_log_pipes.push_back(create_handler(entry));
     }
+    m_cli_mgr = new ClientManager(this, &m_multiplexer, MAX_CLIENTS);
+    if (m_cli_mgr->init(SOCKET_CONTROL) < 0) {
+        delete m_cli_mgr;
+        m_cli_mgr = nullptr;
+    }
+    init_state_handler(m_modem_state, SOCKET_MODEM_SUPERVISOR);
+    init_wcn_state_handler(m_wcn_state, SOCKET_WCN_SUPERVISOR);
     return 0;
 }
 
 void LogController::run() {
     m_multiplexer.run();
+}
+
+void LogController::init_state_handler(ModemStateHandler*& handler, const char* name) {
+    ModemStateHandler* state = new ModemStateHandler(this, &m_multiplexer, name);
+    if (state->init() < 0) {
+        delete state;
+        err_log("kestcp: connect to %s error", name);
+        return;
+    }
+    handler = state;
+}
+
+void LogController::init_wcn_state_handler(ExtWcnStateHandler*& handler, const char* name) {
+    ExtWcnStateHandler* state = new ExtWcnStateHandler(this, &m_multiplexer, name);
+    if (state->init() < 0) {
+        delete state;
+        err_log("connect to %s error", name);
+        return;
+    }
+    handler = state;
 }
 
 LogPipeHandler* LogController::create_handler(const LogConfig::ConfigEntry* entry) {
@@ -104,8 +138,32 @@ LogPipeHandler* LogController::get_cp(CpType type) const {
     return nullptr;
 }
 
-// There are no clients to tell while the service has no control server.
-void LogController::notify_cp_dump(CpType /*type*/, CpDumpEvent /*event*/) {}
+void LogController::notify_cp_dump(CpType type, CpDumpEvent event) {
+    if (m_cli_mgr) {
+        m_cli_mgr->notify_cp_dump(type, event);
+    }
+}
+
+void LogController::process_cp_evt(CpType type, CpStateHandler::CpEvent event) {
+    const CpType cp = type == CT_WANMODEM ? LogConfig::wan_modem_type() : type;
+    LogPipeHandler* channel = get_cp(cp);
+    if (!channel) {
+        err_log("kestcp: unknown MODEM type %d asserts", type);
+        return;
+    }
+    switch (event) {
+        case CpStateHandler::CE_ALIVE:
+            channel->process_alive();
+            break;
+        case CpStateHandler::CE_ASSERT:
+        case CpStateHandler::CE_BLOCKED:
+            channel->process_assert(m_save_md);
+            break;
+        default:
+            err_log("unknown event %d", event);
+            break;
+    }
+}
 
 int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType type) {
     const LogTime t = LogTime::from_tm(time);

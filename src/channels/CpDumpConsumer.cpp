@@ -1,0 +1,61 @@
+#include "channels/CpDumpConsumer.h"
+
+#include <stdio.h>
+
+#include "core/log.h"
+#include "storage/CpDirectory.h"
+#include "storage/CpStorage.h"
+
+CpDumpConsumer::CpDumpConsumer(const char* cp_name, CpStorage* storage, const struct tm& dump_time)
+    : DataConsumer(cp_name, storage), m_dump_time(dump_time) {}
+
+CpDumpConsumer::~CpDumpConsumer() {
+    close_dump_file();
+}
+
+android::String8 CpDumpConsumer::file_name(const char* extension) const {
+    const LogTime t = LogTime::from_tm(m_dump_time);
+    android::String8 name(m_cp_name);
+    name.appendFormat("_memory_%04d-%02d-%02d_%02d-%02d-%02d.%s", t.year, t.month, t.day, t.hour,
+                      t.minute, t.second, extension);
+    return name;
+}
+
+LogFile* CpDumpConsumer::open_dump_file() {
+    const android::String8 name = file_name("dmp");
+    m_dump_file = m_storage->create_file(name, LT_DUMP, MT_NONE);
+    if (!m_dump_file) {
+        err_log("open dump file %s failed", name.string());
+    }
+    return m_dump_file.get();
+}
+
+LogFile* CpDumpConsumer::open_dump_mem_file() {
+    const android::String8 name = file_name("mem");
+    LogFile* file = m_storage->create_file(name, LT_DUMP, MT_NONE);
+    if (!file) {
+        err_log("open dump mem file %s failed", name.string());
+    }
+    return file;
+}
+
+void CpDumpConsumer::close_dump_file() {
+    if (m_dump_file) {
+        m_dump_file->close();
+        m_dump_file = nullptr;
+    }
+}
+
+void CpDumpConsumer::discard_dump_file() {
+    if (m_dump_file) {
+        m_dump_file->dir()->remove_file(m_dump_file.get());
+    }
+}
+
+ssize_t CpDumpConsumer::write_dump(const void* data, size_t len) {
+    if (!m_dump_file || !m_dump_file->exists()) {
+        err_log("dump file of %s is gone", m_cp_name);
+        return -1;
+    }
+    return m_dump_file->write(data, len);
+}

@@ -1,0 +1,39 @@
+// What the consumers of CP memory dumps share: naming, opening and discarding the dump
+// files. Owned by the channel for one dump.
+#ifndef CHANNELS_CPDUMPCONSUMER_H_
+#define CHANNELS_CPDUMPCONSUMER_H_
+
+#include <time.h>
+
+#include "channels/DataConsumer.h"
+#include "core/ObjectRef.h"
+#include "storage/LogFile.h"
+
+class CpDumpConsumer : public DataConsumer {
+public:
+    // dump_time: local time of the assert; it names the files.
+    CpDumpConsumer(const char* cp_name, CpStorage* storage, const struct tm& dump_time);
+    // Closes the dump file.
+    ~CpDumpConsumer() override;
+
+protected:
+    // Makes the ".dmp" file, kept as the dump file. Null, with a message, on failure.
+    LogFile* open_dump_file();
+    // Makes the ".mem" file for the copy of the kernel's memory file. Not kept.
+    LogFile* open_dump_mem_file();
+    // Closes the dump file, if it still exists; it stays on the medium.
+    void close_dump_file();
+    // Closes the dump file and removes it from the medium.
+    void discard_dump_file();
+    // Writes a chunk to the dump file; the bytes stored, or a negative value. The file may
+    // have gone with its set or its medium, or been trimmed: -1 with a message then.
+    ssize_t write_dump(const void* data, size_t len);
+
+private:
+    android::String8 file_name(const char* extension) const;
+
+    struct tm m_dump_time;
+    ObjectRef<LogFile> m_dump_file;
+};
+
+#endif  // CHANNELS_CPDUMPCONSUMER_H_

@@ -1,0 +1,154 @@
+#include "channels/DiagReplyConsumer.h"
+
+#include <string.h>
+#include <unistd.h>
+
+#include "core/Multiplexer.h"
+#include "core/log.h"
+#include "storage/CpDirectory.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+// Sub-types of the reply frames.
+constexpr uint8_t REPLY_NOT_SERVED = 0x00;
+constexpr uint8_t REPLY_END = 0x01;
+constexpr uint8_t REPLY_DATA = 0x64;
+
+}  // namespace
+
+DiagReplyConsumer::DiagReplyConsumer(const char* cp_name, CpStorage* storage,
+                                     const Exchange& exchange)
+    : DataConsumer(cp_name, storage), m_exchange(exchange) {}
+
+DiagReplyConsumer::~DiagReplyConsumer() {
+    stop_timer();
+    close_file();
+}
+
+void DiagReplyConsumer::stop_timer() {
+    if (m_read_timer) {
+        m_handler->multiplexer()->timer_mgr().del_timer(m_read_timer);
+        m_read_timer = nullptr;
+    }
+}
+
+bool DiagReplyConsumer::create_result_file(android::String8& name, LogFile*& file) {
+    struct tm now;
+    if (get_local_time(now) < 0) {
+        return false;
+    }
+    const LogTime t = LogTime::from_tm(now);
+    name = m_cp_name;
+    name.appendFormat("_%s_%04d-%02d-%02d_%02d-%02d-%02d.log", m_exchange.name_infix, t.year,
+                      t.month, t.day, t.hour, t.minute, t.second);
+    file = m_storage->create_file(name, m_exchange.log_type, MT_NONE);
+    return true;
+}
+
+bool DiagReplyConsumer::send_request() {
+    uint8_t* request;
+    size_t len;
+    DiagFrameParser::frame(m_exchange.diag_type, 0, nullptr, 0, request, len);
+    const ssize_t n = write(m_handler->fd(), request, len);
+    delete[] request;
+    return n == static_cast<ssize_t>(len);
+}
+
+int DiagReplyConsumer::start() {
+    m_file = open_file();
+    if (!m_file) {
+        return -1;
+    }
+    if (!send_request()) {
+        discard_file();
+        return -1;
+    }
+    m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(
+        READ_TIMEOUT_MS, m_exchange.read_timeout, this);
+    return 0;
+}
+
+void DiagReplyConsumer::close_file() {
+    if (m_file) {
+        m_file->close();
+        m_file = nullptr;
+    }
+}
+
+void DiagReplyConsumer::discard_file() {
+    if (m_file) {
+        m_file->dir()->remove_file(m_file.get());
+    }
+}
+
+bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
+    if (m_read_timer) {
+        m_handler->multiplexer()->timer_mgr().set_new_due_time(m_read_timer, READ_TIMEOUT_MS);
+    }
+    const uint8_t* data = buf.data();
+    size_t left = buf.data_len;
+    while (left > 0) {
+        uint8_t* frame;
+        size_t frame_len;
+        size_t used;
+        if (m_parser.unescape(data, left, frame, frame_len, used) &&
+            process_frame(frame, frame_len) == ENDED) {
+            return true;
+        }
+        data += used;
+        left -= used;
+    }
+    buf.consume_all();
+    return false;
+}
+
+// After ENDED this object is gone.
+DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame, size_t len) {
+    DiagHeader header;
+    if (len < sizeof(header)) {
+        return GO_ON;
+    }
+    memcpy(&header, frame, sizeof(header));
+    if (header.type != m_exchange.diag_type) {
+        return GO_ON;
+    }
+    if (header.sub_type == REPLY_NOT_SERVED) {
+        discard_file();
+        end(m_exchange.no_support);
+        return ENDED;
+    }
+    if (header.sub_type != REPLY_DATA && header.sub_type != REPLY_END) {
+        discard_file();
+        end(LPR_FAILURE);
+        return ENDED;
+    }
+    // The file may have gone with its set or its medium, or been trimmed.
+    if (!m_file || !m_file->exists()) {
+        err_log("result file of %s is gone", m_cp_name);
+        end(LPR_FAILURE);
+        return ENDED;
+    }
+    if (header.sub_type == REPLY_END) {
+        close_file();
+        end(LPR_SUCCESS);
+        return ENDED;
+    }
+    const size_t payload = len - sizeof(header);
+    if (m_file->write(frame + sizeof(header), payload) != static_cast<ssize_t>(payload)) {
+        discard_file();
+        end(LPR_FAILURE);
+        return ENDED;
+    }
+    return GO_ON;
+}
+
+void DiagReplyConsumer::end(LogProcResult result) {
+    stop_timer();
+    notify_result(result);
+}
+
+void DiagReplyConsumer::end_by_timeout() {
+    m_read_timer = nullptr;
+    close_file();
+}

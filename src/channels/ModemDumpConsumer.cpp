@@ -1,0 +1,130 @@
+#include "channels/ModemDumpConsumer.h"
+
+#include <errno.h>
+#include <poll.h>
+#include <string.h>
+#include <unistd.h>
+
+#include "core/Multiplexer.h"
+#include "core/log.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+constexpr char DUMP_REQUEST[] = {'3', '\n'};
+constexpr char END_MARKER[] = "\nmodem_memdump_finish";
+constexpr size_t END_MARKER_LEN = sizeof(END_MARKER) - 1;
+
+}  // namespace
+
+ModemDumpConsumer::ModemDumpConsumer(const char* cp_name, CpStorage* storage,
+                                     const struct tm& dump_time, const char* mem_path)
+    : CpDumpConsumer(cp_name, storage, dump_time), m_mem_path(mem_path) {}
+
+ModemDumpConsumer::~ModemDumpConsumer() {
+    stop_timer();
+    m_storage->unsubscribe_ext_stor_umount_evt(this);
+}
+
+void ModemDumpConsumer::stop_timer() {
+    if (m_read_timer) {
+        m_handler->multiplexer()->timer_mgr().del_timer(m_read_timer);
+        m_read_timer = nullptr;
+    }
+}
+
+int ModemDumpConsumer::start() {
+    if (write(m_handler->fd(), DUMP_REQUEST, sizeof(DUMP_REQUEST)) !=
+        static_cast<ssize_t>(sizeof(DUMP_REQUEST))) {
+        return -1;
+    }
+    if (!open_dump_file()) {
+        return -1;
+    }
+    m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
+    m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(READ_TIMEOUT_MS,
+                                                                      dump_read_timeout, this);
+    return 0;
+}
+
+bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& buf) {
+    bool found = false;
+    const uint8_t* data = buf.data();
+    size_t left = buf.data_len;
+    while (left > 0) {
+        uint8_t* frame;
+        size_t frame_len;
+        size_t used;
+        if (m_parser.unescape(data, left, frame, frame_len, used) &&
+            frame_len == sizeof(DiagHeader) + END_MARKER_LEN &&
+            memcmp(frame + sizeof(DiagHeader), END_MARKER, END_MARKER_LEN) == 0) {
+            found = true;
+        }
+        data += used;
+        left -= used;
+    }
+    return found;
+}
+
+bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
+    const bool end = check_end_of_dump(buf);
+    if (m_read_timer) {
+        m_handler->multiplexer()->timer_mgr().set_new_due_time(m_read_timer, READ_TIMEOUT_MS);
+    }
+    const size_t len = buf.data_len;
+    const ssize_t written = write_dump(buf.data(), len);
+    if (written == static_cast<ssize_t>(len)) {
+        buf.consume_all();
+        if (end) {
+            m_handler->del_events(POLLIN);
+            close_dump_file();
+            stop_timer();
+            notify_result(LPR_SUCCESS);
+            info_log("dump complete");
+        }
+        return true;
+    }
+    const int write_errno = errno;
+    discard_dump_file();
+    stop_timer();
+    errno = write_errno;
+    err_log("need to write %lu, write returns %d", static_cast<unsigned long>(len),
+            static_cast<int>(written));
+    notify_result(save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);
+    return true;
+}
+
+void ModemDumpConsumer::dump_read_timeout(void* param) {
+    ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
+    consumer->m_read_timer = nullptr;
+    consumer->discard_dump_file();
+    err_log("read timeout");
+    consumer->notify_result(consumer->save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);
+}
+
+bool ModemDumpConsumer::save_dump_file() {
+    m_handler->del_events(POLLIN);
+    // Making the file may find that the SD card is gone. The dump that lay on it has been
+    // given up already, so that must not end this transaction under our feet.
+    m_storage->unsubscribe_ext_stor_umount_evt(this);
+    LogFile* file = open_dump_mem_file();
+    if (!file) {
+        err_log("create dump mem file failed");
+        return false;
+    }
+    const bool copied = file->copy(m_mem_path) == 0;
+    if (copied) {
+        info_log("dump proc memory: %s successfully.", m_mem_path);
+    } else {
+        err_log("dump proc memory: %s failed.", m_mem_path);
+    }
+    file->close();
+    return copied;
+}
+
+void ModemDumpConsumer::on_ext_stor_umount(void* param) {
+    ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
+    consumer->stop_timer();
+    info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
+    consumer->notify_result(LPR_FAILURE);
+}

@@ -1,0 +1,39 @@
+// Saves the memory of an asserted modem, which the modem sends over its diag device
+// after a short request, raw into a ".dmp" file. When the stream breaks off, the
+// kernel's memory file of the modem is copied into a ".mem" file instead.
+// Owned by the WanModemLogHandler for one dump.
+#ifndef CHANNELS_MODEMDUMPCONSUMER_H_
+#define CHANNELS_MODEMDUMPCONSUMER_H_
+
+#include "channels/CpDumpConsumer.h"
+#include "channels/DiagFrameParser.h"
+#include "core/TimerManager.h"
+
+class ModemDumpConsumer : public CpDumpConsumer {
+public:
+    // A modem that is silent for this long has stopped.
+    static constexpr unsigned int READ_TIMEOUT_MS = 3000;
+
+    ModemDumpConsumer(const char* cp_name, CpStorage* storage, const struct tm& dump_time,
+                      const char* mem_path);
+    ~ModemDumpConsumer() override;
+
+    int start() override;
+    bool process(DeviceFileHandler::DataBuffer& buf) override;
+
+private:
+    static void dump_read_timeout(void* consumer);
+    static void on_ext_stor_umount(void* consumer);
+
+    // Follows the frames of the chunk; true when one of them was the end marker.
+    bool check_end_of_dump(const DeviceFileHandler::DataBuffer& buf);
+    // Copies the kernel's memory file; false when that failed.
+    bool save_dump_file();
+    void stop_timer();
+
+    const char* m_mem_path;
+    TimerManager::Timer* m_read_timer = nullptr;
+    DiagFrameParser m_parser;
+};
+
+#endif  // CHANNELS_MODEMDUMPCONSUMER_H_

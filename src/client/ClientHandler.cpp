@@ -1,0 +1,189 @@
+#include "client/ClientHandler.h"
+
+#include <poll.h>
+#include <stdio.h>
+#include <string.h>
+#include <unistd.h>
+
+#include "channels/LogPipeHandler.h"
+#include "client/ClientManager.h"
+#include "core/log.h"
+#include "core/text.h"
+
+namespace {
+
+// One write: what a client that does not read has no room for is lost, and a late
+// rest of a line would only garble the next one.
+int send_all(int fd, const char* text, size_t len) {
+    return write(fd, text, len) == static_cast<ssize_t>(len) ? 0 : -1;
+}
+
+}  // namespace
+
+ClientHandler::ClientHandler(int fd, LogController* ctrl, Multiplexer* mux, ClientManager* manager)
+    : BufferedFdHandler(fd, ctrl, mux, MAX_REQUEST), m_manager(manager) {}
+
+ClientHandler::~ClientHandler() {
+    cancel_trans();
+}
+
+int ClientHandler::process_data() {
+    m_in_data = true;
+    const uint8_t* const end = m_buffer + m_data_len;
+    const uint8_t* req = m_buffer;
+    for (const uint8_t* p = m_buffer; p < end; ++p) {
+        if (*p == '\n' || *p == '\0') {
+            process_req(req, static_cast<size_t>(p - req));
+            req = p + 1;
+        }
+    }
+    m_data_len = static_cast<size_t>(end - req);
+    if (req != m_buffer) {
+        memmove(m_buffer, req, m_data_len);
+    }
+    m_in_data = false;
+    if (m_unreadable) {
+        process_conn_closed();
+    }
+    return 0;
+}
+
+void ClientHandler::process_req(const uint8_t* req, size_t len) {
+    size_t keyword_len;
+    const uint8_t* keyword = get_token(req, len, keyword_len);
+    if (!keyword) {
+        return;
+    }
+    const Request* request = find_request(keyword, keyword_len);
+    if (!request) {
+        err_log("unknown request");
+        return reply(RC_UNKNOWN_REQUEST);
+    }
+    const uint8_t* params = keyword + keyword_len;
+    (this->*request->handler)(params, static_cast<size_t>(req + len - params));
+}
+
+void ClientHandler::process_conn_closed() {
+    cancel_trans();
+    m_manager->process_client_disconn(this);
+}
+
+void ClientHandler::process_conn_error(int /*err*/) {
+    process_conn_closed();
+}
+
+int ClientHandler::notify_cp_dump(CpType type, CpDumpEvent event) {
+    if (type < 0 || type >= CP_TYPE_NUM || event < CDE_START || event > CDE_END ||
+        !m_dump_subscribed[type]) {
+        return 0;
+    }
+    char line[128];
+    const int len = snprintf(line, sizeof(line), "%s%s\n",
+                             event == CDE_START ? "CP_DUMP_START " : "CP_DUMP_END ",
+                             cp_type_to_request_name(type));
+    return send_all(m_fd, line, static_cast<size_t>(len));
+}
+
+void ClientHandler::notify_trans_result(int result) {
+    if (m_trans_state != CTS_EXECUTING) {
+        err_log("Non CTS_EXECUTING state notification %d", result);
+        return;
+    }
+    switch (m_trans_type) {
+        case CTT_SLEEP_LOG:
+            proc_sleep_log_result(result);
+            break;
+        case CTT_RINGBUF:
+            proc_ringbuf_result(result);
+            break;
+        default:
+            err_log("Unknown transaction %d result %d", static_cast<int>(m_trans_type), result);
+            break;
+    }
+}
+
+int ClientHandler::start_trans(ClientTransType type, LogPipeHandler* channel) {
+    if (m_trans_state != CTS_IDLE) {
+        return -2;
+    }
+    // Before the channel starts: its result may come while it is starting.
+    const ClientTransType last_type = m_trans_type;
+    m_trans_type = type;
+    m_trans_state = CTS_EXECUTING;
+    m_trans_channel = channel;
+    const int result =
+        type == CTT_SLEEP_LOG ? channel->save_sleep_log(this) : channel->save_ringbuf(this);
+    if (result != 1) {
+        m_trans_type = last_type;
+        m_trans_state = CTS_IDLE;
+        m_trans_channel = nullptr;
+    } else if (m_trans_state == CTS_EXECUTING) {
+        del_events(POLLIN);
+    }
+    return result;
+}
+
+void ClientHandler::end_trans(int result) {
+    m_trans_state = CTS_IDLE;
+    m_trans_channel = nullptr;
+    if (add_events(POLLIN) < 0) {
+        info_log("no room to poll the client, closing it");
+        m_unreadable = true;
+    }
+    reply(result_to_error(result));
+    // While requests are being handled the object is still in use: process_data closes.
+    if (m_unreadable && !m_in_data) {
+        process_conn_closed();
+    }
+}
+
+void ClientHandler::cancel_trans() {
+    if (m_trans_state == CTS_IDLE) {
+        return;
+    }
+    if (m_trans_channel) {
+        m_trans_channel->cancel_trans_result_notify(this);
+    }
+    m_trans_state = CTS_IDLE;
+    m_trans_channel = nullptr;
+}
+
+int ClientHandler::result_to_error(int result) {
+    switch (result) {
+        case 0:
+            return RC_OK;
+        case -2:
+            return RC_BUSY;
+        case -3:
+            return RC_LOG_DISABLED;
+        case -4:
+            return RC_NO_SLEEP_LOG;
+        case -5:
+            return RC_NO_RINGBUF;
+        case -6:
+            return RC_CP_NOT_WORKING;
+        default:
+            return RC_FAILED;
+    }
+}
+
+int ClientHandler::send_response(int fd, int code) {
+    if (code == RC_OK) {
+        return send_all(fd, "OK\n", 3);
+    }
+    char line[32];
+    const int len = snprintf(line, sizeof(line), "ERROR %d\n", code);
+    return send_all(fd, line, static_cast<size_t>(len));
+}
+
+void ClientHandler::reply_number(unsigned int number) {
+    char line[64];
+    const int len = snprintf(line, sizeof(line), "OK %u\n", number);
+    send_all(m_fd, line, static_cast<size_t>(len));
+}
+
+void ClientHandler::reply_word(const char* word) {
+    char line[64];
+    const int len = snprintf(line, sizeof(line), "OK %s\n", word);
+    send_all(m_fd, line, static_cast<size_t>(len));
+}

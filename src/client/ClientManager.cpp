@@ -1,0 +1,108 @@
+#include "client/ClientManager.h"
+
+#include <cutils/sockets.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/socket.h>
+
+#include "client/ClientHandler.h"
+#include "core/Multiplexer.h"
+#include "core/log.h"
+
+namespace {
+
+int set_nonblock(int fd) {
+    const int flags = fcntl(fd, F_GETFL);
+    return flags < 0 ? -1 : fcntl(fd, F_SETFL, flags | O_NONBLOCK);
+}
+
+}  // namespace
+
+ClientManager::ClientManager(LogController* ctrl, Multiplexer* mux, size_t max_clients)
+    : FdHandler(-1, ctrl, mux), m_max_clients(max_clients) {}
+
+ClientManager::~ClientManager() {
+    if (m_listen_timer) {
+        m_multiplexer->timer_mgr().del_timer(m_listen_timer);
+    }
+    for (ClientHandler* client : m_clients) {
+        delete client;
+    }
+    m_clients.clear();
+}
+
+int ClientManager::init(const char* name) {
+    m_fd = socket_local_server(name, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    if (m_fd < 0) {
+        err_log("can not create server socket");
+        return -1;
+    }
+    if (set_nonblock(m_fd) < 0) {
+        const int saved_errno = errno;
+        close();
+        errno = saved_errno;
+        err_log("set server socket non-block error");
+        return -1;
+    }
+    resume_listening();
+    return 0;
+}
+
+void ClientManager::process(int /*events*/) {
+    const int fd = accept4(m_fd, nullptr, nullptr, SOCK_CLOEXEC);
+    if (fd < 0) {
+        return;
+    }
+    if (set_nonblock(fd) < 0) {
+        err_log("set accepted socket to O_NONBLOCK error");
+    }
+    ClientHandler* client = new ClientHandler(fd, m_log_ctrl, m_multiplexer, this);
+    if (client->add_events(POLLIN) < 0) {
+        info_log("no room to poll a new client, closing it");
+        delete client;
+        return;
+    }
+    m_clients.push_back(client);
+    info_log("new client accepted");
+    if (full()) {
+        del_events(POLLIN);
+    }
+}
+
+void ClientManager::process_client_disconn(ClientHandler* client) {
+    for (auto it = m_clients.begin(); it != m_clients.end(); ++it) {
+        if (*it == client) {
+            m_clients.erase(it);
+            break;
+        }
+    }
+    delete client;
+    info_log("client disconnected, remaining %u clients",
+             static_cast<unsigned int>(m_clients.size()));
+    if (m_max_clients && !full()) {
+        resume_listening();
+    }
+}
+
+void ClientManager::notify_cp_dump(CpType type, CpDumpEvent event) {
+    for (ClientHandler* client : m_clients) {
+        client->notify_cp_dump(type, event);
+    }
+}
+
+void ClientManager::resume_listening() {
+    if (add_events(POLLIN) == 0 || m_listen_timer) {
+        return;
+    }
+    // The server must not stay deaf for ever because the loop was full for a moment.
+    info_log("no room to poll the server socket, trying again later");
+    m_listen_timer = m_multiplexer->timer_mgr().create_timer(LISTEN_RETRY_MS, listen_again, this);
+}
+
+void ClientManager::listen_again(void* manager) {
+    ClientManager* const self = static_cast<ClientManager*>(manager);
+    self->m_listen_timer = nullptr;
+    if (!self->full()) {
+        self->resume_listening();
+    }
+}

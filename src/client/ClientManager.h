@@ -1,0 +1,52 @@
+// The control server: owns the listening socket and the handler of every connected
+// client, and serves a limited number of clients at once; further ones wait unaccepted.
+//
+// Owned by the LogController, which does without one when init fails. Loop thread only.
+#ifndef CLIENT_CLIENTMANAGER_H_
+#define CLIENT_CLIENTMANAGER_H_
+
+#include <stddef.h>
+#include <utils/List.h>
+
+#include "client/CpDumpEvent.h"
+#include "config/CpType.h"
+#include "core/FdHandler.h"
+#include "core/TimerManager.h"
+
+class ClientHandler;
+
+class ClientManager : public FdHandler {
+public:
+    // max_clients: the most connections served at once; 0: no limit. Listens not yet.
+    ClientManager(LogController* ctrl, Multiplexer* mux, size_t max_clients);
+    // Disconnects every client.
+    ~ClientManager() override;
+
+    // Listens on the local socket of that name. 0, or -1 (logged).
+    int init(const char* name);
+
+    // Accepts one connection.
+    void process(int events) override;
+
+    // Destroys the handler of a connection that has ended; its code must return at once.
+    void process_client_disconn(ClientHandler* client);
+
+    // Tells every client that has subscribed to the CP, in the order of connection.
+    void notify_cp_dump(CpType type, CpDumpEvent event);
+
+    size_t client_num() const { return m_clients.size(); }
+
+private:
+    // How long a loop without room for the listening socket is left alone.
+    static constexpr unsigned int LISTEN_RETRY_MS = 3000;
+
+    static void listen_again(void* manager);
+    bool full() const { return m_max_clients && m_clients.size() >= m_max_clients; }
+    void resume_listening();
+
+    const size_t m_max_clients;
+    android::List<ClientHandler*> m_clients;
+    TimerManager::Timer* m_listen_timer = nullptr;
+};
+
+#endif  // CLIENT_CLIENTMANAGER_H_

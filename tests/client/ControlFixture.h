@@ -1,0 +1,149 @@
+// A real controller on a temporary root, a control server of its own beside whatever
+// the controller runs, and clients on real sockets. The tests drive the loop.
+#ifndef TESTS_CLIENT_CONTROLFIXTURE_H_
+#define TESTS_CLIENT_CONTROLFIXTURE_H_
+
+#include <cutils/sockets.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <termios.h>
+#include <unistd.h>
+
+#include <list>
+#include <string>
+#include <vector>
+
+#include "channels/LogPipeHandler.h"
+#include "client/ClientHandler.h"
+#include "client/ClientManager.h"
+#include "config/ConfigFixture.h"
+#include "control/LogController.h"
+
+constexpr char TEST_SERVER[] = "control_test";
+
+// One end of a connection, closed at the end; never blocks.
+struct Peer {
+    explicit Peer(int fd_in) : fd(fd_in) {
+        if (fd >= 0) {
+            fcntl(fd, F_SETFL, fcntl(fd, F_GETFL) | O_NONBLOCK);
+        }
+    }
+    explicit Peer(const char* server)
+        : Peer(socket_local_client(server, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)) {}
+    ~Peer() { hang_up(); }
+    Peer(const Peer&) = delete;
+    Peer& operator=(const Peer&) = delete;
+
+    void hang_up() {
+        if (fd >= 0) {
+            close(fd);
+        }
+        fd = -1;
+    }
+    bool send(const std::string& bytes) const {
+        return ::send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL) ==
+               static_cast<ssize_t>(bytes.size());
+    }
+    // Adds what has arrived to got; "closed" tells whether the other end is gone.
+    const std::string& receive() {
+        char buf[4096];
+        ssize_t n;
+        while ((n = recv(fd, buf, sizeof(buf), 0)) > 0) {
+            got.append(buf, static_cast<size_t>(n));
+        }
+        closed = closed || n == 0 || (errno != EAGAIN && errno != EINTR);
+        return got;
+    }
+
+    int fd;
+    std::string got;
+    bool closed = false;
+};
+
+class ControlFixture : public ConfigFixture {
+protected:
+    ControlFixture() : config(file.c_str()) {
+        signal(SIGPIPE, SIG_IGN);  // as the service does
+        mkfifo(root.path("w_log").c_str(), 0600);
+        root.set_prop("ro.modem.w.log", root.path("w_log"));
+        // A CP that takes requests on its diag device and never answers.
+        m_diag = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+        grantpt(m_diag);
+        unlockpt(m_diag);
+        struct termios raw;
+        tcgetattr(m_diag, &raw);
+        cfmakeraw(&raw);
+        tcsetattr(m_diag, TCSANOW, &raw);
+        root.set_prop("ro.modem.w.diag", ptsname(m_diag));
+        root.write_file("kest_modem.conf",
+                        "stream cp_wcdma off 0 3\nstream cp_wcn off 0 3\nlog_file_size 5\n");
+        EXPECT_EQ(read(config), 0);
+        EXPECT_EQ(ctrl.init(&config), 0);
+    }
+    ~ControlFixture() override { close(m_diag); }
+
+    Multiplexer& mux() { return ctrl.multiplexer(); }
+
+    // One pass of the loop that does not wait long.
+    static void pass(Multiplexer& loop) {
+        bool fired = false;
+        TimerManager::Timer* const guard = loop.timer_mgr().create_timer(
+            5, [](void* flag) { *static_cast<bool*>(flag) = true; }, &fired);
+        loop.run_once();
+        if (!fired) {
+            loop.timer_mgr().del_timer(guard);
+        }
+    }
+    // Runs the loop until the condition holds.
+    template <typename Condition>
+    bool run_until(Multiplexer& loop, Condition condition, int timeout_ms = 10000) {
+        return wait_until(
+            [&] {
+                pass(loop);
+                return condition();
+            },
+            timeout_ms);
+    }
+
+    // What the peer got when it got as many bytes as expected, or when time is over.
+    std::string replies(Peer& peer, const std::string& expected) {
+        run_until(mux(), [&] { return peer.receive().size() >= expected.size(); });
+        std::string got;
+        got.swap(peer.got);
+        return got;
+    }
+    std::string ask(Peer& peer, const std::string& request, const std::string& expected) {
+        EXPECT_TRUE(peer.send(request));
+        return replies(peer, expected);
+    }
+
+    LogConfig config;
+    LogController ctrl;
+
+private:
+    int m_diag;
+};
+
+// Takes every place that is free in the loop's table.
+class Occupants {
+public:
+    explicit Occupants(Multiplexer& mux) {
+        do {
+            m_handlers.emplace_back(&mux);
+        } while (m_handlers.back().add_events(POLLIN) == 0);
+        m_handlers.pop_back();
+    }
+    size_t size() const { return m_handlers.size(); }
+
+private:
+    struct Occupant : FdHandler {
+        explicit Occupant(Multiplexer* mux) : FdHandler(-1, nullptr, mux) {}
+        void process(int) override {}
+    };
+    std::list<Occupant> m_handlers;
+};
+
+#endif  // TESTS_CLIENT_CONTROLFIXTURE_H_
