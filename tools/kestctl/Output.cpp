@@ -1,0 +1,115 @@
+#include "kestctl/Output.h"
+
+#include <stdio.h>
+
+#include <algorithm>
+
+#include "kestctl/ExitStatus.h"
+
+namespace {
+
+bool is_printable(char c) {
+    return c >= 0x20 && c < 0x7f;
+}
+
+std::string hex(const char* prefix, char c) {
+    char text[8];
+    snprintf(text, sizeof(text), "%s%02x", prefix, static_cast<unsigned int>(c) & 0xffu);
+    return text;
+}
+
+void print(const std::string& line) {
+    printf("%s\n", line.c_str());
+    fflush(stdout);
+}
+
+std::string json_value(const std::string& value) {
+    return is_number(value) ? value : json_string(value);
+}
+
+}  // namespace
+
+std::string escape_text(const std::string& text) {
+    std::string result;
+    for (char c : text) {
+        if (c == '\\') {
+            result += "\\\\";
+        } else {
+            result += is_printable(c) ? std::string(1, c) : hex("\\x", c);
+        }
+    }
+    return result;
+}
+
+std::string json_string(const std::string& text) {
+    std::string result = "\"";
+    for (char c : text) {
+        if (c == '"' || c == '\\') {
+            result += '\\';
+        }
+        result += is_printable(c) ? std::string(1, c) : hex("\\u00", c);
+    }
+    return result + "\"";
+}
+
+void Output::ok() const {
+    print(m_json ? "{\"ok\":true}" : "OK");
+}
+
+void Output::value(const std::string& value) const {
+    print(m_json ? "{\"ok\":true,\"value\":" + json_value(value) + "}" : escape_text(value));
+}
+
+void Output::notification(const Notification& notification) const {
+    const std::string event = notification.start ? "DUMP_START" : "DUMP_END";
+    print(m_json ? "{\"event\":\"" + event + "\",\"cp\":" + json_string(notification.cp) + "}"
+                 : "CP_" + event + " " + escape_text(notification.cp));
+}
+
+void Output::status(const Table& settings, const Table& cps) const {
+    if (!m_json) {
+        for (const Table* table : {&settings, &cps}) {
+            for (const auto& row : *table) {
+                const std::string name = (table == &cps ? "log " : "") + row.first;
+                printf("%-16s %s%s\n", name.c_str(), escape_text(row.second).c_str(),
+                       is_number(row.second) ? " MB" : "");
+            }
+        }
+        fflush(stdout);
+        return;
+    }
+    std::string object = "{\"ok\":true";
+    for (const auto& row : settings) {
+        std::string name = row.first;
+        std::replace(name.begin(), name.end(), '-', '_');
+        object += "," + json_string(name) + ":" + json_value(row.second);
+    }
+    object += ",\"log\":{";
+    for (const auto& row : cps) {
+        object += (&row == &cps.front() ? "" : ",") + json_string(row.first) + ":" +
+                  json_value(row.second);
+    }
+    print(object + "}}");
+}
+
+void Output::line(const std::string& line) const {
+    print(escape_text(line));
+}
+
+int Output::error_reply(int code) const {
+    fprintf(stderr, "kestctl: error %d: %s\n", code, error_meaning(code));
+    if (m_json) {
+        print("{\"ok\":false,\"code\":" + std::to_string(code) +
+              ",\"meaning\":" + json_string(error_meaning(code)) + "}");
+    }
+    return ES_SERVICE_ERROR + code;
+}
+
+int Output::failure(int status, const std::string& words) const {
+    fprintf(stderr, "kestctl: %s\n", escape_text(words).c_str());
+    if (m_json) {
+        print("{\"ok\":false,\"status\":" + std::to_string(status) +
+              ",\"meaning\":" + json_string(words) + "}");
+    }
+    return status;
+}

@@ -1,0 +1,27 @@
+// The lines that the service sends, taken apart. They are not trusted: whatever does not
+// look exactly like a reply or a notification is neither.
+#ifndef KESTCTL_REPLY_H_
+#define KESTCTL_REPLY_H_
+
+#include <string>
+
+struct Reply {
+    int code = 0;       // 0: OK, otherwise the code of an error reply
+    std::string value;  // what follows OK; empty without a value
+};
+
+// "OK", "OK <value>" or "ERROR <code>", without the line feed. False for anything else.
+bool parse_reply(const std::string& line, Reply* reply);
+
+// A line on the start or the end of a CP's memory dump.
+struct Notification {
+    bool start = false;
+    std::string cp;
+};
+
+bool parse_notification(const std::string& line, Notification* notification);
+
+// A decimal number as the service prints one: digits without leading zeros, up to 32 bits.
+bool is_number(const std::string& text);
+
+#endif  // KESTCTL_REPLY_H_

@@ -1,0 +1,129 @@
+#include "kestctl/handlers.h"
+
+#include <signal.h>
+#include <string.h>
+#include <unistd.h>
+
+#include "kestctl/ControlConnection.h"
+#include "kestctl/ExitStatus.h"
+#include "kestctl/Output.h"
+#include "kestctl/Reply.h"
+
+namespace {
+
+bool fits(ReplyKind kind, const std::string& value) {
+    switch (kind) {
+        case RK_NONE:
+            return value.empty();
+        case RK_NUMBER:
+            return is_number(value);
+        default:
+            return !value.empty();
+    }
+}
+
+// Sends the command's request and stores the value of the reply. Prints only failures.
+int ask(const Command& command, const Args& args, ControlConnection& connection,
+        const Output& output, std::string* value) {
+    std::string request = command.request;
+    for (const std::string& arg : args) {
+        request += " " + arg;
+    }
+    std::string line;
+    const int status = connection.request(request, &line);
+    if (status != ES_OK) {
+        return output.failure(status, connection.failure());
+    }
+    Reply reply;
+    if (!parse_reply(line, &reply) || (reply.code == 0 && !fits(command.reply, reply.value))) {
+        return output.failure(ES_BAD_REPLY, "unexpected reply to " + request + ": " + line);
+    }
+    *value = reply.value;
+    return reply.code == 0 ? static_cast<int>(ES_OK) : output.error_reply(reply.code);
+}
+
+// Whatever is printed is flushed at once, so nothing is lost. A result that nobody can
+// read any more must not keep the program either.
+extern "C" void end_watch(int) {
+    _exit(ES_OK);
+}
+
+}  // namespace
+
+int run_request(const Command& command, const Args& args, ControlConnection& connection,
+                const Output& output) {
+    std::string value;
+    const int status = ask(command, args, connection, output, &value);
+    if (status == ES_OK) {
+        command.reply == RK_NONE ? output.ok() : output.value(value);
+    }
+    return status;
+}
+
+int run_status(const Command&, const Args&, ControlConnection& connection, const Output& output) {
+    Output::Table settings, cps;
+    std::string value;
+    for (const Command& getter : COMMANDS) {
+        if (getter.reply == RK_NONE || getter.run != run_request) {
+            continue;
+        }
+        if (getter.params->max == 0) {
+            const int status = ask(getter, {}, connection, output, &value);
+            if (status != ES_OK) {
+                return status;
+            }
+            settings.emplace_back(getter.name + strlen("get-"), value);
+            continue;
+        }
+        for (size_t i = 0; const char* cp = param_word(PK_CP, i); ++i) {
+            const int status = ask(getter, {cp}, connection, output, &value);
+            if (status != ES_OK) {
+                return status;
+            }
+            cps.emplace_back(cp, value);
+        }
+    }
+    output.status(settings, cps);
+    return ES_OK;
+}
+
+int run_watch(const Command& command, const Args& args, ControlConnection& connection,
+              const Output& output) {
+    struct sigaction action = {};
+    action.sa_handler = end_watch;
+    sigaction(SIGINT, &action, nullptr);
+
+    connection.set_listener([&output](const Notification& n) { output.notification(n); });
+    Args cps = args;
+    for (size_t i = 0; args.empty() && param_word(PK_CP, i); ++i) {
+        cps.push_back(param_word(PK_CP, i));
+    }
+    std::string value;
+    for (const std::string& cp : cps) {
+        const int status = ask(command, {cp, "DUMP"}, connection, output, &value);
+        if (status != ES_OK) {
+            return status;
+        }
+    }
+    connection.wait_without_limit();
+    return output.failure(connection.listen(), connection.failure());
+}
+
+int run_raw(const Command&, const Args& args, ControlConnection& connection, const Output& output) {
+    std::string line;
+    const int status = connection.request(args[0], &line);
+    if (status != ES_OK) {
+        return output.failure(status, connection.failure());
+    }
+    Reply reply;
+    const bool valid = parse_reply(line, &reply);
+    if (!output.json()) {
+        output.line(line);
+    } else if (valid && reply.code == 0) {
+        reply.value.empty() ? output.ok() : output.value(reply.value);
+    }
+    if (!valid) {
+        return output.failure(ES_BAD_REPLY, "unexpected reply: " + line);
+    }
+    return reply.code == 0 ? static_cast<int>(ES_OK) : output.error_reply(reply.code);
+}
