@@ -1,23 +1,147 @@
 #include "channels/AgDspLogHandler.h"
 
 #include <errno.h>
+#include <string.h>
+#include <sys/ioctl.h>
+#include <unistd.h>
 
 #include "core/log.h"
+#include "core/system_paths.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+// Tells the dump device that its content has been taken: write direction, type 'X',
+// number 6, argument of 4 bytes.
+constexpr unsigned long CMD_DUMP_COMPLETE = 0x40045806;
+
+void complete_dump(int fd) {
+    const int saved_errno = errno;
+    ioctl(fd, CMD_DUMP_COMPLETE, 0);
+    errno = saved_errno;
+}
+
+}  // namespace
 
 AgDspLogHandler::AgDspLogHandler(LogController* ctrl, Multiplexer* mux,
                                  const LogConfig::ConfigEntry* entry, StorageManager* stor_mgr)
-    : LogPipeHandler(ctrl, mux, entry, stor_mgr) {}
+    : LogPipeHandler(ctrl, mux, entry, stor_mgr),
+      m_pcm_notifier(ctrl, mux, PATH_AGDSP_PCM),
+      m_dump_notifier(ctrl, mux, PATH_AGDSP_MEM) {
+    m_pcm_notifier.set_callback(this, notify_pcm);
+    m_dump_notifier.set_callback(this, notify_dump);
+}
 
 int AgDspLogHandler::start() {
-    errno = ENOSYS;
-    err_log("audio DSP %s is not supported yet", name().string());
-    return -1;
+    const int result = start_logging();
+    if (result < 0) {
+        return result;
+    }
+    if (m_pcm_notifier.open() < 0) {
+        err_log("start PCM notifier error");
+    }
+    if (m_dump_notifier.open() < 0) {
+        err_log("start dump notifier error");
+    }
+    return 0;
 }
 
 int AgDspLogHandler::stop() {
-    return stop_logging();
+    const int result = stop_logging();
+    if (result < 0) {
+        return result;
+    }
+    m_pcm_notifier.close();
+    m_dump_notifier.close();
+    return 0;
 }
 
 int AgDspLogHandler::start_dump(const struct tm& /*t*/) {
     return -1;
+}
+
+void AgDspLogHandler::fill_header(uint8_t* buffer, size_t n, DspLogType type) {
+    const DspChunkHeader header = make_dsp_chunk_header(n, type, m_seq++);
+    memcpy(buffer, &header, sizeof(header));
+}
+
+int AgDspLogHandler::write_chunk(size_t n, DspLogType type) {
+    fill_header(s_io_buffer, n, type);
+    return storage()->write(s_io_buffer, n + DSP_CHUNK_HEADER_LEN);
+}
+
+void AgDspLogHandler::process(int /*events*/) {
+    const ssize_t n = read(m_fd, s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
+    if (n < 0) {
+        if (errno != EAGAIN && errno != EINTR) {
+            recover_dev();
+        }
+        return;
+    }
+    if (n == 0) {
+        err_log("AG-DSP log device driver bug: read returns 0");
+        return;
+    }
+    if (!storage() && create_storage() < 0) {
+        return;
+    }
+    if (write_chunk(static_cast<size_t>(n), DLT_LOG) < 0) {
+        err_log("%s save log error", name().string());
+    }
+}
+
+void AgDspLogHandler::notify_pcm(FileNotifier* notifier, void* client) {
+    static_cast<AgDspLogHandler*>(client)->save_audio_log(notifier, DLT_PCM);
+}
+
+void AgDspLogHandler::save_audio_log(FileNotifier* notifier, DspLogType type) {
+    const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
+    if (n < 0) {
+        if (errno != EAGAIN && errno != EINTR) {
+            err_log("read PCM device error");
+            notifier->close();
+        }
+        return;
+    }
+    if (!storage() && create_storage() < 0) {
+        err_log("create CpStorage error");
+        return;
+    }
+    if (write_chunk(static_cast<size_t>(n), type) < 0) {
+        err_log("%s save log error", name().string());
+    }
+}
+
+void AgDspLogHandler::notify_dump(FileNotifier* notifier, void* client) {
+    AgDspLogHandler* handler = static_cast<AgDspLogHandler*>(client);
+    info_log("AG-DSP %s assert", handler->name().string());
+    handler->save_dump(notifier);
+}
+
+void AgDspLogHandler::save_dump(FileNotifier* notifier) {
+    if (!storage() && create_storage() < 0) {
+        complete_dump(notifier->fd());
+        err_log("create AG-DSP CpStorage error");
+        return;
+    }
+    for (;;) {
+        const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
+        if (n < 0 && errno == EINTR) {
+            continue;
+        }
+        if (n < 0) {
+            err_log("read AG-DSP dump device error");
+            break;
+        }
+        if (n == 0) {
+            break;
+        }
+        const size_t len = static_cast<size_t>(n);
+        if (write_chunk(len, DLT_DUMP) != static_cast<int>(len + DSP_CHUNK_HEADER_LEN)) {
+            err_log("%s save AG-DSP dump error", name().string());
+            break;
+        }
+    }
+    complete_dump(notifier->fd());
+    flush();
 }

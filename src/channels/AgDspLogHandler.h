@@ -1,20 +1,45 @@
-// The log channel of the audio DSP. Its devices are not collected yet: start() refuses
-// and says so. Owned by the LogController.
+// The log channel of the audio DSP. It collects three sources, the log device, a PCM
+// capture device and a memory dump device, into the same rotating log files, each chunk
+// behind a DspChunkHeader. A readable dump device means that the DSP has asserted.
+// Owned by the LogController.
 #ifndef CHANNELS_AGDSPLOGHANDLER_H_
 #define CHANNELS_AGDSPLOGHANDLER_H_
 
+#include "channels/DspChunkHeader.h"
 #include "channels/LogPipeHandler.h"
+#include "storage/FileNotifier.h"
 
 class AgDspLogHandler : public LogPipeHandler {
 public:
+    enum DspLogType : uint8_t { DLT_LOG = 0, DLT_DUMP = 2, DLT_PCM = 3 };
+
     AgDspLogHandler(LogController* ctrl, Multiplexer* mux, const LogConfig::ConfigEntry* entry,
                     StorageManager* stor_mgr);
 
     int start() override;
     int stop() override;
+    void process(int events) override;
 
 protected:
     int start_dump(const struct tm& t) override;
+
+private:
+    // What fits into the shared buffer behind the header.
+    static constexpr size_t MAX_CHUNK = IO_BUFFER_SIZE - DSP_CHUNK_HEADER_LEN;
+
+    static void notify_pcm(FileNotifier* notifier, void* client);
+    static void notify_dump(FileNotifier* notifier, void* client);
+
+    void save_audio_log(FileNotifier* notifier, DspLogType type);
+    void save_dump(FileNotifier* notifier);
+    // Puts the header of a chunk of n data bytes at the start of the buffer.
+    void fill_header(uint8_t* buffer, size_t n, DspLogType type);
+    // Writes the chunk in the shared buffer, header and n data bytes; as CpStorage::write.
+    int write_chunk(size_t n, DspLogType type);
+
+    FileNotifier m_pcm_notifier;
+    FileNotifier m_dump_notifier;
+    uint32_t m_seq = 0;
 };
 
 #endif  // CHANNELS_AGDSPLOGHANDLER_H_

@@ -14,6 +14,9 @@ public:
 
 protected:
     int start_dump(const struct tm& t) override;
+
+private:
+    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
 };
 
 #endif  // CHANNELS_EXTWCNLOGHANDLER_H_

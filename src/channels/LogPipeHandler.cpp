@@ -36,10 +36,10 @@ LogPipeHandler::LogPipeHandler(LogController* ctrl, Multiplexer* mux,
       m_iq(this, ctrl, mux) {}
 
 LogPipeHandler::~LogPipeHandler() {
-    cancel_reopen();
     m_iq.stop();
     // The consumer may hold a file and a subscription of the storage.
     stop_transaction(CWS_NOT_WORKING);
+    cancel_reopen();
     if (m_storage) {
         m_stor_mgr->delete_storage(m_storage);
     }
@@ -74,6 +74,9 @@ void LogPipeHandler::close_dev() {
 void LogPipeHandler::poll_dev() {
     if (add_events(POLLIN) < 0) {
         err_log("can not poll the log device of %s", m_name.string());
+        // Open but never read it would stay silent for good.
+        close();
+        arm_reopen();
     }
 }
 
@@ -244,7 +247,9 @@ void LogPipeHandler::process_assert(bool save_md) {
         if (start_dump(t) == 0) {
             return;
         }
+        const int start_errno = errno;
         notify_cp_dump(CDE_END);
+        errno = start_errno;
         err_log("Start dump transaction error");
     }
     close_on_assert();

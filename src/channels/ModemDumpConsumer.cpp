@@ -12,8 +12,6 @@
 namespace {
 
 constexpr char DUMP_REQUEST[] = {'3', '\n'};
-constexpr char END_MARKER[] = "\nmodem_memdump_finish";
-constexpr size_t END_MARKER_LEN = sizeof(END_MARKER) - 1;
 
 }  // namespace
 
@@ -56,8 +54,8 @@ bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& b
         size_t frame_len;
         size_t used;
         if (m_parser.unescape(data, left, frame, frame_len, used) &&
-            frame_len == sizeof(DiagHeader) + END_MARKER_LEN &&
-            memcmp(frame + sizeof(DiagHeader), END_MARKER, END_MARKER_LEN) == 0) {
+            frame_len == sizeof(DiagHeader) + MODEM_DUMP_END_LEN &&
+            memcmp(frame + sizeof(DiagHeader), MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0) {
             found = true;
         }
         data += used;

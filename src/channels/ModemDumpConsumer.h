@@ -9,6 +9,10 @@
 #include "channels/DiagFrameParser.h"
 #include "core/TimerManager.h"
 
+// The payload of the frame that ends a dump.
+constexpr char MODEM_DUMP_END[] = "\nmodem_memdump_finish";
+constexpr size_t MODEM_DUMP_END_LEN = sizeof(MODEM_DUMP_END) - 1;
+
 class ModemDumpConsumer : public CpDumpConsumer {
 public:
     // A modem that is silent for this long has stopped.

@@ -1,29 +1,369 @@
 #include "iq/WcdmaIqManager.h"
 
+#include <errno.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/ioctl.h>
+#include <sys/mman.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
 #include "channels/LogPipeHandler.h"
+#include "core/Multiplexer.h"
 #include "core/log.h"
+#include "core/system_paths.h"
+#include "iq/IqStorRespHandler.h"
+#include "iq/iq_mem.h"
+#include "storage/CpDirectory.h"
+#include "storage/CpStorage.h"
+#include "storage/log_name.h"
+
+namespace {
+
+void set_nonblock(int fd) {
+    fcntl(fd, F_SETFL, fcntl(fd, F_GETFL) | O_NONBLOCK);
+}
+
+}  // namespace
 
 WcdmaIqManager::WcdmaIqManager(LogPipeHandler* channel, LogController* ctrl, Multiplexer* mux)
     : FdHandler(-1, ctrl, mux), m_channel(channel) {}
 
-int WcdmaIqManager::start(CpStorage* /*storage*/) {
-    errno = ENOSYS;
-    err_log("WCDMA I/Q capture of %s is not supported yet", m_channel->name().string());
-    return -1;
+WcdmaIqManager::~WcdmaIqManager() {
+    stop();
+}
+
+// ---- Start and stop
+
+int WcdmaIqManager::start(CpStorage* storage) {
+    if (m_state != IQS_IDLE || prepare_iq_mem_map() < 0) {
+        return -1;
+    }
+    m_storage = storage;
+    const bool thread_runs = start_save_thread() == 0;
+    // A device that is never polled would be a capture that silently does nothing.
+    if (!thread_runs || add_events(POLLIN) < 0) {
+        if (thread_runs) {
+            stop_save_thread();
+        }
+        release_iq_mem_map();
+        m_storage = nullptr;
+        return -1;
+    }
+    m_state = IQS_WAITING;
+    m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
+    return 0;
+}
+
+int WcdmaIqManager::prepare_iq_mem_map() {
+    m_fd = open(system_path(PATH_IQ_MEM).string(), O_RDONLY | O_CLOEXEC);
+    if (m_fd < 0) {
+        err_log("can not open /dev/iq_mem");
+        return -1;
+    }
+    if (ioctl(m_fd, CMD_SET_IQ_CH_TYPE, 1) < 0) {
+        const int ioctl_errno = errno;
+        close();
+        errno = ioctl_errno;
+        err_log("ioctl CMD_SET_IQ_CH_TYPE error");
+        return -1;
+    }
+    void* base = mmap(nullptr, IQ_MEM_SIZE, PROT_READ | PROT_WRITE, MAP_PRIVATE, m_fd, 0);
+    if (base == MAP_FAILED) {
+        const int mmap_errno = errno;
+        close();
+        errno = mmap_errno;
+        err_log("mmap error");
+        return -1;
+    }
+    m_mem_base = static_cast<uint8_t*>(base);
+    info_log("/dev/iq_mem mapped to %p", base);
+    return 0;
+}
+
+void WcdmaIqManager::release_iq_mem_map() {
+    ioctl(m_fd, CMD_SET_IQ_CH_TYPE, 0);
+    munmap(m_mem_base, IQ_MEM_SIZE);
+    m_mem_base = nullptr;
+    del_events(POLLIN);
+    close();
+}
+
+int WcdmaIqManager::start_save_thread() {
+    int pair[2];
+    if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, pair) < 0) {
+        return -1;
+    }
+    set_nonblock(pair[0]);
+    set_nonblock(pair[1]);
+    m_resp_handler = new IqStorRespHandler(pair[0], m_log_ctrl, m_multiplexer, this);
+    m_thread_sock = pair[1];
+    if (m_resp_handler->add_events(POLLIN) < 0 ||
+        pthread_create(&m_thread, nullptr, save_thread, this) != 0) {
+        delete m_resp_handler;
+        m_resp_handler = nullptr;
+        ::close(m_thread_sock);
+        m_thread_sock = -1;
+        return -1;
+    }
+    return 0;
+}
+
+void WcdmaIqManager::stop_save_thread() {
+    if (m_resp_handler->send_cmd(IQST_QUIT) < 0) {
+        // The thread takes the end of the connection for the same command.
+        shutdown(m_resp_handler->fd(), SHUT_WR);
+    }
+    while (m_resp_handler->wait_response() >= 0) {
+    }
+    pthread_join(m_thread, nullptr);
+    m_thread = 0;
+    delete m_resp_handler;
+    m_resp_handler = nullptr;
+    ::close(m_thread_sock);
+    m_thread_sock = -1;
 }
 
 int WcdmaIqManager::stop() {
+    if (m_state == IQS_IDLE) {
+        return 0;
+    }
+    m_storage->unsubscribe_ext_stor_umount_evt(this);
+    cancel_name_timer();
+    stop_save_thread();
+    settle_file();
+    m_storage = nullptr;
+    release_iq_mem_map();
+    m_state = IQS_IDLE;
     return 0;
 }
 
 int WcdmaIqManager::pause() {
-    return -1;
+    cancel_name_timer();
+    switch (m_state) {
+        case IQS_IDLE:
+            return -1;
+        case IQS_SAVING:
+            del_events(POLLIN);
+            wait_for_stop();
+            settle_file();
+            break;
+        case IQS_WAITING:
+            del_events(POLLIN);
+            break;
+        case IQS_PAUSED:
+            break;
+    }
+    m_state = IQS_PAUSED;
+    return 0;
 }
 
 int WcdmaIqManager::resume() {
-    return -1;
+    if (m_state == IQS_IDLE) {
+        return -1;
+    }
+    if (m_state == IQS_PAUSED) {
+        poll_device();
+        release_buffer();
+        m_state = IQS_WAITING;
+    }
+    return 0;
 }
 
-void WcdmaIqManager::clear_files() {}
+// ---- One buffer
 
-void WcdmaIqManager::process(int /*events*/) {}
+void WcdmaIqManager::poll_device() {
+    if (add_events(POLLIN) < 0) {
+        err_log("can not poll the I/Q memory device");
+    }
+}
+
+void WcdmaIqManager::release_buffer() {
+    ioctl(m_fd, CMD_RELEASE_IQ_BUF);
+}
+
+void WcdmaIqManager::process(int /*events*/) {
+    android::String8 name;
+    if (gen_iq_file_name(name) == 0 && name_in_use(name)) {
+        // File names tell seconds. The driver keeps the buffer until it is released, so a
+        // second one within the same second waits for a name of its own.
+        del_events(POLLIN);
+        m_name_timer = m_multiplexer->timer_mgr().create_timer(200, on_next_second, this);
+        if (m_name_timer) {
+            return;
+        }
+        poll_device();
+    }
+    m_cur_file = create_iq_file();
+    if (!m_cur_file) {
+        release_buffer();
+        err_log("create WCDMA I/Q file error");
+        return;
+    }
+    m_save_file = m_cur_file.get();
+    m_saved_bytes = 0;
+    if (m_resp_handler->send_cmd(IQST_SAVE) < 0) {
+        m_save_file = nullptr;
+        m_cur_file->dir()->remove_file(m_cur_file.get());
+        prune_files();
+        release_buffer();
+        return;
+    }
+    m_cur_file->set_destroy_hook(on_file_destroyed, this);
+    m_state = IQS_SAVING;
+    del_events(POLLIN);
+}
+
+void WcdmaIqManager::on_next_second(void* param) {
+    WcdmaIqManager* manager = static_cast<WcdmaIqManager*>(param);
+    manager->m_name_timer = nullptr;
+    if (manager->m_state == IQS_WAITING) {
+        manager->poll_device();
+    }
+}
+
+void WcdmaIqManager::cancel_name_timer() {
+    if (m_name_timer) {
+        m_multiplexer->timer_mgr().del_timer(m_name_timer);
+        m_name_timer = nullptr;
+    }
+}
+
+int WcdmaIqManager::gen_iq_file_name(android::String8& name) {
+    struct tm now;
+    if (get_local_time(now) < 0) {
+        return -1;
+    }
+    const LogTime t = LogTime::from_tm(now);
+    name = m_channel->name();
+    name.appendFormat("_wiq_%04d-%02d-%02d_%02d-%02d-%02d.bin", t.year, t.month, t.day, t.hour,
+                      t.minute, t.second);
+    return 0;
+}
+
+LogFile* WcdmaIqManager::create_iq_file() {
+    prune_files();
+    while (m_files.size() >= MAX_FILES) {
+        LogFile* oldest = m_files.begin()->get();
+        oldest->dir()->remove_file(oldest);
+        m_files.erase(m_files.begin());
+    }
+    android::String8 name;
+    if (gen_iq_file_name(name) < 0) {
+        return nullptr;
+    }
+    LogFile* file = m_storage->create_file(name, LT_WCDMA_IQ, MT_NONE);
+    if (file) {
+        m_files.push_back(FileRef(file));
+    }
+    return file;
+}
+
+// Entries whose file is gone are worth nothing.
+void WcdmaIqManager::prune_files() {
+    android::List<FileRef>::iterator it = m_files.begin();
+    while (it != m_files.end()) {
+        if (*it) {
+            ++it;
+        } else {
+            it = m_files.erase(it);
+        }
+    }
+}
+
+bool WcdmaIqManager::name_in_use(const android::String8& name) {
+    prune_files();
+    // Not the newest only: the clock may have been set back.
+    for (const FileRef& file : m_files) {
+        if (file->name() == name) {
+            return true;
+        }
+    }
+    return false;
+}
+
+size_t WcdmaIqManager::num_files() {
+    prune_files();
+    return m_files.size();
+}
+
+void WcdmaIqManager::clear_files() {
+    m_files.clear();
+}
+
+// Accounts for the file that the thread has written and closes it.
+void WcdmaIqManager::settle_file() {
+    m_save_file = nullptr;
+    if (m_cur_file) {
+        m_cur_file->set_destroy_hook(nullptr, nullptr);
+        m_cur_file->set_size(m_saved_bytes);
+        m_cur_file->close();
+        m_cur_file = nullptr;
+    }
+}
+
+void WcdmaIqManager::process_stor_response(int response) {
+    if (response == IQST_SAVED && m_state == IQS_SAVING) {
+        info_log("WCDMA I/Q saved");
+        settle_file();
+        poll_device();
+        m_state = IQS_WAITING;
+        release_buffer();
+    } else if (response == IQST_SAVED) {
+        err_log("IQST_SAVED received in state %d", m_state);
+    } else {
+        err_log("response %d received in state %d", response, m_state);
+    }
+}
+
+// Makes the thread stop saving; a response to a save that ended by itself is dropped.
+void WcdmaIqManager::wait_for_stop() {
+    const bool sent = m_resp_handler->send_cmd(IQST_STOP) == 0;
+    if (!sent) {
+        err_log("can not stop saving WCDMA I/Q");
+    }
+    int response;
+    do {
+        response = m_resp_handler->wait_response();
+    } while (response >= 0 && response != IQST_STOPPED && (sent || response != IQST_SAVED));
+    if (response < 0) {
+        err_log("I/Q saving thread is gone");
+    }
+}
+
+int WcdmaIqManager::cancel_save() {
+    wait_for_stop();
+    m_save_file = nullptr;
+    if (m_cur_file) {
+        m_cur_file->set_destroy_hook(nullptr, nullptr);
+        m_cur_file->close();
+        m_cur_file = nullptr;
+    }
+    clear_files();
+    release_buffer();
+    poll_device();
+    m_state = IQS_WAITING;
+    return 0;
+}
+
+void WcdmaIqManager::on_ext_stor_umount(void* param) {
+    WcdmaIqManager* manager = static_cast<WcdmaIqManager*>(param);
+    if (manager->m_state == IQS_SAVING) {
+        manager->cancel_save();
+    }
+}
+
+// The file being saved goes with its set or directory: the thread lets go of it first.
+void WcdmaIqManager::on_file_destroyed(void* param) {
+    WcdmaIqManager* manager = static_cast<WcdmaIqManager*>(param);
+    if (manager->m_state != IQS_SAVING) {
+        return;
+    }
+    info_log("WCDMA I/Q file is gone, its save ends");
+    manager->wait_for_stop();
+    manager->m_save_file = nullptr;
+    manager->m_cur_file = nullptr;
+    manager->release_buffer();
+    manager->poll_device();
+    manager->m_state = IQS_WAITING;
+}

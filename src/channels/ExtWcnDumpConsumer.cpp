@@ -1,0 +1,60 @@
+#include "channels/ExtWcnDumpConsumer.h"
+
+#include <poll.h>
+
+#include "core/log.h"
+#include "core/text.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+constexpr char END_MARKER[] = "corbet_memdump_finish";
+constexpr size_t END_MARKER_LEN = sizeof(END_MARKER) - 1;
+// The marker comes in a short chunk. In a longer one the same bytes are memory content.
+constexpr size_t MARKER_CHUNK_LIMIT = 4096;
+
+}  // namespace
+
+ExtWcnDumpConsumer::ExtWcnDumpConsumer(const char* cp_name, CpStorage* storage,
+                                       const struct tm& dump_time)
+    : CpDumpConsumer(cp_name, storage, dump_time) {}
+
+ExtWcnDumpConsumer::~ExtWcnDumpConsumer() {
+    m_storage->unsubscribe_ext_stor_umount_evt(this);
+}
+
+int ExtWcnDumpConsumer::start() {
+    if (!open_dump_file()) {
+        err_log("open dump file failed!");
+        return -1;
+    }
+    m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
+    return 0;
+}
+
+bool ExtWcnDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
+    if (buf.data_len < MARKER_CHUNK_LIMIT &&
+        find_bytes(buf.data(), buf.data_len, END_MARKER, END_MARKER_LEN)) {
+        m_handler->del_events(POLLIN);
+        buf.consume_all();
+        close_dump_file();
+        notify_result(LPR_SUCCESS);
+        return true;
+    }
+    const size_t len = buf.data_len;
+    const ssize_t written = write_dump(buf.data(), len);
+    buf.consume_all();
+    if (written < static_cast<ssize_t>(len)) {
+        m_handler->del_events(POLLIN);
+        discard_dump_file();
+        notify_result(LPR_FAILURE);
+        return true;
+    }
+    return false;
+}
+
+void ExtWcnDumpConsumer::on_ext_stor_umount(void* param) {
+    ExtWcnDumpConsumer* consumer = static_cast<ExtWcnDumpConsumer*>(param);
+    info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
+    consumer->notify_result(LPR_FAILURE);
+}

@@ -1,0 +1,249 @@
+// The part of WanModemLogHandler that keeps the modem's log parsing database beside its
+// logs: taken from the firmware image, with the digest that tells whether it is current.
+#include <cutils/properties.h>
+#include <fcntl.h>
+#include <stdio.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "channels/ModemImage.h"
+#include "channels/WanModemLogHandler.h"
+#include "config/property_names.h"
+#include "core/log.h"
+#include "storage/CpStorage.h"
+#include "storage/MediaStorage.h"
+
+namespace {
+
+constexpr char DB_FILE_NAME[] = "/modem_db.gz";
+constexpr char SHA1_FILE_NAME[] = "/sha1.txt";
+constexpr int LIB_FILE_FLAGS = O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC;
+// An image has a handful of entries; a table that goes on for longer is garbage.
+constexpr int MAX_ENTRIES = 1024;
+constexpr size_t COPY_SIZE = 32768;
+
+int copy_bytes(int src, int dst, size_t n) {
+    static uint8_t buffer[COPY_SIZE];
+    size_t copied = 0;
+    while (copied < n) {
+        const size_t rest = n - copied;
+        const ssize_t num = read(src, buffer, rest < COPY_SIZE ? rest : COPY_SIZE);
+        if (num < 0) {
+            return -1;
+        }
+        if (num == 0) {
+            return 0;
+        }
+        if (write(dst, buffer, static_cast<size_t>(num)) != num) {
+            return -1;
+        }
+        copied += static_cast<size_t>(num);
+    }
+    return 0;
+}
+
+}  // namespace
+
+int WanModemLogHandler::get_image_path(CpType type, char* buf, size_t size) {
+    char partition[PROPERTY_VALUE_MAX];
+    property_get(PROP_PARTITION_PATH, partition, "");
+    if (!partition[0]) {
+        err_log("no ro.product.partitionpath property");
+        return -1;
+    }
+    char prop[32];
+    snprintf(prop, sizeof(prop), "%s%s", PROP_MODEM_PREFIX, cp_image_prop_suffix(type));
+    char value[PROPERTY_VALUE_MAX];
+    property_get(prop, value, "");
+    if (!value[0]) {
+        err_log("no %s property", prop);
+        return -1;
+    }
+    const int len = snprintf(buf, size, "%s%smodem", partition, value);
+    if (len < 0 || static_cast<size_t>(len) >= size) {
+        // A path cut short could name another file.
+        errno = ENAMETOOLONG;
+        err_log("MODEM image path %s%smodem too long", partition, value);
+        return -1;
+    }
+    return 0;
+}
+
+int WanModemLogHandler::open_modem_img() {
+    const CpType type = LogConfig::wan_modem_type();
+    if (type == CT_UNKNOWN) {
+        err_log("can not get MODEM type");
+        return -1;
+    }
+    char path[128];
+    if (get_image_path(type, path, sizeof(path)) < 0) {
+        err_log("can not get MODEM image file path");
+        return -1;
+    }
+    return open(path, O_RDONLY | O_CLOEXEC);
+}
+
+int WanModemLogHandler::get_modem_img(int fd, uint8_t* sha1_hex, size_t& offset, size_t& size) {
+    struct {
+        ModemImageHeader header;
+        ModemImageEntry entry;
+    } head;
+    static_assert(sizeof(head) == sizeof(ModemImageHeader) + sizeof(ModemImageEntry), "packed");
+    // A block device has a length too, but only lseek tells it.
+    const off_t image_len = lseek(fd, 0, SEEK_END);
+    lseek(fd, 0, SEEK_SET);
+    if (read(fd, &head, sizeof(head)) != static_cast<ssize_t>(sizeof(head))) {
+        err_log("MODEM image length less than two headers");
+        return -1;
+    }
+    if (memcmp(head.header.magic, MODEM_IMAGE_MAGIC, sizeof(head.header.magic)) != 0) {
+        err_log("MODEM image not VHX1 format");
+        return -1;
+    }
+    ModemImageEntry& entry = head.entry;
+    for (int num = 1; entry.type != MODEM_IMAGE_PARSING_DB; ++num) {
+        if (entry.flags & MODEM_IMAGE_LAST_ENTRY) {
+            return -1;
+        }
+        if (num == MAX_ENTRIES) {
+            err_log("MODEM image has more than %d headers", MAX_ENTRIES);
+            return -1;
+        }
+        const ssize_t n = read(fd, &entry, sizeof(entry));
+        if (n != static_cast<ssize_t>(sizeof(entry))) {
+            err_log("can not read more headers %d", static_cast<int>(n));
+            return -1;
+        }
+    }
+    if (!(entry.flags & MODEM_IMAGE_HAS_SHA1)) {
+        err_log("MODEM image has no SHA-1 checksum");
+        return -1;
+    }
+    if (lseek(fd, static_cast<off_t>(entry.offset), SEEK_SET) != static_cast<off_t>(entry.offset)) {
+        err_log("lseek MODEM image error");
+        return -1;
+    }
+    uint8_t sha1[SHA1_LEN];
+    const ssize_t n = read(fd, sha1, sizeof(sha1));
+    if (n != static_cast<ssize_t>(sizeof(sha1))) {
+        err_log("read SHA-1 error %d", static_cast<int>(n));
+        return -1;
+    }
+    const uint64_t end = static_cast<uint64_t>(entry.offset) + entry.size;
+    if (entry.size < SHA1_LEN || image_len < 0 || end > static_cast<uint64_t>(image_len) ||
+        end > SIZE_MAX) {
+        err_log("MODEM image entry at %u size %u is not within the image", entry.offset,
+                entry.size);
+        return -1;
+    }
+    offset = static_cast<size_t>(entry.offset) + SHA1_LEN;
+    size = entry.size - SHA1_LEN;
+    static const char DIGITS[] = "0123456789ABCDEF";
+    for (size_t i = 0; i < SHA1_LEN; ++i) {
+        sha1_hex[2 * i] = static_cast<uint8_t>(DIGITS[sha1[i] >> 4]);
+        sha1_hex[2 * i + 1] = static_cast<uint8_t>(DIGITS[sha1[i] & 0x0F]);
+    }
+    return 0;
+}
+
+int WanModemLogHandler::check_cur_parsing_lib(const android::String8& db_path,
+                                              const android::String8& sha1_path, uint8_t* sha1_hex,
+                                              size_t& size) {
+    struct stat st;
+    if (lstat(db_path.string(), &st) < 0) {
+        err_log("lstat(%s) error", db_path.string());
+        return -1;
+    }
+    const int fd = open(sha1_path.string(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) {
+        err_log("open(%s) error", sha1_path.string());
+        return -1;
+    }
+    const ssize_t n = read(fd, sha1_hex, SHA1_HEX_LEN);
+    ::close(fd);
+    if (n != static_cast<ssize_t>(SHA1_HEX_LEN)) {
+        err_log("read SHA-1 file error: %d", static_cast<int>(n));
+        return -1;
+    }
+    size = static_cast<size_t>(st.st_size);
+    return 0;
+}
+
+int WanModemLogHandler::save_log_lib(const android::String8& db_path,
+                                     const android::String8& sha1_path, int fd, size_t offset,
+                                     size_t size, const uint8_t* sha1_hex) {
+    if (lseek(fd, static_cast<off_t>(offset), SEEK_SET) != static_cast<off_t>(offset)) {
+        err_log("seek MODEM image file %u error", static_cast<unsigned int>(offset));
+        return -1;
+    }
+    const int db = open(db_path.string(), LIB_FILE_FLAGS, 0644);
+    if (db < 0) {
+        err_log("open %s failed", db_path.string());
+        return -1;
+    }
+    const int copied = copy_bytes(fd, db, size);
+    // What the medium could not take may come out only now.
+    const int closed = ::close(db);
+    if (copied < 0 || closed < 0) {
+        err_log("save parsing lib error");
+        unlink(db_path.string());
+        return -1;
+    }
+    const int sha1 = open(sha1_path.string(), LIB_FILE_FLAGS, 0644);
+    if (sha1 < 0) {
+        err_log("create SHA-1 file error");
+        unlink(db_path.string());
+        return -1;
+    }
+    const ssize_t n = write(sha1, sha1_hex, SHA1_HEX_LEN);
+    const int sha1_closed = ::close(sha1);
+    if (n != static_cast<ssize_t>(SHA1_HEX_LEN) || sha1_closed < 0) {
+        err_log("write SHA-1 file error %d", static_cast<int>(n));
+        unlink(sha1_path.string());
+        unlink(db_path.string());
+        return -1;
+    }
+    return 0;
+}
+
+int WanModemLogHandler::save_log_parsing_lib(MediaStorage& media) {
+    android::String8 db_path(media.log_root());
+    db_path.append(DB_FILE_NAME);
+    android::String8 sha1_path(media.log_root());
+    sha1_path.append(SHA1_FILE_NAME);
+
+    uint8_t saved_sha1[SHA1_HEX_LEN];
+    size_t saved_size = 0;
+    const bool saved = check_cur_parsing_lib(db_path, sha1_path, saved_sha1, saved_size) == 0;
+    const int fd = open_modem_img();
+    if (fd < 0) {
+        err_log("open MODEM image failed");
+        return -1;
+    }
+    uint8_t sha1[SHA1_HEX_LEN];
+    size_t offset = 0;
+    size_t size = 0;
+    if (get_modem_img(fd, sha1, offset, size) < 0) {
+        ::close(fd);
+        err_log("get MODEM image info error");
+        return -1;
+    }
+    int result = 0;
+    if (!saved || saved_size != size || memcmp(saved_sha1, sha1, SHA1_HEX_LEN) != 0) {
+        result = save_log_lib(db_path, sha1_path, fd, offset, size, sha1);
+    }
+    ::close(fd);
+    return result;
+}
+
+void WanModemLogHandler::save_current_parsing_lib() {
+    MediaStorage* media = stor_mgr()->get_media_stor();
+    if (media) {
+        save_log_parsing_lib(*media);
+    }
+}
+
+void WanModemLogHandler::on_media_change(void* handler, MediaType /*type*/) {
+    static_cast<WanModemLogHandler*>(handler)->save_current_parsing_lib();
+}
