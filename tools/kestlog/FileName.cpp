@@ -1,0 +1,147 @@
+#include "kestlog/FileName.h"
+
+#include <stdio.h>
+#include <string.h>
+
+#include <algorithm>
+
+namespace {
+
+constexpr size_t STAMP_LEN = 19;
+
+struct Form {
+    LogType type;
+    const char* kind;
+    const char* head;  // before the time
+    const char* tail;  // behind it
+    bool cp;           // the CP's name stands before the head
+    bool stamp;
+};
+
+// clang-format off
+constexpr Form FORMS[] = {
+    {LT_LOG,       "log",         "-",          ".log",     true,  true},
+    {LT_DUMP,      "memory dump", "_memory_",   ".dmp",     true,  true},
+    {LT_DUMP,      "memory copy", "_memory_",   ".mem",     true,  true},
+    {LT_RINGBUF,   "ring buffer", "_ringbuf_",  ".log",     true,  true},
+    {LT_SLEEP_LOG, "sleep log",   "_sleeplog_", ".log",     true,  true},
+    {LT_WCDMA_IQ,  "I/Q samples", "_wiq_",      ".bin",     true,  true},
+    {LT_VERSION,   "version",     "",           ".version", true,  false},
+    {LT_MINI_DUMP, "mini dump",   "mini_dump_", ".bin",     false, true},
+    {LT_IPC_INFO,  "IPC record",  "smsg_",      ".log",     false, true},
+    {LT_IPC_INFO,  "IPC record",  "sbuf_",      ".log",     false, true},
+    {LT_IPC_INFO,  "IPC record",  "sblock_",    ".log",     false, true},
+};
+// clang-format on
+
+// In the form of names, with that character between date and time; "" when no calendar
+// has such a time.
+std::string stamp(const LogTime& t, char middle, char colon) {
+    if (t.month < 1 || t.month > 12 || t.day < 1 || t.day > 31 || t.hour > 23 || t.minute > 59 ||
+        t.second > 60) {
+        return "";
+    }
+    char text[64];
+    snprintf(text, sizeof(text), "%04d-%02d-%02d%c%02d%c%02d%c%02d", t.year, t.month, t.day, middle,
+             t.hour, colon, t.minute, colon, t.second);
+    return text;
+}
+
+// A time in the form of file names, read by the parser of log names.
+bool parse_stamp(const std::string& text, LogTime* time) {
+    const std::string name = "0-" + text;
+    return parse_log_name(name.data(), name.size(), *time) == LT_LOG;
+}
+
+bool cut_tail(std::string* text, const std::string& tail) {
+    if (text->size() < tail.size() ||
+        text->compare(text->size() - tail.size(), tail.size(), tail) != 0) {
+        return false;
+    }
+    text->resize(text->size() - tail.size());
+    return true;
+}
+
+// Takes the rotation number off the front.
+bool cut_number(std::string* text, uint32_t* number) {
+    size_t digits;
+    if (parse_log_number(android::String8(text->c_str()), *number, digits) < 0) {
+        return false;
+    }
+    const bool exact = text->compare(0, digits, std::to_string(*number)) == 0;
+    text->erase(0, digits + 1);
+    return exact;
+}
+
+bool match(const Form& form, FileName* name) {
+    std::string rest = name->text;
+    LogTime time;
+    if (!cut_tail(&rest, form.tail)) {
+        return false;
+    }
+    if (form.stamp) {
+        const std::string text = rest.substr(rest.size() - std::min(rest.size(), STAMP_LEN));
+        if (!parse_stamp(text, &time) || stamp(time, '_', '-') != text) {
+            return false;
+        }
+        rest.resize(rest.size() - STAMP_LEN);
+    }
+    uint32_t number = 0;
+    if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &number)) ||
+        (form.cp ? cp_type_of(rest) == CT_UNKNOWN : !rest.empty())) {
+        return false;
+    }
+    name->type = form.type;
+    name->kind = form.kind;
+    name->cp = rest;
+    name->cp_type = cp_type_of(rest);
+    name->number = number;
+    name->time = time;
+    return true;
+}
+
+}  // namespace
+
+FileName::FileName(const std::string& name) : text(name) {
+    if (name == DATABASE_NAME || name == DIGEST_NAME) {
+        kind = name == DIGEST_NAME ? "database digest" : "parsing database";
+        exact = true;
+        return;
+    }
+    for (const Form& form : FORMS) {
+        if (match(form, this)) {
+            exact = true;
+            framed_dump = of_modem() && strcmp(form.tail, ".dmp") == 0;
+            return;
+        }
+    }
+    // Not ours, yet the service takes it for something.
+    type = parse_log_name(name.data(), name.size(), time);
+    for (const Form& form : FORMS) {
+        if (form.type == type) {
+            kind = form.kind;
+            break;
+        }
+    }
+    size_t digits;
+    if (is_log() && parse_log_number(android::String8(name.c_str()), number, digits) < 0) {
+        type = LT_UNKNOWN;
+    }
+}
+
+bool has_time(const LogTime& time) {
+    return LogTime() < time;
+}
+
+std::string time_text(const LogTime& time) {
+    const std::string text = stamp(time, ' ', ':');
+    return text.empty() ? "-" : text;
+}
+
+bool parse_set_name(const std::string& name, LogTime* time) {
+    return name.size() == STAMP_LEN && parse_stamp(name, time) && stamp(*time, '-', '-') == name;
+}
+
+CpType cp_type_of(const std::string& cp) {
+    return cp_type_from_name(cp.data(), cp.size());
+}

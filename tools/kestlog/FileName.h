@@ -1,0 +1,41 @@
+// What the name of a file of the log tree tells. The service's own parsers take a name
+// for what it may be, here it has to be exactly one that the service gives.
+#ifndef KESTLOG_FILENAME_H_
+#define KESTLOG_FILENAME_H_
+
+#include <string>
+
+#include "config/CpType.h"
+#include "storage/log_name.h"
+
+constexpr char DATABASE_NAME[] = "modem_db.gz";
+constexpr char DIGEST_NAME[] = "sha1.txt";
+
+struct FileName {
+    explicit FileName(const std::string& name);
+
+    // A modem's log files begin with a time record, its dump consists of frames.
+    bool of_modem() const { return cp_type >= CT_WCDMA && cp_type <= CT_5MODE; }
+    bool is_log() const { return type == LT_LOG; }
+
+    std::string text;
+    bool exact = false;  // the name is one that the service gives
+    LogType type = LT_UNKNOWN;
+    const char* kind = "unknown";  // in words; a memory dump and its substitute differ
+    bool framed_dump = false;      // a memory dump as it came over the diag device
+    std::string cp;                // name in it, or ""
+    CpType cp_type = CT_UNKNOWN;
+    uint32_t number = 0;  // of a log file
+    LogTime time;
+};
+
+bool has_time(const LogTime& time);
+// "2016-03-01 09:15:00", or "-" without a time.
+std::string time_text(const LogTime& time);
+
+// Is the name that of a set directory? Stores its time.
+bool parse_set_name(const std::string& name, LogTime* time);
+
+CpType cp_type_of(const std::string& cp);
+
+#endif  // KESTLOG_FILENAME_H_

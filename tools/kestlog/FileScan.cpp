@@ -1,0 +1,329 @@
+#include "kestlog/FileScan.h"
+
+#include <cutils/properties.h>
+#include <string.h>
+
+#include <algorithm>
+
+#include "channels/AgDspLogHandler.h"
+#include "channels/DiagFrameParser.h"
+#include "channels/ModemDumpConsumer.h"
+#include "channels/ModemImage.h"
+#include "core/text.h"
+
+const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
+
+namespace {
+
+// A dump that was written to so short a time ago may still be coming in.
+constexpr time_t DUMP_IDLE_SECONDS = 10;
+
+bool begins_with_magic(const uint8_t* data, size_t len) {
+    const uint32_t magic = TIME_SYNC_MAGIC;
+    return len > 0 && memcmp(data, &magic, std::min(len, sizeof(magic))) == 0;
+}
+
+int chunk_kind(const DspChunkHeader& header) {
+    static const uint8_t TYPES[CK_NUM] = {AgDspLogHandler::DLT_LOG, AgDspLogHandler::DLT_PCM,
+                                          AgDspLogHandler::DLT_DUMP};
+    for (int i = 0; i < CK_NUM; ++i) {
+        if (header.sub_type == (TYPES[i] | DSP_CHUNK_SUB_TYPE)) {
+            return i;
+        }
+    }
+    return -1;
+}
+
+// What is wrong with a chunk's header, or null; stores the length of the chunk's data.
+const char* chunk_fault(const DspChunkHeader& header, size_t* data_len) {
+    const uint16_t least = make_dsp_chunk_header(0, 0, 0).len;
+    *data_len = header.len >= least ? static_cast<size_t>(header.len - least) : 0;
+    const DspChunkHeader good = make_dsp_chunk_header(*data_len, 0, 0);
+    if (memcmp(header.flags, good.flags, sizeof(good.flags)) != 0) {
+        return "flags";
+    }
+    if (header.mark != good.mark) {
+        return "mark";
+    }
+    if (header.len < least) {
+        return "length";
+    }
+    if (header.checksum != good.checksum) {
+        return "checksum";
+    }
+    if (header.reserved != good.reserved) {
+        return "reserved field";
+    }
+    if (header.diag_len != good.diag_len) {
+        return "second length";
+    }
+    return header.type != good.type || chunk_kind(header) < 0 ? "type" : nullptr;
+}
+
+class Scanner {
+public:
+    Scanner(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report)
+        : m_in(in), m_name(name), m_visit(visit), m_report(*report) {}
+
+    void run() {
+        size_t got;
+        m_in.peek(1, got);
+        if (got == 0) {
+            m_report.add(false, "empty", "the file is empty");
+        }
+        const bool raw = strcmp(m_name.kind, "memory copy") == 0 || m_name.type == LT_MINI_DUMP ||
+                         m_name.type == LT_IPC_INFO || m_name.type == LT_WCDMA_IQ ||
+                         m_name.text == DATABASE_NAME ||
+                         (m_name.type == LT_DUMP && m_name.exact && !m_name.framed_dump);
+        m_report.chunked = is_chunked(m_in, m_name);
+        if (got == 0 || raw) {
+            return;
+        }
+        if (m_name.type == LT_VERSION) {
+            check_version();
+        } else if (m_name.text == DIGEST_NAME) {
+            check_digest();
+        } else {
+            take_record();
+            m_report.chunked ? scan_chunks() : scan_frames();
+        }
+    }
+
+private:
+    int64_t here() const { return static_cast<int64_t>(m_in.offset()); }
+
+    void check_version() {
+        if (m_in.size() >= PROPERTY_VALUE_MAX) {
+            m_report.add(true, "version", "a version record is not that long");
+        }
+    }
+
+    void check_digest() {
+        size_t got;
+        const uint8_t* data = m_in.peek(SHA1_HEX_LEN + 1, got);
+        if (got != SHA1_HEX_LEN || !std::all_of(data, data + got, [](uint8_t c) {
+                return (c >= '0' && c <= '9') || (c >= 'A' && c <= 'F');
+            })) {
+            m_report.add(true, "digest",
+                         "not " + std::to_string(SHA1_HEX_LEN) + " upper-case hexadecimal digits");
+        }
+    }
+
+    // Any log may begin with a time record, a modem's should.
+    void take_record() {
+        size_t got;
+        const uint8_t* data = m_in.peek(sizeof(TimeSyncRecord), got);
+        if (m_name.type == LT_DUMP) {
+            return;
+        }
+        const bool due = m_name.is_log() && m_name.of_modem();
+        if (!begins_with_magic(data, got) || (got < sizeof(TimeSyncRecord) && !due)) {
+            if (due) {
+                m_report.add(false, "record", "no time record at the start");
+            }
+        } else if (got < sizeof(TimeSyncRecord)) {
+            m_report.add(true, "record", "the time record is cut off", here());
+            m_report.other += got;
+            m_in.skip(got);
+        } else {
+            m_report.has_record = true;
+            memcpy(&m_report.record, data, sizeof(TimeSyncRecord));
+            m_in.skip(sizeof(TimeSyncRecord));
+        }
+    }
+
+    void scan_frames() {
+        uint64_t first_broken = 0;
+        m_report.other += m_in.size() - m_in.offset();
+        for (size_t got; !m_stop;) {
+            const uint8_t* data = m_in.peek(1, got);
+            if (got == 0) {
+                break;
+            }
+            uint8_t* body;
+            size_t len;
+            size_t used;
+            if (!m_parser.unescape(data, got, body, len, used)) {
+                m_in.skip(used);
+                continue;
+            }
+            const uint64_t end = m_in.offset() + used;
+            const uint64_t size = DiagFrameParser::escape(body, len, m_raw) + 2;
+            if (take_frame(end > size ? end - size : 0, body, len)) {
+                m_report.other -= std::min(m_report.other, size);
+            } else {
+                first_broken = m_report.broken++ ? first_broken : end - size;
+                // The flag that ended what is no frame may well begin one.
+                m_parser.init();
+                --used;
+            }
+            m_in.skip(used);
+        }
+        if (!m_name.framed_dump || m_stop) {
+            return;
+        }
+        if (m_report.broken) {
+            m_report.add(true, "frame",
+                         std::to_string(m_report.broken) + " frames with a wrong length",
+                         static_cast<int64_t>(first_broken));
+        } else if (m_report.other) {
+            m_report.add(false, "frame",
+                         std::to_string(m_report.other) + " bytes are outside frames");
+        }
+        if (!m_report.end_marker) {
+            const bool recent = time(nullptr) - m_in.modified() < DUMP_IDLE_SECONDS;
+            m_report.add(!recent, "end", recent ? "the dump is going on" : "the dump has no end");
+        }
+    }
+
+    // True for an intact frame.
+    bool take_frame(uint64_t offset, const uint8_t* body, size_t len) {
+        DiagHeader header{};
+        Piece piece{};
+        piece.offset = offset;
+        if (len >= sizeof(header)) {
+            memcpy(&header, body, sizeof(header));
+            piece.data = body + sizeof(header);
+            piece.data_len = len - sizeof(header);
+            const bool end = m_name.framed_dump && piece.data_len == MODEM_DUMP_END_LEN &&
+                             memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0;
+            m_report.end_marker |= end;
+            piece.intact = header.len == len || end;
+        }
+        piece.seq_num = header.seq_num;
+        piece.len_field = header.len;
+        piece.type = header.type;
+        piece.sub_type = header.sub_type;
+        if (piece.intact) {
+            ++m_report.frames;
+            m_report.payload += piece.data_len;
+        }
+        m_stop = m_visit && !m_visit(piece);
+        return piece.intact;
+    }
+
+    void scan_chunks() {
+        bool follows = false;
+        uint32_t next_seq = 0;
+        for (DspChunkHeader header; !m_stop;) {
+            size_t got;
+            size_t len;
+            const uint8_t* data = m_in.peek(sizeof(header), got);
+            if (got == 0) {
+                return;
+            }
+            memset(header.flags, DSP_CHUNK_FLAG, sizeof(header.flags));
+            if (got < sizeof(header)) {
+                if (memcmp(data, header.flags, std::min(got, sizeof(header.flags))) == 0) {
+                    cut_off(got);
+                } else {
+                    m_report.add(true, "chunk", "what follows is no chunk", here());
+                    m_report.other += got;
+                }
+                return;
+            }
+            memcpy(&header, data, sizeof(header));
+            if (const char* fault = chunk_fault(header, &len)) {
+                m_report.add(true, "chunk", std::string("chunk header with a wrong ") + fault,
+                             here());
+                find_chunk();
+                continue;
+            }
+            data = m_in.peek(sizeof(header) + len, got);
+            if (got < sizeof(header) + len) {
+                return cut_off(got);
+            }
+            if (follows && header.seq_num != next_seq) {
+                ++m_report.sequence_gaps;
+                m_report.add(false, "sequence",
+                             "chunk " + std::to_string(header.seq_num) + " follows where " +
+                                 std::to_string(next_seq) + " should",
+                             here());
+            }
+            follows = true;
+            next_seq = header.seq_num + 1;
+            take_chunk(header, data + sizeof(header), len);
+            m_in.skip(sizeof(header) + len);
+        }
+    }
+
+    void take_chunk(const DspChunkHeader& header, const uint8_t* data, size_t len) {
+        const int kind = chunk_kind(header);
+        ++m_report.chunks[kind].count;
+        m_report.chunks[kind].bytes += len;
+        m_report.payload += len;
+        m_stop = m_visit && !m_visit({m_in.offset(), header.seq_num, header.diag_len, header.type,
+                                      header.sub_type, data, len, true, CHUNK_KINDS[kind]});
+    }
+
+    // The newest file of a CP may be one that is being written.
+    void cut_off(size_t left) {
+        const bool newest = m_name.is_log() && m_name.number == 0;
+        m_report.add(!newest, "cut",
+                     newest ? "the last chunk is unfinished" : "the last chunk is cut off", here());
+        m_report.other += left;
+    }
+
+    // Goes on to the next good header, or to the end.
+    void find_chunk() {
+        DspChunkHeader header;
+        size_t len;
+        uint8_t flags[sizeof(header.flags)];
+        memset(flags, DSP_CHUNK_FLAG, sizeof(flags));
+        for (size_t pass = 1;;) {
+            m_in.skip(pass);
+            m_report.other += pass;
+            size_t got;
+            const uint8_t* data = m_in.peek(sizeof(header), got);
+            if (got < sizeof(header)) {
+                m_report.other += got;
+                m_in.skip(got);
+                return;
+            }
+            memcpy(&header, data, sizeof(header));
+            if (!chunk_fault(header, &len)) {
+                return;
+            }
+            const uint8_t* next = find_bytes(data + 1, got - 1, flags, sizeof(flags));
+            pass = next ? static_cast<size_t>(next - data) : got - (sizeof(flags) - 1);
+        }
+    }
+
+    LogReader& m_in;
+    const FileName& m_name;
+    const PieceVisitor& m_visit;
+    FileReport& m_report;
+    bool m_stop = false;
+    DiagFrameParser m_parser;
+    uint8_t m_raw[2 * DiagFrameParser::MAX_FRAME];
+};
+
+}  // namespace
+
+void FileReport::add(bool damage, const char* code, const std::string& words, int64_t offset) {
+    damaged |= damage;
+    if (findings.size() < MAX_FINDINGS) {
+        findings.push_back({damage, code, words, offset});
+    } else {
+        ++more_findings;
+    }
+}
+
+bool is_chunked(LogReader& in, const FileName& name) {
+    if (name.exact) {
+        return name.is_log() && name.cp_type == CT_AGDSP;
+    }
+    DspChunkHeader header;
+    size_t got;
+    size_t len;
+    const uint8_t* data = in.peek(sizeof(header), got);
+    if (got < sizeof(header)) {
+        return false;
+    }
+    memcpy(&header, data, sizeof(header));
+    return !chunk_fault(header, &len);
+}
+
+void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report) {
+    Scanner(in, name, visit, report).run();
+}

@@ -1,0 +1,70 @@
+// The content of one file: its time record, its frames or its audio DSP chunks, and what
+// is wrong with it. A CP's log may hold anything, so bytes that are no frame are counted
+// but no damage; an audio DSP log is chunks and nothing else.
+#ifndef KESTLOG_FILESCAN_H_
+#define KESTLOG_FILESCAN_H_
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "channels/TimeSyncRecord.h"
+#include "kestlog/FileName.h"
+#include "kestlog/LogReader.h"
+
+struct Finding {
+    bool damage;  // or only a note
+    const char* code;
+    std::string words;
+    int64_t offset;  // in the file; -1 without one
+};
+
+// A diag frame or a chunk.
+struct Piece {
+    uint64_t offset;
+    uint32_t seq_num;
+    size_t len_field;  // what the header says of the header and data
+    uint8_t type;
+    uint8_t sub_type;
+    const uint8_t* data;  // behind the header
+    size_t data_len;
+    bool intact;       // the header's length is the right one
+    const char* kind;  // of a chunk, else null
+};
+
+// Kinds of chunks, as indices.
+enum ChunkKind : int { CK_LOG, CK_PCM, CK_DUMP, CK_NUM };
+extern const char* const CHUNK_KINDS[CK_NUM];  // their names
+
+struct FileReport {
+    bool chunked = false;  // an audio DSP log, else frames or anything
+    bool has_record = false;
+    TimeSyncRecord record{};
+    uint64_t frames = 0;   // intact
+    uint64_t broken = 0;   // bytes between flags whose length is another
+    uint64_t payload = 0;  // of intact frames or chunks, without headers
+    uint64_t other = 0;    // bytes that belong to no intact frame or chunk
+    bool end_marker = false;
+    struct {
+        uint64_t count = 0;
+        uint64_t bytes = 0;
+    } chunks[CK_NUM];
+    uint64_t sequence_gaps = 0;
+    std::vector<Finding> findings;  // the first MAX_FINDINGS
+    uint64_t more_findings = 0;
+    bool damaged = false;
+
+    static constexpr size_t MAX_FINDINGS = 20;
+    void add(bool damage, const char* code, const std::string& words, int64_t offset = -1);
+};
+
+// Is the content chunks? By the file's name; under a foreign one, by the first header.
+bool is_chunked(LogReader& in, const FileName& name);
+
+// Sees every piece in order; false ends the scan. May be null.
+typedef std::function<bool(const Piece&)> PieceVisitor;
+
+// Reads the open file as far as its content has a form; in.error() tells a read error.
+void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report);
+
+#endif  // KESTLOG_FILESCAN_H_

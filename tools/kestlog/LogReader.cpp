@@ -1,0 +1,61 @@
+#include "kestlog/LogReader.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+LogReader::~LogReader() {
+    if (m_fd >= 0) {
+        close(m_fd);
+    }
+}
+
+bool LogReader::open(const std::string& path, bool follow) {
+    // Non-blocking: to open a FIFO must not wait for its writer.
+    m_fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (follow ? 0 : O_NOFOLLOW));
+    struct stat st;
+    if (m_fd < 0 || fstat(m_fd, &st) < 0) {
+        return false;
+    }
+    if (!S_ISREG(st.st_mode)) {
+        errno = S_ISDIR(st.st_mode) ? EISDIR : EINVAL;
+        return false;
+    }
+    m_size = m_left = static_cast<uint64_t>(st.st_size);
+    m_modified = st.st_mtime;
+    m_window.resize(WINDOW);
+    return true;
+}
+
+const uint8_t* LogReader::peek(size_t want, size_t& got) {
+    if (m_end - m_start < want && m_left > 0) {
+        memmove(m_window.data(), m_window.data() + m_start, m_end - m_start);
+        m_end -= m_start;
+        m_start = 0;
+        while (m_end < want && m_left > 0) {
+            const size_t room = static_cast<size_t>(std::min<uint64_t>(WINDOW - m_end, m_left));
+            const ssize_t n = read(m_fd, m_window.data() + m_end, room);
+            if (n < 0 && errno == EINTR) {
+                continue;
+            }
+            if (n <= 0) {  // 0: it has become shorter
+                m_error = n < 0 ? errno : 0;
+                m_left = 0;
+                break;
+            }
+            m_end += static_cast<size_t>(n);
+            m_left -= static_cast<uint64_t>(n);
+        }
+    }
+    got = m_end - m_start;
+    return m_window.data() + m_start;
+}
+
+void LogReader::skip(size_t n) {
+    m_start += n;
+    m_offset += n;
+}

@@ -1,0 +1,160 @@
+// kestlog info and kestlog frames.
+#include <stdio.h>
+
+#include "kestctl/Output.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/Report.h"
+
+namespace {
+
+// Facts in order, for both forms of output.
+class Facts {
+public:
+    explicit Facts(bool json) : m_json(json) {}
+
+    template <typename T>
+    void add(const char* key, const T& value) {
+        if (m_json) {
+            std::string name = key;
+            for (char& c : name) {
+                c = c == ' ' ? '_' : c;
+            }
+            m_object.add(name.c_str(), value);
+        } else {
+            line(key, value);
+        }
+    }
+    Json& object() { return m_object; }
+
+private:
+    static void line(const char* key, const std::string& value) {
+        printf("%-15s %s\n", key, escape_text(value).c_str());
+    }
+    static void line(const char* key, uint64_t value) { line(key, std::to_string(value)); }
+    static void line(const char* key, bool value) { line(key, std::string(value ? "yes" : "no")); }
+
+    bool m_json;
+    Json m_object;
+};
+
+// The record's seconds are local time already.
+std::string wall_clock(const TimeSyncRecord& record) {
+    const time_t seconds = static_cast<time_t>(record.seconds);
+    struct tm t;
+    return gmtime_r(&seconds, &t) ? time_text(LogTime::from_tm(t)) : "-";
+}
+
+std::string cp_time(const TimeSyncRecord& record) {
+    std::string text;
+    for (uint8_t byte : record.cp_time) {
+        char hex[3];
+        snprintf(hex, sizeof(hex), "%02x", byte);
+        text += hex;
+    }
+    return text;
+}
+
+void add_content(Facts* facts, const FileName& name, const FileReport& report) {
+    if (report.has_record) {
+        facts->add("time record", wall_clock(report.record));
+        facts->add("cp time", cp_time(report.record));
+    }
+    if (report.chunked) {
+        for (int i = 0; i < CK_NUM; ++i) {
+            const std::string kind = CHUNK_KINDS[i];
+            facts->add((kind + " chunks").c_str(), report.chunks[i].count);
+            facts->add((kind + " bytes").c_str(), report.chunks[i].bytes);
+        }
+        facts->add("sequence gaps", report.sequence_gaps);
+    } else {
+        facts->add("frames", report.frames);
+        facts->add("broken frames", report.broken);
+    }
+    facts->add("payload", report.payload);
+    facts->add("other bytes", report.other);
+    if (name.framed_dump) {
+        facts->add("end marker", report.end_marker);
+    }
+}
+
+void add_findings(Facts* facts, bool json, const FileReport& report) {
+    std::vector<std::string> objects;
+    for (const Finding& finding : report.findings) {
+        if (json) {
+            objects.push_back(finding_json(finding).str());
+        } else {
+            printf("%s\n", finding_text(finding).c_str());
+        }
+    }
+    if (json) {
+        facts->object().raw("findings", json_array(objects));
+    }
+    if (report.more_findings) {
+        facts->add("more findings", report.more_findings);
+    }
+}
+
+}  // namespace
+
+int run_info(const std::string& path, const Settings& settings) {
+    LogReader in;
+    if (const int status = open_input(in, path)) {
+        return status;
+    }
+    const FileName name(file_part(path));
+    FileReport report;
+    scan_file(in, name, nullptr, &report);
+    Facts facts(settings.json);
+    facts.add("file", path);
+    facts.add("kind", std::string(name.kind));
+    if (!name.cp.empty()) {
+        facts.add("cp", name.cp);
+    }
+    if (name.is_log()) {
+        facts.add("number", static_cast<uint64_t>(name.number));
+    }
+    if (has_time(name.time)) {
+        facts.add("started", time_text(name.time));
+    }
+    facts.add("size", in.size());
+    add_content(&facts, name, report);
+    facts.add("damaged", report.damaged);
+    add_findings(&facts, settings.json, report);
+    if (settings.json) {
+        facts.object().print();
+    }
+    return scan_status(in, path, report);
+}
+
+int run_frames(const std::string& path, const Settings& settings) {
+    LogReader in;
+    if (const int status = open_input(in, path)) {
+        return status;
+    }
+    FileReport report;
+    const bool json = settings.json;
+    const PieceVisitor print = [json](const Piece& piece) {
+        if (!json) {
+            printf("%10llu  seq %-10u type 0x%02x 0x%02x  %5zu bytes%s%s%s\n",
+                   static_cast<unsigned long long>(piece.offset), piece.seq_num, piece.type,
+                   piece.sub_type, piece.data_len, piece.kind ? "  " : "",
+                   piece.kind ? piece.kind : "", piece.intact ? "" : "  wrong length");
+            return ferror(stdout) == 0;
+        }
+        Json object;
+        object.add("offset", piece.offset).add("seq", static_cast<uint64_t>(piece.seq_num));
+        object.add("type", static_cast<uint64_t>(piece.type));
+        object.add("sub_type", static_cast<uint64_t>(piece.sub_type));
+        object.add("len", static_cast<uint64_t>(piece.len_field));
+        object.add("payload", static_cast<uint64_t>(piece.data_len)).add("intact", piece.intact);
+        if (piece.kind) {
+            object.add("kind", piece.kind);
+        }
+        object.print();
+        return ferror(stdout) == 0;
+    };
+    scan_file(in, FileName(file_part(path)), print, &report);
+    tell_damage(path, report);
+    return scan_status(in, path, report);
+}

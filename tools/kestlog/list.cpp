@@ -1,0 +1,101 @@
+// kestlog ls.
+#include <stdio.h>
+
+#include <algorithm>
+
+#include "kestctl/Output.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/LogTree.h"
+#include "kestlog/Report.h"
+
+namespace {
+
+struct Sum {
+    uint64_t files = 0;
+    uint64_t size = 0;
+    LogTime first, last;
+
+    void add(const TreeFile& file) {
+        ++files;
+        size += file.size;
+        if (has_time(file.name.time)) {
+            first = has_time(first) ? std::min(first, file.name.time) : file.name.time;
+            last = std::max(last, file.name.time);
+        }
+    }
+};
+
+// A line about a set or a CP.
+void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* cp,
+               const Sum& sum) {
+    if (json) {
+        Json object;
+        object.add("set", set.name);
+        if (cp) {
+            object.add("cp", cp->name);
+        } else {
+            object.add("cps", static_cast<uint64_t>(set.cps.size()));
+        }
+        object.add("files", sum.files).add("size", sum.size);
+        object.add("from", time_text(sum.first)).add("to", time_text(sum.last)).print();
+        return;
+    }
+    const std::string name = cp ? cp->name : set.name.empty() ? set.path : set.name;
+    printf("%s%-*s %12llu bytes  %4llu files  %s to %s\n", indent, cp ? 22 : 24,
+           escape_text(name).c_str(), static_cast<unsigned long long>(sum.size),
+           static_cast<unsigned long long>(sum.files), time_text(sum.first).c_str(),
+           time_text(sum.last).c_str());
+}
+
+void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile& file) {
+    if (json) {
+        Json object;
+        if (set) {
+            object.add("set", set->name).add("cp", cp->name);
+        }
+        object.add("file", file.name.text).add("kind", file.name.kind);
+        if (file.name.is_log()) {
+            object.add("number", static_cast<uint64_t>(file.name.number));
+        }
+        object.add("size", file.size).add("time", time_text(file.name.time)).print();
+        return;
+    }
+    printf("%s%12llu  %-16s %s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),
+           file.name.kind, escape_text(file.name.text).c_str());
+}
+
+}  // namespace
+
+int run_ls(const std::string& path, const Settings& settings) {
+    LogTree tree;
+    if (!tree.read(path)) {
+        return failure(ES_UNREADABLE, path + ": no log tree");
+    }
+    for (const TreeFile& file : tree.root_files) {
+        print_file(settings.json, nullptr, nullptr, file);
+    }
+    for (const TreeSet& set : tree.sets) {
+        Sum sum;
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                sum.add(file);
+            }
+        }
+        print_sum(settings.json, "", set, nullptr, sum);
+        for (const TreeCp& cp : set.cps) {
+            Sum cp_sum;
+            for (const TreeFile& file : cp.files) {
+                cp_sum.add(file);
+            }
+            print_sum(settings.json, "  ", set, &cp, cp_sum);
+            for (const TreeFile& file : cp.files) {
+                print_file(settings.json, &set, &cp, file);
+            }
+        }
+    }
+    for (const std::string& words : tree.failures) {
+        failure(ES_UNREADABLE, words);
+    }
+    return tree.failures.empty() ? ES_OK : ES_UNREADABLE;
+}

@@ -1,0 +1,174 @@
+// kestlog verify.
+#include <errno.h>
+#include <stdio.h>
+#include <string.h>
+
+#include <algorithm>
+
+#include "kestctl/Output.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/LogTree.h"
+#include "kestlog/Report.h"
+
+namespace {
+
+class Verifier {
+public:
+    explicit Verifier(bool json) : m_json(json) {}
+
+    void tree(const LogTree& tree) {
+        for (const std::string& path : tree.strays) {
+            find(path, {true, "name", "does not belong here", -1});
+        }
+        for (const TreeFile& file : tree.root_files) {
+            content(file);
+        }
+        parsing_database(tree.root_files);
+        for (const TreeSet& set : tree.sets) {
+            for (const TreeCp& cp : set.cps) {
+                names(cp);
+                numbers(cp);
+                for (const TreeFile& file : cp.files) {
+                    content(file);
+                }
+            }
+        }
+        for (const std::string& words : tree.failures) {
+            unreadable(words);
+        }
+    }
+
+    int finish() const {
+        if (m_json) {
+            Json()
+                .add("ok", m_damages == 0 && !m_unreadable)
+                .add("files", m_files)
+                .add("damages", m_damages)
+                .add("notes", m_notes)
+                .add("unreadable", m_unreadable)
+                .print();
+        } else {
+            printf("%llu files checked, %llu damages, %llu notes\n",
+                   static_cast<unsigned long long>(m_files),
+                   static_cast<unsigned long long>(m_damages),
+                   static_cast<unsigned long long>(m_notes));
+        }
+        return m_damages ? ES_DAMAGE : m_unreadable ? ES_UNREADABLE : ES_OK;
+    }
+
+private:
+    void find(const std::string& path, const Finding& finding) {
+        ++(finding.damage ? m_damages : m_notes);
+        if (m_json) {
+            finding_json(finding).add("path", path).print();
+        } else {
+            printf("%s: %s\n", escape_text(path).c_str(), finding_text(finding).c_str());
+        }
+    }
+
+    void unreadable(const std::string& words) {
+        ++m_unreadable;
+        failure(ES_UNREADABLE, words);
+    }
+
+    // In each log root, the database and its digest come together.
+    void parsing_database(const std::vector<TreeFile>& files) {
+        for (const TreeFile& file : files) {
+            const std::string dir = file.path.substr(0, file.path.rfind('/') + 1);
+            const std::string other =
+                dir + (file.name.text == DIGEST_NAME ? DATABASE_NAME : DIGEST_NAME);
+            if (std::none_of(files.begin(), files.end(),
+                             [&](const TreeFile& f) { return f.path == other; })) {
+                find(file.path, {true, "pair", "without " + file_part(other), -1});
+            }
+        }
+    }
+
+    void names(const TreeCp& cp) {
+        const CpType type = cp_type_of(cp.name);
+        for (const TreeFile& file : cp.files) {
+            const FileName& name = file.name;
+            if (!name.exact || name.type == LT_UNKNOWN) {
+                find(file.path, {true, "name", "no name that the service gives", -1});
+            } else if (type != CT_UNKNOWN && name.cp_type != CT_UNKNOWN && name.cp_type != type) {
+                find(file.path, {true, "name", "the name of another CP", -1});
+            }
+        }
+    }
+
+    // The newest log file is number 0, every older one has the next number.
+    void numbers(const TreeCp& cp) {
+        std::vector<const TreeFile*> logs;
+        for (const TreeFile& file : cp.files) {
+            if (file.name.is_log()) {
+                logs.push_back(&file);
+            }
+        }
+        std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
+            return a->name.number < b->name.number;
+        });
+        uint64_t due = 0;
+        const TreeFile* newer = nullptr;
+        for (const TreeFile* log : logs) {
+            const uint32_t number = log->name.number;
+            if (newer && newer->name.number == number) {
+                find(log->path, {true, "double", "two log files with this number", -1});
+            } else if (number != due) {
+                // Trimming may take the file that has just been closed.
+                find(log->path,
+                     {false, "gap", "number " + std::to_string(due) + " is missing", -1});
+            }
+            if (newer && newer->name.number < number && newer->name.time < log->name.time) {
+                find(log->path, {false, "order", "newer than a log file of a lower number", -1});
+            }
+            due = static_cast<uint64_t>(number) + 1;
+            newer = log;
+        }
+    }
+
+    void content(const TreeFile& file) {
+        ++m_files;
+        LogReader in;
+        if (!in.open(file.path, false)) {
+            if (errno == ENOENT) {
+                // The service goes on renaming and trimming meanwhile.
+                find(file.path,
+                     {false, "gone", "gone or renamed since the directory was read", -1});
+            } else {
+                unreadable(file.path + ": " + strerror(errno));
+            }
+            return;
+        }
+        FileReport report;
+        scan_file(in, file.name, nullptr, &report);
+        if (in.error()) {
+            unreadable(file.path + ": " + strerror(in.error()));
+        }
+        for (const Finding& finding : report.findings) {
+            find(file.path, finding);
+        }
+        if (report.more_findings) {
+            find(file.path, {report.damaged, "more",
+                             std::to_string(report.more_findings) + " more findings", -1});
+        }
+    }
+
+    bool m_json;
+    uint64_t m_files = 0;
+    uint64_t m_damages = 0;
+    uint64_t m_notes = 0;
+    uint64_t m_unreadable = 0;
+};
+
+}  // namespace
+
+int run_verify(const std::string& path, const Settings& settings) {
+    LogTree tree;
+    if (!tree.read(path)) {
+        return failure(ES_UNREADABLE, path + ": no log tree");
+    }
+    Verifier verifier(settings.json);
+    verifier.tree(tree);
+    return verifier.finish();
+}
