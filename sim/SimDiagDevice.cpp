@@ -73,23 +73,30 @@ std::vector<uint8_t> SimDiagDevice::read_request(size_t min, int timeout_ms) con
 }
 
 bool SimDiagDevice::write_reply(const void* data, size_t len, int timeout_ms) const {
+    return write_some(data, len, timeout_ms) == len;
+}
+
+size_t SimDiagDevice::write_some(const void* data, size_t len, int timeout_ms) const {
     const auto deadline = Clock::now() + std::chrono::milliseconds(timeout_ms);
-    const char* next = static_cast<const char*>(data);
-    while (len > 0) {
-        const ssize_t n = write(m_master, next, len);
+    const char* bytes = static_cast<const char*>(data);
+    size_t done = 0;
+    while (done < len) {
+        const ssize_t n = write(m_master, bytes + done, len - done);
         if (n > 0) {
-            next += n;
-            len -= static_cast<size_t>(n);
-        } else if (n < 0 && errno != EAGAIN && errno != EINTR) {
-            return false;
-        } else if (!wait_for(m_master, POLLOUT, deadline)) {
-            return false;
+            done += static_cast<size_t>(n);
+        } else if ((n < 0 && errno != EAGAIN && errno != EINTR) ||
+                   !wait_for(m_master, POLLOUT, deadline)) {
+            break;
         }
     }
-    return true;
+    return done;
 }
 
 size_t SimDiagDevice::pending() const {
     int n = 0;
     return m_slave >= 0 && ioctl(m_slave, FIONREAD, &n) == 0 ? static_cast<size_t>(n) : 0;
+}
+
+void SimDiagDevice::discard() const {
+    tcflush(m_slave, TCIFLUSH);
 }

@@ -27,8 +27,13 @@ public:
     // Sends all bytes, waiting for the service to make room; false when the time is over
     // or on an error.
     bool write_reply(const void* data, size_t len, int timeout_ms) const;
-    // Bytes of replies that the service has not read yet.
+    // The same, but gives the number of bytes that were sent in time.
+    size_t write_some(const void* data, size_t len, int timeout_ms) const;
+    // Bytes of replies that the service has not read yet. The kernel holds back more than
+    // a few KB and shows them as they are read: only 0 that stays 0 means that all is read.
     size_t pending() const;
+    // Throws away what the service has not read.
+    void discard() const;
 
     const std::string& path() const { return m_path; }
 

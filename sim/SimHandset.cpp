@@ -108,7 +108,7 @@ bool SimHandset::create(const std::string& dir, const SimSizes& sizes) {
            write_config();
 }
 
-SimCp* SimHandset::add_cp(const std::string& name) {
+SimCp* SimHandset::add_cp(const std::string& name, bool terminal) {
     const CpKind* kind = std::find_if(std::begin(CP_KINDS), std::end(CP_KINDS),
                                       [&](const CpKind& k) { return name == k.name; });
     if (kind == std::end(CP_KINDS)) {
@@ -119,7 +119,7 @@ SimCp* SimHandset::add_cp(const std::string& name) {
     auto cp = std::make_unique<SimCp>(name, modem, static_cast<uint8_t>(kind - CP_KINDS));
     const std::string log_path = path("dev/" + name + "_log");
     const std::string diag_path = path("dev/" + name + "_diag");
-    if (!cp->log.create(log_path) || (modem && !cp->diag.create(diag_path))) {
+    if (!cp->log.create(log_path, terminal) || (modem && !cp->diag.create(diag_path))) {
         fail("cannot make the devices of " + name);
         return nullptr;
     }
@@ -129,6 +129,12 @@ SimCp* SimHandset::add_cp(const std::string& name) {
                                        set_prop(kind->enable_prop, "1")
                                  : set_prop(kind->diag_prop, log_path);
     return announced && write_config() ? m_cps.back().get() : nullptr;
+}
+
+SimCp* SimHandset::cp(const std::string& name) const {
+    const auto found =
+        std::find_if(m_cps.begin(), m_cps.end(), [&](const auto& cp) { return cp->name == name; });
+    return found == m_cps.end() ? nullptr : found->get();
 }
 
 bool SimHandset::write_config() {
@@ -182,7 +188,7 @@ bool SimHandset::settle(LogCollector& logs, int timeout_ms) {
         for (const auto& cp : m_cps) {
             // The service writes its buffer out together with the piece that fills it:
             // then everything that was fed is on the medium.
-            if (logs.end_position(*cp) != cp->fed) {
+            if (cp->running && logs.end_position(*cp) != cp->fed) {
                 all = false;
                 if (cp->log.pending() == 0) {
                     cp->feed(step);

@@ -30,7 +30,8 @@ struct SimCp {
     const std::string name;  // its directory's name, "cp_wcdma"
     const bool modem;        // its log files begin with a time record
     SimLogDevice log;
-    SimDiagDevice diag;  // modems only; the others have one device for both
+    SimDiagDevice diag;   // modems only; the others have one device for both
+    bool running = true;  // a crashed CP does not log: the owner neither feeds nor settles it
     const SimStream stream;
     uint64_t fed = 0;  // position of the next byte
 };
@@ -53,8 +54,12 @@ public:
     // below $TMPDIR or /tmp. Starts the time service. False with error() set on failure.
     bool create(const std::string& dir, const SimSizes& sizes = SimSizes());
     // Adds a CP ("cp_wcdma", "cp_wcn", ...): its devices, properties and the line in the
-    // default configuration. The handset owns it. Null with error() set on failure.
-    SimCp* add_cp(const std::string& name);
+    // default configuration. The handset owns it. Null with error() set on failure. With
+    // terminal its log device is one that can also be read, for requests or a dump
+    // through the device that a CP other than a modem has for both.
+    SimCp* add_cp(const std::string& name, bool terminal = false);
+    // Null when there is none of this name.
+    SimCp* cp(const std::string& name) const;
 
     // Sets one property; "" removes it. The properties file is replaced by rename.
     bool set_prop(const std::string& key, const std::string& value);
@@ -62,7 +67,7 @@ public:
     bool remove_sd();
     bool sd_inserted() const { return m_sd; }
 
-    // Feeds every CP a little more until the service has nothing of it in its buffers,
+    // Feeds every running CP a little more until the service has nothing of it in its buffers,
     // so that it can be stopped without losing a byte. False when the time is over first.
     bool settle(LogCollector& logs, int timeout_ms);
 

@@ -6,8 +6,13 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-bool SimLogDevice::create(const std::string& path) {
+bool SimLogDevice::create(const std::string& path, bool terminal) {
     remove();
+    m_is_terminal = terminal;
+    if (terminal) {
+        m_path = path;
+        return m_terminal.create(path);
+    }
     if (mkfifo(path.c_str(), 0600) != 0) {
         return false;
     }
@@ -17,6 +22,10 @@ bool SimLogDevice::create(const std::string& path) {
 }
 
 void SimLogDevice::remove() {
+    if (m_is_terminal) {
+        m_terminal.remove();
+        m_path.clear();
+    }
     if (m_fd >= 0) {
         close(m_fd);
         m_fd = -1;
@@ -28,11 +37,17 @@ void SimLogDevice::remove() {
 }
 
 ssize_t SimLogDevice::feed(const void* data, size_t len) {
+    if (m_is_terminal) {
+        return static_cast<ssize_t>(m_terminal.write_some(data, len, 0));
+    }
     const ssize_t n = write(m_fd, data, len);
     return n < 0 && (errno == EAGAIN || errno == EINTR) ? 0 : n;
 }
 
 size_t SimLogDevice::pending() const {
+    if (m_is_terminal) {
+        return m_terminal.pending();
+    }
     int n = 0;
     return m_fd >= 0 && ioctl(m_fd, FIONREAD, &n) == 0 ? static_cast<size_t>(n) : 0;
 }

@@ -3,30 +3,18 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
-#include <string.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 #include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
 
+#include "sim/local_socket.h"
+
 bool TimeService::start(const std::string& root) {
     stop();
-    const std::string name = "cp_time_sync_server@" + root;
-    sockaddr_un addr = {};
-    addr.sun_family = AF_UNIX;
-    // The abstract namespace: a NUL, then the name without a terminator.
-    if (name.size() + 1 > sizeof addr.sun_path) {
-        errno = ENAMETOOLONG;
-        return false;
-    }
-    memcpy(addr.sun_path + 1, name.data(), name.size());
-    const size_t len = offsetof(sockaddr_un, sun_path) + 1 + name.size();
-    m_listen = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
-    if (m_listen < 0 ||
-        bind(m_listen, reinterpret_cast<sockaddr*>(&addr), static_cast<socklen_t>(len)) != 0 ||
-        listen(m_listen, 8) != 0 || pipe2(m_wake, O_CLOEXEC) != 0) {
+    m_listen = listen_local("cp_time_sync_server", root);
+    if (m_listen < 0 || pipe2(m_wake, O_CLOEXEC) != 0) {
         const int error = errno;
         stop();
         errno = error;

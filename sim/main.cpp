@@ -1,4 +1,4 @@
-// kestsim: shows the service at work on a simulated handset and checks its logs.
+// kestsim: shows the service at work on a simulated handset and checks what it saves.
 #include <getopt.h>
 #include <signal.h>
 #include <stdio.h>
@@ -19,19 +19,20 @@ void on_signal(int) {
 const char USAGE[] =
     "usage: kestsim [options]\n"
     "Runs the service kestmodem on a simulated handset: a modem, a connectivity chip and a\n"
-    "GNSS receiver stream their logs while the SD card comes and goes. Shows the progress\n"
-    "and the resulting tree and checks that no byte was lost or doubled.\n"
+    "GNSS receiver stream their logs while the SD card comes and goes, CPs crash and a client\n"
+    "asks for this and that. Shows the progress and the resulting tree and checks that no\n"
+    "byte was lost or doubled and that everything asked for came.\n"
     "\n"
     "  --kestmodem PATH  the service's program (default: the one beside this program)\n"
     "  --root DIR        root of the handset, absent or empty (default: a new one in /tmp)\n"
-    "  --seconds N       length of the run (default 20)\n"
+    "  --seconds N       length of the run (default 30), longer if the scenes need it\n"
     "  --rate KB         KB/s from each CP (default 500)\n"
-    "  --fast            a run of 5 seconds at 2000 KB/s\n"
+    "  --fast            a run of 6 seconds at 2000 KB/s, with short scenes\n"
     "  --sd, --no-sd     whether the SD card comes and goes (default: it does)\n"
     "  --rm              remove the root at the end\n"
     "  --help            this text\n"
     "\n"
-    "Exit status: 0 nothing lost or doubled, 1 otherwise, 2 wrong options.\n";
+    "Exit status: 0 all checks passed, nothing lost or doubled, 1 otherwise, 2 wrong options.\n";
 
 enum Option {
     OPT_PROGRAM = 1,
@@ -87,7 +88,8 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 options.rate = static_cast<unsigned>(number);
                 break;
             case OPT_FAST:
-                options.seconds = 5;
+                options.seconds = 6;
+                options.fast = true;
                 options.rate = 2000;
                 break;
             case OPT_SD:
@@ -135,5 +137,5 @@ int main(int argc, char** argv) {
     sigaction(SIGINT, &action, nullptr);
     sigaction(SIGTERM, &action, nullptr);
     signal(SIGPIPE, SIG_IGN);
-    return Demo(options).run(&s_interrupted);
+    return Demo(options, &s_interrupted).run();
 }

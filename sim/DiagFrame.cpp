@@ -1,0 +1,69 @@
+#include "sim/DiagFrame.h"
+
+#include <algorithm>
+
+namespace {
+
+const uint8_t FLAG = 0x7e;
+const uint8_t ESCAPE = 0x7d;
+const uint8_t ESCAPE_XOR = 0x20;
+const size_t HEADER_SIZE = 8;
+
+void append_escaped(std::vector<uint8_t>& out, uint8_t byte) {
+    if (byte == FLAG || byte == ESCAPE) {
+        out.push_back(ESCAPE);
+        byte ^= ESCAPE_XOR;
+    }
+    out.push_back(byte);
+}
+
+}  // namespace
+
+std::vector<uint8_t> DiagFrame::encode() const {
+    const size_t size = HEADER_SIZE + payload.size();
+    std::vector<uint8_t> out = {FLAG};
+    out.reserve(size + size / 16 + 2);
+    for (int shift = 0; shift < 32; shift += 8) {
+        append_escaped(out, static_cast<uint8_t>(sequence >> shift));
+    }
+    append_escaped(out, static_cast<uint8_t>(size));
+    append_escaped(out, static_cast<uint8_t>(size >> 8));
+    append_escaped(out, type);
+    append_escaped(out, sub_type);
+    for (const uint8_t byte : payload) {
+        append_escaped(out, byte);
+    }
+    out.push_back(FLAG);
+    return out;
+}
+
+bool DiagFrame::take(std::vector<uint8_t>& bytes, DiagFrame* frame) {
+    for (;;) {
+        auto start = std::find(bytes.begin(), bytes.end(), FLAG);
+        while (start != bytes.end() && start + 1 != bytes.end() && start[1] == FLAG) {
+            ++start;
+        }
+        bytes.erase(bytes.begin(), start);
+        const auto end =
+            bytes.empty() ? bytes.end() : std::find(bytes.begin() + 1, bytes.end(), FLAG);
+        if (end == bytes.end()) {
+            return false;
+        }
+        std::vector<uint8_t> body;
+        for (auto it = bytes.begin() + 1; it != end; ++it) {
+            const bool escaped = *it == ESCAPE && it + 1 != end;
+            body.push_back(escaped ? static_cast<uint8_t>(*++it ^ ESCAPE_XOR) : *it);
+        }
+        bytes.erase(bytes.begin(), end + 1);
+        if (body.size() >= HEADER_SIZE &&
+            static_cast<size_t>(body[4] | body[5] << 8) == (body.size() & 0xffff)) {
+            frame->sequence = static_cast<uint32_t>(body[0]) | static_cast<uint32_t>(body[1]) << 8 |
+                              static_cast<uint32_t>(body[2]) << 16 |
+                              static_cast<uint32_t>(body[3]) << 24;
+            frame->type = body[6];
+            frame->sub_type = body[7];
+            frame->payload.assign(body.begin() + HEADER_SIZE, body.end());
+            return true;
+        }
+    }
+}
