@@ -1,6 +1,6 @@
 #include "channels/CpDumpConsumer.h"
 
-#include <stdio.h>
+#include <errno.h>
 
 #include "core/log.h"
 #include "storage/CpDirectory.h"
@@ -46,6 +46,14 @@ void CpDumpConsumer::close_dump_file() {
     }
 }
 
+int CpDumpConsumer::write_out_dump_file() {
+    return m_dump_file ? m_dump_file->write_out() : -1;
+}
+
+bool CpDumpConsumer::dump_on_sd() const {
+    return m_dump_file && m_storage->on_sd(m_dump_file.get());
+}
+
 void CpDumpConsumer::discard_dump_file() {
     if (m_dump_file) {
         m_dump_file->dir()->remove_file(m_dump_file.get());
@@ -54,7 +62,8 @@ void CpDumpConsumer::discard_dump_file() {
 
 ssize_t CpDumpConsumer::write_dump(const void* data, size_t len) {
     if (!m_dump_file || !m_dump_file->exists()) {
-        err_log("dump file of %s is gone", m_cp_name);
+        info_log("dump file of %s is gone", m_cp_name);
+        errno = ENOENT;
         return -1;
     }
     return m_dump_file->write(data, len);

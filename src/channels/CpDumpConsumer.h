@@ -21,8 +21,12 @@ protected:
     LogFile* open_dump_file();
     // Makes the ".mem" file for the copy of the kernel's memory file. Not kept.
     LogFile* open_dump_mem_file();
-    // Closes the dump file, if it still exists; it stays on the medium.
+    // Writes out and closes the dump file, if it still exists; it stays on the medium.
     void close_dump_file();
+    // Writes out what is staged; 0, or -1 when bytes were lost.
+    int write_out_dump_file();
+    // True when the SD card carries the dump file.
+    bool dump_on_sd() const;
     // Closes the dump file and removes it from the medium.
     void discard_dump_file();
     // Writes a chunk to the dump file; the bytes stored, or a negative value. The file may

@@ -19,7 +19,9 @@ LogFile* CpRingBufConsumer::open_file() {
 
 void CpRingBufConsumer::ring_buffer_read_timeout(void* param) {
     CpRingBufConsumer* consumer = static_cast<CpRingBufConsumer*>(param);
-    consumer->end_by_timeout();
+    if (!consumer->end_by_timeout()) {
+        return;
+    }
     err_log("read ring buffer timeout");
     consumer->notify_result(LPR_FAILURE);
 }

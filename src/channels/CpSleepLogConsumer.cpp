@@ -19,7 +19,9 @@ LogFile* CpSleepLogConsumer::open_file() {
 
 void CpSleepLogConsumer::sleep_log_read_timeout(void* param) {
     CpSleepLogConsumer* consumer = static_cast<CpSleepLogConsumer*>(param);
-    consumer->end_by_timeout();
+    if (!consumer->end_by_timeout()) {
+        return;
+    }
     err_log("read sleep log timeout");
     consumer->notify_result(LPR_FAILURE);
 }

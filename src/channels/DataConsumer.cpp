@@ -1,5 +1,7 @@
 #include "channels/DataConsumer.h"
 
+#include <poll.h>
+
 DataConsumer::DataConsumer(const char* cp_name, CpStorage* storage)
     : m_cp_name(cp_name), m_storage(storage) {}
 
@@ -14,4 +16,12 @@ void DataConsumer::notify_result(LogProcResult result) {
     if (m_callback) {
         m_callback(m_client, result);
     }
+}
+
+bool DataConsumer::data_waits() const {
+    struct pollfd pfd;
+    pfd.fd = m_handler->fd();
+    pfd.events = POLLIN;
+    pfd.revents = 0;
+    return poll(&pfd, 1, 0) > 0 && (pfd.revents & POLLIN);
 }

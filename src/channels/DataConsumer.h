@@ -40,6 +40,9 @@ public:
 
 protected:
     void notify_result(LogProcResult result);
+    // True when the device has data that has not been read yet: a read time-out that comes
+    // then tells that the loop was busy, not that the CP is silent.
+    bool data_waits() const;
 
     const char* m_cp_name;
     DeviceFileHandler* m_handler = nullptr;

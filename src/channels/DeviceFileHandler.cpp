@@ -26,24 +26,36 @@ int DeviceFileHandler::open() {
     return m_fd;
 }
 
+bool DeviceFileHandler::first_failure() {
+    const bool first = !m_failing;
+    m_failing = true;
+    return first;
+}
+
 void DeviceFileHandler::process(int events) {
     if (!(events & POLLIN)) {
-        err_log("file %s unexpected event %#x", m_path.string(), static_cast<unsigned int>(events));
+        if (first_failure()) {
+            err_log("file %s unexpected event %#x", m_path.string(),
+                    static_cast<unsigned int>(events));
+        }
         return;
     }
     for (;;) {
         const size_t used = m_buf.data_start + m_buf.data_len;
         const ssize_t n = read(m_fd, m_buf.buffer + used, m_buf.capacity - used);
         if (n < 0) {
-            if (errno != EAGAIN && errno != ENODATA) {
+            if (errno != EAGAIN && errno != ENODATA && first_failure()) {
                 err_log("read %s error", m_path.string());
             }
             return;
         }
         if (n == 0) {
-            err_log("read %s return 0", m_path.string());
+            if (first_failure()) {
+                err_log("read %s return 0", m_path.string());
+            }
             return;
         }
+        m_failing = false;
         m_buf.data_len += static_cast<size_t>(n);
         if (process_data(m_buf)) {
             return;

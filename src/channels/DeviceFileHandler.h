@@ -40,7 +40,9 @@ public:
     // Opens the device; the descriptor or -1.
     int open();
 
-    // Reads until the device has no more data or process_data wants no more now.
+    // Reads until the device has no more data or process_data wants no more now. A device
+    // that fails stays polled; of failures in a row only the first is logged, because a
+    // device that hung up is reported at every pass of the loop.
     void process(int events) override;
 
     // Takes what the buffer holds. True: stop reading now; the handler may be destroyed
@@ -50,7 +52,10 @@ public:
     const android::String8& path() const { return m_path; }
 
 private:
+    bool first_failure();
+
     bool m_own_fd;
+    bool m_failing = false;  // a failure was logged and nothing was read since
     android::String8 m_path;
     DataBuffer m_buf;
 };

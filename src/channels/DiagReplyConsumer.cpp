@@ -64,9 +64,13 @@ int DiagReplyConsumer::start() {
         discard_file();
         return -1;
     }
+    start_timer();
+    return 0;
+}
+
+void DiagReplyConsumer::start_timer() {
     m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(
         READ_TIMEOUT_MS, m_exchange.read_timeout, this);
-    return 0;
 }
 
 void DiagReplyConsumer::close_file() {
@@ -130,6 +134,12 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
         return ENDED;
     }
     if (header.sub_type == REPLY_END) {
+        if (m_file->write_out() < 0) {
+            err_log("result file of %s is not complete", m_cp_name);
+            discard_file();
+            end(LPR_FAILURE);
+            return ENDED;
+        }
         close_file();
         end(LPR_SUCCESS);
         return ENDED;
@@ -148,7 +158,12 @@ void DiagReplyConsumer::end(LogProcResult result) {
     notify_result(result);
 }
 
-void DiagReplyConsumer::end_by_timeout() {
+bool DiagReplyConsumer::end_by_timeout() {
     m_read_timer = nullptr;
+    if (data_waits()) {
+        start_timer();
+        return false;
+    }
     close_file();
+    return true;
 }

@@ -37,8 +37,9 @@ protected:
     // file's and file the result of its creation.
     bool create_result_file(android::String8& name, LogFile*& file);
 
-    // Ends the exchange after a silence; what was received stays.
-    void end_by_timeout();
+    // Ends the exchange after a silence; what was received stays. False when it goes on
+    // because data has arrived after all.
+    bool end_by_timeout();
     void close_file();
     void discard_file();
 
@@ -48,6 +49,7 @@ private:
     Outcome process_frame(const uint8_t* frame, size_t len);
     void end(LogProcResult result);
     bool send_request();
+    void start_timer();
     void stop_timer();
 
     const Exchange& m_exchange;

@@ -37,8 +37,12 @@ bool ExtWcnDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         find_bytes(buf.data(), buf.data_len, END_MARKER, END_MARKER_LEN)) {
         m_handler->del_events(POLLIN);
         buf.consume_all();
+        const bool complete = write_out_dump_file() == 0;
+        if (!complete) {
+            err_log("dump of %s is not complete", m_cp_name);
+        }
         close_dump_file();
-        notify_result(LPR_SUCCESS);
+        notify_result(complete ? LPR_SUCCESS : LPR_FAILURE);
         return true;
     }
     const size_t len = buf.data_len;
@@ -55,6 +59,9 @@ bool ExtWcnDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 
 void ExtWcnDumpConsumer::on_ext_stor_umount(void* param) {
     ExtWcnDumpConsumer* consumer = static_cast<ExtWcnDumpConsumer*>(param);
+    if (!consumer->dump_on_sd()) {
+        return;
+    }
     info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
     consumer->notify_result(LPR_FAILURE);
 }

@@ -494,8 +494,9 @@ bool LogPipeHandler::save_timestamp(LogFile* file) {
     int conn = -1;
     int slept_ms = 0;
     for (int i = 0; i < ATTEMPTS; ++i) {
-        conn =
-            socket_local_client(SOCKET_TIME_SYNC, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+        // Non-blocking: connecting to a service that hangs, its queue full, would wait.
+        conn = socket_local_client(SOCKET_TIME_SYNC, ANDROID_SOCKET_NAMESPACE_ABSTRACT,
+                                   SOCK_STREAM | SOCK_NONBLOCK);
         if (conn >= 0) {
             break;
         }

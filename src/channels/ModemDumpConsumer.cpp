@@ -40,9 +40,13 @@ int ModemDumpConsumer::start() {
         return -1;
     }
     m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
+    start_timer();
+    return 0;
+}
+
+void ModemDumpConsumer::start_timer() {
     m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(READ_TIMEOUT_MS,
                                                                       dump_read_timeout, this);
-    return 0;
 }
 
 bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& buf) {
@@ -70,7 +74,11 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         m_handler->multiplexer()->timer_mgr().set_new_due_time(m_read_timer, READ_TIMEOUT_MS);
     }
     const size_t len = buf.data_len;
-    const ssize_t written = write_dump(buf.data(), len);
+    ssize_t written = write_dump(buf.data(), len);
+    if (end && written == static_cast<ssize_t>(len) && write_out_dump_file() < 0) {
+        // The medium did not take what was staged: the dump is not complete.
+        written = -1;
+    }
     if (written == static_cast<ssize_t>(len)) {
         buf.consume_all();
         if (end) {
@@ -95,6 +103,10 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 void ModemDumpConsumer::dump_read_timeout(void* param) {
     ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
     consumer->m_read_timer = nullptr;
+    if (consumer->data_waits()) {
+        consumer->start_timer();
+        return;
+    }
     consumer->discard_dump_file();
     err_log("read timeout");
     consumer->notify_result(consumer->save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);
@@ -122,6 +134,9 @@ bool ModemDumpConsumer::save_dump_file() {
 
 void ModemDumpConsumer::on_ext_stor_umount(void* param) {
     ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
+    if (!consumer->dump_on_sd()) {
+        return;
+    }
     consumer->stop_timer();
     info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
     consumer->notify_result(LPR_FAILURE);

@@ -33,6 +33,7 @@ private:
     bool check_end_of_dump(const DeviceFileHandler::DataBuffer& buf);
     // Copies the kernel's memory file; false when that failed.
     bool save_dump_file();
+    void start_timer();
     void stop_timer();
 
     const char* m_mem_path;

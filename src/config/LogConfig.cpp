@@ -2,6 +2,7 @@
 
 #include <cutils/properties.h>
 #include <errno.h>
+#include <fcntl.h>
 #include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
@@ -188,7 +189,10 @@ int LogConfig::iq_type_from_name(const void* text, size_t len) {
 }
 
 int LogConfig::save() {
-    FILE* file = fopen(m_config_file.string(), "w+te");
+    // Not by fopen alone: the service runs without a file-creation mask, and a file that
+    // was deleted meanwhile must not come back writable for everybody.
+    const int fd = open(m_config_file.string(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
+    FILE* file = fd < 0 ? nullptr : fdopen(fd, "w+");
     if (!file) {
         return -1;
     }

@@ -1,5 +1,6 @@
 #include <android/log.h>
 #include <errno.h>
+#include <fcntl.h>
 #include <stdarg.h>
 #include <stdio.h>
 #include <unistd.h>
@@ -21,6 +22,15 @@ size_t stored(int result, size_t size) {
     const size_t len = static_cast<size_t>(result);
     return len < size ? len : size - 1;
 }
+
+// A program started with standard error closed would open some file or device in its
+// place and log into that.
+struct StandardError {
+    StandardError() {
+        while (fcntl(STDERR_FILENO, F_GETFD) < 0 && open("/dev/null", O_RDWR) >= 0) {
+        }
+    }
+} keep_standard_error_open;
 
 }  // namespace
 

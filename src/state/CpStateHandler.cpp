@@ -55,8 +55,9 @@ int CpStateHandler::init() {
 }
 
 bool CpStateHandler::connect() {
-    m_fd =
-        socket_local_client(m_serv_name.string(), ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    // Non-blocking: connecting to a supervisor that hangs, its queue full, would wait.
+    m_fd = socket_local_client(m_serv_name.string(), ANDROID_SOCKET_NAMESPACE_ABSTRACT,
+                               SOCK_STREAM | SOCK_NONBLOCK);
     if (m_fd < 0) {
         return false;
     }

@@ -125,12 +125,10 @@ LogFile* CpDirectory::create_log_file() {
         time.hour, time.minute, time.second);
     // A file of this second that could not be renumbered still has the name: writing on
     // would overwrite it.
-    for (const LogFile* listed : m_files) {
-        if (listed->name() == name) {
-            errno = EEXIST;
-            err_log("log file %s exists already", name.string());
-            return nullptr;
-        }
+    if (find(name)) {
+        errno = EEXIST;
+        err_log("log file %s exists already", name.string());
+        return nullptr;
     }
     LogFile* file = new LogFile(name, this, t);
     if (file->open() < 0) {
@@ -147,7 +145,37 @@ LogFile* CpDirectory::create_log_file() {
     return file;
 }
 
+LogFile* CpDirectory::find(const android::String8& name) const {
+    for (LogFile* file : m_files) {
+        if (file->name() == name) {
+            return file;
+        }
+    }
+    return nullptr;
+}
+
+// Gives a file a name that no other one wants, "-N" before its extension. 0 or -1.
+int CpDirectory::set_aside(LogFile* file) {
+    const android::String8& name = file->name();
+    const char* dot = strrchr(name.string(), '.');
+    const size_t stem_len = dot ? static_cast<size_t>(dot - name.string()) : name.length();
+    android::String8 aside;
+    do {
+        aside.setTo(name.string(), stem_len);
+        aside.appendFormat("-%u%s", ++m_aside_num, name.string() + stem_len);
+    } while (find(aside));
+    if (file->rename_to(m_path, aside) < 0) {
+        err_log("set aside %s failed", name.string());
+        return -1;
+    }
+    return 0;
+}
+
 LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
+    LogFile* older = find(name);
+    if (older && set_aside(older) < 0) {
+        return nullptr;
+    }
     LogFile* file = new LogFile(name, this, type, 0);
     if (file->open() < 0) {
         delete file;

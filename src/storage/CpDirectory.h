@@ -44,7 +44,8 @@ public:
     // Makes, opens and appends a new log file numbered 0, which becomes the current
     // one. The caller renumbers the older ones first (rotate_logs). Null on failure.
     LogFile* create_log_file();
-    // Makes, opens and appends another file. Null on failure. Owned by this directory.
+    // Makes, opens and appends another file. Null on failure. Owned by this directory. Names
+    // tell seconds: an older file of the same second and name is set aside as "NAME-N.EXT".
     LogFile* create_file(const android::String8& name, LogType type);
     // Drops a file from the list and deletes it, on the medium too. The object is gone
     // when this returns 0; -1 when it is not in the list.
@@ -70,6 +71,8 @@ public:
 private:
     typedef android::List<LogFile*>::iterator FileIter;
 
+    LogFile* find(const android::String8& name) const;
+    int set_aside(LogFile* file);
     FileIter find(LogFile* file);
     FileIter drop(FileIter it);
     bool is_protected(const LogFile* file) const;
@@ -83,6 +86,7 @@ private:
     ObjectRef<LogFile> m_first_log;
     android::List<LogFile*> m_files;
     ObjectRef<LogFile> m_cur_log;
+    unsigned int m_aside_num = 0;  // last N given by set_aside
 };
 
 #endif  // STORAGE_CPDIRECTORY_H_

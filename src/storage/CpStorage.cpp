@@ -141,3 +141,7 @@ void CpStorage::subscribe_ext_stor_umount_evt(void* client,
 void CpStorage::unsubscribe_ext_stor_umount_evt(void* client) {
     m_manager->unsubscribe_ext_stor_umount_evt(client);
 }
+
+bool CpStorage::on_sd(const LogFile* file) const {
+    return file->dir()->set()->media() == m_manager->get_media(MT_EXTERNAL);
+}

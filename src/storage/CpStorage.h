@@ -56,6 +56,9 @@ public:
     void subscribe_ext_stor_umount_evt(void* client, StorageManager::ext_umount_callback callback);
     void unsubscribe_ext_stor_umount_evt(void* client);
 
+    // True when the file lies on the SD card.
+    bool on_sd(const LogFile* file) const;
+
     LogFile* current_file() const { return m_cur_file.get(); }
 
 private:

@@ -63,11 +63,13 @@ int LogFile::close() {
     return 0;
 }
 
-void LogFile::flush() {
-    if (m_fd >= 0 && m_staged > 0) {
-        write_data(m_buffer, m_staged);
-        m_staged = 0;
+int LogFile::write_out() {
+    if (m_fd < 0 || m_staged == 0) {
+        return 0;
     }
+    const ssize_t n = write_data(m_buffer, m_staged);
+    m_staged = 0;
+    return n < 0 ? -1 : 0;
 }
 
 void LogFile::grow(size_t len) {

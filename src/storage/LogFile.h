@@ -52,7 +52,9 @@ public:
     // that the I/Q thread may call it while it alone uses the file.
     ssize_t write_raw(const void* data, size_t len);
     // Hands what is staged to the system; dropped when that fails.
-    void flush();
+    void flush() { write_out(); }
+    // The same; 0, or -1 when bytes were dropped.
+    int write_out();
     // Accounts for a file that was filled with write_raw. Once per file.
     void set_size(uint32_t size);
 
@@ -66,6 +68,8 @@ public:
     android::String8 next_name() const;
     // Sets that number. 0 or -1; does nothing when the name carries it already.
     int change_name_num(unsigned int num);
+    // Gives the file another name in its directory. 0 or -1, without a message.
+    int rename_to(const android::String8& dir_path, const android::String8& new_name);
     // Deletes the file from the medium; one that is gone already counts as deleted.
     int remove(const android::String8& dir_path);
     // True when the file can be read and written on the medium.
@@ -84,7 +88,6 @@ public:
 private:
     ssize_t write_staged_with(const void* data, size_t len);
     void grow(size_t len);
-    int rename_to(const android::String8& dir_path, const android::String8& new_name);
 
     CpDirectory* m_dir;
     android::String8 m_name;

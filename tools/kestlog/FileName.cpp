@@ -73,18 +73,31 @@ bool cut_number(std::string* text, uint32_t* number) {
     return exact;
 }
 
+// Takes the time off the end; behind it may stand the "-N" of a file that was set aside for
+// a younger one of the same second.
+bool cut_stamp(std::string* text, bool may_be_aside, LogTime* time) {
+    const std::string last = text->substr(text->size() - std::min(text->size(), STAMP_LEN));
+    if (parse_stamp(last, time) && stamp(*time, '_', '-') == last) {
+        text->resize(text->size() - STAMP_LEN);
+        return true;
+    }
+    const size_t dash = text->find_last_not_of("0123456789");
+    if (!may_be_aside || dash == std::string::npos || dash + 1 == text->size() ||
+        (*text)[dash] != '-') {
+        return false;
+    }
+    text->resize(dash);
+    return cut_stamp(text, false, time);
+}
+
 bool match(const Form& form, FileName* name) {
     std::string rest = name->text;
     LogTime time;
     if (!cut_tail(&rest, form.tail)) {
         return false;
     }
-    if (form.stamp) {
-        const std::string text = rest.substr(rest.size() - std::min(rest.size(), STAMP_LEN));
-        if (!parse_stamp(text, &time) || stamp(time, '_', '-') != text) {
-            return false;
-        }
-        rest.resize(rest.size() - STAMP_LEN);
+    if (form.stamp && !cut_stamp(&rest, form.type != LT_LOG, &time)) {
+        return false;
     }
     uint32_t number = 0;
     if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &number)) ||
