@@ -13,8 +13,8 @@
 #include <unistd.h>
 
 #include <list>
+#include <memory>
 #include <string>
-#include <vector>
 
 #include "channels/LogPipeHandler.h"
 #include "client/ClientHandler.h"
@@ -26,11 +26,7 @@ constexpr char TEST_SERVER[] = "control_test";
 
 // One end of a connection, closed at the end; never blocks.
 struct Peer {
-    explicit Peer(int fd_in) : fd(fd_in) {
-        if (fd >= 0) {
-            fcntl(fd, F_SETFL, fcntl(fd, F_GETFL) | O_NONBLOCK);
-        }
-    }
+    explicit Peer(int fd_in) : fd(fd_in) { fcntl(fd, F_SETFL, O_RDWR | O_NONBLOCK); }
     explicit Peer(const char* server)
         : Peer(socket_local_client(server, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)) {}
     ~Peer() { hang_up(); }
@@ -38,9 +34,7 @@ struct Peer {
     Peer& operator=(const Peer&) = delete;
 
     void hang_up() {
-        if (fd >= 0) {
-            close(fd);
-        }
+        close(fd);
         fd = -1;
     }
     bool send(const std::string& bytes) const {
@@ -57,6 +51,7 @@ struct Peer {
         closed = closed || n == 0 || (errno != EAGAIN && errno != EINTR);
         return got;
     }
+    bool ended() { return receive(), closed; }
 
     int fd;
     std::string got;
@@ -99,13 +94,8 @@ protected:
     }
     // Runs the loop until the condition holds.
     template <typename Condition>
-    bool run_until(Multiplexer& loop, Condition condition, int timeout_ms = 10000) {
-        return wait_until(
-            [&] {
-                pass(loop);
-                return condition();
-            },
-            timeout_ms);
+    static bool run_until(Multiplexer& loop, Condition condition) {
+        return wait_until([&] { return pass(loop), condition(); });
     }
 
     // What the peer got when it got as many bytes as expected, or when time is over.
@@ -115,9 +105,9 @@ protected:
         got.swap(peer.got);
         return got;
     }
-    std::string ask(Peer& peer, const std::string& request, const std::string& expected) {
+    void talk(Peer& peer, const std::string& request, const std::string& expected) {
         EXPECT_TRUE(peer.send(request));
-        return replies(peer, expected);
+        EXPECT_EQ(replies(peer, expected), expected) << request;
     }
 
     LogConfig config;
@@ -125,6 +115,24 @@ protected:
 
 private:
     int m_diag;
+};
+
+// With the server and its clients of the test.
+class ClientFixture : public ControlFixture {
+protected:
+    ClientFixture() { serve(3); }
+    void serve(int max_clients) {
+        manager.reset();
+        manager.reset(new ClientManager(&ctrl, &mux(), max_clients));
+        EXPECT_EQ(manager->init(TEST_SERVER), 0);
+    }
+    // Passes enough for whatever is there to be handled.
+    void settle() {
+        for (int i = 0; i < 5; ++i) {
+            pass(mux());
+        }
+    }
+    std::unique_ptr<ClientManager> manager;
 };
 
 // Takes every place that is free in the loop's table.

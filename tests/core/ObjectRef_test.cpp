@@ -79,19 +79,3 @@ TEST(ObjectRef, ReferencesEndInAnyOrder) {
         }
     }
 }
-
-TEST(ObjectRef, SurvivesAContainerThatMovesIt) {
-    Target* const target = new Target;
-    std::vector<Ref> refs;
-    for (int i = 0; i < 100; ++i) {
-        refs.push_back(Ref(target));
-    }
-    refs.erase(refs.begin() + 10, refs.begin() + 60);
-    for (const Ref& ref : refs) {
-        ASSERT_EQ(target, ref.get());
-    }
-    delete target;
-    for (const Ref& ref : refs) {
-        EXPECT_FALSE(ref);
-    }
-}

@@ -2,13 +2,10 @@
 
 #include <errno.h>
 #include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/time.h>
 
 #include <functional>
 #include <string>
 
-#include "core/Multiplexer.h"
 #include "support/TestRoot.h"
 
 namespace {
@@ -16,7 +13,6 @@ namespace {
 enum ClockMode { CLOCK_REAL, CLOCK_FROZEN, CLOCK_FAILS };
 ClockMode g_mode = CLOCK_REAL;
 struct timespec g_now;
-volatile sig_atomic_t g_signals;
 
 }  // namespace
 
@@ -81,76 +77,27 @@ protected:
 
 }  // namespace
 
-TEST(TimerArithmetic, AddMilliseconds) {
-    const struct {
-        struct timespec t;
-        unsigned int ms;
-        struct timespec sum;
-    } table[] = {
-        {{5, 0}, 0, {5, 0}},
-        {{5, 500000000}, 499, {5, 999000000}},
-        {{5, 500000000}, 500, {6, 0}},
-        {{5, 500000000}, 1999, {7, 499000000}},
-        {{5, 999999999}, 1, {6, 999999}},
-        {{5, 1}, 3000, {8, 1}},
-        {{5, 0}, 2147483647u, {2147488, 647000000}},
-        {{5, 900000000}, 4294967295u, {5, 899000000}},  // as a signed value: -1
-    };
-    for (const auto& row : table) {
-        const struct timespec sum = TimerManager::add_ms(row.t, row.ms);
-        EXPECT_EQ(row.sum.tv_sec, sum.tv_sec) << row.ms;
-        EXPECT_EQ(row.sum.tv_nsec, sum.tv_nsec) << row.ms;
-    }
-}
-
-TEST(TimerArithmetic, DifferenceAndOrder) {
+TEST(TimerArithmetic, SumDifferenceAndOrder) {
     const struct {
         struct timespec a, b;
-        int ms;
-        bool earlier;
+        int ms;  // a - b
     } table[] = {
-        {{5, 0}, {5, 0}, 0, false},
-        {{5, 1999999}, {5, 0}, 1, false},
-        {{5, 0}, {5, 1999999}, -1, true},
-        {{6, 0}, {5, 999999999}, 1, false},  // -999 ms of the nanoseconds, cut towards zero
-        {{5, 999999999}, {6, 0}, -1, true},
-        {{8, 500000000}, {5, 250000000}, 3250, false},
-        {{5, 250000000}, {8, 500000000}, -3250, true},
-        {{5, 900000000}, {6, 100000000}, -200, true},
+        {{5, 0}, {5, 0}, 0},
+        {{5, 1999999}, {5, 0}, 1},
+        {{5, 0}, {5, 1999999}, -1},
+        {{6, 0}, {5, 999999999}, 1},  // -999 ms of the nanoseconds, cut towards zero
+        {{8, 500000000}, {5, 250000000}, 3250},
+        {{5, 250000000}, {8, 500000000}, -3250},
+        {TimerManager::add_ms({5, 500000000}, 499), {5, 999000000}, 0},
+        {TimerManager::add_ms({5, 500000000}, 500), {6, 0}, 0},
+        {TimerManager::add_ms({5, 999999999}, 1), {6, 999999}, 0},
+        {TimerManager::add_ms({5, 0}, 2147483647u), {2147488, 647000000}, 0},
+        {TimerManager::add_ms({5, 900000000}, 4294967295u), {5, 899000000}, 0},  // as signed: -1
     };
     for (const auto& row : table) {
         EXPECT_EQ(row.ms, TimerManager::diff_ms(row.a, row.b)) << row.a.tv_nsec;
-        EXPECT_EQ(row.earlier, TimerManager::is_earlier(row.a, row.b)) << row.a.tv_nsec;
+        EXPECT_EQ(row.ms < 0, TimerManager::is_earlier(row.a, row.b)) << row.a.tv_nsec;
     }
-}
-
-TEST_F(TimerManagerTest, FireInOrderOfExpiryThenOfInsertion) {
-    const unsigned int periods[] = {20, 10, 20, 0, 30, 10, 20};
-    for (size_t i = 0; i < 7; ++i) {
-        create(i, periods[i]);
-    }
-    EXPECT_EQ("d", after(0));
-    EXPECT_EQ("", after(9));
-    EXPECT_EQ("bf", after(1));
-    EXPECT_EQ("acge", after(50));
-    EXPECT_EQ("", after(50));
-}
-
-TEST_F(TimerManagerTest, TimeoutIsThatOfTheEarliest) {
-    int ms = 7;
-    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
-    EXPECT_EQ(-1, ms);
-    create(0, 3000);
-    create(1, 1500);
-    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
-    EXPECT_EQ(1500, ms);
-    g_now = {1002, 499999998};  // one nanosecond before the earliest
-    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
-    EXPECT_EQ(0, ms);
-    EXPECT_EQ("", after(0));
-    g_now = {1100, 0};
-    EXPECT_EQ(0, m_mgr.get_timeout(&ms));
-    EXPECT_EQ(0, ms);
 }
 
 TEST_F(TimerManagerTest, CancelAndRearm) {
@@ -206,23 +153,21 @@ TEST_F(TimerManagerTest, TimerAddedByACallbackWaitsForTheNextPass) {
     for (int i = 0; i < 3; ++i) {
         EXPECT_EQ(i ? "a" : "ab", after(i ? 0 : 10));
     }
-    // Due before a timer that is run later in the same pass.
-    create(1, 5);
-    m_clients[0].action = [&] { m_clients[0].action = [&] { create(2, 0); }, create(0, 0); };
-    EXPECT_EQ("ab", after(5));
-    EXPECT_EQ("a", after(0));
-    EXPECT_EQ("c", after(0));
 }
 
 TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
-    create(0, 10);
     int ms = 7;
+    EXPECT_TRUE(m_mgr.get_timeout(&ms) == 0 && ms == -1);
+    create(1, 60);
+    create(0, 10);
+    EXPECT_TRUE(m_mgr.get_timeout(&ms) == 0 && ms == 10);
+    m_mgr.del_timer(m_clients[1].timer);
     LogCapture log;
     g_mode = CLOCK_FAILS;
     EXPECT_EQ(nullptr, m_mgr.create_timer(0, fire, nullptr));
     EXPECT_EQ(-1, m_mgr.set_new_due_time(m_clients[0].timer, 100));
     EXPECT_EQ(-1, m_mgr.get_timeout(&ms));
-    EXPECT_EQ(7, ms);
+    EXPECT_EQ(10, ms);
     EXPECT_EQ("", after(10));
     EXPECT_EQ("", log.text());
     EXPECT_EQ(-1, m_mgr.add_timer(0, fire, nullptr));
@@ -232,31 +177,4 @@ TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
     EXPECT_EQ("a", after(0));
     EXPECT_EQ(0, m_mgr.add_timer(0, fire, &m_clients[0]));
     EXPECT_EQ("a", after(0));
-}
-
-// With a due timer but no clock, the loop waits until a descriptor or a signal ends it.
-TEST_F(TimerManagerTest, LoopWithoutClockWaitsWithoutLimit) {
-    Multiplexer mux;
-    EXPECT_EQ(0, mux.timer_mgr().add_timer(
-                     0, [](void*) { FAIL(); }, nullptr));
-    struct sigaction action = {}, saved;
-    action.sa_handler = [](int) { g_signals = g_signals + 1; };
-    g_signals = 0;
-    ASSERT_EQ(0, sigaction(SIGALRM, &action, &saved));
-    const struct itimerval every = {{0, 20000}, {0, 20000}};
-    const struct itimerval off = {{0, 0}, {0, 0}};
-    ASSERT_EQ(0, setitimer(ITIMER_REAL, &every, nullptr));
-    g_mode = CLOCK_FAILS;
-    mux.run_once();
-    ASSERT_EQ(0, setitimer(ITIMER_REAL, &off, nullptr));
-    EXPECT_GE(g_signals, 1);
-    ASSERT_EQ(0, sigaction(SIGALRM, &saved, nullptr));
-}
-
-TEST_F(TimerManagerTest, DestructorCallsNobody) {
-    {
-        TimerManager mgr;
-        EXPECT_EQ(0, mgr.add_timer(
-                         0, [](void*) { FAIL(); }, nullptr));
-    }
 }

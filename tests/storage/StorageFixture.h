@@ -3,7 +3,6 @@
 #ifndef TESTS_STORAGE_STORAGEFIXTURE_H_
 #define TESTS_STORAGE_STORAGEFIXTURE_H_
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <stdlib.h>
@@ -12,7 +11,6 @@
 #include <time.h>
 #include <unistd.h>
 
-#include <chrono>
 #include <string>
 #include <vector>
 
@@ -49,35 +47,6 @@ inline mode_t mode_of(const std::string& path) {
     return ::lstat(path.c_str(), &st) == 0 ? st.st_mode & 07777u : 0;
 }
 
-// Names that a shell, an option parser or a terminal could take for something else. All
-// would make a file "pwned" or remove "canary" in the working directory if executed.
-inline const Names& strange_names() {
-    static const Names names = {"x; touch pwned",
-                                "$(touch pwned)",
-                                "`touch pwned`",
-                                "a'b",
-                                "a\"b",
-                                "a'; touch pwned; '",
-                                "line\ntouch pwned\n",
-                                "-rf",
-                                "--help",
-                                "*",
-                                "? [a-z]* ~ {a,b}",
-                                "\\",
-                                "a\\",
-                                "&& rm -f canary",
-                                "\xff\xfe\x80",
-                                "#x",
-                                "$HOME",
-                                "~",
-                                " ",
-                                "\t",
-                                "!!",
-                                std::string(255, 'n'),
-                                std::string(255, '\'')};
-    return names;
-}
-
 class StorageTest : public testing::Test {
 protected:
     // 2016-03-01 09:15:00
@@ -95,8 +64,14 @@ protected:
         umask(m_umask);
     }
 
-    void init(const char* sd_root = nullptr) {
-        ASSERT_EQ(0, m_mgr.init(sd_root ? sd_root : m_root.path("sd").c_str(), nullptr, nullptr));
+    void init() { ASSERT_EQ(0, m_mgr.init(m_root.path("sd").c_str(), nullptr, nullptr)); }
+    // The set of now and in it the directory of cp_wcn, with what is found there.
+    void start() {
+        init();
+        bool new_dir = false;
+        m_set = internal().create_cp_set();
+        m_dir = m_set->prepare_cp_dir("cp_wcn", new_dir);
+        ASSERT_NE(nullptr, m_dir);
     }
     void plug_card() { m_root.set_prop("init.svc.fuse_sdcard0", "running"); }
     void pull_card() { m_root.set_prop("init.svc.fuse_sdcard0", "stopped"); }
@@ -109,9 +84,8 @@ protected:
         ASSERT_EQ(0, truncate(m_root.path(rel).c_str(), size));
     }
 
-    // Every directory's size is the sum of its files' sizes, a set's that of its
-    // directories, the medium's that of its sets. extra: bytes known to be left in the
-    // totals above, by a file or directory that vanished.
+    // Every size is the sum of the sizes below. extra: bytes known to be left in the totals
+    // above, by a file or directory that vanished.
     static void check_sums(const MediaStorage& media, uint64_t set_extra = 0,
                            uint64_t media_extra = 0) {
         uint64_t sets = 0;
@@ -133,52 +107,11 @@ protected:
 
     TestRoot m_root;
     StorageManager m_mgr;
+    CpSetDirectory* m_set = nullptr;
+    CpDirectory* m_dir = nullptr;
 
 private:
     mode_t m_umask;
 };
-
-// The least time of three runs, in seconds; prepare runs before each and does not count.
-template <typename Prepare, typename Work>
-double seconds(Prepare prepare, Work work) {
-    double least = 1e9;
-    for (int i = 0; i < 3; ++i) {
-        prepare();
-        const auto start = std::chrono::steady_clock::now();
-        work();
-        const std::chrono::duration<double> took = std::chrono::steady_clock::now() - start;
-        least = took.count() < least ? took.count() : least;
-    }
-    return least;
-}
-
-// How much longer than the plain walk a scan may take: far more than it needs, far less
-// than a quadratic one would.
-#ifdef __SANITIZE_ADDRESS__
-constexpr double SCAN_FACTOR = 40;
-#else
-constexpr double SCAN_FACTOR = 15;
-#endif
-
-// The plain walk that a scan cannot beat: every entry of the tree once through fstatat.
-inline size_t plain_walk(const std::string& path) {
-    size_t num = 0;
-    DIR* dir = opendir(path.c_str());
-    while (const struct dirent* entry = dir ? readdir(dir) : nullptr) {
-        struct stat st;
-        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..") ||
-            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0) {
-            continue;
-        }
-        ++num;
-        if (S_ISDIR(st.st_mode)) {
-            num += plain_walk(path + "/" + entry->d_name);
-        }
-    }
-    if (dir) {
-        closedir(dir);
-    }
-    return num;
-}
 
 #endif  // TESTS_STORAGE_STORAGEFIXTURE_H_

@@ -128,6 +128,9 @@ int __wrap_open(const char* path, int flags, ...) {
     return fails(faults::OPEN, path) ? -1 : __real_open(path, flags, mode);
 }
 
+// The name of open where off_t was asked to have 64 bits.
+int __wrap_open64(const char* path, int flags, ...) __attribute__((alias("__wrap_open")));
+
 int __wrap_mkdir(const char* path, mode_t mode) {
     return fails(faults::MKDIR, path) ? -1 : __real_mkdir(path, mode);
 }

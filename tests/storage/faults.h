@@ -1,8 +1,7 @@
-// Faults of the C library for the storage tests: the program is linked with --wrap, so
-// that a test can make the n-th call of a kind fail or transfer less than was asked
-// for. Only calls on the log tree count (a path with "/modem_log" in it; for write and
-// writev any descriptor above standard error), so that the log, the properties and the
-// test itself stay out of the way. Also the clock of the names and a record of commands.
+// Faults of the C library for the storage tests, linked with --wrap: the n-th call of a
+// kind fails or transfers less. Only calls on the log tree count (a path with "/modem_log"
+// in it; for write and writev any descriptor above standard error). Also the clock of the
+// names and a record of commands.
 #ifndef TESTS_STORAGE_FAULTS_H_
 #define TESTS_STORAGE_FAULTS_H_
 

@@ -1,12 +1,11 @@
 #include "storage/log_name.h"
 
+#include <ctype.h>
 #include <gtest/gtest.h>
-#include <string.h>
 
 #include <string>
+#include <utility>
 #include <vector>
-
-#include "storage/StorageFixture.h"
 
 namespace {
 
@@ -16,117 +15,73 @@ LogType parse(const std::string& name, LogTime& time) {
     return parse_log_name(exact.data(), exact.size(), time);
 }
 
-const char STAMP[] = "2016-03-01_09-15-00";
-
 TEST(LogName, KindAndTime) {
     const struct {
-        const char* name;
         LogType type;
-        bool timed;  // 2016-03-01 09:15:00, else all 0
+        std::vector<std::string> names;
     } cases[] = {
-        {"0-cp_wcdma-2016-03-01_09-15-00.log", LT_LOG, true},
-        {"4294967295-x2016-03-01_09-15-00", LT_LOG, true},
-        {"007-12345-2016-03-01_09-15-00.log", LT_LOG, true},
-        {"1-9999x2016-03-01_09-15-00", LT_LOG, true},
-        {"3-2016x03x01x09x15x00", LT_LOG, true},
-        {"1-2016-03-0 2016-03-01_09-15-00", LT_LOG, true},
-        {"0-cp-2016-03-01_09-15-0", LT_UNKNOWN, false},
-        {"0-cp-2016-03-01_09-15-0x", LT_UNKNOWN, false},
-        {"4-x.log", LT_UNKNOWN, false},
-        {"4-", LT_UNKNOWN, false},
-        {"4", LT_UNKNOWN, false},
-        {"4x-2016-03-01_09-15-00.log", LT_UNKNOWN, false},
-        {"2016.version", LT_UNKNOWN, false},
-        {"-0-cp-2016-03-01_09-15-00.log", LT_UNKNOWN, false},
-        {"cp_gnss.version", LT_VERSION, false},
-        {".version", LT_VERSION, false},
-        {"mini_dump_2016-03-01_09-15-00.version", LT_VERSION, false},
-        {"version", LT_UNKNOWN, false},
-        {"cp_wcdma_memory_2016-03-01_09-15-00.dmp", LT_DUMP, true},
-        {"a_2016-03-01_09-15-00.dmp.dmp", LT_DUMP, true},
-        {"cp_wcdma_memory_2016-03-01_09-15-00.mem", LT_UNKNOWN, false},
-        {"cp_1234_2016-03-01_09-15-00.dmp", LT_UNKNOWN, false},  // only the first one counts
-        {"cp2016-03-01_09-15-00.dmp", LT_UNKNOWN, false},
-        {"_2016.dmp", LT_UNKNOWN, false},
-        {".dmp", LT_UNKNOWN, false},
-        {"mini_dump_2016-03-01_09-15-00.bin", LT_MINI_DUMP, true},
-        {"mini_dump_x2016-03-01_09-15-00.bin", LT_UNKNOWN, false},
-        {"sblock_2016-03-01_09-15-00.log", LT_IPC_INFO, true},
-        {"sbuf_2016-03-01_09-15-00", LT_IPC_INFO, true},
-        {"smsg_2016-03-01_09-15-00.log", LT_IPC_INFO, true},
-        {"smsg_2016.log", LT_UNKNOWN, false},
-        {"smsg_", LT_UNKNOWN, false},
-        {"Smsg_2016-03-01_09-15-00.log", LT_UNKNOWN, false},
-        {"", LT_UNKNOWN, false},
-        {"\xff\xfe 2016-03-01_09-15-00", LT_UNKNOWN, false},
+        {LT_LOG,
+         {"0-cp_wcdma-2016-03-01_09-15-00.log", "4294967295-x2016-03-01_09-15-00",
+          "007-12345-2016-03-01_09-15-00.log", "1-9999x2016-03-01_09-15-00",
+          "3-2016x03x01x09x15x00", "1-2016-03-0 2016-03-01_09-15-00"}},
+        {LT_DUMP, {"memory_2016-03-01_09-15-00.dmp", "a_2016-03-01_09-15-00.dmp.dmp"}},
+        {LT_VERSION, {"cp_gnss.version", ".version", "mini_dump_2016-03-01_09-15-00.version"}},
+        {LT_UNKNOWN,
+         {"4-x.log", "4-", "4", "4x-2016-03-01_09-15-00.log", "-0-cp-2016-03-01_09-15-00.log",
+          "version", "2016.version", "memory_2016-03-01_09-15-00.mem",
+          "cp_1234_2016-03-01_09-15-00.dmp", "cp2016-03-01_09-15-00.dmp", "_2016.dmp", ".dmp",
+          "mini_dump_x2016-03-01_09-15-00.bin", "Smsg_2016-03-01_09-15-00.log", "",
+          "\xff\xfe 2016-03-01_09-15-00"}},
     };
     for (const auto& c : cases) {
-        LogTime time;
-        EXPECT_EQ(c.type, parse(c.name, time)) << c.name;
-        const int expected[] = {2016, 3, 1, 9, 15, 0};
-        const int fields[] = {time.year, time.month, time.day, time.hour, time.minute, time.second};
-        for (size_t i = 0; i < 6; ++i) {
-            EXPECT_EQ(c.timed ? expected[i] : 0, fields[i]) << c.name << " field " << i;
+        for (const std::string& name : c.names) {
+            LogTime time;
+            EXPECT_EQ(c.type, parse(name, time)) << name;
+            const bool timed = c.type == LT_LOG || c.type == LT_DUMP;
+            const LogTime expected = timed ? LogTime{2016, 3, 1, 9, 15, 0} : LogTime();
+            EXPECT_FALSE(time < expected || expected < time) << name;
         }
     }
 }
 
 // Every digit of the timestamp has to be one; every shorter name is not recognised.
 TEST(LogName, DamagedTimestamps) {
-    for (const char* prefix : {"0-cp-", "mini_dump_", "sblock_", "sbuf_", "smsg_"}) {
-        const std::string name = prefix + std::string(STAMP);
+    const std::string stamp = "2016-03-01_09-15-00";
+    const std::pair<std::string, LogType> prefixes[] = {{"0-cp-", LT_LOG},
+                                                        {"mini_dump_", LT_MINI_DUMP},
+                                                        {"sblock_", LT_IPC_INFO},
+                                                        {"sbuf_", LT_IPC_INFO},
+                                                        {"smsg_", LT_IPC_INFO}};
+    for (const auto& p : prefixes) {
+        const std::string name = p.first + stamp;
         LogTime time;
-        for (size_t i = 0; i < strlen(STAMP); ++i) {
+        for (size_t i = 0; i < stamp.size(); ++i) {
             std::string damaged = name;
-            damaged[strlen(prefix) + i] = ':';
-            const bool separator = strchr("-_", STAMP[i]) != nullptr;
-            EXPECT_EQ(separator, parse(damaged, time) != LT_UNKNOWN) << damaged;
+            damaged[p.first.size() + i] = ':';
+            EXPECT_EQ(isdigit(stamp[i]) ? LT_UNKNOWN : p.second, parse(damaged, time)) << damaged;
             EXPECT_EQ(LT_UNKNOWN, parse(name.substr(0, name.size() - 1 - i), time)) << i;
         }
     }
 }
 
-TEST(LogName, Numbers) {
-    const struct {
-        const char* name;
-        int result;
-        uint32_t number;
-        size_t digits;
-    } cases[] = {{"12-cp.log", 0, 12, 2},
-                 {"0-", 0, 0, 1},
-                 {"007-x", 0, 7, 3},
-                 {"12", -1, 0, 0},
-                 {"-12-", -1, 0, 0},
-                 {"cp_wcn.version", -1, 0, 0},
-                 {"", -1, 0, 0},
-                 {"1x-", -1, 0, 0},
-                 {"4294967295-", 0, UINT32_MAX, 10},
-                 {"42949672959-", -1, 0, 0}};
+TEST(LogName, NumbersAndTimeOrder) {
+    const std::pair<const char*, uint32_t> cases[] = {
+        {"12-cp.log", 12}, {"0-", 0}, {"007-x", 7}, {"4294967295-", UINT32_MAX}};
+    uint32_t number = 0;
+    size_t digits = 0;
     for (const auto& c : cases) {
-        uint32_t number = 0;
-        size_t digits = 0;
-        EXPECT_EQ(c.result, parse_log_number(c.name, number, digits)) << c.name;
-        if (c.result == 0) {
-            EXPECT_EQ(c.number, number) << c.name;
-            EXPECT_EQ(c.digits, digits) << c.name;
-        }
+        EXPECT_EQ(0, parse_log_number(c.first, number, digits)) << c.first;
+        EXPECT_TRUE(c.second == number && c.first[digits] == '-') << c.first;
     }
-}
-
-TEST(LogName, TimeOrder) {
+    for (const char* name : {"12", "-12-", "", "1x-", "42949672959-"}) {
+        EXPECT_EQ(-1, parse_log_number(name, number, digits)) << name;
+    }
     // Ascending; each differs from the one before in an earlier field than any after it.
-    const LogTime times[] = {{},
-                             {2015, 12, 31, 23, 59, 59},
-                             {2016, 1, 30, 23, 59, 59},
-                             {2016, 2, 1, 22, 0, 0},
-                             {2016, 2, 1, 23, 0, 59},
-                             {2016, 2, 1, 23, 1, 0},
-                             {2016, 2, 1, 23, 1, 1}};
-    const size_t num = sizeof(times) / sizeof(times[0]);
-    for (size_t i = 0; i < num; ++i) {
-        for (size_t j = 0; j < num; ++j) {
-            EXPECT_EQ(i < j, times[i] < times[j]) << i << " " << j;
-        }
+    const std::vector<LogTime> times = {{2015, 12, 31, 23, 59, 59}, {2016, 1, 30, 23, 59, 59},
+                                        {2016, 2, 1, 22, 0, 0},     {2016, 2, 1, 23, 0, 59},
+                                        {2016, 2, 1, 23, 1, 0},     {2016, 2, 1, 23, 1, 1}};
+    for (size_t i = 1; i < times.size(); ++i) {
+        EXPECT_TRUE(times[i - 1] < times[i] && !(times[i] < times[i - 1])) << i;
     }
 }
 

@@ -1,5 +1,4 @@
-// Runs the real kestlog over trees that the test writes, mostly with the service's own
-// code, and over a table of damages.
+// Runs the real kestlog over good trees and over a table of damages.
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <string.h>
@@ -7,15 +6,12 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <fstream>
-#include <sstream>
+#include <algorithm>
 
 #include "channels/AgDspLogHandler.h"
 #include "channels/DiagFrameParser.h"
 #include "channels/TimeSyncRecord.h"
-#include "core/system_paths.h"
 #include "storage/CpDirectory.h"
-#include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
@@ -95,15 +91,14 @@ protected:
         write(MODEM_LOG, time_record() + frame("a\x7e") + frame(std::string(60000, '}')));
         write(MODEM + "1-cp_wcdma-2016-03-01_09-00-00.log", time_record() + LOG_DATA);
         write(MODEM_DUMP, frame(LOG_DATA) + frame("") + DUMP_END);
-        write(MODEM + "cp_wcdma_memory_" + STAMP + ".mem", LOG_DATA);
-        write(MODEM + "cp_wcdma_ringbuf_" + STAMP + ".log", LOG_DATA);
-        write(MODEM + "cp_wcdma_sleeplog_" + STAMP + ".log", LOG_DATA);
-        write(MODEM + "cp_wcdma_wiq_" + STAMP + ".bin", LOG_DATA);
         write(MODEM + "cp_wcdma.version", "baseband 1");
-        write(MODEM + "mini_dump_" + STAMP + ".bin", LOG_DATA);
-        for (const char* head : {"smsg_", "sbuf_", "sblock_"}) {
+        for (const char* head :
+             {"cp_wcdma_ringbuf_", "cp_wcdma_sleeplog_", "smsg_", "sbuf_", "sblock_"}) {
             write(MODEM + head + STAMP + ".log", "x");
         }
+        write(MODEM + "cp_wcdma_memory_" + STAMP + ".mem", "x");
+        write(MODEM + "cp_wcdma_wiq_" + STAMP + ".bin", "x");
+        write(MODEM + "mini_dump_" + STAMP + ".bin", "x");
         write(WCN_LOG, LOG_DATA);
         write(WCN + "cp_wcn_memory_" + STAMP + ".dmp", LOG_DATA);
         write(DSP_LOG, THREE_CHUNKS);
@@ -113,31 +108,19 @@ protected:
     }
 
     TestRoot m_root;
-    std::string m_out;
-    std::string m_err;
+    std::string m_out, m_err;
 };
 
 TEST_F(KestlogTest, AGoodTreeIsFineFromEveryDirectoryOfIt) {
     write_good_tree();
-    static const struct {
-        std::string root;
-        int files;
-    } CASES[] = {{".", 18}, {"modem_log/", 18}, {SET, 16}, {MODEM, 12}, {WCN, 2}};
-    for (const auto& c : CASES) {
-        EXPECT_EQ(run("verify " + c.root), 0) << m_out << m_err;
-        EXPECT_EQ(m_out, std::to_string(c.files) + " files checked, 0 damages, 0 notes\n");
+    for (const std::string& dir : {std::string("modem_log/"), SET, MODEM, WCN, std::string(".")}) {
+        EXPECT_EQ(run("verify " + dir), 0) << m_out << m_err;
+        EXPECT_TRUE(said(" files checked, 0 damages, 0 notes\n")) << m_out;
     }
-    EXPECT_EQ(run("--json verify ."), 0);
-    EXPECT_EQ(m_out, "{\"ok\":true,\"files\":18,\"damages\":0,\"notes\":0,\"unreadable\":0}\n");
-    // Neither the CP's directory nor the medium carries its own name any more.
+    EXPECT_TRUE(said("18 files"));
+    // A copied directory does not carry its own name any more.
     EXPECT_EQ(rename(m_root.path(WCN).c_str(), m_root.path("copy").c_str()), 0);
     EXPECT_EQ(run("verify copy"), 0) << m_out;
-    m_root.make_dir("card/kest");
-    EXPECT_EQ(rename(m_root.path("modem_log").c_str(), m_root.path("card/kest/modem_log").c_str()),
-              0);
-    EXPECT_EQ(run("verify card"), 0) << m_out;
-    EXPECT_TRUE(said("16 files")) << m_out;
-    EXPECT_EQ(run("verify ."), 2);
     EXPECT_EQ(run("ls nowhere"), 2);
 }
 
@@ -149,18 +132,13 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         bool damage;
         int offset;  // of the finding
     } CASES[] = {
-        {SET + "cp_lte/x", "", "name", true, -1},
         {"modem_log/2016-3-1/x", "", "name", true, -1},
         {"modem_log/2016-13-01-00-00-00/x", "", "name", true, -1},
         {SET + "junk", "", "name", true, -1},
-        {"modem_log/junk", "", "name", true, -1},
         {WCN + "sub/x", "", "name", true, -1},
-        {WCN + "sha1.txt", "0123456789ABCDEF0123456789ABCDEF01234567", "name", true, -1},
         {WCN + "01-cp_wcn-2016-02-01_00-00-00.log", "x", "name", true, -1},
         {WCN + "1-cp_gnss-2016-02-01_00-00-00.log", "x", "name", true, -1},
-        {WCN + "1-cp_wcn-2016-02-01_00:00:00.log", "x", "name", true, -1},
         {WCN + "1-cp_wcn-2016-02-01_24-00-00.log", "x", "name", true, -1},
-        {WCN + "smsg_2016.log", "x", "name", true, -1},
         {WCN + "x\x1b[2J\"", "x", "name", true, -1},
         {WCN + "0-cp_wcn-2016-03-01_09-15-01.log", "x", "double", true, -1},
         {WCN + "2-cp_wcn-2016-03-01_09-00-00.log", "x", "gap", false, -1},
@@ -168,29 +146,20 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         {WCN_LOG, "", "empty", false, -1},
         {MODEM_LOG, frame("no record"), "record", false, -1},
         {MODEM_LOG, time_record().substr(0, 15), "record", true, 0},
-        {MODEM_LOG, "\x78", "record", true, 0},
         {MODEM_DUMP, frame(LOG_DATA), "end", true, -1},
-        {MODEM_DUMP, frame("\nmodem_memdump_finish!"), "end", true, -1},
         {MODEM_DUMP, frame("x") + altered(frame("\x55"), 9, 0x7e) + DUMP_END, "frame", true, 11},
         {MODEM_DUMP, frame("x") + "between" + DUMP_END, "frame", false, -1},
         {DSP_LOG, altered(good, 2, 0), "chunk", true, 0},
         {DSP_LOG, altered(good, 4, 0x18), "chunk", true, 0},
-        {DSP_LOG, altered(good, 4, 3), "chunk", true, 0},
-        {DSP_LOG, altered(good, 6, 1), "chunk", true, 0},
-        {DSP_LOG, altered(good, 27 + 8, 0), "chunk", true, 27},
-        {DSP_LOG, altered(good, 27 + 10, 0), "chunk", true, 27},
         {DSP_LOG, altered(good, 27 + 16, 9), "chunk", true, 27},
-        {DSP_LOG, altered(good, 27 + 18, 0), "chunk", true, 27},
         {DSP_LOG, altered(good, 27 + 19, 0x41), "chunk", true, 27},
         {DSP_LOG, good.substr(1), "chunk", true, 0},
         {DSP_LOG, good + "tail", "chunk", true, 1067},
         {DSP_LOG, good + good.substr(0, 27), "sequence", false, 1067},
         {DSP_LOG, good.substr(0, 1000), "cut", false, 47},
-        {DSP_LOG, good.substr(0, 30), "cut", false, 27},
         {OLD_DSP_LOG, good.substr(0, 1000), "cut", true, 47},
         {MODEM + "cp_wcdma.version", std::string(92, 'v'), "version", true, -1},
         {"modem_log/sha1.txt", "0123456789abcdef0123456789ABCDEF01234567", "digest", true, -1},
-        {"modem_log/sha1.txt", "0123456789ABCDEF0123456789ABCDEF01234567\n", "digest", true, -1},
     };
     for (const auto& c : CASES) {
         write_good_tree();
@@ -198,56 +167,38 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         write(c.file, c.content);
         const std::string label = c.file + " " + c.code + "\n";
         EXPECT_EQ(run("--json verify ."), c.damage ? 3 : 0) << label << m_out;
-        const std::string begin = std::string("{\"damage\":") + (c.damage ? "true" : "false") +
-                                  ",\"code\":\"" + c.code + "\",\"meaning\":\"";
-        const size_t at = m_out.find(begin);
+        const size_t at = m_out.find(std::string("{\"damage\":") + (c.damage ? "true" : "false") +
+                                     ",\"code\":\"" + c.code + "\",");
         ASSERT_NE(at, std::string::npos) << label << m_out;
-        const std::string line = m_out.substr(at, m_out.find('\n', at) - at);
         const std::string offset = ",\"offset\":" + std::to_string(c.offset) + ",";
-        EXPECT_EQ(line.find(offset) != std::string::npos, c.offset >= 0) << label << line;
+        EXPECT_EQ(m_out.find(offset, at) != std::string::npos, c.offset >= 0) << label << m_out;
         EXPECT_EQ(m_out.find('\x1b'), std::string::npos);
         // Alone, but that a lost chunk also leaves a gap in the sequence.
-        const std::string rest = m_out.substr(0, at) + m_out.substr(at + line.size() + 1);
-        EXPECT_TRUE(rest.find("{\"ok\"") == 0 || c.offset == 27) << m_out;
+        EXPECT_EQ(std::count(m_out.begin(), m_out.end(), '\n'), c.offset == 27 ? 3 : 2) << m_out;
         EXPECT_EQ(run("info '" + c.file + "'"), c.damage && replaced ? 3 : 0) << label << m_err;
-        const std::string top = c.file.substr(0, c.file.rfind('/'));
         unlink(m_root.path(c.file).c_str());
-        rmdir(m_root.path(top).c_str());
+        rmdir(m_root.path(c.file.substr(0, c.file.rfind('/'))).c_str());
     }
     write_good_tree();
-    unlink(m_root.path("modem_log/sha1.txt").c_str());
     m_root.write_file(MODEM_DUMP, frame("in progress"));  // just now
-    EXPECT_EQ(symlink("/dev/zero", m_root.path(WCN + "1-cp_wcn-2016-02-01_00-00-00.log").c_str()),
-              0);
+    ASSERT_EQ(symlink("/dev/zero", m_root.path(WCN + "smsg_" + STAMP + ".log").c_str()), 0);
     EXPECT_EQ(run("verify ."), 3);
-    EXPECT_EQ(m_out,
-              "./modem_log/2016-03-01-09-15-00/cp_wcn/1-cp_wcn-2016-02-01_00-00-00.log: "
-              "damage: does not belong here\n./modem_log/modem_db.gz: damage: without "
-              "sha1.txt\n./" +
-                  MODEM_DUMP +
-                  ": note: the dump is going on\n17 files checked, 2 damages, 1 notes\n");
+    for (const char* line : {".log: damage: does not belong here\n", "note: the dump is going on\n",
+                             " 1 damages, 1 notes\n"}) {
+        EXPECT_TRUE(said(line)) << line << m_out;
+    }
 }
 
 TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     write_good_tree();
-    setenv("TZ", "America/New_York", 1);  // of no account: records and names are local
     EXPECT_EQ(run("info " + MODEM_LOG), 0) << m_err;
     for (const char* line :
-         {"kind            log\n", "cp              cp_wcdma\n",
-          "started         2016-03-01 09:15:00\n", "time record     2016-03-01 09:15:00\n",
-          "cp time         7e017e0304057dff\n", "frames          2\n", "payload         60002\n",
-          "other bytes     0\n", "damaged         no\n"}) {
+         {"started         2016-03-01 09:15:00\n", "time record     2016-03-01 09:15:00\n",
+          "cp time         7e017e0304057dff\n", "frames          2\n", "payload         60002\n"}) {
         EXPECT_TRUE(said(line)) << line << m_out;
     }
-    unsetenv("TZ");
     EXPECT_EQ(run("--json info " + DSP_LOG), 0) << m_err;
-    EXPECT_TRUE(
-        said("\"log_chunks\":1,\"log_bytes\":7,\"pcm_chunks\":1,\"pcm_bytes\":0,"
-             "\"dump_chunks\":1,\"dump_bytes\":1000,\"sequence_gaps\":0,"
-             "\"payload\":1007,\"other_bytes\":0,\"damaged\":false,\"findings\":[]}\n"))
-        << m_out;
-    EXPECT_EQ(run("info " + MODEM_DUMP), 0);
-    EXPECT_TRUE(said("end marker      yes\n")) << m_out;
+    EXPECT_TRUE(said("\"dump_bytes\":1000,\"sequence_gaps\":0,\"payload\":1007,")) << m_out;
 
     // Frames are found between anything, across every window, and after a lost flag.
     std::string text = "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(700000, 2);
@@ -256,36 +207,29 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     write(WCN_LOG, text);
     EXPECT_EQ(run("frames " + WCN_LOG + " | grep -v wrong"), 0);
     const size_t at = text.find(frame(big, 3, 4).substr(0, 20));
-    char expected[256];
-    snprintf(expected, sizeof(expected),
-             "%10d  seq 0          type 0x9d 0x01      5 bytes\n"
-             "%10zu  seq 0          type 0x03 0x04  65527 bytes\n"
-             "%10zu  seq 0          type 0x9d 0x01      4 bytes\n",
-             16, at, text.size() - frame("last").size());
-    EXPECT_EQ(m_out, expected);
+    const std::string seq = "  seq 0          type ";
+    for (const std::string& line :
+         {"16" + seq + "0x9d 0x01      5 bytes\n",
+          std::to_string(at) + seq + "0x03 0x04  65527 bytes\n",
+          std::to_string(text.size() - frame("last").size()) + seq + "0x9d 0x01      4 bytes\n"}) {
+        EXPECT_TRUE(said(line)) << line << m_out;
+    }
+    EXPECT_EQ(std::count(m_out.begin(), m_out.end(), '\n'), 3);
     EXPECT_EQ(run("--json frames " + DSP_LOG), 0);
-    EXPECT_TRUE(
-        said("{\"offset\":27,\"seq\":8,\"type\":157,\"sub_type\":67,\"len\":8,\"payload\":"
-             "0,\"intact\":true,\"kind\":\"pcm\"}\n"))
-        << m_out;
-    EXPECT_EQ(run("info ."), 2);
+    EXPECT_TRUE(said("\"len\":8,\"payload\":0,\"intact\":true,\"kind\":\"pcm\"}\n")) << m_out;
     EXPECT_EQ(run("frames " + WCN_LOG + " >/dev/full 2>/dev/null; echo $?"), 0);
     EXPECT_EQ(m_out, "4\n");
 }
 
 TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
+    static const uint8_t KINDS[] = {AgDspLogHandler::DLT_LOG, AgDspLogHandler::DLT_PCM,
+                                    AgDspLogHandler::DLT_DUMP};
     std::string text, want[3];
     for (uint32_t seq = 0; seq < 60; ++seq) {
-        static const uint8_t KINDS[] = {AgDspLogHandler::DLT_LOG, AgDspLogHandler::DLT_PCM,
-                                        AgDspLogHandler::DLT_DUMP};
         const std::string data = pattern_bytes(seq * 500, seq) + "~~~~";
-        std::string bytes = chunk(data, KINDS[seq % 3], seq);
-        if (seq == 31) {
-            bytes[9] = 0;  // one PCM chunk is lost
-        } else {
-            want[seq % 3] += data;
-        }
-        text += bytes;
+        text += seq == 31 ? altered(chunk(data, KINDS[1], seq), 9, 0)
+                          : chunk(data, KINDS[seq % 3], seq);
+        want[seq % 3] += seq == 31 ? "" : data;  // that one is lost
     }
     write(OLD_DSP_LOG, text);
     m_root.make_dir("to");
@@ -294,45 +238,33 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
     EXPECT_EQ(m_root.read_file(stem + "log.bin"), want[0]);
     EXPECT_EQ(m_root.read_file(stem + "pcm.bin"), want[1]);
     EXPECT_EQ(m_root.read_file(stem + "dump.bin"), want[2]);
-    EXPECT_TRUE(said(stem + "pcm.bin: 19 chunks, " + std::to_string(want[1].size()) + " bytes\n"));
     EXPECT_TRUE(said("1 sequence gaps, 15524 other bytes\n")) << m_out;
 
-    // Nothing is replaced unasked, nor anything half done left.
-    EXPECT_EQ(unlink(m_root.path(stem + "log.bin").c_str()), 0);
+    // Nothing is replaced unasked; with --force a link is replaced, not followed.
     EXPECT_EQ(run("split --output=to " + OLD_DSP_LOG), 4);
-    EXPECT_NE(m_err.find("pcm.bin: File exists"), std::string::npos) << m_err;
-    EXPECT_EQ(m_root.list("to").size(), 2u);
-    // With --force a link is replaced, not followed.
     write("victim", "v");
+    unlink(m_root.path(stem + "log.bin").c_str());
     EXPECT_EQ(symlink(m_root.path("victim").c_str(), m_root.path(stem + "log.bin").c_str()), 0);
     write(OLD_DSP_LOG, THREE_CHUNKS);
     EXPECT_EQ(run("--json split --force --output to " + OLD_DSP_LOG), 0) << m_err;
     EXPECT_EQ(m_root.read_file(stem + "log.bin"), "log~~~~");
     EXPECT_EQ(m_root.read_file("victim"), "v");
-    EXPECT_TRUE(said("pcm.bin\",\"chunks\":1,\"bytes\":0}")) << m_out;
-    write("renamed", THREE_CHUNKS);
-    EXPECT_EQ(run("split renamed"), 0) << m_err;
-    EXPECT_EQ(m_root.read_file("renamed.dump.bin"), LOG_DATA);
-    write(WCN_LOG, LOG_DATA);
-    EXPECT_EQ(run("split " + WCN_LOG), 2);
-    EXPECT_EQ(run("split --output nowhere " + OLD_DSP_LOG), 4);
 }
 
 // What the service's own storage classes make, after rotation and trimming.
 TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
-    CpSetDirectory* set;
     StorageManager manager;
     MediaStorage media(&manager);
     media.set_dirs(android::String8(m_root.path("data").c_str()));
     ASSERT_EQ(media.stat(), 0);
-    ASSERT_NE(set = media.create_cp_set(), nullptr);
+    ASSERT_NE(media.create_cp_set(), nullptr);
+    const android::String8 gnss("cp_gnss");
     bool is_new;
     for (int i = 0; i < 4; ++i) {
-        if (CpDirectory* dir = media.get_cp_dir(android::String8("cp_gnss"))) {
+        if (CpDirectory* dir = media.get_cp_dir(gnss)) {
             dir->rotate_logs();
         }
-        LogFile* file =
-            media.create_file(android::String8("cp_gnss"), LT_LOG, is_new, android::String8());
+        LogFile* const file = media.create_file(gnss, LT_LOG, is_new, android::String8());
         ASSERT_NE(file, nullptr);
         EXPECT_EQ(file->write(LOG_DATA.data(), 100), 100);
         file->close();
@@ -340,41 +272,21 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     media.trim(100);
     EXPECT_EQ(run("verify data"), 0) << m_err;
     EXPECT_EQ(m_out, "3 files checked, 0 damages, 0 notes\n");
-    EXPECT_EQ(run("ls --json data"), 0);
-    const std::string name = set->path().string();
-    const std::string head = "{\"set\":\"" + name.substr(name.rfind('/') + 1) + "\",";
-    EXPECT_EQ(m_out.find(head + "\"cps\":1,\"files\":3,\"size\":300,\"from\":\""), 0u) << m_out;
-    EXPECT_TRUE(said("\n" + head + "\"cp\":\"cp_gnss\",\"files\":3,\"size\":300,")) << m_out;
-    EXPECT_LT(m_out.find("\"kind\":\"log\",\"number\":2,"), m_out.find("\"number\":0,")) << m_out;
     EXPECT_EQ(run("ls data"), 0);
     EXPECT_TRUE(said("  cp_gnss                         300 bytes     3 files  2")) << m_out;
+    EXPECT_EQ(run("ls --json data"), 0);
+    EXPECT_LT(m_out.find("\"kind\":\"log\",\"number\":2,"), m_out.find("\"number\":0,")) << m_out;
 }
 
-TEST_F(KestlogTest, WrongUsageHelpAndCompletion) {
+TEST_F(KestlogTest, WrongUsageAndHelp) {
     for (const char* args :
          {"", "fly", "ls", "ls a b", "ls ''", "--fly ls x", "ls --force x", "info --output d x"}) {
         EXPECT_EQ(run(args), 1) << args;
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
     }
-    std::ifstream file(SOURCE_DIR "/docs/man/kestlog.1");
-    std::stringstream manual;
-    manual << file.rdbuf();
-    EXPECT_EQ(run("--complete ''"), 0);
-    EXPECT_EQ(m_out, "ls\ninfo\nverify\nframes\nsplit\n");
-    std::istringstream commands(m_out);
     EXPECT_EQ(run("--help"), 0);
-    for (std::string command; commands >> command;) {
-        EXPECT_TRUE(said("\n  " + command + " ")) << command;
-        EXPECT_NE(manual.str().find("\n.BI " + command + " \""), std::string::npos) << command;
-    }
-    static const struct {
-        const char *words, *out;
-    } CASES[] = {
-        {"v", "verify\n"},          {"--o", "--output\n"}, {"ls --", "--help\n--json\n--version\n"},
-        {"split --f", "--force\n"}, {"info ''", ""},       {"--output ''", ""}};
-    for (const auto& c : CASES) {
-        EXPECT_EQ(run(std::string("--complete ") + c.words), 0);
-        EXPECT_EQ(m_out, c.out) << c.words;
+    for (const char* command : {"ls", "info", "verify", "frames", "split"}) {
+        EXPECT_TRUE(said(std::string("\n  ") + command + " ")) << command;
     }
 }
 
