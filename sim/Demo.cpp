@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <vector>
 
+#include "sim/run_program.h"
 #include "sim/scenes/scenes.h"
 
 namespace fs = std::filesystem;
@@ -17,8 +18,10 @@ const struct {
     double share;
     void (*play)(DemoStage& stage);
 } SCENES[] = {
-    {0.05, play_control},     {0.12, play_retrieval}, {0.33, play_sd_inserted},
-    {0.40, play_modem_crash}, {0.60, play_wcn_crash}, {0.80, play_sd_removed},
+    {0.04, play_control},     {0.08, play_retrieval},       {0.20, play_sd_inserted},
+    {0.28, play_modem_crash}, {0.28, play_parsing_library}, {0.44, play_wcn_crash},
+    {0.58, play_sd_removed},  {0.64, play_new_firmware},    {0.68, play_audio_dsp},
+    {0.76, play_iq_capture},
 };
 
 void print_tree(const fs::path& dir, const std::string& indent) {
@@ -30,6 +33,9 @@ void print_tree(const fs::path& dir, const std::string& indent) {
     std::sort(paths.begin(), paths.end());
     for (const fs::path& path : paths) {
         const std::string name = path.filename().string();
+        if (name[0] == '.') {
+            continue;  // the simulator's own
+        }
         if (fs::is_directory(fs::symlink_status(path, ec))) {
             printf("%s%s/\n", indent.c_str(), name.c_str());
             print_tree(path, indent + "    ");
@@ -103,7 +109,30 @@ bool Demo::finish() {
     m_stage.logs().scan();
     printf("\nWhat is in the root now:\n");
     print_tree(m_stage.handset().root(), "    ");
-    return show_verdict() && good;
+    const bool read = read_logs();
+    return show_verdict() && read && good;
+}
+
+bool Demo::read_logs() {
+    if (m_options.reader.empty()) {
+        return true;
+    }
+    bool good = true;
+    printf("\nWhat kestlog says of the logs:\n");
+    for (const LogCollector::Medium& medium : m_stage.logs().media()) {
+        std::error_code ec;
+        if (!fs::exists(medium.log_root, ec)) {
+            continue;
+        }
+        std::string text;
+        const int status = run_program({m_options.reader, "verify", medium.log_root}, &text);
+        printf("    %-9s %s", medium.name.c_str(), text.empty() ? "nothing\n" : text.c_str());
+        if (status != 0) {
+            printf("    %-9s FAILED: exit status %d\n", "", status);
+            good = false;
+        }
+    }
+    return good;
 }
 
 bool Demo::show_verdict() {

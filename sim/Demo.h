@@ -19,6 +19,7 @@ public:
 private:
     void play();
     bool finish();
+    bool read_logs();
     bool show_verdict();
 
     const DemoOptions m_options;

@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <iterator>
 
 #include "sim/kernel_files.h"
@@ -42,6 +43,8 @@ bool ends_with(const std::string& text, const std::string& end) {
 DemoStage::DemoStage(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
     : m_options(options),
       m_interrupted(interrupted),
+      m_modem_image(300000, 1),
+      m_rate(options.rate),
       m_tty(isatty(STDOUT_FILENO) != 0),
       m_start(std::chrono::steady_clock::now()) {}
 
@@ -61,8 +64,12 @@ bool DemoStage::set_up() {
             return fail(m_handset.error());
         }
     }
+    if (!m_handset.add_audio_dsp() || !m_handset.add_iq_memory()) {
+        return fail(m_handset.error());
+    }
     const std::string& root = m_handset.root();
-    if (!make_kernel_files(root) || !m_modem_supervisor.start("modemd", root) ||
+    if (!m_modem_image.install(m_handset, "w") || !make_kernel_files(root) ||
+        !m_modem_supervisor.start("modemd", root) ||
         !m_wcn_supervisor.start("external_wcn_kest", root)) {
         return fail("cannot set up " + root + ": " + strerror(errno));
     }
@@ -128,6 +135,12 @@ bool DemoStage::wait_until(const std::function<bool()>& condition, double second
     return true;
 }
 
+bool DemoStage::wait_for(const std::function<void()>& work) {
+    const std::future<void> done = std::async(std::launch::async, work);
+    return wait_until(
+        [&] { return done.wait_for(std::chrono::seconds(0)) == std::future_status::ready; }, 60);
+}
+
 void DemoStage::step() {
     usleep(5000);
     const double before = m_now;
@@ -148,7 +161,7 @@ void DemoStage::feed(double seconds) {
     for (size_t i = 0; i < m_due.size(); ++i) {
         SimCp& cp = *m_handset.cps()[i];
         if (cp.running) {
-            m_due[i] += seconds * m_options.rate * 1024;
+            m_due[i] += seconds * m_rate * 1024;
             const uint64_t fed = cp.feed(std::min(static_cast<uint64_t>(m_due[i]), FEED_STEP));
             m_due[i] -= static_cast<double>(fed);
             m_unwatched += fed;
@@ -263,15 +276,15 @@ bool DemoStage::expect_notification(const std::string& line, double timeout_s) {
     return check(false, "the client was to receive " + line);
 }
 
-std::vector<std::string> DemoStage::files(const SimCp& cp, const std::string& prefix,
-                                          const std::string& suffix) const {
+std::vector<std::string> DemoStage::cp_files(const std::string& cp_name, const std::string& prefix,
+                                             const std::string& suffix) const {
     std::vector<std::string> found;
     std::error_code ec;
     for (const LogCollector::Medium& medium : m_logs->media()) {
         for (fs::directory_iterator set(medium.log_root, ec), end; !ec && set != end;
              set.increment(ec)) {
             std::error_code none;
-            for (fs::directory_iterator file(set->path() / cp.name, none), last;
+            for (fs::directory_iterator file(set->path() / cp_name, none), last;
                  !none && file != last; file.increment(none)) {
                 const std::string name = file->path().filename().string();
                 if (begins_with(name, prefix) && ends_with(name, suffix)) {

@@ -17,16 +17,18 @@
 #include "sim/SimControlClient.h"
 #include "sim/SimDiagResponder.h"
 #include "sim/SimHandset.h"
+#include "sim/SimModemImage.h"
 #include "sim/SimSupervisor.h"
 
 struct DemoOptions {
     std::string program;  // of the service
     std::string root;     // empty: a new directory
-    double seconds = 30;
+    double seconds = 60;
     unsigned rate = 500;  // KB/s for each CP
     bool sd = true;       // the SD card comes and goes
     bool fast = false;    // the scenes do not take their time
     bool remove = false;  // remove the root at the end
+    std::string reader;   // the program kestlog; empty: the logs are not read with it
 };
 
 class DemoStage {
@@ -44,6 +46,10 @@ public:
     bool run_until(double seconds);
     bool wait_until(const std::function<bool()>& condition, double seconds);
     bool wait(double seconds) { return run_until(m_now + seconds); }
+    // Does the work on another thread meanwhile.
+    bool wait_for(const std::function<void()>& work);
+    // KB/s from each CP, as far as its device takes them; 0 for what the options say.
+    void set_rate(unsigned rate) { m_rate = rate > 0 ? rate : m_options.rate; }
     // Interrupted, or the service ended by itself.
     bool over();
 
@@ -68,7 +74,11 @@ public:
 
     // The files of a CP in all its directories, as "prefix*suffix".
     std::vector<std::string> files(const SimCp& cp, const std::string& prefix,
-                                   const std::string& suffix) const;
+                                   const std::string& suffix) const {
+        return cp_files(cp.name, prefix, suffix);
+    }
+    std::vector<std::string> cp_files(const std::string& cp_name, const std::string& prefix,
+                                      const std::string& suffix) const;
     // Checks that there is one such file that was not among the earlier ones, and that it
     // holds these bytes.
     bool check_new_file(const SimCp& cp, const std::string& prefix, const std::string& suffix,
@@ -86,6 +96,8 @@ public:
     SimSupervisor& wcn_supervisor() { return m_wcn_supervisor; }
     SimCp& modem() { return *m_handset.cp("cp_wcdma"); }
     SimCp& wcn() { return *m_handset.cp("cp_wcn"); }
+    // The modem's firmware that the service finds when it starts.
+    const SimModemImage& modem_image() const { return m_modem_image; }
     SimDiagResponder& modem_diag() { return *m_modem_diag; }
     SimDiagResponder& wcn_diag() { return *m_wcn_diag; }
     double now() const { return m_now; }
@@ -102,6 +114,8 @@ private:
     SimHandset m_handset;
     ServiceProcess m_service;
     std::unique_ptr<LogCollector> m_logs;
+    const SimModemImage m_modem_image;
+    unsigned m_rate;
     SimSupervisor m_modem_supervisor;
     SimSupervisor m_wcn_supervisor;
     std::unique_ptr<SimDiagResponder> m_modem_diag;

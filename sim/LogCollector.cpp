@@ -74,6 +74,14 @@ LogCollector::~LogCollector() {
     }
 }
 
+void LogCollector::set_quota(const std::string& medium, unsigned mb) {
+    for (Medium& m : m_media) {
+        if (m.name == medium) {
+            m.quota = static_cast<uint64_t>(mb) << 20;
+        }
+    }
+}
+
 size_t LogCollector::index_of(const std::string& cp_name) const {
     const auto& cps = m_handset.cps();
     const auto found =

@@ -39,6 +39,8 @@ public:
 
     // As of the last scan: the internal medium and the SD card.
     const std::vector<Medium>& media() const { return m_media; }
+    // The service was told another quota for the medium of this name.
+    void set_quota(const std::string& medium, unsigned mb);
     // The medium written last; null while there is no log file.
     const Medium* in_use() const { return m_in_use < 0 ? nullptr : &m_media[size_t(m_in_use)]; }
     // Log files that were deleted, and their bytes, as seen so far.

@@ -3,15 +3,28 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <signal.h>
+#include <stdlib.h>
 #include <string.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <fstream>
 #include <iterator>
 
 #include "sim/SimHandset.h"
+
+namespace {
+
+// "NAME=added", with what the variable holds already behind it.
+std::string extended_variable(const std::string& name, const std::string& added,
+                              const char* separator) {
+    const char* old = getenv(name.c_str());
+    return name + "=" + added + (old && *old ? separator + std::string(old) : "");
+}
+
+}  // namespace
 
 bool ServiceProcess::start(const std::string& program, const SimHandset& handset,
                            const std::vector<std::string>& args) {
@@ -25,11 +38,23 @@ bool ServiceProcess::start(const std::string& program, const SimHandset& handset
     std::vector<std::string> env = {"KESTMODEM_ROOT=" + handset.root(),
                                     "EXTERNAL_STORAGE=" + handset.sd_root(),
                                     "SECONDARY_STORAGE=" + handset.sd_root()};
+    if (handset.needs_drivers()) {
+        std::error_code ec;
+        const std::string library = std::filesystem::read_symlink("/proc/self/exe", ec)
+                                        .replace_filename("libkestsim_devices.so")
+                                        .string();
+        if (access(library.c_str(), R_OK) != 0) {
+            return false;
+        }
+        env.push_back(extended_variable("LD_PRELOAD", library, ":"));
+        // A build with the address sanitizer wants its own library in front.
+        env.push_back(extended_variable("ASAN_OPTIONS", "verify_asan_link_order=0", ":"));
+    }
+    const size_t own = env.size();
     for (char** e = environ; *e; ++e) {
-        const char* own[] = {"KESTMODEM_ROOT=", "EXTERNAL_STORAGE=", "SECONDARY_STORAGE="};
         bool replaced = false;
-        for (const char* name : own) {
-            replaced = replaced || strncmp(*e, name, strlen(name)) == 0;
+        for (size_t i = 0; i < own; ++i) {
+            replaced = replaced || strncmp(*e, env[i].c_str(), env[i].find('=') + 1) == 0;
         }
         if (!replaced) {
             env.push_back(*e);

@@ -1,7 +1,8 @@
 // One run of the service against a simulated handset: started with the handset's root and
 // SD card in its environment, what it prints and logs in the file "kestmodem.log" of the
 // root, in a process group of its own so that Ctrl-C reaches only the simulator. It never
-// outlives the simulator's main thread.
+// outlives the simulator's main thread. When the handset has devices that need drivers, the
+// library kestsim_devices beside this program is preloaded into it.
 #ifndef SIM_SERVICEPROCESS_H_
 #define SIM_SERVICEPROCESS_H_
 
@@ -19,7 +20,7 @@ public:
     ServiceProcess(const ServiceProcess&) = delete;
     ServiceProcess& operator=(const ServiceProcess&) = delete;
 
-    // False with errno set if there is no such program or no process.
+    // False with errno set if there is no such program, no drivers or no process.
     bool start(const std::string& program, const SimHandset& handset,
                const std::vector<std::string>& args = {});
     // Whether it still runs; collects its status when it does not.

@@ -131,6 +131,15 @@ SimCp* SimHandset::add_cp(const std::string& name, bool terminal) {
     return announced && write_config() ? m_cps.back().get() : nullptr;
 }
 
+bool SimHandset::add_audio_dsp() {
+    return m_audio_dsp.create(m_root) ? write_config()
+                                      : fail("cannot make the devices of the audio DSP");
+}
+
+bool SimHandset::add_iq_memory() {
+    return m_iq_memory.create(m_root) || fail("cannot make the I/Q memory");
+}
+
 SimCp* SimHandset::cp(const std::string& name) const {
     const auto found =
         std::find_if(m_cps.begin(), m_cps.end(), [&](const auto& cp) { return cp->name == name; });
@@ -146,6 +155,9 @@ bool SimHandset::write_config() {
     text += "#Type\tName\tState\tSize\tLevel\n";
     for (const auto& cp : m_cps) {
         text += "stream\t" + cp->name + "\ton\t100\t3\n";
+    }
+    if (m_audio_dsp.exists()) {
+        text += "stream\tagdsp\ton\t100\t3\n";
     }
     const std::string file = path("system/etc/kest_modem.conf");
     return replace_file(file, text) || fail("cannot write " + file);

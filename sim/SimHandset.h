@@ -13,6 +13,8 @@
 #include <vector>
 
 #include "sim/SimDiagDevice.h"
+#include "sim/SimDspDevice.h"
+#include "sim/SimIqDevice.h"
 #include "sim/SimLogDevice.h"
 #include "sim/SimStream.h"
 #include "sim/TimeService.h"
@@ -58,6 +60,14 @@ public:
     // terminal its log device is one that can also be read, for requests or a dump
     // through the device that a CP other than a modem has for both.
     SimCp* add_cp(const std::string& name, bool terminal = false);
+    // Adds the audio DSP ("agdsp"), its devices and its line in the default configuration;
+    // its log is no stream like the CPs'. False with error() set on failure.
+    bool add_audio_dsp();
+    // Adds the modem's I/Q memory. False with error() set on failure.
+    bool add_iq_memory();
+    // Some devices are more than a FIFO or a terminal: their drivers have to be preloaded
+    // into the service, which ServiceProcess does.
+    bool needs_drivers() const { return m_audio_dsp.exists() || m_iq_memory.exists(); }
     // Null when there is none of this name.
     SimCp* cp(const std::string& name) const;
 
@@ -78,6 +88,8 @@ public:
     std::string sd_root() const { return path("storage/sdcard0"); }
     const SimSizes& sizes() const { return m_sizes; }
     const std::vector<std::unique_ptr<SimCp>>& cps() const { return m_cps; }
+    SimDspDevice& audio_dsp() { return m_audio_dsp; }
+    SimIqDevice& iq_memory() { return m_iq_memory; }
     TimeService& time_service() { return m_time; }
     const std::string& error() const { return m_error; }
 
@@ -89,6 +101,8 @@ private:
     SimSizes m_sizes;
     std::vector<std::pair<std::string, std::string>> m_props;
     std::vector<std::unique_ptr<SimCp>> m_cps;
+    SimDspDevice m_audio_dsp;
+    SimIqDevice m_iq_memory;
     TimeService m_time;
     bool m_sd = false;
     std::string m_error;

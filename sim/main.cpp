@@ -8,6 +8,8 @@
 
 #include "sim/Demo.h"
 
+namespace fs = std::filesystem;
+
 namespace {
 
 volatile sig_atomic_t s_interrupted = 0;
@@ -18,16 +20,19 @@ void on_signal(int) {
 
 const char USAGE[] =
     "usage: kestsim [options]\n"
-    "Runs the service kestmodem on a simulated handset: a modem, a connectivity chip and a\n"
-    "GNSS receiver stream their logs while the SD card comes and goes, CPs crash and a client\n"
-    "asks for this and that. Shows the progress and the resulting tree and checks that no\n"
+    "Runs the service kestmodem on a simulated handset: a modem, a connectivity chip, a GNSS\n"
+    "receiver and an audio DSP stream their logs while the SD card comes and goes, CPs crash,\n"
+    "I/Q samples are captured and a client asks for this and that. Shows the progress and the "
+    "resulting tree and checks that no\n"
     "byte was lost or doubled and that everything asked for came.\n"
     "\n"
     "  --kestmodem PATH  the service's program (default: the one beside this program)\n"
+    "  --kestlog PATH    the program that reads the logs at the end (default: the one beside\n"
+    "                    this program, if it is there)\n"
     "  --root DIR        root of the handset, absent or empty (default: a new one in /tmp)\n"
-    "  --seconds N       length of the run (default 30), longer if the scenes need it\n"
+    "  --seconds N       length of the run (default 60), longer if the scenes need it\n"
     "  --rate KB         KB/s from each CP (default 500)\n"
-    "  --fast            a run of 6 seconds at 2000 KB/s, with short scenes\n"
+    "  --fast            a run of 12 seconds at 2000 KB/s, with short scenes\n"
     "  --sd, --no-sd     whether the SD card comes and goes (default: it does)\n"
     "  --rm              remove the root at the end\n"
     "  --help            this text\n"
@@ -36,6 +41,7 @@ const char USAGE[] =
 
 enum Option {
     OPT_PROGRAM = 1,
+    OPT_READER,
     OPT_ROOT,
     OPT_SECONDS,
     OPT_RATE,
@@ -48,6 +54,7 @@ enum Option {
 
 const option OPTIONS[] = {
     {"kestmodem", required_argument, nullptr, OPT_PROGRAM},
+    {"kestlog", required_argument, nullptr, OPT_READER},
     {"root", required_argument, nullptr, OPT_ROOT},
     {"seconds", required_argument, nullptr, OPT_SECONDS},
     {"rate", required_argument, nullptr, OPT_RATE},
@@ -75,6 +82,9 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
             case OPT_PROGRAM:
                 options.program = optarg;
                 break;
+            case OPT_READER:
+                options.reader = optarg;
+                break;
             case OPT_ROOT:
                 options.root = optarg;
                 good = !options.root.empty();
@@ -88,7 +98,7 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 options.rate = static_cast<unsigned>(number);
                 break;
             case OPT_FAST:
-                options.seconds = 6;
+                options.seconds = 12;
                 options.fast = true;
                 options.rate = 2000;
                 break;
@@ -125,11 +135,14 @@ int main(int argc, char** argv) {
     if (stop != 0) {
         return stop - 1;
     }
+    std::error_code ec;
+    const fs::path self = fs::read_symlink("/proc/self/exe", ec);
     if (options.program.empty()) {
-        std::error_code ec;
-        options.program = std::filesystem::read_symlink("/proc/self/exe", ec)
-                              .replace_filename("kestmodem")
-                              .string();
+        options.program = fs::path(self).replace_filename("kestmodem").string();
+    }
+    const fs::path reader = fs::path(self).replace_filename("kestlog");
+    if (options.reader.empty() && fs::exists(reader, ec)) {
+        options.reader = reader.string();
     }
     struct sigaction action = {};
     action.sa_handler = on_signal;

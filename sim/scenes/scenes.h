@@ -16,5 +16,12 @@ void play_retrieval(DemoStage& stage);
 // crash_scenes.cpp
 void play_modem_crash(DemoStage& stage);
 void play_wcn_crash(DemoStage& stage);
+// parsing_scenes.cpp
+void play_parsing_library(DemoStage& stage);
+void play_new_firmware(DemoStage& stage);
+// dsp_scenes.cpp
+void play_audio_dsp(DemoStage& stage);
+// iq_scenes.cpp: raises the internal medium's quota for good, the captures have to fit
+void play_iq_capture(DemoStage& stage);
 
 #endif  // SIM_SCENES_SCENES_H_

@@ -1,0 +1,36 @@
+#include "sim/SharedFile.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+bool SharedFile::create(const std::string& path, size_t size) {
+    remove();
+    const int fd = open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+    if (fd < 0) {
+        return false;
+    }
+    m_path = path;
+    void* data = MAP_FAILED;
+    if (ftruncate(fd, static_cast<off_t>(size)) == 0) {
+        data = mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
+    }
+    close(fd);
+    if (data == MAP_FAILED) {
+        return false;
+    }
+    m_data = static_cast<uint8_t*>(data);
+    m_size = size;
+    return true;
+}
+
+void SharedFile::remove() {
+    if (m_data) {
+        munmap(m_data, m_size);
+        m_data = nullptr;
+    }
+    if (!m_path.empty()) {
+        unlink(m_path.c_str());
+        m_path.clear();
+    }
+}

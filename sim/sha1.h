@@ -1,0 +1,12 @@
+// The SHA-1 digest: 20 bytes.
+#ifndef SIM_SHA1_H_
+#define SIM_SHA1_H_
+
+#include <stddef.h>
+#include <stdint.h>
+
+#include <vector>
+
+std::vector<uint8_t> sha1(const uint8_t* data, size_t len);
+
+#endif  // SIM_SHA1_H_
