@@ -23,5 +23,6 @@ bool DataConsumer::data_waits() const {
     pfd.fd = m_handler->fd();
     pfd.events = POLLIN;
     pfd.revents = 0;
-    return poll(&pfd, 1, 0) > 0 && (pfd.revents & POLLIN);
+    // A device that hung up or failed is readable as well, for ever and without data.
+    return poll(&pfd, 1, 0) > 0 && pfd.revents == POLLIN;
 }

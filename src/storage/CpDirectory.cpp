@@ -154,7 +154,8 @@ LogFile* CpDirectory::find(const android::String8& name) const {
     return nullptr;
 }
 
-// Gives a file a name that no other one wants, "-N" before its extension. 0 or -1.
+// Gives a file a name that no other one wants, "-N" before its extension. 0 or -1. One that
+// is gone from the medium is dropped.
 int CpDirectory::set_aside(LogFile* file) {
     const android::String8& name = file->name();
     const char* dot = strrchr(name.string(), '.');
@@ -165,6 +166,9 @@ int CpDirectory::set_aside(LogFile* file) {
         aside.appendFormat("-%u%s", ++m_aside_num, name.string() + stem_len);
     } while (find(aside));
     if (file->rename_to(m_path, aside) < 0) {
+        if (errno == ENOENT) {
+            return remove_file(file);  // somebody deleted it: nothing is in the way
+        }
         err_log("set aside %s failed", name.string());
         return -1;
     }

@@ -1,0 +1,145 @@
+// The audio DSP's three devices in one log.
+#include "channels/AgDspLogHandler.h"
+#include "channels/DspChunkHeader.h"
+#include "channels/FaultFixture.h"
+#include "iq/fake_devices.h"
+
+namespace {
+
+constexpr unsigned long COMPLETE = 0x40045806;
+enum Kind { LOG = 0x40, DUMP = 0x42, PCM = 0x43 };
+
+// A chunk as the log file holds it, written down byte by byte.
+std::string chunk(uint32_t seq, Kind kind, const std::string& data) {
+    const uint32_t n = static_cast<uint32_t>(data.size());
+    const uint32_t sum = n + 0x5a6a;
+    const uint32_t check = ~((sum >> 16) + (sum & 0xffff));
+    std::string head = "\x7e\x7e\x7e\x7e";
+    for (uint32_t half : {n + 16, 0u, 0x5a5au, check, seq & 0xffff, seq >> 16, n + 8}) {
+        head += static_cast<char>(half & 0xff);
+        head += static_cast<char>(half >> 8 & 0xff);
+    }
+    return head + '\x9d' + static_cast<char>(kind) + data;
+}
+
+class AgDspTest : public FaultFixture {
+protected:
+    AgDspTest() {
+        EXPECT_EQ(boot("stream agdsp on 5 3\n"), 0);
+        dsp = ctrl->get_cp(CT_AGDSP);
+        dsp->start();
+        log.clear();
+    }
+    // Has the device yield the steps, until the service has taken them all.
+    bool yields(FakeDevice& device, const FakeDevice::Steps& steps) {
+        device.script_reads(steps);
+        return pump([&] { return device.reads_left() == 0; });
+    }
+    std::string stored() {
+        dsp->flush();
+        return content("agdsp");
+    }
+    std::string device(const char* name) {
+        root.make_dir("dev");
+        return root.path("dev/audio_dsp_") + name;
+    }
+
+    FakeDevice logs{device("log")}, pcm{device("pcm")}, mem{device("mem")};
+    LogPipeHandler* dsp = nullptr;
+};
+
+TEST_F(AgDspTest, OneSequenceOverAllKindsByteForByte) {
+    const std::string data = pattern_bytes(100, 1);
+    ASSERT_TRUE(yields(logs, {{data, 0}}));
+    std::string sofar(
+        "\x7e\x7e\x7e\x7e\x74\x00\x00\x00\x5a\x5a\x31\xa5\x00\x00\x00\x00\x6c\x00\x9d\x40", 20);
+    sofar += data;
+    EXPECT_EQ(stored(), sofar);
+    EXPECT_EQ(make_dsp_chunk_header(32748, 0, 0).checksum, 0x25a9);
+
+    const std::string full = pattern_bytes(40000, 2);  // more than one read takes
+    const std::string first = full.substr(0, 32748);
+    ASSERT_TRUE(yields(pcm, {{"pcm", 0}, {"", 0}}));
+    ASSERT_TRUE(yields(mem, {{"memory", 0}, {full, 0}, {"rest", 0}, {"", 0}}));
+    sofar += chunk(1, PCM, "pcm") + chunk(2, PCM, "") + chunk(3, DUMP, "memory") +
+             chunk(4, DUMP, first) + chunk(5, DUMP, "rest");
+    EXPECT_TRUE(content("agdsp") == sofar) << "the dump was flushed";
+    ASSERT_TRUE(yields(pcm, {{full, 0}}));
+    ASSERT_TRUE(yields(logs, {{full, 0}}));
+    EXPECT_TRUE(stored() == sofar + chunk(6, PCM, first) + chunk(7, LOG, first));
+    EXPECT_EQ(log.count("notify_dump(FileNotifier*, void*): AG-DSP agdsp assert\n"), 1u);
+}
+
+TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
+    const struct {
+        FakeDevice::Steps steps;
+        std::string stored;
+        const char* message;
+    } cases[] = {
+        {{{"", 0}}, "", ""},
+        {{{"", EINTR}, {"a", 0}, {"", EINTR}, {"b", 0}, {"", 0}},
+         chunk(0, DUMP, "a") + chunk(1, DUMP, "b"),
+         ""},
+        {{{"", EIO}}, "", "save_dump(FileNotifier*): read AG-DSP dump device error [5("},
+        {{{"c", 0}, {"", EAGAIN}}, chunk(2, DUMP, "c"), "read AG-DSP dump device error [11("},
+    };
+    size_t completions = 0;
+    std::string expected;
+    for (const auto& c : cases) {
+        log.clear();
+        ASSERT_TRUE(yields(mem, c.steps));
+        EXPECT_EQ(mem.count(COMPLETE), ++completions);
+        EXPECT_EQ(log.count("dump device error"), *c.message ? 1u : 0u);
+        EXPECT_TRUE(log.has(c.message)) << log.text();
+        EXPECT_EQ(content("agdsp"), expected += c.stored);
+    }
+    // A write that fails, one that is short: the rest of the dump is not read.
+    const std::string big = pattern_bytes(32748, 3);
+    for (const auto& arrange : {+[] { faults::shorten(faults::WRITEV, 50000); },
+                                +[] { faults::fail(faults::WRITEV, 1, EIO); }}) {
+        log.clear();
+        arrange();
+        mem.script_reads({{big, 0}, {big, 0}, {big, 0}, {"left", 0}});
+        ASSERT_TRUE(pump([&] { return mem.count(COMPLETE) > completions; }));
+        EXPECT_TRUE(log.has("save_dump(FileNotifier*): agdsp save AG-DSP dump error ["));
+        EXPECT_GE(mem.reads_left(), 1u);
+        ASSERT_TRUE(yields(mem, {{"", 0}}));
+        completions = mem.count(COMPLETE);
+    }
+    // No file at all.
+    remove_tree("data/modem_log");
+    root.write_file("data/modem_log", "in the way");
+    ASSERT_TRUE(yields(mem, {{"d", 0}}));
+    EXPECT_EQ(mem.count(COMPLETE), completions + 1);
+    ASSERT_TRUE(yields(pcm, {{"d", 0}}));
+    ASSERT_TRUE(yields(logs, {{"d", 0}}));
+    EXPECT_EQ(log.count(": agdsp save log error ["), 2u);
+}
+
+TEST_F(AgDspTest, FailingDevices) {
+    const size_t running = open_descriptors();
+    const size_t slots = Filler::free_slots(mux());
+    ASSERT_TRUE(yields(pcm, {{"", EAGAIN}, {"", EINTR}, {"", ENODEV}}));
+    EXPECT_TRUE(log.has("read PCM device error [19("));
+    EXPECT_EQ(open_descriptors(), running - 1) << "off until the next start";
+    pcm.script_reads({{"p", 0}});
+    // The log device: nothing there is a bug of its driver, a failure leads to a new open.
+    ASSERT_TRUE(yields(logs, {{"", 0}, {"", EAGAIN}, {"", EINTR}, {"a", 0}, {"", EIO}, {"b", 0}}));
+    EXPECT_EQ(log.count("AG-DSP log device driver bug: read returns 0 ["), 1u);
+    EXPECT_EQ(pcm.reads_left(), 1u);
+    EXPECT_EQ(dsp->stop(), 0);
+    EXPECT_EQ(Filler::free_slots(mux()), slots + 3);
+    ASSERT_EQ(unlink(root.path("dev/audio_dsp_mem").c_str()), 0);
+    EXPECT_EQ(dsp->start(), 0);
+    EXPECT_TRUE(log.has("AgDspLogHandler::start(): start dump notifier error [2("));
+    ASSERT_TRUE(pump([&] { return pcm.reads_left() == 0; }));
+    // There is no dump over the diag device.
+    dsp->process_assert(false);
+    EXPECT_EQ(dsp->state(), CWS_NOT_WORKING);
+    dsp->process_alive();
+    ASSERT_TRUE(yields(logs, {{"c", 0}}));
+    EXPECT_EQ(stored(),
+              chunk(0, LOG, "a") + chunk(1, LOG, "b") + chunk(2, PCM, "p") + chunk(3, LOG, "c"));
+}
+
+}  // namespace

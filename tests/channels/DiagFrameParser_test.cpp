@@ -1,0 +1,117 @@
+#include "channels/DiagFrameParser.h"
+
+#include <gtest/gtest.h>
+#include <string.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "support/TestRoot.h"
+
+namespace {
+
+typedef std::vector<std::string> Strings;
+
+class DiagFrameParserTest : public testing::Test {
+protected:
+    // The frames in the pieces, fed one after the other as reads would be.
+    Strings decode(const Strings& pieces) {
+        Strings frames;
+        for (const std::string& piece : pieces) {
+            const uint8_t* data = reinterpret_cast<const uint8_t*>(piece.data());
+            for (size_t pos = 0, used = 0; pos < piece.size(); pos += used) {
+                uint8_t* frame = nullptr;
+                size_t len = 99;
+                if (parser->unescape(data + pos, piece.size() - pos, frame, len, used)) {
+                    EXPECT_EQ(piece[pos + used - 1], '\x7e');
+                    frames.emplace_back(reinterpret_cast<char*>(frame), len);
+                } else {
+                    EXPECT_EQ(frame, nullptr);
+                    EXPECT_EQ(used, piece.size() - pos);
+                }
+            }
+        }
+        return frames;
+    }
+    static std::string build(uint8_t type, uint8_t sub_type, const std::string& payload) {
+        uint8_t* buf = nullptr;
+        size_t len = 0;
+        DiagFrameParser::frame(type, sub_type, reinterpret_cast<const uint8_t*>(payload.data()),
+                               payload.size(), buf, len);
+        const std::string wire(reinterpret_cast<char*>(buf), len);
+        delete[] buf;
+        return wire;
+    }
+
+    std::unique_ptr<DiagFrameParser> parser = std::make_unique<DiagFrameParser>();
+};
+
+TEST_F(DiagFrameParserTest, DecodesTheSameWhereverTheInputIsSplit) {
+    // In ASCII the flag is '~', the escape '}', and "}^" and "}]" stand for them in a body.
+    const struct {
+        const char* what;
+        std::string input;
+        Strings frames;
+    } cases[] = {
+        {"escapes, next to each other and at both ends", "~}^a}]}^}]~", {"~a}~}"}},
+        {"an escaped byte that needed no escape", "~a}Ab~", {"aab"}},
+        {"the byte after an escape is never a flag", "~a}~b~", {"a^b"}},
+        {"repeated flags", "~~~body~", {"body"}},
+        {"garbage before the first flag", "x}yz~body~", {"body"}},
+        {"no frame in garbage", "xyz}}", {}},
+        {"a closing flag does not open the next frame", "~one~two~", {"one"}},
+        {"in step after a lost opening flag", "~1~2~~3~", {"1", "3"}},
+        {"garbage between frames", "~one~xx}~two~", {"one", "two"}},
+        {"unfinished", "~one~~two", {"one"}},
+    };
+    for (const auto& c : cases) {
+        for (size_t split = 0; split <= c.input.size(); ++split) {
+            parser->init();  // forgets the frame in progress
+            EXPECT_EQ(decode({c.input.substr(0, split), c.input.substr(split)}), c.frames)
+                << c.what << ", split at " << split;
+        }
+    }
+}
+
+TEST_F(DiagFrameParserTest, DropsAnOverlongFrameWholeAndStaysInStep) {
+    for (const char* byte : {"x", "}]"}) {
+        for (size_t len : {65536u, 65537u, 200000u}) {
+            std::string input = "~";
+            for (size_t i = 0; i < len; ++i) {
+                input += byte;
+            }
+            input += "~~next~";
+            Strings pieces;
+            for (size_t at = 0; at < input.size(); at += 32767) {
+                pieces.push_back(input.substr(at, 32767));
+            }
+            const Strings frames = decode(pieces);
+            ASSERT_EQ(frames.size(), len > 65536 ? 1u : 2u) << len;
+            EXPECT_TRUE(len > 65536 || frames[0] == std::string(len, *byte)) << len;
+            EXPECT_EQ(frames.back(), "next") << len;
+        }
+    }
+}
+
+TEST_F(DiagFrameParserTest, BuildsFramesThatDecodeAgain) {
+    EXPECT_EQ(build(0x3A, 0, ""), std::string("\x7e\0\0\0\0\x08\0\x3a\0\x7e", 10));
+    EXPECT_EQ(build(0x7E, 0x7D, ""), std::string("\x7e\0\0\0\0\x08\0\x7d\x5e\x7d\x5d\x7e", 12));
+    const std::string p(0x7E - 8, 'p');  // the length field itself needs an escape
+    EXPECT_EQ(build(1, 2, p), std::string("\x7e\0\0\0\0\x7d\x5e\0\1\2", 10) + p + "\x7e");
+    for (uint32_t seed = 0; seed < 40; ++seed) {
+        std::string payload = pattern_bytes(seed * seed * 13, seed);
+        for (size_t i = 0; i < payload.size(); i += seed % 7 + 2) {
+            payload[i] = i % 2 ? '\x7d' : '\x7e';
+        }
+        const Strings frames = decode({build(7, static_cast<uint8_t>(seed), payload)});
+        ASSERT_EQ(frames.size(), 1u) << seed;
+        DiagHeader header;
+        memcpy(&header, frames[0].data(), sizeof(header));
+        EXPECT_EQ(header.len, payload.size() + sizeof(header));
+        EXPECT_EQ(header.sub_type, seed);
+        EXPECT_EQ(frames[0].substr(sizeof(header)), payload);
+    }
+}
+
+}  // namespace

@@ -1,0 +1,248 @@
+#include "channels/ModemDumpConsumer.h"
+
+#include "channels/FaultFixture.h"
+#include "storage/MediaStorage.h"
+
+namespace {
+
+const std::string START_END = "CP_DUMP_START WCDMA\nCP_DUMP_END WCDMA\n";
+const std::string DUMP_NAME = std::string("cp_wcdma_memory") + STAMP;
+
+class ModemDumpTest : public FaultFixture {
+protected:
+    // Where the dump file lies; "" when there is none.
+    std::string dump_path() const {
+        for (const std::string medium : {"data", "sd"}) {
+            for (const std::string& name : root.tree(medium + "/modem_log")) {
+                if (name.find(".dmp") != std::string::npos) {
+                    return medium + "/modem_log/" + name;
+                }
+            }
+        }
+        return "";
+    }
+    std::string dir_of(const std::string& path) const { return path.substr(0, path.rfind('/')); }
+};
+
+TEST_F(ModemDumpTest, EndsAtTheMarkerWhereverItIsSplit) {
+    const std::string marker = end_marker();
+    for (bool one_device : {false, true}) {
+        boot_modem(one_device);
+        const size_t slots = Filler::free_slots(mux());
+        Files expected;
+        for (size_t split = 0; split < marker.size(); ++split) {
+            // All of one second: the older ones are set aside.
+            const std::string aside = split ? "-" + std::to_string(split) : "";
+            expected["data:" + DUMP_NAME + aside + ".dmp"] = "x\x7d" + marker;
+            ASSERT_TRUE(begin_dump());
+            ASSERT_TRUE(supply(diag_dev, "x\x7d" + marker.substr(0, split)));
+            ASSERT_EQ(modem()->state(), CWS_DUMP) << split;
+            ASSERT_TRUE(supply(diag_dev, marker.substr(split)));
+            ASSERT_EQ(modem()->state(), CWS_NOT_WORKING) << split;
+            EXPECT_EQ(modem()->fd(), -1);
+            modem()->process_alive();
+        }
+        EXPECT_EQ(files(), expected);
+        EXPECT_EQ(Filler::free_slots(mux()), slots);
+        EXPECT_EQ(log.count(": dump complete\n"), marker.size());
+        end_service();
+    }
+}
+
+TEST_F(ModemDumpTest, KeepsEveryByteAndOnlyTheMarkerEndsIt) {
+    const std::string header(8, '\x11');
+    const std::string decoys =
+        raw_frame(header + END_TEXT + "!") + raw_frame(header + "!" + END_TEXT) +
+        raw_frame(header + END_TEXT.substr(0, 20)) + raw_frame(END_TEXT) +
+        raw_frame(header + "\nmodem_memdump_Finish") + raw_frame(header + END_TEXT + '\0') +
+        END_TEXT + header + END_TEXT + "\x7e";  // without an opening flag: opens the next frame
+    const std::string memory = pattern_bytes(300000, 1) + "\x7e\x7e";
+    boot_modem(false);
+    ASSERT_TRUE(begin_dump());
+    ASSERT_TRUE(supply(diag_dev, memory));
+    ASSERT_TRUE(supply(diag_dev, "\x7e" + decoys));
+    EXPECT_EQ(modem()->state(), CWS_DUMP);
+    // The card that comes and goes during a dump to the internal medium changes nothing.
+    for (bool card : {true, false}) {
+        set_card(card);
+        ASSERT_TRUE(both_log(card ? "<on the card>" : "<without it>"));
+        EXPECT_EQ(modem()->state(), CWS_DUMP);
+    }
+    EXPECT_EQ(log_files(root, "sd/modem_log", "cp_wcdma").size(), 1u);
+    // What follows the marker in its chunk belongs to the file, too.
+    ASSERT_TRUE(supply(diag_dev, end_marker() + "rest"));
+    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+    EXPECT_TRUE(files() == (Files{{"data:" + DUMP_NAME + ".dmp",
+                                   memory + "\x7e" + decoys + end_marker() + "rest"}}));
+    modem()->process_alive();
+    EXPECT_TRUE(both_log("<after>"));
+    EXPECT_EQ(logged("cp_wcdma", "finish"), 0u);
+}
+
+// Two modems fall silent: one after some data, one without an answer.
+TEST_F(ModemDumpTest, SilentModemsAreCopiedFromTheKernel) {
+    Pty td_dev;
+    const Fifo log_t(root.path("log_t"));
+    root.set_prop("ro.modem.t.log", root.path("log_t"));
+    root.set_prop("ro.modem.t.diag", td_dev.path());
+    boot_modem(true, "stream cp_td-scdma on 5 3\n");
+    LogPipeHandler* td = ctrl->get_cp(CT_TD);
+    td->process_assert(false);
+    const int64_t asserted = monotonic_ms();
+    ASSERT_TRUE(begin_dump());
+    EXPECT_FALSE(pump([&] { return td->state() != CWS_DUMP; }, 500));
+    ASSERT_TRUE(supply(diag_dev, "partial"));
+    ASSERT_TRUE(pump([&] { return td->state() == CWS_NOT_WORKING; }, 5000));
+    EXPECT_GE(monotonic_ms() - asserted, 2950);
+    EXPECT_LT(monotonic_ms() - asserted, 4900);
+    EXPECT_EQ(modem()->state(), CWS_DUMP);
+    // A time-out that comes late, with more data waiting, is none.
+    ASSERT_TRUE(diag_dev.put("late"));
+    run_clock(3100);
+    EXPECT_EQ(modem()->state(), CWS_DUMP);
+    ASSERT_TRUE(pump([&] { return diag_dev.unread() == 0; }));
+    run_clock(2900);
+    EXPECT_EQ(modem()->state(), CWS_DUMP);
+    run_clock(150);
+    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+    EXPECT_TRUE(files() == (Files{{"data:" + DUMP_NAME + ".mem", MEMORY}}));
+    // What a copy that failed has made stays.
+    EXPECT_EQ(files("cp_td-scdma"),
+              (Files{{std::string("data:cp_td-scdma_memory") + STAMP + ".mem", ""}}));
+    const std::string where = "bool ModemDumpConsumer::save_dump_file(): dump proc memory: ";
+    EXPECT_EQ(log.count("dump_read_timeout(void*): read timeout ["), 2u);
+    EXPECT_TRUE(log.has(where + root.path("proc/cpw/mem") + " successfully.\n"));
+    EXPECT_TRUE(log.has(where + root.path("proc/cpt/mem") + " failed. [2("));
+}
+
+TEST_F(ModemDumpTest, FailsToStart) {
+    std::vector<std::unique_ptr<Filler>> fillers;
+    const struct {
+        const char* what;
+        std::function<void()> arrange;
+        const char* received;
+    } cases[] = {
+        {"no diag device", [&] { modem()->set_dev_paths(own_log_dev.path().c_str(), "/nowhere"); },
+         ""},
+        {"request refused", [] { faults::fail(faults::WRITE, 1, EIO); }, ""},
+        {"request cut", [] { faults::shorten(faults::WRITE, 1); }, "3"},
+        {"no file", [] { faults::fail(faults::OPEN, 4, EROFS); }, "3\n"},  // 3 driver records
+        {"no room in the loop",
+         [&] {
+             do {
+                 fillers.push_back(std::make_unique<Filler>(&mux()));
+             } while (fillers.back()->add_events(POLLIN) == 0);
+         },
+         ""},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
+        boot_modem(false);
+        pump_once(mux());
+        const size_t descriptors = lasting_descriptors();
+        c.arrange();
+        modem()->process_assert(false);
+        repair();
+        fillers.clear();
+        EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+        EXPECT_EQ(modem()->fd(), -1);
+        EXPECT_EQ(lasting_descriptors(), descriptors - 1) << "the log device";
+        EXPECT_EQ(log.has("open_dump_file(): open dump file " + DUMP_NAME + ".dmp failed [30("),
+                  c.what == std::string("no file"));
+        EXPECT_TRUE(log.has("process_assert(bool): Start dump transaction error ["));
+        EXPECT_TRUE(wait_until([&] { return diag_dev.received() == c.received; }));
+        EXPECT_EQ(files(), Files{}) << "no copy of the memory either";
+        end_service();
+    }
+}
+
+// The medium refuses the dump or the file goes away under it, in every way it can.
+TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
+    const std::string mem = "data:" + DUMP_NAME + ".mem";
+    const Files copy{{mem, MEMORY}};
+    const std::string more(4000, 'y');
+    const std::string gone = ": dump file of cp_wcdma is gone\n";
+    const auto full = [] { faults::fail(faults::WRITEV, 1, ENOSPC); };
+    const struct {
+        const char* what;
+        bool card;
+        std::function<void()> arrange;
+        std::string then;  // arrives at the modem's dump, or, if empty, at another log
+        std::string message;
+        Files files;
+    } cases[] = {
+        {"full", false, full, more, ": need to write 4000, write returns -2 [28(", copy},
+        {"error", false, [] { faults::fail(faults::WRITEV, 1, EIO); }, more, "returns -1 [5(",
+         copy},
+        {"cut", false, [] { faults::shorten(faults::WRITEV, 64010); }, more, "returns 10 [", copy},
+        {"cut early", false, [] { faults::shorten(faults::WRITEV, 100); }, more, "returns 0 [",
+         copy},
+        {"full at the end", false, [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end_marker(),
+         "returns -1 [28(", copy},
+        {"no memory file",
+         false,
+         [&] { full(), faults::fail(faults::OPEN, 1, ENOSPC); },
+         more,
+         "create dump mem file failed [28(",
+         {}},
+        // The first write is that of what is staged, when the dump file is closed.
+        {"copy fails",
+         false,
+         [&] { full(), faults::fail(faults::WRITE, 3, ENOSPC); },
+         more,
+         "/proc/cpw/mem failed. [28(",
+         {{mem, MEMORY.substr(0, 65536)}}},
+        {"set deleted", false, [&] { remove_tree(dir_of(dir_of(dump_path()))); }, more, gone, copy},
+        {"trimmed", false,
+         [&] {
+             for (int i = 0; i < 34; ++i) {
+                 EXPECT_TRUE(feed(gnss_dev, std::string(32768, 'g')));
+             }
+             ctrl->set_data_part_size(50);
+         },
+         more, gone, copy},
+        {"unmounted",
+         true,
+         [&] { set_card(false); },
+         "",
+         ": SD card is gone, the dump of cp_wcdma ends\n",
+         {{"sd:" + DUMP_NAME + ".dmp", std::string(64000, 'x')}}},
+        {"pulled", true, [&] { set_card(false), remove_tree("sd"); }, more, gone, copy},
+        {"full, unmounted", true, [&] { set_card(false), full(); }, more, "returns -2 [28(", copy},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
+        root.make_dir("sd");
+        set_card(c.card);
+        boot_modem(&c == cases, "data_log_size 1\n");
+        ASSERT_TRUE(both_log("<start>"));
+        Client client;
+        ASSERT_EQ(ask(client, "SUBSCRIBE WCDMA DUMP\n", "OK\n"), "OK\n");
+        const auto before = resources();
+        const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
+        ASSERT_TRUE(begin_dump());
+        ASSERT_TRUE(supply(diag_dev, std::string(64000, 'x')));
+        ASSERT_EQ(dump_path().compare(0, 2, c.card ? "sd" : "da"), 0);
+        c.arrange();
+        ASSERT_TRUE(c.then.empty() ? feed(gnss_dev, "notice") : supply(diag_dev, c.then));
+        EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+        EXPECT_TRUE(log.has(c.message)) << log.text();
+        EXPECT_FALSE(log.has("Receive diag notify")) << "ended twice";
+        EXPECT_EQ(hear(client, START_END), START_END);
+        EXPECT_TRUE(files() == c.files);
+        if (!c.card && c.message != gone) {
+            const uint64_t kept = c.files.empty() ? 0 : c.files.begin()->second.size();
+            EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size + kept);
+        }
+        repair();
+        faults::set_time(NOON + 1);
+        diag_dev.forget();
+        modem()->process_alive();
+        EXPECT_TRUE(both_log("<again>"));
+        EXPECT_EQ(resources(), before);
+        repair();
+        end_service();
+    }
+}
+
+}  // namespace

@@ -1,0 +1,205 @@
+// The modem's log parsing database, taken from the firmware image to the log root.
+#include "channels/FaultFixture.h"
+#include "channels/ModemImage.h"
+
+namespace {
+
+const char DB[] = "modem_db.gz";
+const char SHA1[] = "sha1.txt";
+const std::string DIGEST(
+    "\x00\x12\x34\x56\x78\x9a\xbc\xde\xf0\xff\x00\x01\x02\x03\x0a\xa0\x7f\x80\x9f\xf9", 20);
+const char HEX[] = "00123456789ABCDEF0FF000102030AA07F809FF9";
+constexpr uint8_t LAST = MODEM_IMAGE_LAST_ENTRY;
+constexpr uint8_t HASHED = MODEM_IMAGE_HAS_SHA1;
+
+std::string le32(uint32_t value) {
+    std::string bytes;
+    for (int shift = 0; shift < 32; shift += 8) {
+        bytes += static_cast<char>(value >> shift);
+    }
+    return bytes;
+}
+
+std::string entry(uint8_t type, uint8_t flags, uint32_t offset, uint32_t size) {
+    return std::string({static_cast<char>(type), static_cast<char>(flags), '?', '?'}) +
+           le32(offset) + le32(size);
+}
+
+const std::string HEADER = "VHX1\x07\xff??????";
+
+// An image whose payload, digest and database, lies at offset 1000.
+std::string image(const std::string& entries, const std::string& payload) {
+    std::string bytes = HEADER + entries;
+    bytes.resize(1000, '.');
+    return bytes + payload;
+}
+
+class ParsingLibTest : public FaultFixture {
+protected:
+    ParsingLibTest() {
+        root.set_prop("ro.product.partitionpath", root.path("part/"));
+        root.set_prop("persist.modem.w.nvp", "nv_w");
+        root.write_file("part/nv_wmodem", good(db));
+    }
+
+    static std::string good(const std::string& content) {
+        return image(entry(2, LAST | HASHED, 1000, static_cast<uint32_t>(content.size()) + 20),
+                     DIGEST + content);
+    }
+    bool write_log() { return feed(gnss_dev, "x"); }
+    // Starts the modem's channel anew.
+    void restart() {
+        log.clear();
+        modem()->stop();
+        EXPECT_EQ(modem()->start(), 0);
+    }
+    std::string saved(const std::string& name, const std::string& medium = "data") const {
+        const std::string path = medium + "/modem_log/" + name;
+        return root.exists(path) ? root.read_file(path) : "(none)";
+    }
+    void expect_saved(const std::string& content, const std::string& medium = "data") const {
+        EXPECT_TRUE(saved(DB, medium) == content);
+        EXPECT_EQ(saved(SHA1, medium), HEX);
+    }
+    void remove_saved(const std::string& medium = "data") const {
+        remove_tree(medium + "/modem_log/" + DB);
+        remove_tree(medium + "/modem_log/" + SHA1);
+    }
+
+    const std::string db = pattern_bytes(100001, 3);
+};
+
+TEST_F(ParsingLibTest, FindsTheDatabaseWhereverItsEntryStands) {
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    expect_saved(db);
+    std::string others;  // of every type but the database's, with all flags but the last
+    for (int type = 3; type < 80; ++type) {
+        others += entry(static_cast<uint8_t>(type), 0xfe, 0xffffffff, 0xffffffff);
+    }
+    for (const std::string& entries :
+         {entry(2, HASHED, 1000, 21), others + entry(2, 0xff, 1000, 21),
+          entry(2, HASHED, 1000, 21) + entry(2, LAST | HASHED, 0, 20)}) {
+        remove_saved();
+        root.write_file("part/nv_wmodem", image(entries, DIGEST + "z"));
+        restart();
+        expect_saved("z");
+    }
+}
+
+TEST_F(ParsingLibTest, TrustsNothingInAnImage) {
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    const std::string get = "get_modem_img(int, uint8_t*, size_t&, size_t&): ";
+    const std::string payload = DIGEST + "database";
+    const std::string outside = "is not within the image";
+    std::string endless = HEADER;
+    for (int i = 0; i < 5000; ++i) {
+        endless += entry(1, 0, 0, 0);
+    }
+    const uint32_t end = 1028;
+    const struct {
+        std::string bytes, message;
+    } images[] = {
+        {good("x").substr(0, 23), get + "MODEM image length less than two headers ["},
+        {"VHX2" + good("x").substr(4), get + "MODEM image not VHX1 format ["},
+        {image(entry(1, LAST, 0, 0) + entry(2, HASHED, 1000, 28), payload), ""},
+        {HEADER + entry(1, 0, 0, 0) + "12345", get + "can not read more headers 5 ["},
+        {endless, get + "MODEM image has more than 1024 headers ["},
+        {image(entry(2, LAST, 1000, 28), payload), get + "MODEM image has no SHA-1 checksum ["},
+        {image(entry(2, HASHED, 1000, 19), payload), outside},
+        {image(entry(2, HASHED, 1000, 29), payload), outside},
+        {image(entry(2, HASHED, 1000, 0xffffffff - 999), payload), outside},
+        {image(entry(2, HASHED, end - 19, 20), payload), get + "read SHA-1 error 19 ["},
+        {image(entry(2, HASHED, 0xffffffff - 19, 40), payload), get + "read SHA-1 error 0 ["},
+    };
+    for (const auto& i : images) {
+        SCOPED_TRACE(i.message + " " + std::to_string(&i - images));
+        remove_saved();
+        root.write_file("part/nv_wmodem", i.bytes);
+        restart();
+        EXPECT_EQ(saved(DB) + saved(SHA1), "(none)(none)");
+        EXPECT_TRUE(log.has(i.message)) << log.text();
+        EXPECT_EQ(log.count(get), i.message.empty() ? 0u : 1u);
+        EXPECT_EQ(log.count("save_log_parsing_lib(MediaStorage&): get MODEM image info error ["),
+                  1u);
+        EXPECT_GE(modem()->fd(), 0) << "logging goes on";
+    }
+}
+
+TEST_F(ParsingLibTest, AFailureLeavesNoHalfWrittenFile) {
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    const size_t descriptors = lasting_descriptors();
+    const std::string zeros(40, '0');
+    // nth call fails, or (0) the first piece is written in part only; until none is left.
+    const auto attempt = [&](faults::Call call, int nth, bool older) {
+        remove_saved();
+        if (older) {
+            root.write_file(std::string("data/modem_log/") + DB, "older");
+            root.write_file(std::string("data/modem_log/") + SHA1, zeros);
+        }
+        modem()->stop();
+        nth == 0 ? faults::shorten(call, 7) : faults::fail(call, nth, ENOSPC);
+        EXPECT_EQ(modem()->start(), 0);
+        const bool hit = nth == 0 || faults::hit(call);
+        faults::reset();
+        if (!hit || saved(DB) == db) {
+            expect_saved(db);
+        } else {
+            EXPECT_TRUE(saved(DB) == "(none)" || (saved(DB) == "older" && saved(SHA1) == zeros));
+            EXPECT_TRUE(saved(SHA1) == "(none)" || saved(SHA1) == zeros) << saved(SHA1);
+        }
+        restart();
+        expect_saved(db);
+        return hit;
+    };
+    for (bool older : {false, true}) {
+        int writes = -1;
+        while (attempt(faults::WRITE, ++writes, older)) {
+        }
+        EXPECT_EQ(writes, 6) << "four pieces and the digest were made to fail";
+        int opens = 0;
+        while (attempt(faults::OPEN, ++opens, older)) {
+        }
+        EXPECT_EQ(opens, older ? 4 : 3);
+    }
+    EXPECT_EQ(lasting_descriptors(), descriptors);
+}
+
+TEST_F(ParsingLibTest, StaysCurrentOnBothMediaWithSeveralModems) {
+    const Fifo td_dev(root.path("td"));
+    root.set_prop("ro.modem.t.log", root.path("td"));
+    root.set_prop("ro.modem.t.diag", root.path("td"));
+    boot_modem(false, "stream cp_td-scdma on 5 3\nstream cp_4mode off 5 3\n");
+    EXPECT_EQ(saved(DB), "(none)") << "no medium is in use yet";
+    const auto card = [&](bool in) { return set_card(in), write_log(); };
+    ASSERT_TRUE(card(false));
+    expect_saved(db);
+    ASSERT_TRUE(card(true));
+    expect_saved(db, "sd");
+    remove_saved();
+    ASSERT_TRUE(card(false));
+    expect_saved(db);
+    // A new firmware between two changes.
+    root.write_file("part/nv_wmodem", good("new"));
+    ASSERT_TRUE(card(true));
+    expect_saved("new", "sd");
+    expect_saved(db);
+    ASSERT_TRUE(card(false));
+    expect_saved("new");
+    // What has the same size and digest is current, a digest that is cut is none.
+    for (size_t digits : {40u, 39u}) {
+        root.write_file(std::string("data/modem_log/") + DB, "old");
+        root.write_file(std::string("data/modem_log/") + SHA1, std::string(HEX, digits));
+        restart();
+        EXPECT_EQ(saved(DB), digits == 40 ? "old" : "new");
+    }
+    // Clearing the logs keeps the files; the next write looks again.
+    remove_saved();
+    EXPECT_EQ(ctrl->clear_log(), 0);
+    ASSERT_TRUE(write_log());
+    expect_saved("new");
+}
+
+}  // namespace

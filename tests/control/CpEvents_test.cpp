@@ -1,0 +1,174 @@
+// From a supervisor's message to files and notifications, through the real sockets.
+#include "channels/CrashFixture.h"
+#include "storage/faults.h"
+
+namespace {
+
+constexpr time_t NOON = 1456811100;  // 2016-03-01 05:45:00 UTC, 09:15:00 here
+const std::string STAMP = "_2016-03-01_09-15-00";
+
+class CpEventsTest : public CrashFixture {
+protected:
+    CpEventsTest() {
+        faults::reset();
+        faults::set_time(NOON);
+        root.write_file("d/dipx/smsg", "S");
+        root.write_file("d/dipx/sbuf", "B");
+        root.write_file("d/dipx/sblock", "K");
+        root.write_file("proc/cpw/mini_dump", "MINI W");
+        root.write_file("proc/cptl/mini_dump", "MINI TL");
+    }
+    ~CpEventsTest() override {
+        ctrl.reset();
+        close(m_modemd);
+        close(m_wcnd);
+        faults::reset();
+    }
+
+    void boot_supervised(const std::string& settings = "") {
+        boot_modem(false, settings);
+        modemd = std::make_unique<Client>(accept4(m_modemd, nullptr, nullptr, SOCK_CLOEXEC));
+        wcnd = std::make_unique<Client>(accept4(m_wcnd, nullptr, nullptr, SOCK_CLOEXEC));
+    }
+    bool reaches(LogPipeHandler* channel, CpWorkState state) {
+        return pump([&] { return channel->state() == state; });
+    }
+    static Files records(const std::string& medium = "data:") {
+        return {{medium + "smsg" + STAMP + ".log", "S"},
+                {medium + "sbuf" + STAMP + ".log", "B"},
+                {medium + "sblock" + STAMP + ".log", "K"}};
+    }
+
+    const int m_modemd =
+        socket_local_server("modemd", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    const int m_wcnd =
+        socket_local_server("external_wcn_kest", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    std::unique_ptr<Client> modemd, wcnd;  // the supervisors' connections with the service
+};
+
+TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
+    const struct {
+        const char *message, *settings, *card, *reset;
+        bool dumps;
+        std::string mini_dump;
+    } cases[] = {
+        {"Modem Assert", "", "", "", true, ""},
+        {"TD Modem Assert", "minidump enable\texternal\n", "", "", true, "data:"},
+        {"Modem Blocked\n", "minidump enable\texternal\n", "running", "2", true, "sd:"},
+        {"Modem Blocked", "minidump enable\tinternal\n", "running", "", true, "data:"},
+        {"at 1: Modem Assert: file x.c", "minidump disable\tinternal\n", "", "0", true, ""},
+        {"Modem Blocked", "minidump enable\tinternal\n", "", "1", false, "data:"},
+        {"Modem Assert", "minidump disable\tinternal\n", "", "0x1", false, ""},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::string(c.message) + ", " + c.settings);
+        root.set_prop("persist.sys.vexa.modemreset", c.reset);
+        root.set_prop("init.svc.fuse_sdcard0", c.card);
+        boot_supervised(c.settings);
+        ASSERT_TRUE(both_log("<before>"));
+        Client subscribers[2];
+        Client other;
+        for (Client& client : subscribers) {
+            ASSERT_EQ(ask(client, "SUBSCRIBE WCDMA DUMP\n", "OK\n"), "OK\n");
+        }
+        ASSERT_EQ(ask(other, "SUBSCRIBE TD DUMP\n", "OK\n"), "OK\n");
+        diag_dev.forget();
+
+        ASSERT_TRUE(modemd->say(c.message));
+        ASSERT_TRUE(reaches(modem(), c.dumps ? CWS_DUMP : CWS_NOT_WORKING));
+        Files expected;
+        if (c.dumps) {
+            const std::string medium = *c.card ? "sd:" : "data:";
+            expected = records(medium);
+            expected[medium + "cp_wcdma_memory" + STAMP + ".dmp"] = "memory" + end_marker();
+            EXPECT_TRUE(pump([&] { return diag_dev.received() == "3\n"; }));
+            // Further events of the same crash change nothing.
+            ASSERT_TRUE(modemd->say("Modem Blocked"));
+            pump_once(mux());
+            ASSERT_TRUE(supply(diag_dev, "memory" + end_marker()));
+            const std::string lines = "CP_DUMP_START WCDMA\nCP_DUMP_END WCDMA\n";
+            for (Client& client : subscribers) {
+                EXPECT_EQ(hear(client, lines), lines);
+            }
+        }
+        if (!c.mini_dump.empty()) {
+            expected[c.mini_dump + "mini_dump" + STAMP + ".bin"] = "MINI W";
+        }
+        EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+        EXPECT_EQ(modem()->fd() < 0, c.dumps) << "stays open for a CP that is reset";
+        EXPECT_EQ(files(), expected);
+        ASSERT_TRUE(modemd->say("Modem Alive"));
+        ASSERT_TRUE(reaches(modem(), CWS_WORKING));
+        EXPECT_TRUE(both_log("<after>"));
+        EXPECT_EQ(subscribers[0].heard() + subscribers[1].heard() + other.heard(), "");
+        ctrl.reset();
+        remove_tree("data/modem_log");
+        remove_tree("sd/modem_log");
+    }
+}
+
+TEST_F(CpEventsTest, WcnHasItsOwnSupervisorAndReset) {
+    root.set_prop("persist.sys.vexa.modemreset", "1");
+    boot_supervised("stream cp_wcn off 5 3\n");
+    LogPipeHandler* wcn = ctrl->get_cp(CT_WCN);
+    Files expected = records();
+    for (bool mini_dump : {false, true}) {
+        if (mini_dump) {
+            ctrl->enable_md();
+            expected["data:mini_dump" + STAMP + ".bin"] = "MINI TL";
+        }
+        ASSERT_TRUE(wcnd->say("WCN-EXTERNAL-DUMP"));
+        ASSERT_TRUE(reaches(wcn, CWS_NOT_WORKING));
+        EXPECT_EQ(files("cp_wcn"), expected);
+        EXPECT_EQ(modem()->state(), CWS_WORKING);
+        ASSERT_TRUE(wcnd->say("WCN-EXTERNAL-ALIVE"));
+        EXPECT_TRUE(reaches(wcn, CWS_WORKING));
+        EXPECT_EQ(wcn->fd(), -1) << "still switched off";
+        ASSERT_EQ(ctrl->clear_log(), 0);
+    }
+}
+
+TEST_F(CpEventsTest, RecordsFailOneByOne) {
+    boot_supervised();
+    struct tm t;
+    localtime_r(&NOON, &t);
+    for (const auto& missing : records()) {
+        const std::string record = missing.first.substr(5, missing.first.find('_') - 5);
+        Files expected = records();
+        expected.erase(missing.first);
+        remove_tree("d/dipx/" + record);
+        EXPECT_EQ(LogController::save_dipx_dump(modem()->storage(), t), -1);
+        EXPECT_EQ(files(), expected);
+        EXPECT_TRUE(log.has(": kestcp: save DIPX " + record + " info failed [2("));
+        root.write_file("d/dipx/" + record, missing.second);
+        ASSERT_EQ(ctrl->clear_log(), 0);
+    }
+    EXPECT_EQ(log.count("save DIPX"), 3u);
+    EXPECT_EQ(LogController::save_dipx_dump(modem()->storage(), t), 0);
+}
+
+TEST_F(CpEventsTest, EventsForNobody) {
+    boot_supervised();
+    for (int event = 0; event < 5; ++event) {
+        ctrl->process_cp_evt(CT_TD, static_cast<CpStateHandler::CpEvent>(event));
+    }
+    EXPECT_EQ(log.count("CpEvent): kestcp: unknown MODEM type 1 asserts ["), 5u);
+    for (int event : {0, 4, -1}) {
+        ctrl->process_cp_evt(CT_WANMODEM, static_cast<CpStateHandler::CpEvent>(event));
+        EXPECT_TRUE(log.has("CpEvent): unknown event " + std::to_string(event) + " ["));
+    }
+}
+
+TEST_F(CpEventsTest, NoControlServer) {
+    const int taken =
+        socket_local_server("kestmodem", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    boot_supervised();
+    ASSERT_TRUE(modemd->say("Modem Assert"));
+    ASSERT_TRUE(pump([&] { return diag_dev.received() == "3\n"; }));
+    ASSERT_TRUE(supply(diag_dev, end_marker()));
+    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+    EXPECT_EQ(files().size(), 4u);
+    close(taken);
+}
+
+}  // namespace

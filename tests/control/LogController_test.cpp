@@ -1,0 +1,86 @@
+#include "control/LogController.h"
+
+#include "channels/AgDspLogHandler.h"
+#include "channels/ChannelFixture.h"
+#include "channels/ExtWcnLogHandler.h"
+#include "channels/GnssCpLogHandler.h"
+#include "channels/WanModemLogHandler.h"
+#include "storage/CpStorage.h"
+
+namespace {
+
+class LogControllerTest : public ChannelFixture {};
+
+TEST_F(LogControllerTest, MakesTheChannelOfEachType) {
+    for (const char* mode : {"t", "tl", "lf", "l"}) {
+        root.set_prop(std::string("ro.modem.") + mode + ".log", root.path(mode));
+        root.set_prop(std::string("ro.modem.") + mode + ".diag", root.path("diag_w"));
+    }
+    ASSERT_EQ(boot("stream cp_5mode off 5 3\nstream agdsp off 5 3\nstream cp_gnss on 5 3\n"
+                   "stream cp_wcdma on 5 3\nstream cp_wcn off 5 3\nstream cp_4mode off 5 3\n"
+                   "stream cp_td-scdma off 5 3\nstream cp_3mode off 5 3\n"),
+              0);
+    const CpType order[] = {CT_5MODE, CT_AGDSP, CT_GNSS, CT_WCDMA,
+                            CT_WCN,   CT_4MODE, CT_TD,   CT_3MODE};
+    ASSERT_EQ(ctrl->log_pipes().size(), 8u);
+    size_t i = 0;
+    for (LogPipeHandler* channel : ctrl->log_pipes()) {
+        const CpType type = channel->type();
+        EXPECT_EQ(type, order[i++]);
+        EXPECT_EQ(ctrl->get_cp(type), channel);
+        EXPECT_STREQ(channel->name().string(), cp_type_to_name(type));
+        EXPECT_EQ(dynamic_cast<ExtWcnLogHandler*>(channel) != nullptr, type == CT_WCN);
+        EXPECT_EQ(dynamic_cast<GnssCpLogHandler*>(channel) != nullptr, type == CT_GNSS);
+        EXPECT_EQ(dynamic_cast<AgDspLogHandler*>(channel) != nullptr, type == CT_AGDSP);
+        EXPECT_EQ(dynamic_cast<WanModemLogHandler*>(channel) != nullptr, type <= CT_5MODE);
+        EXPECT_EQ(channel->enabled(), type == CT_GNSS || type == CT_WCDMA);
+        EXPECT_EQ(channel->state(), CWS_WORKING);
+    }
+    EXPECT_EQ(ctrl->get_cp(CT_WANMODEM), nullptr);
+    EXPECT_EQ(ctrl->get_cp(CT_UNKNOWN), nullptr);
+    const std::string where =
+        "LogPipeHandler* LogController::create_handler(const LogConfig::ConfigEntry*): ";
+    EXPECT_TRUE(log.has(where + "CP cp_wcdma dev " + root.path("log_w") + " " +
+                        root.path("diag_w") + "\n"));
+    EXPECT_EQ(log.count(where), 2u);
+}
+
+TEST_F(LogControllerTest, ChannelWithoutDevicesWaitsToBeStarted) {
+    const Fifo fifo(root.path("td"));
+    ASSERT_EQ(boot("stream cp_td-scdma on 5 3\nstream cp_gnss off 5 3\n"), 0);
+    EXPECT_TRUE(log.has(": Can not get log/diag path for cp_td-scdma ["));
+    LogPipeHandler* td = ctrl->get_cp(CT_TD);
+    ASSERT_NE(td, nullptr);
+    EXPECT_FALSE(td->enabled());
+    EXPECT_EQ(td->fd(), -1);
+    EXPECT_EQ(polled(), 0u);
+    td->set_dev_paths(root.path("td").c_str(), root.path("diag").c_str());
+    EXPECT_EQ(td->start(), 0);
+    EXPECT_GE(td->fd(), 0);
+    EXPECT_EQ(polled(), 1u);
+}
+
+TEST_F(LogControllerTest, KestLayout) {
+    const Fifo fifo(root.path("gnss"));
+    ASSERT_EQ(boot("stream cp_gnss on 5 3\n", {"-s"}), 0);
+    EXPECT_TRUE(
+        log.has("int LogController::init(LogConfig*): modem log will be placed in kest dir!\n"));
+    ASSERT_TRUE(feed(fifo, "data"));
+    ctrl.reset();
+    EXPECT_EQ(log_content(root, log_files(root, "data/kest/modem_log", "cp_gnss")), "data");
+    EXPECT_FALSE(root.exists("data/modem_log"));
+}
+
+TEST_F(LogControllerTest, NoSpaceForAMiniDump) {
+    const Fifo fifo(root.path("gnss"));
+    root.write_file("proc/cptl/mini_dump", "mini");
+    root.write_file("data/modem_log/2016-03-01-09-15-00/cp_gnss/a.bin", std::string(1 << 21, 'x'));
+    ASSERT_EQ(boot("data_log_size 1\nlog_overwrite disable\nstream cp_gnss on 5 3\n"), 0);
+    ASSERT_TRUE(feed(fifo, "data"));  // makes the set and so counts what there is
+    struct tm t = {};
+    EXPECT_EQ(ctrl->save_mini_dump(ctrl->get_cp(CT_GNSS)->storage(), t, CT_GNSS), -1);
+    EXPECT_TRUE(log.has(": no space for mini dump ["));
+    EXPECT_EQ(root.tree("data/modem_log").size(), 2u);
+}
+
+}  // namespace

@@ -1,0 +1,262 @@
+// The real program as a child process: its exit statuses, its log lines, the files that
+// it leaves and the system calls that a block of log data costs.
+#include <signal.h>
+#include <sys/wait.h>
+
+#include <map>
+#include <sstream>
+
+#include "channels/ChannelFixture.h"
+
+namespace {
+
+const char CONFIG[] = "data/local/tmp/kestmodem/kest_modem.conf";
+const size_t BLOCK = 32768;
+
+class ServiceTest : public testing::Test {
+protected:
+    ServiceTest() {
+        setenv("EXTERNAL_STORAGE", root.path("sd").c_str(), 1);
+        setenv("TZ", "UTC0", 1);
+        root.make_dir("sd");
+        root.set_prop("persist.storage.type", "1");
+        root.set_prop("persist.modem.w.enable", "1");
+        root.set_prop("ro.modem.w.log", root.path("log_w"));
+        root.set_prop("ro.modem.w.diag", root.path("diag_w"));
+        root.set_prop("ro.modem.wcn.diag", root.path("wcn"));
+        root.set_prop("ro.modem.gnss.diag", root.path("gnss"));
+    }
+    ~ServiceTest() override { kill_now(); }
+
+    // Runs a command with its standard error in the file "log".
+    void run(std::vector<std::string> args = {KESTMODEM_BIN}) {
+        std::vector<char*> argv;
+        for (std::string& arg : args) {
+            argv.push_back(&arg[0]);
+        }
+        argv.push_back(nullptr);
+        const int file =
+            open(root.path("log").c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
+        pid = fork();
+        if (pid == 0) {
+            setpgid(0, 0);
+            umask(077);
+            dup2(file, STDERR_FILENO);
+            execvp(argv[0], argv.data());
+            _exit(127);
+        }
+        setpgid(pid, pid);  // whoever comes first
+        close(file);
+    }
+    // With its own children: a killed tracer would leave the traced program behind.
+    void kill_now() {
+        if (pid > 0) {
+            kill(-pid, SIGKILL);
+            waitpid(pid, nullptr, 0);
+        }
+        pid = -1;
+    }
+    bool logged(const std::string& part) const {
+        return root.read_file("log").find(part) != std::string::npos;
+    }
+    // One block into an empty device, and all of it read again, once the service is there.
+    static bool feed(const Fifo& fifo, const std::string& block) {
+        return fifo.put(block) && wait_until([&] { return fifo.unread() == 0; });
+    }
+    // A set's name has the resolution of a second.
+    static void next_second() {
+        const time_t now = time(nullptr);
+        wait_until([&] { return time(nullptr) > now; });
+    }
+
+    TestRoot root;
+    pid_t pid = -1;
+};
+
+TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
+    const struct {
+        std::vector<std::string> args;
+        const char *settings, *in_the_way;
+        int status;
+        std::string message;
+    } cases[] = {
+        {{KESTMODEM_BIN},
+         CONFIG,
+         "data/modem_log",
+         2,
+         "int LogController::init(LogConfig*): init storage manager error ["},
+        {{KESTMODEM_BIN, "-x"},
+         CONFIG,
+         "data/other",
+         255,
+         "int LogConfig::read_config(int, char**): parameters passed to kestmodem are "
+         "unrecognised! ["},
+        {{KESTMODEM_BIN},
+         "other",
+         "data/other",
+         255,
+         "int LogConfig::read_config(int, char**): can not open " + root.path(CONFIG) + " ["},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.message);
+        root.write_file(c.settings, "stream cp_gnss on 5 3\n");
+        root.write_file(c.in_the_way, "a file");
+        run(c.args);
+        const std::string prefix = "E/KESTCP(" + std::to_string(pid) + "): ";
+        int status = 0;
+        ASSERT_TRUE(wait_until([&] { return waitpid(pid, &status, WNOHANG) == pid; }));
+        pid = -1;
+        EXPECT_EQ(status, c.status << 8) << "exit status " << c.status;
+        std::istringstream lines(root.read_file("log"));
+        std::string line;
+        char ids[100];
+        snprintf(ids, sizeof(ids), "int main(int, char**): kestmodem start ID=%u/%u, GID=%u/%u",
+                 getuid(), geteuid(), getgid(), getegid());
+        EXPECT_TRUE(std::getline(lines, line));
+        EXPECT_EQ(line, prefix + ids);
+        while (std::getline(lines, line) && lines.peek() != EOF) {
+            EXPECT_EQ(line.substr(0, prefix.size()), prefix);
+        }
+        EXPECT_EQ(line.substr(0, prefix.size() + c.message.size()), prefix + c.message);
+        EXPECT_EQ(line.back(), ']');
+        EXPECT_EQ(root.exists("data/modem_log"), c.status == 2) << "untouched";
+        ASSERT_EQ(system(("rm -rf " + root.path("data")).c_str()), 0);
+    }
+}
+
+// Four lives: internal medium, killed and started again on the old set, SD card in, SD card
+// out. Two blocks always fill the staging buffer, so an even number leaves nothing staged.
+TEST_F(ServiceTest, NoByteIsLostAcrossRestartAndMediumChanges) {
+    const std::string settings =  // the system's, to be copied
+        "log_file_size 1\nstream cp_wcdma on 5 3\nstream cp_wcn on 5 3\nstream cp_gnss on 5 3\n";
+    root.write_file("system/etc/kest_modem.conf", settings);
+    root.make_dir("data/local/tmp/kestmodem");
+    root.set_prop("gsm.version.baseband", "BB_1");
+    const TimeServer time_service(std::string("\x40\x42\x0f\0cp-time!", 12));
+    const std::string record("\x78\x56\x34\x12\x40\x42\x0f\0cp-time!", 16);
+    struct Stream {
+        const char* cp;
+        Fifo fifo;
+        std::string head;
+        std::map<std::string, std::string> sent;  // by medium
+    } streams[] = {{"cp_wcdma", Fifo(root.path("log_w")), record, {}},
+                   {"cp_wcn", Fifo(root.path("wcn")), "", {}},
+                   {"cp_gnss", Fifo(root.path("gnss")), "", {}}};
+    uint32_t seed = 0;
+    const auto send_blocks = [&](const char* medium, int blocks) {
+        for (int i = 0; i < 3 * blocks; ++i) {
+            const std::string block = pattern_bytes(BLOCK, seed++);
+            if (!feed(streams[i % 3].fifo, block)) {
+                return false;
+            }
+            streams[i % 3].sent[medium] += block;
+        }
+        return true;
+    };
+    // All that was sent is there at last, in so many files.
+    const auto check = [&](const std::string& medium, size_t files) {
+        for (Stream& stream : streams) {
+            SCOPED_TRACE(medium + " " + stream.cp);
+            const auto paths = [&] { return log_files(root, medium + "/modem_log", stream.cp); };
+            EXPECT_TRUE(wait_until(
+                [&] { return log_content(root, paths(), stream.head) == stream.sent[medium]; },
+                3000));
+            EXPECT_EQ(paths().size(), files);
+        }
+    };
+
+    run();
+    ASSERT_TRUE(send_blocks("data", 80));
+    EXPECT_EQ(root.read_file(CONFIG), settings);
+    kill_now();
+    check("data", 3);
+
+    next_second();
+    run();
+    ASSERT_TRUE(send_blocks("data", 34));
+    check("data", 3 + 2);
+
+    next_second();
+    root.set_prop("init.svc.fuse_sdcard0", "running");
+    ASSERT_TRUE(send_blocks("sd", 41));  // what is staged at the change is kept, too
+    root.set_prop("init.svc.fuse_sdcard0", "stopped");
+    next_second();
+    ASSERT_TRUE(send_blocks("data", 2));
+    check("data", 3 + 2 + 1);
+    check("sd", 2);
+    EXPECT_EQ(root.list("data/modem_log").size(), 3u);
+
+    // A single block stays staged: killing the service costs exactly that.
+    ASSERT_TRUE(feed(streams[2].fifo, pattern_bytes(BLOCK, seed)));
+    EXPECT_TRUE(logged("bool StorageManager::check_media_change(): sd card is umounted!"));
+    EXPECT_FALSE(logged("save log"));
+    EXPECT_FALSE(logged("kestcp: open "));
+    kill_now();
+    check("data", 3 + 2 + 1);
+
+    // Modes as asked for in spite of the parent's mask, and a version file a directory.
+    for (const std::string medium : {"data/modem_log/", "sd/modem_log/"}) {
+        size_t versions = 0;
+        for (const std::string& name : root.tree(medium)) {
+            struct stat st;
+            const std::string path = root.path(medium + name);
+            ASSERT_EQ(stat(path.c_str(), &st), 0);
+            EXPECT_EQ(st.st_mode, S_IFREG | 0644u) << name;
+            ASSERT_EQ(stat(path.substr(0, path.rfind('/')).c_str(), &st), 0);
+            EXPECT_EQ(st.st_mode, S_IFDIR | 0775u) << name;
+            versions += root.read_file(medium + name) == "BB_1";
+        }
+        EXPECT_EQ(versions, root.list(medium).size());
+    }
+}
+
+// Between two marked blocks, the system calls are those of the log path and no others.
+TEST_F(ServiceTest, ABlockCostsFiveSystemCallsAtMost) {
+    if (system("strace -f -o /dev/null true 2>/dev/null") != 0) {
+        GTEST_SKIP() << "no strace or no ptrace here";
+    }
+    root.write_file(CONFIG, "stream cp_wcn on 5 3\nstream cp_gnss on 5 3\n");
+    const Fifo wcn(root.path("wcn")), gnss(root.path("gnss"));
+    // Supervisors to connect to, so that no attempt falls into the measured time.
+    const int supervisors[] = {
+        socket_local_server("modemd", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM),
+        socket_local_server("external_wcn_kest", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)};
+    run({"strace", "-f", "-s", "32", "-o", root.path("trace"), KESTMODEM_BIN});
+    // The first blocks make the files; the properties' file is not trusted while it is new.
+    ASSERT_TRUE(feed(wcn, "x"));
+    for (const int64_t begun = monotonic_ms(); monotonic_ms() - begun < 200;) {
+        ASSERT_TRUE(feed(wcn, "x") && feed(gnss, "y"));
+    }
+    const int blocks = 40;
+    ASSERT_TRUE(feed(gnss, "MARK-BEGIN"));
+    for (int i = 0; i < blocks; ++i) {
+        ASSERT_TRUE(feed(i % 4 ? gnss : wcn, pattern_bytes(20000, static_cast<uint32_t>(i))));
+    }
+    ASSERT_TRUE(feed(gnss, "MARK-END"));
+    const auto trace = [&] { return root.read_file("trace"); };
+    ASSERT_TRUE(wait_until([&] { return trace().find("MARK-END") != std::string::npos; }));
+
+    // From the first marked read to the second: the same of each as there are blocks.
+    const size_t begin = trace().find('\n', trace().find("MARK-BEGIN")) + 1;
+    std::istringstream lines(trace().substr(begin, trace().find("MARK-END") - begin));
+    std::map<std::string, int> calls;
+    for (std::string line; std::getline(lines, line);) {
+        const size_t start = line.find_first_not_of("0123456789 ");
+        std::string name = line.substr(start, line.find('(', start) - start);
+        for (const char* kind : {"stat", "access"}) {
+            name = name.find(kind) != std::string::npos ? kind : name;
+        }
+        ++calls[name];
+    }
+    const int n = blocks + 1;
+    EXPECT_GT(calls["writev"], 5);
+    EXPECT_LE(calls["writev"], n);
+    calls.erase("writev");
+    const std::map<std::string, int> expected = {
+        {"poll", n}, {"read", n}, {"stat", n}, {"access", n}};
+    EXPECT_EQ(calls, expected);
+    close(supervisors[0]);
+    close(supervisors[1]);
+}
+
+}  // namespace

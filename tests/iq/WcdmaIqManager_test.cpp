@@ -1,0 +1,482 @@
+#include "iq/WcdmaIqManager.h"
+
+#include <errno.h>
+#include <pthread.h>
+
+#include <filesystem>
+
+#include "channels/ChannelFixture.h"
+#include "iq/IqStorRespHandler.h"
+#include "iq/fake_devices.h"
+#include "iq/iq_mem.h"
+#include "storage/CpStorage.h"
+#include "storage/StorageManager.h"
+
+// Interposed: writes of the saving thread and commands to it, the clock of the names
+// and the making of threads.
+extern "C" {
+ssize_t __real_write(int fd, const void* data, size_t len);
+int __real_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
+                          void* arg);
+}
+
+namespace {
+
+constexpr uint32_t MB = 1u << 20;
+const pthread_t s_main = pthread_self();
+
+// Read by the saving thread between a command and its response. Steps of a save: 0 the
+// driver is asked, 2n-1 the middle and 2n the end of the nth write.
+struct Script {
+    std::vector<size_t> writes;  // what the saving thread wrote to files, call by call
+    size_t half_at = 0;          // that call (from 1) transfers 1000 bytes only
+    size_t fail_at = 0;          // that call and all later ones fail with ENOSPC
+    int refused_cmd = -1;        // this command to the thread is not taken
+    bool no_threads = false;
+    size_t gate_at = SIZE_MAX;  // at this step the thread waits at the gate
+    // Without a lock, which would put the threads in order.
+    std::atomic<bool> shut{false}, reached{false};
+    std::atomic<int> saved_sent{0};
+    std::atomic<time_t> time{1456823700};  // 2016-03-01 09:15:00
+    std::atomic<int> tick{1};              // every call of time() is so much later
+
+    void pass(size_t step) {
+        for (; step == gate_at && shut.load(std::memory_order_relaxed); usleep(200)) {
+            reached.store(true, std::memory_order_relaxed);
+        }
+    }
+};
+Script* s_script;
+
+ssize_t thread_write(Script& script, int fd, const char* data, size_t len) {
+    script.writes.push_back(len);
+    const size_t call = script.writes.size();
+    if (script.fail_at != 0 && call >= script.fail_at) {
+        errno = ENOSPC;
+        return -1;
+    }
+    ssize_t n = __real_write(fd, data, std::min<size_t>(len, 1000));
+    script.pass(2 * call - 1);
+    if (call != script.half_at) {
+        n += __real_write(fd, data + n, len - static_cast<size_t>(n));
+    }
+    script.pass(2 * call);
+    return n;
+}
+
+}  // namespace
+
+extern "C" {
+
+ssize_t __wrap_write(int fd, const void* data, size_t len) {
+    struct stat st;
+    if (fd <= STDERR_FILENO || !s_script || fstat(fd, &st) != 0) {
+        return __real_write(fd, data, len);
+    }
+    const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
+    if (S_ISREG(st.st_mode) && !in_main) {
+        return thread_write(*s_script, fd, static_cast<const char*>(data), len);
+    }
+    const int message = S_ISSOCK(st.st_mode) ? *static_cast<const uint8_t*>(data) : -1;
+    if (in_main && message >= 0 && message == s_script->refused_cmd) {
+        errno = EAGAIN;
+        return -1;
+    }
+    const ssize_t n = __real_write(fd, data, len);
+    if (in_main && (message == IQST_STOP || message == IQST_QUIT)) {  // which opens the gate
+        s_script->shut.store(false, std::memory_order_relaxed);
+    }
+    s_script->saved_sent.fetch_add(message == IQST_SAVED, std::memory_order_relaxed);
+    return n;
+}
+
+time_t __wrap_time(time_t* result) {
+    const time_t now = s_script ? s_script->time += s_script->tick : 0;
+    return result ? *result = now : now;
+}
+
+int __wrap_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
+                          void* arg) {
+    return s_script && s_script->no_threads ? EAGAIN
+                                            : __real_pthread_create(thread, attr, run, arg);
+}
+}
+
+namespace {
+
+std::string samples(uint32_t len) {
+    static const std::string bytes = pattern_bytes(25 * MB, 8);
+    return bytes.substr(0, len);
+}
+
+class WcdmaIqManagerTest : public ChannelFixture {
+protected:
+    WcdmaIqManagerTest() {
+        setenv("TZ", "UTC0", 1);
+        tzset();
+        s_script = &script;
+        device.on_buf_info = [this] { script.pass(0); };
+        EXPECT_EQ(boot("stream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
+        iq = std::make_unique<WcdmaIqManager>(ctrl->get_cp(CT_GNSS), ctrl.get(), &mux());
+    }
+    ~WcdmaIqManagerTest() override {
+        iq.reset();
+        ctrl.reset();
+        s_script = nullptr;
+    }
+
+    int start() { return iq->start(ctrl->get_cp(CT_GNSS)->storage()); }
+    bool waits() const { return iq->state() == WcdmaIqManager::IQS_WAITING; }
+    size_t released() { return device.count(CMD_RELEASE_IQ_BUF); }
+    bool saved(size_t num) {
+        return pump([&] { return released() >= num; }) && waits();
+    }
+    void fill(const std::string& content) {
+        device.fill(64, static_cast<uint32_t>(content.size()), content);
+    }
+    bool save(const std::string& content) {
+        const size_t before = released();
+        fill(content);
+        return saved(before + 1);
+    }
+    void arm(size_t gate_at) {
+        script.writes.clear();
+        script.gate_at = gate_at;
+        script.shut = true;
+    }
+    bool begin_save(const std::string& content, size_t gate_at = SIZE_MAX) {
+        arm(gate_at);
+        fill(content);
+        return pump([&] { return !waits(); }) &&
+               (gate_at == SIZE_MAX ||
+                wait_until([&] { return script.reached.load(std::memory_order_relaxed); }));
+    }
+    void log_data(CpType cp) {
+        ASSERT_TRUE((cp == CT_GNSS ? gnss_dev : wcn_dev).put("log"));
+        ctrl->get_cp(cp)->process(POLLIN);
+    }
+    void remove(const std::string& path) { std::filesystem::remove_all(root.path(path)); }
+    void set_card(const char* state) { root.set_prop("init.svc.fuse_sdcard0", state); }
+    // The I/Q files on both media, oldest first.
+    std::vector<std::string> iq_files() const {
+        std::vector<std::string> all = root.tree(""), files;
+        std::copy_if(all.begin(), all.end(), std::back_inserter(files),
+                     [](const auto& file) { return file.find("_wiq_") != std::string::npos; });
+        return files;
+    }
+    std::string newest() const { return root.read_file(iq_files().back()); }
+    // That the total of the medium in use is what its files hold.
+    void expect_accounted() {
+        ctrl->flush();
+        MediaStorage* media = ctrl->stor_mgr().get_media_stor();
+        const std::string dir = media->log_root().string() + root.root().size();
+        size_t sum = 0;
+        for (const std::string& file : root.tree(dir)) {
+            sum += root.read_file(dir + "/" + file).size();
+        }
+        EXPECT_EQ(media->size(), sum);
+    }
+
+    Script script;
+    FakeDevice device{root.path("dev/iq_mem")};
+    const Fifo gnss_dev{root.path("gnss")}, wcn_dev{root.path("wcn")};
+    std::unique_ptr<WcdmaIqManager> iq;
+};
+
+TEST_F(WcdmaIqManagerTest, AFailedStartUndoesEverything) {
+    const size_t descriptors = open_descriptors();
+    const size_t slots = Filler::free_slots(mux());
+    std::vector<std::unique_ptr<Filler>> fillers;
+    const auto leave_slots = [&](size_t num) {
+        fillers.clear();
+        while (Filler::free_slots(mux()) > num) {
+            fillers.push_back(std::make_unique<Filler>(&mux()));
+            fillers.back()->add_events(POLLIN);
+        }
+    };
+    const std::string path = root.path("dev/iq_mem"), away = path + "_";
+    const struct {
+        std::function<void(bool)> set_broken;
+        size_t ioctls;
+        const char* message;
+    } cases[] = {
+        {[&](bool on) { rename((on ? path : away).c_str(), (on ? away : path).c_str()); }, 0,
+         "prepare_iq_mem_map(): can not open /dev/iq_mem [2("},
+        {[&](bool on) { device.fail_ioctl(CMD_SET_IQ_CH_TYPE, on ? EBUSY : 0); }, 1,
+         "prepare_iq_mem_map(): ioctl CMD_SET_IQ_CH_TYPE error [16("},
+        {[&](bool on) { device.fail_mmap(on ? ENOMEM : 0); }, 1,
+         "prepare_iq_mem_map(): mmap error [12("},
+        {[&](bool on) { script.no_threads = on; }, 2, "mapped to 0x"},
+        {[&](bool on) { leave_slots(on ? 0 : slots); }, 2, "mapped to 0x"},
+        {[&](bool on) { leave_slots(on ? 1 : slots); }, 2, "mapped to 0x"},
+        {nullptr, 2, "mapped to 0x"},  // and one that does not fail
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(&c - cases);
+        log.clear();
+        const size_t calls = device.count(CMD_SET_IQ_CH_TYPE);
+        if (c.set_broken) {
+            c.set_broken(true);
+            EXPECT_EQ(start(), -1);
+            c.set_broken(false);
+        } else {
+            EXPECT_EQ(start(), 0);
+            EXPECT_EQ(start(), -1) << "runs already";
+            EXPECT_TRUE(save("samples"));
+            EXPECT_EQ(iq->stop(), 0);
+        }
+        EXPECT_TRUE(log.has(c.message)) << log.text();
+        EXPECT_EQ(iq->state(), WcdmaIqManager::IQS_IDLE);
+        EXPECT_EQ(device.count(CMD_SET_IQ_CH_TYPE) - calls, c.ioctls);
+        EXPECT_TRUE(c.ioctls != 2 || device.ioctls(CMD_SET_IQ_CH_TYPE).back() == 0);
+        EXPECT_EQ(device.maps(), 0u);
+        EXPECT_EQ(open_descriptors(), descriptors);
+        EXPECT_EQ(Filler::free_slots(mux()), slots);
+    }
+}
+
+TEST_F(WcdmaIqManagerTest, SavesWhatIsWithinTheMappingAndFitsTheMedium) {
+    const uint32_t size = IQ_MEM_SIZE;
+    const char *const outside = "is outside the mapping", *const full = "save WCDMA I/Q error";
+    const struct {
+        uint32_t offset, len, kept;
+        size_t half_at, fail_at;
+        const char* message;
+    } cases[] = {
+        {7, 25 * MB, 25 * MB, 0, 0, ""},
+        {0, 10 * MB, 10 * MB, 0, 0, ""},
+        {0, 0, 0, 0, 0, ""},
+        {size - 1, 1, 1, 0, 0, ""},
+        {size, 0, 0, 0, 0, ""},
+        {size + 1, 0, 0, 0, 0, outside},
+        {size, 1, 0, 0, 0, outside},
+        {0, size + 1, 0, 0, 0, outside},
+        {1, size, 0, 0, 0, outside},
+        {UINT32_MAX, 1, 0, 0, 0, outside},
+        {1, UINT32_MAX, 0, 0, 0, outside},
+        {0, 25 * MB, 0, 0, 1, full},
+        {0, 25 * MB, 10 * MB, 0, 2, full},
+        {0, 25 * MB, 1000, 1, 2, full},
+        {0, 25 * MB, 10 * MB + 1000, 2, 3, full},
+        {0, 25 * MB, 25 * MB, 3, 0, ""},
+    };
+    ASSERT_EQ(start(), 0);
+    script.tick = 0;
+    size_t num = 0;
+    for (const auto& c : cases) {
+        SCOPED_TRACE(&c - cases);
+        script.half_at = c.half_at;
+        script.fail_at = c.fail_at;
+        script.writes.clear();
+        log.clear();
+        device.fill(c.offset, c.len, c.message == outside ? "" : samples(c.len));
+        ASSERT_TRUE(saved(++num));
+        EXPECT_EQ(log.has(outside), c.message == outside);
+        EXPECT_EQ(log.has(full), c.message == full);
+        EXPECT_EQ(log.count("process_stor_response(int): WCDMA I/Q saved\n"), 1u);
+        ASSERT_EQ(iq_files().size(), num);
+        EXPECT_TRUE(newest() == samples(c.kept));
+        expect_accounted();
+        script.tick = 1;
+    }
+    EXPECT_EQ(iq_files()[0],
+              "data/modem_log/2016-03-01-09-15-00/cp_gnss/cp_gnss_wiq_2016-03-01_09-15-00.bin");
+    device.fail_ioctl(CMD_GET_IQ_BUF_INFO, EIO);
+    ASSERT_TRUE(save("never told"));
+    device.fail_ioctl(CMD_GET_IQ_BUF_INFO, 0);
+    EXPECT_TRUE(log.has("process_save(): ioctl CMD_GET_IQ_BUF_INFO error [5("));
+    EXPECT_EQ(newest(), "");
+}
+
+TEST_F(WcdmaIqManagerTest, KeepsSixtyFilesAcrossStopAndStart) {
+    for (size_t i = 0; i < 63; ++i) {
+        if (i == 0 || i == 59) {
+            iq->stop();
+            ASSERT_EQ(start(), 0);
+        }
+        ASSERT_TRUE(save(std::string(i, 'x')));
+    }
+    EXPECT_EQ(iq->num_files(), 60u);
+    ASSERT_EQ(iq_files().size(), 60u);
+    EXPECT_EQ(root.read_file(iq_files()[0]).size(), 3u);
+    EXPECT_EQ(newest().size(), 62u);
+    expect_accounted();
+    // An entry never outlives its file: here they all go with their set.
+    remove("data/modem_log/" + root.list("data/modem_log")[0]);
+    log_data(CT_WCN);
+    EXPECT_EQ(iq->num_files(), 0u);
+    // Creating the file is what finds the card there, and gone.
+    for (const char* service : {"running", "", "running", "", "running"}) {
+        set_card(service);
+        ASSERT_TRUE(save(service));
+    }
+    EXPECT_EQ(iq_files().size(), 5u);
+    EXPECT_EQ(iq->num_files(), 3u) << "the first and the third went with the card";
+    set_card("");
+    log_data(CT_WCN);
+    EXPECT_EQ(iq->num_files(), 2u);
+    EXPECT_TRUE(waits());
+}
+
+TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeAndForAName) {
+    script.tick = 0;
+    EXPECT_EQ(iq->pause() + iq->resume(), -2) << "not started";
+    ASSERT_EQ(start(), 0);
+    iq->process_stor_response(IQST_SAVED);
+    EXPECT_TRUE(log.has("process_stor_response(int): IQST_SAVED received in state 1 ["));
+    EXPECT_EQ(iq->pause() + iq->pause(), 0);
+    fill("dropped");
+    fill("first");
+    fill("second");
+    pump_once(mux());
+    EXPECT_EQ(iq_files().size(), 0u) << "nothing is taken while paused";
+    EXPECT_EQ(iq->resume(), 0);
+    ASSERT_TRUE(saved(2));
+    EXPECT_FALSE(pump([&] { return released() > 2; }, 300)) << "within the second";
+    ++script.time;
+    ASSERT_TRUE(saved(3));
+    ASSERT_EQ(iq_files().size(), 2u);
+    EXPECT_EQ(newest(), "second");
+    // The wait ends with the capture, however often it was begun.
+    script.time = 2000000000;
+    ASSERT_TRUE(save("once"));
+    for (int i = 0; i < 3; ++i) {
+        EXPECT_EQ(iq->pause(), 0);
+        EXPECT_EQ(iq->resume(), 0);
+        fill("x");
+        mux().run_once();
+        ASSERT_TRUE(waits());
+    }
+    iq.reset();
+    EXPECT_FALSE(pump([] { return false; }, 300)) << "no timer finds the manager gone";
+    EXPECT_EQ(iq_files().size(), 3u);
+}
+
+TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
+    ASSERT_EQ(start(), 0);
+    remove("data/modem_log");
+    root.write_file("data/modem_log", "");
+    ASSERT_TRUE(save("lost"));
+    EXPECT_EQ(log.count("process(int): create WCDMA I/Q file error ["), 1u);
+    remove("data/modem_log");
+    script.refused_cmd = IQST_SAVE;
+    ASSERT_TRUE(save("lost too"));
+    EXPECT_EQ(iq_files().size() + iq->num_files(), 0u);
+    // A stop that cannot be sent lets the save end by itself.
+    script.refused_cmd = IQST_STOP;
+    ASSERT_TRUE(begin_save(samples(25 * MB)));
+    EXPECT_EQ(iq->pause(), 0);
+    EXPECT_TRUE(log.has("can not stop saving WCDMA I/Q"));
+    EXPECT_TRUE(newest() == samples(25 * MB));
+    // And one that cannot be told to end ends with the connection.
+    script.refused_cmd = IQST_QUIT;
+    EXPECT_EQ(iq->stop(), 0);
+    expect_accounted();
+}
+
+// ---- Every moment of a save, every way to disturb it
+
+enum Moment { BEFORE, IN_FIRST_CHUNK, BETWEEN_CHUNKS, AT_THE_END, ANSWERED, NUM_MOMENTS };
+enum Action { PAUSE, STOP, UNMOUNT, SET_GONE, CP_DIR_GONE, CLEAR, CLEAR_UNPAUSED, NUM_ACTIONS };
+
+class SaveMomentTest : public WcdmaIqManagerTest,
+                       public testing::WithParamInterface<std::tuple<int, int>> {};
+
+TEST_P(SaveMomentTest, IsDisturbed) {
+    const int moment = std::get<0>(GetParam()), action = std::get<1>(GetParam());
+    const size_t descriptors = open_descriptors();
+    set_card(action == UNMOUNT ? "running" : "");
+    ASSERT_EQ(start(), 0);
+    ASSERT_TRUE(save("earlier"));
+
+    const size_t gates[NUM_MOMENTS] = {0, 1, 2, 4, SIZE_MAX};
+    ASSERT_TRUE(begin_save(samples(11 * MB), gates[moment]));
+    if (moment == ANSWERED) {
+        ASSERT_TRUE(
+            wait_until([&] { return script.saved_sent.load(std::memory_order_relaxed) == 2; }));
+    }
+    const auto files = iq_files();
+    ASSERT_EQ(files.size(), 2u);
+    const std::string set = files[0].substr(0, files[0].find("/cp_gnss"));
+
+    set_card("");
+    if (action == SET_GONE || action == CP_DIR_GONE) {
+        remove(action == SET_GONE ? set : set + "/cp_gnss");
+    }
+    if (action == PAUSE || action == CLEAR) {
+        EXPECT_EQ(iq->pause(), 0);
+        EXPECT_EQ(released(), 1u);
+    }
+    if (action == STOP) {
+        EXPECT_EQ(iq->stop(), 0);
+        EXPECT_EQ(open_descriptors(), descriptors);
+        EXPECT_EQ(device.maps(), 0u);
+    } else if (action == CLEAR || action == CLEAR_UNPAUSED) {
+        EXPECT_EQ(ctrl->clear_log(), 0);
+    } else if (action != PAUSE) {
+        log_data(action == CP_DIR_GONE ? CT_GNSS : CT_WCN);
+    }
+    const bool kept = action == PAUSE || action == STOP;
+    EXPECT_EQ(iq->num_files(), kept ? 2u : 0u);
+    EXPECT_EQ(log.has("WCDMA I/Q file is gone, its save ends"),
+              action == SET_GONE || action == CP_DIR_GONE || action == CLEAR_UNPAUSED);
+    // Where the thread notices: after the chunk it is at.
+    const bool whole = moment == AT_THE_END || moment == ANSWERED;
+    EXPECT_EQ(script.writes.size(), whole ? 2u : 1u);
+    if (kept || action == UNMOUNT) {
+        EXPECT_TRUE(root.read_file(files[1]) == samples((whole ? 11 : 10) * MB));
+    } else {
+        EXPECT_EQ(iq_files().size(), 0u);
+    }
+
+    EXPECT_EQ(iq->resume(), action == STOP ? -1 : 0);
+    ASSERT_EQ(start(), action == STOP ? 0 : -1);
+    ASSERT_TRUE(saved(2)) << "or again, when it was stopped";
+    ASSERT_TRUE(save("later"));
+    EXPECT_EQ(root.read_file(iq_files()[action == UNMOUNT ? 0 : iq_files().size() - 1]), "later");
+    EXPECT_FALSE(log.has("received in state"));
+    // A directory that vanished by itself stays in the medium's total until the next scan.
+    if (action != UNMOUNT && action != CP_DIR_GONE) {
+        expect_accounted();
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(All, SaveMomentTest,
+                         testing::Combine(testing::Range<int>(0, NUM_MOMENTS),
+                                          testing::Range<int>(0, NUM_ACTIONS)));
+
+// ---- Driven by the channel
+
+TEST_F(WcdmaIqManagerTest, TheChannelDrivesItsCapture) {
+    iq.reset();
+    const size_t before = open_descriptors();
+    ASSERT_EQ(boot("iq cp_gnss WCDMA\nstream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
+    const auto captured = [&](const std::string& content) {
+        const size_t num = released();
+        fill(content);
+        return pump([&] { return released() > num; }) && newest() == content;
+    };
+    ASSERT_TRUE(captured("one"));
+    // Cleared in the middle of a save.
+    arm(4);
+    fill(samples(20 * MB));
+    ASSERT_TRUE(pump([&] { return script.reached.load(); }));
+    EXPECT_EQ(ctrl->clear_log(), 0);
+    EXPECT_EQ(iq_files().size(), 0u);
+    ASSERT_TRUE(captured("two"));
+    EXPECT_EQ(iq_files().size(), 1u);
+    EXPECT_EQ(ctrl->disable_wcdma_iq(CT_GNSS) + ctrl->enable_wcdma_iq(CT_GNSS), 0);
+    EXPECT_EQ(device.maps(), 0u) << "not before the next start";
+    LogPipeHandler* gnss = ctrl->get_cp(CT_GNSS);
+    gnss->stop();
+    EXPECT_EQ(gnss->start(), 0);
+    ASSERT_TRUE(captured("three"));
+    gnss->stop();
+    device.fail_mmap(ENOMEM);
+    EXPECT_EQ(gnss->start(), 0);
+    EXPECT_TRUE(log.has("start_logging(): start saving WCDMA I/Q error ["));
+    ctrl.reset();
+    EXPECT_LE(open_descriptors(), before);
+}
+
+}  // namespace
