@@ -18,7 +18,8 @@ namespace {
 
 constexpr char DB_FILE_NAME[] = "/modem_db.gz";
 constexpr char SHA1_FILE_NAME[] = "/sha1.txt";
-constexpr int LIB_FILE_FLAGS = O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC;
+// A link of that name on a card must not be written through.
+constexpr int LIB_FILE_FLAGS = O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC;
 // An image has a handful of entries; a table that goes on for longer is garbage.
 constexpr int MAX_ENTRIES = 1024;
 constexpr size_t COPY_SIZE = 32768;

@@ -51,7 +51,7 @@ const char* parse_save(RequestParams params, LogController* ctrl, LogPipeHandler
     return channel ? nullptr : "unknown CP";
 }
 
-// One size and nothing more. The size is set with PE_EXTRA as well.
+// One size and nothing more. mb is filled in also when more follows (PE_EXTRA).
 ParamError parse_size(RequestParams params, uint32_t& mb) {
     const ParamError error = params.take_size(mb);
     return error ? error : params.take_end();

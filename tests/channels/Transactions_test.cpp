@@ -177,4 +177,21 @@ TEST_F(TransactionsTest, DevicesThatFailEndTheirTransactionAndComeBack) {
     EXPECT_TRUE(both_log("<again>"));
 }
 
+// A try to open the log device that falls into a transaction is made up for afterwards.
+TEST_F(TransactionsTest, ALogDeviceThatIsMissingAtTheStartIsOpenedAfterATransaction) {
+    boot_modem(false);
+    modem()->stop();
+    modem()->set_dev_paths("/nowhere", diag_dev.path().c_str());
+    modem()->start();
+    modem()->set_dev_paths(log_dev->path().c_str(), diag_dev.path().c_str());
+    Client client;
+    ASSERT_TRUE(begin(RINGBUF, client));
+    run_clock(3100);
+    EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
+    EXPECT_LT(modem()->fd(), 0);
+    run_clock(3100);
+    ASSERT_GE(modem()->fd(), 0);
+    EXPECT_TRUE(both_log("<again>"));
+}
+
 }  // namespace

@@ -1,0 +1,237 @@
+// The part of LogPipeHandler that reacts to the events of its CP and runs the transactions
+// over the diag device.
+#include <cutils/properties.h>
+#include <errno.h>
+#include <poll.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include "channels/CpRingBufConsumer.h"
+#include "channels/CpSleepLogConsumer.h"
+#include "channels/DiagDeviceHandler.h"
+#include "channels/LogPipeHandler.h"
+#include "client/ClientHandler.h"
+#include "control/LogController.h"
+#include "core/Multiplexer.h"
+#include "core/log.h"
+#include "storage/CpStorage.h"
+#include "storage/log_name.h"
+
+// ---- CP events
+
+bool LogPipeHandler::will_be_reset() const {
+    char value[PROPERTY_VALUE_MAX];
+    property_get(m_reset_prop, value, "");
+    return strtoul(value, nullptr, 0) == 1;
+}
+
+void LogPipeHandler::process_assert(bool save_md) {
+    if (m_state == CWS_NOT_WORKING || m_state == CWS_DUMP) {
+        return;
+    }
+    if (client_transaction_runs()) {
+        end_client_transaction(-1);
+    }
+    const bool reset = will_be_reset();
+    if (reset && !save_md) {
+        m_state = CWS_NOT_WORKING;
+        return;
+    }
+    struct tm t;
+    if (!need_storage() || get_local_time(t) < 0) {
+        return;
+    }
+    if (reset) {
+        m_log_ctrl->save_mini_dump(m_storage, t, m_type);
+        m_state = CWS_NOT_WORKING;
+        return;
+    }
+    LogController::save_dipx_dump(m_storage, t);
+    if (save_md) {
+        m_log_ctrl->save_mini_dump(m_storage, t, m_type);
+    }
+    if (m_enabled) {
+        notify_cp_dump(CDE_START);
+        if (start_dump(t) == 0) {
+            return;
+        }
+        const int start_errno = errno;
+        notify_cp_dump(CDE_END);
+        errno = start_errno;
+        err_log("Start dump transaction error");
+    }
+    close_on_assert();
+}
+
+void LogPipeHandler::close_on_assert() {
+    close_dev();
+    cancel_reopen();
+    flush();
+    m_state = CWS_NOT_WORKING;
+}
+
+void LogPipeHandler::process_alive() {
+    if (m_state == CWS_DUMP) {
+        // The CP was restarted under the dump: what arrived so far is kept.
+        end_dump();
+        notify_cp_dump(CDE_END);
+    } else if (client_transaction_runs()) {
+        // A CP that has just come up knows nothing of the request.
+        end_client_transaction(-1);
+    }
+    m_state = CWS_WORKING;
+    if (!m_enabled) {
+        return;
+    }
+    if (open_dev() < 0) {
+        err_log("kestcp: open %s error", m_name.string());
+        arm_reopen();
+    } else {
+        poll_dev();
+    }
+}
+
+void LogPipeHandler::notify_cp_dump(CpDumpEvent event) {
+    m_log_ctrl->notify_cp_dump(m_type, event);
+}
+
+// ---- Transactions over the diag device
+
+DiagDeviceHandler* LogPipeHandler::create_diag_device(DataConsumer* consumer) {
+    if (m_log_diag_same) {
+        if (m_fd < 0) {
+            return nullptr;
+        }
+        return new DiagDeviceHandler(m_fd, consumer, m_log_ctrl, m_multiplexer);
+    }
+    DiagDeviceHandler* diag =
+        new DiagDeviceHandler(m_diag_dev_path, consumer, m_log_ctrl, m_multiplexer);
+    if (diag->open() < 0) {
+        delete diag;
+        return nullptr;
+    }
+    return diag;
+}
+
+int LogPipeHandler::run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer,
+                                    CpWorkState state) {
+    if (diag && diag->add_events(POLLIN) == 0) {
+        consumer->bind(diag);
+        if (consumer->start() == 0) {
+            start_transaction(diag, consumer, state);
+            return 0;
+        }
+    }
+    delete consumer;
+    delete diag;
+    return -1;
+}
+
+void LogPipeHandler::start_transaction(DiagDeviceHandler* diag, DataConsumer* consumer,
+                                       CpWorkState state) {
+    m_diag_handler = diag;
+    m_consumer = consumer;
+    m_state = state;
+    if (m_log_diag_same) {
+        del_events(POLLIN);
+    }
+}
+
+void LogPipeHandler::stop_transaction(CpWorkState new_state) {
+    delete m_consumer;
+    m_consumer = nullptr;
+    delete m_diag_handler;
+    m_diag_handler = nullptr;
+    m_state = new_state;
+    if (m_log_diag_same && m_fd >= 0) {
+        poll_dev();
+    }
+}
+
+void LogPipeHandler::end_dump() {
+    stop_transaction(CWS_NOT_WORKING);
+    close_on_assert();
+}
+
+// ---- Transactions for clients
+
+// 0 when a client's transaction can start, else the result that refuses it.
+int LogPipeHandler::check_client_transaction() const {
+    if (!m_enabled) {
+        return -3;
+    }
+    if (m_state == CWS_NOT_WORKING) {
+        return -6;
+    }
+    return m_state == CWS_WORKING ? 0 : -2;
+}
+
+int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState state,
+                                             ClientHandler* client) {
+    consumer->set_callback(this, diag_transaction_notify);
+    if (run_transaction(create_diag_device(consumer), consumer, state) < 0) {
+        return -1;
+    }
+    m_trans_client = client;
+    return 1;
+}
+
+int LogPipeHandler::save_sleep_log(ClientHandler* client) {
+    const int refusal = check_client_transaction();
+    if (refusal < 0) {
+        return refusal;
+    }
+    if (!m_storage && create_storage() < 0) {
+        return -1;
+    }
+    return begin_client_transaction(new CpSleepLogConsumer(m_name.string(), m_storage),
+                                    CWS_SAVE_SLEEP_LOG, client);
+}
+
+int LogPipeHandler::save_ringbuf(ClientHandler* client) {
+    const int refusal = check_client_transaction();
+    if (refusal < 0) {
+        return refusal;
+    }
+    if (!m_storage && create_storage() < 0) {
+        return -1;
+    }
+    return begin_client_transaction(new CpRingBufConsumer(m_name.string(), m_storage),
+                                    CWS_SAVE_RINGBUF, client);
+}
+
+void LogPipeHandler::cancel_trans_result_notify(ClientHandler* client) {
+    if (m_trans_client.get() == client) {
+        m_trans_client = nullptr;
+    }
+}
+
+void LogPipeHandler::end_client_transaction(int result) {
+    stop_transaction(CWS_WORKING);
+    if (m_enabled && m_fd < 0 && !m_reopen_timer) {
+        // The next try to open the log device fell into the transaction and was passed over.
+        arm_reopen();
+    }
+    ClientHandler* client = m_trans_client.get();
+    m_trans_client = nullptr;
+    if (client) {
+        client->notify_trans_result(result);
+    }
+}
+
+void LogPipeHandler::diag_transaction_notify(void* client, DataConsumer::LogProcResult result) {
+    LogPipeHandler* handler = static_cast<LogPipeHandler*>(client);
+    if (!handler->client_transaction_runs()) {
+        err_log("Receive diag notify %d under state %d, ignore", result, handler->m_state);
+        return;
+    }
+    int client_result = -1;
+    if (result == DataConsumer::LPR_SUCCESS) {
+        client_result = 0;
+    } else if (result == DataConsumer::LPR_SLEEPLOG_NO_SUPPORT) {
+        client_result = -4;
+    } else if (result == DataConsumer::LPR_RINGBUF_NO_SUPPORT) {
+        client_result = -5;
+    }
+    handler->end_client_transaction(client_result);
+}
