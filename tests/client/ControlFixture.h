@@ -121,7 +121,7 @@ private:
 class ClientFixture : public ControlFixture {
 protected:
     ClientFixture() { serve(3); }
-    void serve(int max_clients) {
+    void serve(size_t max_clients) {
         manager.reset();
         manager.reset(new ClientManager(&ctrl, &mux(), max_clients));
         EXPECT_EQ(manager->init(TEST_SERVER), 0);

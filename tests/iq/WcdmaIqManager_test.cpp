@@ -318,6 +318,17 @@ TEST_F(WcdmaIqManagerTest, KeepsSixtyFilesAcrossStopAndStart) {
     EXPECT_TRUE(waits());
 }
 
+TEST_F(WcdmaIqManagerTest, AThreadThatDoesNotAnswerIsReported) {
+    ASSERT_EQ(start(), 0);
+    // The driver holds the thread until the service has said that it waits.
+    device.on_buf_info = [this] {
+        EXPECT_TRUE(wait_until([this] { return log.has("does not answer, waiting on"); }, 30000));
+    };
+    ASSERT_TRUE(begin_save(samples(MB)));
+    EXPECT_EQ(iq->pause(), 0);
+    EXPECT_EQ(iq->state(), WcdmaIqManager::IQS_PAUSED);
+}
+
 TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeAndForAName) {
     script.tick = 0;
     EXPECT_EQ(iq->pause() + iq->resume(), -2) << "not started";

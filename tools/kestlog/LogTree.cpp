@@ -93,7 +93,7 @@ bool LogTree::read(const std::string& path) {
     const auto is_ours = [](const Entry& e) {
         return e.file && FileName(e.name).type != LT_UNKNOWN;
     };
-    if (name == DIR_MODEM_LOG + 1 || any(is_set)) {
+    if (name == &DIR_MODEM_LOG[1] || any(is_set)) {
         read_root(path);
     } else if (parse_set_name(name, &time) || any(is_cp)) {
         read_set(path, name);
