@@ -135,8 +135,10 @@ LogFile* CpDirectory::create_log_file() {
         delete file;
         return nullptr;
     }
-    const bool first = std::none_of(m_files.begin(), m_files.end(),
-                                    [](const LogFile* f) { return f->type() == LT_LOG; });
+    bool first = true;
+    for (const LogFile* listed : m_files) {
+        first = first && listed->type() != LT_LOG;
+    }
     if (first) {
         m_first_log = file;
     }

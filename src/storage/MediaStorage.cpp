@@ -161,7 +161,11 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
     m_manager->media_vanished(this);
     CpSetDirectory* vanished = m_working_set;
     m_working_set = nullptr;
-    m_sets.erase(std::find(m_sets.begin(), m_sets.end(), vanished));
+    android::List<CpSetDirectory*>::iterator it = m_sets.begin();
+    while (*it != vanished) {
+        ++it;
+    }
+    m_sets.erase(it);
     m_size -= vanished->size();
     delete vanished;
     return create_cp_set();

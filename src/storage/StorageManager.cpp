@@ -3,8 +3,6 @@
 #include <cutils/properties.h>
 #include <string.h>
 
-#include <algorithm>
-
 #include "config/property_names.h"
 #include "core/log.h"
 #include "core/system_paths.h"
@@ -130,11 +128,13 @@ CpStorage* StorageManager::create_storage(LogPipeHandler* channel) {
 }
 
 void StorageManager::delete_storage(CpStorage* storage) {
-    android::List<CpStorage*>::iterator it =
-        std::find(m_storages.begin(), m_storages.end(), storage);
-    if (it != m_storages.end()) {
-        m_storages.erase(it);
-        delete storage;
+    for (android::List<CpStorage*>::iterator it = m_storages.begin(); it != m_storages.end();
+         ++it) {
+        if (*it == storage) {
+            m_storages.erase(it);
+            delete storage;
+            return;
+        }
     }
 }
 
