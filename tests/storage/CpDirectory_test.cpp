@@ -130,6 +130,31 @@ TEST_F(CpDirectoryTest, FilesOfOneSecondAreNeverReplaced) {
     EXPECT_EQ(3u, m_root.list(DIR_REL).size());
 }
 
+TEST_F(CpDirectoryTest, TrimTakesWholeFilesFromTheFront) {
+    const struct {
+        uint64_t wanted;
+        int failing;  // number of the unlink that fails
+        uint64_t removed;
+        size_t left;
+    } cases[] = {{0, 0, 10, 3},  {10, 0, 10, 3},    {11, 0, 30, 2},  {31, 0, 60, 1},
+                 {30, 0, 30, 2}, {1000, 0, 100, 0}, {1000, 1, 0, 4}, {1000, 3, 30, 2}};
+    start();
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.wanted);
+        for (uint32_t i = 1; i <= 4; ++i) {
+            add("f" + std::to_string(i), LT_DUMP, 10 * i);
+        }
+        if (c.failing) {
+            faults::fail(faults::UNLINK, c.failing, EIO);
+        }
+        EXPECT_EQ(c.removed, m_dir->trim(c.wanted));
+        EXPECT_EQ(c.left, m_dir->files().size());
+        EXPECT_EQ(100 - c.removed, m_dir->size());
+        faults::reset();
+        m_dir->trim(1000);
+    }
+}
+
 TEST_F(CpDirectoryTest, TrimWorkingDir) {
     start();
     LogFile* first = m_dir->create_log_file();

@@ -110,4 +110,27 @@ TEST_F(MediaStorageTest, Quota) {
     }
 }
 
+TEST_F(MediaStorageTest, FreeSpaceWantsHalfAFileSize) {
+    const struct {
+        off_t old_size;
+        bool overwrite;
+        int result;
+        size_t sets_left;
+    } cases[] = {{5 * MIB / 2, true, 0, 0},
+                 {5 * MIB / 2 - 1, true, -1, 0},
+                 {50 * MIB, true, 0, 0},
+                 {50 * MIB, false, -1, 1}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.old_size);
+        put(ROOT + "2016-02-01-00-00-00/cp/f", c.old_size);
+        internal().clear();
+        init();
+        m_mgr.set_file_size(5 * MIB);
+        m_mgr.set_overwrite(c.overwrite);
+        EXPECT_EQ(c.result, internal().free_space());
+        EXPECT_EQ(c.sets_left, m_root.list(ROOT).size());
+        check_sums(internal());
+    }
+}
+
 }  // namespace
