@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include "core/Multiplexer.h"
+#include "core/log.h"
 
 FdHandler::FdHandler(int fd, LogController* ctrl, Multiplexer* mux)
     : m_fd(fd), m_log_ctrl(ctrl), m_multiplexer(mux) {}
@@ -11,6 +12,7 @@ FdHandler::~FdHandler() {
     // Wholly, even without a descriptor: an entry left behind would be read when the
     // poll set is built next.
     if (m_multiplexer) {
+        cancel_rest();
         m_multiplexer->forget(this);
     }
     close();
@@ -18,6 +20,13 @@ FdHandler::~FdHandler() {
 
 int FdHandler::add_events(int events) {
     return m_multiplexer->register_fd(this, events);
+}
+
+void FdHandler::poll_when_room(int events, const char* what) {
+    if (m_multiplexer->register_when_room(this, events) < 0) {
+        errno = ENOBUFS;
+        err_log("no room to poll %s, waiting for it", what);
+    }
 }
 
 void FdHandler::del_events(int events) {
@@ -31,4 +40,43 @@ int FdHandler::close() {
     const int result = ::close(m_fd);
     m_fd = -1;
     return result;
+}
+
+void FdHandler::note_idle(const char* what) {
+    if (m_idle_wakeups < IDLE_LIMIT) {
+        ++m_idle_wakeups;
+    }
+    if (m_idle_wakeups < IDLE_LIMIT || m_rest_timer) {
+        return;
+    }
+    m_rest_timer = m_multiplexer->timer_mgr().create_timer(REST_MS, on_rest_over, this);
+    if (!m_rest_timer) {
+        return;  // no clock, no rest: nothing would end it
+    }
+    m_multiplexer->rest_changed();
+    if (!m_rest_logged) {
+        m_rest_logged = true;
+        info_log("%s gave nothing %u times in a row, left alone for %u ms at a time", what,
+                 IDLE_LIMIT, REST_MS);
+    }
+}
+
+void FdHandler::on_rest_over(void* handler) {
+    FdHandler* const self = static_cast<FdHandler*>(handler);
+    self->m_rest_timer = nullptr;
+    self->m_multiplexer->rest_changed();
+}
+
+void FdHandler::end_rest() {
+    m_idle_wakeups = 0;
+    m_rest_logged = false;
+    cancel_rest();
+}
+
+void FdHandler::cancel_rest() {
+    if (m_rest_timer) {
+        m_multiplexer->timer_mgr().del_timer(m_rest_timer);
+        m_rest_timer = nullptr;
+        m_multiplexer->rest_changed();
+    }
 }

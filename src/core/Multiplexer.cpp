@@ -2,16 +2,16 @@
 
 #include "core/FdHandler.h"
 
-size_t Multiplexer::find(const FdHandler* h) const {
+size_t Multiplexer::find(const android::Vector<PollEntry>& entries, const FdHandler* h) {
     size_t i = 0;
-    while (i < m_entries.size() && m_entries[i].handler != h) {
+    while (i < entries.size() && entries[i].handler != h) {
         ++i;
     }
     return i;
 }
 
 int Multiplexer::register_fd(FdHandler* h, int events) {
-    const size_t i = find(h);
+    const size_t i = find(m_entries, h);
     if (i < m_entries.size()) {
         if ((m_entries[i].events & events) == events) {
             return 0;
@@ -30,8 +30,25 @@ int Multiplexer::register_fd(FdHandler* h, int events) {
     return 0;
 }
 
+int Multiplexer::register_when_room(FdHandler* h, int events) {
+    if (register_fd(h, events) == 0) {
+        return 0;
+    }
+    const size_t i = find(m_waiting, h);
+    if (i < m_waiting.size()) {
+        m_waiting.editItemAt(i).events |= events;
+    } else {
+        PollEntry entry;
+        entry.handler = h;
+        entry.events = events;
+        m_waiting.push(entry);
+    }
+    return -1;
+}
+
 void Multiplexer::unregister_fd(FdHandler* h, int events) {
-    const size_t i = find(h);
+    remove_waiting(h, events);
+    const size_t i = find(m_entries, h);
     if (i == m_entries.size() || !(m_entries[i].events & events)) {
         return;
     }
@@ -44,9 +61,21 @@ void Multiplexer::unregister_fd(FdHandler* h, int events) {
 }
 
 void Multiplexer::forget(FdHandler* h) {
-    const size_t i = find(h);
+    remove_waiting(h, ~0);
+    const size_t i = find(m_entries, h);
     if (i < m_entries.size()) {
         remove_entry(i);
+    }
+}
+
+void Multiplexer::remove_waiting(FdHandler* h, int events) {
+    const size_t i = find(m_waiting, h);
+    if (i < m_waiting.size()) {
+        PollEntry& entry = m_waiting.editItemAt(i);
+        entry.events &= ~events;
+        if (!entry.events) {
+            m_waiting.removeAt(i);
+        }
     }
 }
 
@@ -58,13 +87,18 @@ void Multiplexer::remove_entry(size_t index) {
         }
     }
     m_entries.removeAt(index);
+    if (!m_waiting.isEmpty()) {
+        m_entries.push(m_waiting[0]);
+        m_waiting.removeAt(0);
+    }
     m_changed = true;
 }
 
 void Multiplexer::build_poll_set() {
     m_poll_num = m_entries.size();
     for (size_t i = 0; i < m_poll_num; ++i) {
-        m_poll_fds[i].fd = m_entries[i].handler->fd();
+        const FdHandler* handler = m_entries[i].handler;
+        m_poll_fds[i].fd = handler->resting() ? -1 : handler->fd();  // poll passes over -1
         m_poll_fds[i].events = static_cast<short>(m_entries[i].events);
         m_poll_fds[i].revents = 0;
         m_handlers[i] = m_entries[i].handler;

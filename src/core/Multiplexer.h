@@ -29,12 +29,19 @@ public:
     // those it is registered for. 0, or -1 when MAX_HANDLERS others are registered.
     int register_fd(FdHandler* h, int events);
 
+    // As register_fd, but when the table is full (-1) h waits: it is registered as soon as
+    // another handler leaves. Handlers that wait are admitted in their order.
+    int register_when_room(FdHandler* h, int events);
+
     // Drops events of h; a handler without events left is removed. Events that h is not
     // registered for are ignored.
     void unregister_fd(FdHandler* h, int events);
 
     // Removes h with all its events, for a handler that is being destroyed.
     void forget(FdHandler* h);
+
+    // A handler's rest has begun or ended: the poll set is built afresh for the next pass.
+    void rest_changed() { m_changed = true; }
 
     // Runs the loop; never returns.
     [[noreturn]] void run();
@@ -54,13 +61,15 @@ private:
     };
 
     // Index of h's entry, or the number of entries when it has none.
-    size_t find(const FdHandler* h) const;
+    static size_t find(const android::Vector<PollEntry>& entries, const FdHandler* h);
     void remove_entry(size_t index);
+    void remove_waiting(FdHandler* h, int events);
     void build_poll_set();
 
     android::Vector<PollEntry> m_entries;
-    bool m_changed = true;  // m_entries differs from what the arrays were built from
-    size_t m_poll_num = 0;  // slots in use in both arrays
+    android::Vector<PollEntry> m_waiting;  // for room in m_entries, which is full then
+    bool m_changed = true;                 // m_entries differs from what the arrays were built from
+    size_t m_poll_num = 0;                 // slots in use in both arrays
     struct pollfd m_poll_fds[MAX_HANDLERS];
     FdHandler* m_handlers[MAX_HANDLERS];  // null: removed since the arrays were built
     TimerManager m_timer_mgr;

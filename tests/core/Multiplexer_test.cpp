@@ -14,6 +14,7 @@
 
 #include "core/FdHandler.h"
 #include "support/TestRoot.h"
+#include "support/boot_clock.h"
 
 namespace {
 
@@ -83,7 +84,10 @@ private:
 
 class MultiplexerTest : public testing::Test {
 protected:
-    ~MultiplexerTest() override { g_poll_error = 0; }
+    ~MultiplexerTest() override {
+        g_poll_error = 0;
+        boot_clock::real();
+    }
     // A pass that does not wait, whatever is ready.
     void pass() {
         mux.timer_mgr().add_timer(
@@ -251,4 +255,87 @@ TEST_F(MultiplexerTest, DestructorLeavesNoRegistration) {
     closed.reset();
     pass();
     EXPECT_TRUE(g_polled.empty());
+}
+
+// A descriptor that hung up is ready for ever: it took a whole core.
+TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
+    boot_clock::freeze();
+    LogCapture log;
+    Probe hung(&mux, POLLIN);
+    Probe other(&mux, POLLOUT);
+    hung.hang_up();
+    hung.action = [&] { hung.note_idle("hung device"); };
+    for (int i = 0; i < 30; ++i) {
+        mux.run_once();
+    }
+    EXPECT_EQ(10u, hung.calls.size());
+    EXPECT_EQ(30u, other.calls.size());
+    EXPECT_EQ(1u, log.count("void FdHandler::note_idle(const char*): hung device gave nothing 10 "
+                            "times in a row, left alone for 3000 ms at a time\n"));
+
+    // One try after each rest, even if the descriptor was closed and opened meanwhile.
+    hung.del_events(POLLIN);
+    hung.reopen();
+    EXPECT_EQ(0, hung.add_events(POLLIN));
+    hung.hang_up();
+    boot_clock::advance(2999);
+    mux.run_once();
+    EXPECT_EQ(10u, hung.calls.size());
+    for (int i = 0; i < 3; ++i) {
+        boot_clock::advance(3000);
+        for (int j = 0; j < 5; ++j) {
+            mux.run_once();
+        }
+    }
+    EXPECT_EQ(13u, hung.calls.size());
+    EXPECT_EQ(1u, log.count("left alone"));
+
+    // Data counts afresh and ends the rest.
+    EXPECT_TRUE(hung.resting());
+    hung.note_alive();
+    for (int i = 0; i < 30; ++i) {
+        mux.run_once();
+    }
+    EXPECT_EQ(23u, hung.calls.size());
+    EXPECT_EQ(2u, log.count("left alone"));
+
+    // Without a clock nothing would end a rest.
+    hung.note_alive();
+    boot_clock::fail();
+    for (int i = 0; i < 30; ++i) {
+        mux.run_once();
+    }
+    EXPECT_EQ(53u, hung.calls.size());
+}
+
+// A handler that found the table full stayed unpolled for good.
+TEST_F(MultiplexerTest, HandlerWaitsForRoomInTheTable) {
+    LogCapture log;
+    std::vector<std::unique_ptr<Probe>> probes;
+    for (size_t i = 0; i < Multiplexer::MAX_HANDLERS; ++i) {
+        probes.emplace_back(new Probe(&mux, POLLIN));
+    }
+    Probe first(&mux, 0);
+    Probe withdrawn(&mux, 0);
+    std::unique_ptr<Probe> destroyed(new Probe(&mux, 0));
+    Probe last(&mux, 0);
+    for (Probe* probe : {&first, &withdrawn, destroyed.get(), &last}) {
+        probe->make_ready();
+        probe->poll_when_room(POLLIN, "some device");
+    }
+    EXPECT_EQ(4u,
+              log.count("void FdHandler::poll_when_room(int, const char*): no room to poll some "
+                        "device, waiting for it [105(No buffer space available)]\n"));
+    withdrawn.del_events(POLLIN);
+    destroyed.reset();
+    pass();
+    EXPECT_TRUE(first.calls.empty());
+    probes.pop_back();
+    pass();
+    EXPECT_EQ(ONE_INPUT, first.calls);
+    EXPECT_TRUE(last.calls.empty());
+    probes.clear();
+    mux.run_once();
+    EXPECT_EQ(ONE_INPUT, last.calls);
+    EXPECT_TRUE(withdrawn.calls.empty());
 }

@@ -1,34 +1,12 @@
 #include "core/TimerManager.h"
 
-#include <errno.h>
 #include <gtest/gtest.h>
 
 #include <functional>
 #include <string>
 
 #include "support/TestRoot.h"
-
-namespace {
-
-enum ClockMode { CLOCK_REAL, CLOCK_FROZEN, CLOCK_FAILS };
-ClockMode g_mode = CLOCK_REAL;
-struct timespec g_now;
-
-}  // namespace
-
-extern "C" int __real_clock_gettime(clockid_t id, struct timespec* now);
-extern "C" int __wrap_clock_gettime(clockid_t id, struct timespec* now);
-extern "C" int __wrap_clock_gettime(clockid_t id, struct timespec* now) {
-    if (id != CLOCK_BOOTTIME || g_mode == CLOCK_REAL) {
-        return __real_clock_gettime(id, now);
-    }
-    if (g_mode == CLOCK_FAILS) {
-        errno = EINVAL;
-        return -1;
-    }
-    *now = g_now;
-    return 0;
-}
+#include "support/boot_clock.h"
 
 namespace {
 
@@ -42,11 +20,8 @@ protected:
         TimerManager::Timer* timer;
     };
 
-    TimerManagerTest() {
-        g_mode = CLOCK_FROZEN;
-        g_now = {1000, 999999999};
-    }
-    ~TimerManagerTest() override { g_mode = CLOCK_REAL; }
+    TimerManagerTest() { boot_clock::freeze(); }
+    ~TimerManagerTest() override { boot_clock::real(); }
 
     static void fire(void* data) {
         Client* const client = static_cast<Client*>(data);
@@ -64,7 +39,7 @@ protected:
     }
     // Moves the clock and runs one pass; the names of the timers that fired, in order.
     std::string after(unsigned int ms) {
-        g_now = TimerManager::add_ms(g_now, ms);
+        boot_clock::advance(ms);
         m_fired.clear();
         m_mgr.process_timers();
         return m_fired;
@@ -163,7 +138,7 @@ TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
     EXPECT_TRUE(m_mgr.get_timeout(&ms) == 0 && ms == 10);
     m_mgr.del_timer(m_clients[1].timer);
     LogCapture log;
-    g_mode = CLOCK_FAILS;
+    boot_clock::fail();
     EXPECT_EQ(nullptr, m_mgr.create_timer(0, fire, nullptr));
     EXPECT_EQ(-1, m_mgr.set_new_due_time(m_clients[0].timer, 100));
     EXPECT_EQ(-1, m_mgr.get_timeout(&ms));
@@ -173,7 +148,7 @@ TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
     EXPECT_EQ(-1, m_mgr.add_timer(0, fire, nullptr));
     EXPECT_TRUE(log.has("TimerManager::add_timer(unsigned int, "));
     EXPECT_TRUE(log.has("): clock_gettime CLOCK_BOOTTIME error [22(Invalid argument)]\n"));
-    g_mode = CLOCK_FROZEN;
+    boot_clock::freeze();
     EXPECT_EQ("a", after(0));
     EXPECT_EQ(0, m_mgr.add_timer(0, fire, &m_clients[0]));
     EXPECT_EQ("a", after(0));
