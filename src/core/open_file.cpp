@@ -1,0 +1,46 @@
+#include "core/open_file.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+int refuse(int fd, int error) {
+    close(fd);
+    errno = error;
+    return -1;
+}
+
+int open_checked(const char* path, int flags, Links links, bool block_device_too) {
+    const int no_follow = links == Links::REFUSE ? O_NOFOLLOW : 0;
+    const int fd = open(path, flags | no_follow | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, 0644);
+    if (fd < 0) {
+        return -1;
+    }
+    struct stat st;
+    if (fstat(fd, &st) < 0) {
+        return refuse(fd, errno);
+    }
+    if (!S_ISREG(st.st_mode) && !(block_device_too && S_ISBLK(st.st_mode))) {
+        return refuse(fd, S_ISDIR(st.st_mode) ? EISDIR : EINVAL);
+    }
+    // Only the opening must not wait. A file of the kernel may take the flag for a wish to
+    // get a part of its content instead of all.
+    const int status = fcntl(fd, F_GETFL);
+    if (status < 0 || fcntl(fd, F_SETFL, status & ~O_NONBLOCK) < 0) {
+        return refuse(fd, errno);
+    }
+    return fd;
+}
+
+}  // namespace
+
+int open_to_read(const char* path, Links links) {
+    return open_checked(path, O_RDONLY, links, true);
+}
+
+int open_to_write(const char* path, int flags, Links links) {
+    return open_checked(path, flags, links, false);
+}
