@@ -1,13 +1,7 @@
 #include "storage/CpDirectory.h"
 
-#include <dirent.h>
 #include <errno.h>
-#include <fcntl.h>
 #include <string.h>
-#include <sys/stat.h>
-
-#include <algorithm>
-#include <vector>
 
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
@@ -33,68 +27,6 @@ int CpDirectory::create() {
 
 int CpDirectory::remove() {
     return remove_tree(m_path);
-}
-
-int CpDirectory::stat() {
-    DIR* dir = opendir(m_path.string());
-    if (!dir) {
-        return -1;
-    }
-    std::vector<LogFile*> found;
-    while (const struct dirent* entry = readdir(dir)) {
-        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..")) {
-            continue;
-        }
-        // Links are not followed: one on a card must not lead trimming out of the tree.
-        struct stat st;
-        if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
-            !S_ISREG(st.st_mode)) {
-            continue;
-        }
-        LogFile* file = new LogFile(android::String8(entry->d_name), this, LT_UNKNOWN,
-                                    static_cast<uint32_t>(st.st_size));
-        file->parse_name();
-        found.push_back(file);
-        m_size += static_cast<uint64_t>(st.st_size);
-    }
-    closedir(dir);
-    insert_scanned(found.data(), found.size());
-    return 0;
-}
-
-// Puts a scan's files into the list order. They are sorted first, so that a directory
-// of many thousand files costs n log n comparisons instead of n walks along the list.
-void CpDirectory::insert_scanned(LogFile** files, size_t num) {
-    // Where a kind stands: unknown files lead, version records end the list.
-    auto group = [](const LogFile* file) {
-        return file->type() == LT_UNKNOWN ? 0 : file->type() == LT_VERSION ? 2 : 1;
-    };
-    // Of log files made within one second the one with the larger number is older. Other
-    // files count as number 0, so that the order stays a strict one among mixed kinds.
-    auto number = [](const LogFile* file) {
-        uint32_t value = 0;
-        size_t digits;
-        return file->type() == LT_LOG && parse_log_number(file->name(), value, digits) == 0 ? value
-                                                                                            : 0;
-    };
-    std::stable_sort(files, files + num, [&](const LogFile* a, const LogFile* b) {
-        if (group(a) != group(b)) {
-            return group(a) < group(b);
-        }
-        if (group(a) != 1) {
-            return false;
-        }
-        if (a->time() < b->time() || b->time() < a->time()) {
-            return a->time() < b->time();
-        }
-        return number(a) > number(b);
-    });
-    // Unknown files each go ahead of those found before.
-    std::reverse(files, std::find_if(files, files + num,
-                                     [&](const LogFile* file) { return group(file) != 0; }));
-    for (size_t i = 0; i < num; ++i) {
-        m_files.push_back(files[i]);
-    }
 }
 
 CpDirectory::FileIter CpDirectory::find(LogFile* file) {
@@ -221,23 +153,6 @@ void CpDirectory::close_log_file() {
     }
 }
 
-void CpDirectory::rotate_logs() {
-    // A file that could not be renumbered keeps its name. A younger one of the same second
-    // would take that very name and so replace it on the medium: it stays as well.
-    const LogFile* stuck = nullptr;
-    for (LogFile* file : m_files) {
-        if (file->type() != LT_LOG) {
-            continue;
-        }
-        if (stuck && file->next_name() == stuck->name()) {
-            err_log("%s is in the way of %s", stuck->name().string(), file->name().string());
-            stuck = file;
-        } else if (file->rotate(m_path) < 0) {
-            stuck = file;
-        }
-    }
-}
-
 void CpDirectory::add_size(uint32_t num) {
     m_size += num;
     m_set->add_size(num);
@@ -298,22 +213,4 @@ uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
     m_size -= removed;
     renumber_first_log();
     return removed;
-}
-
-// Keeps the numbers contiguous: the first log file follows on the oldest one left.
-void CpDirectory::renumber_first_log() {
-    if (!m_first_log) {
-        return;
-    }
-    for (LogFile* file : m_files) {
-        if (file->type() != LT_LOG || file == m_first_log.get()) {
-            continue;
-        }
-        uint32_t number;
-        size_t digits;
-        if (parse_log_number(file->name(), number, digits) == 0 && number != UINT32_MAX) {
-            m_first_log->change_name_num(number + 1);
-        }
-        return;
-    }
 }
