@@ -2,7 +2,9 @@
 
 #include <errno.h>
 #include <string.h>
+#include <sys/stat.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
@@ -16,6 +18,9 @@ CpDirectory::CpDirectory(CpSetDirectory* set, const android::String8& name)
 }
 
 CpDirectory::~CpDirectory() {
+    // What a file fails to write out as it closes has left the totals above with all of this
+    // directory already.
+    m_set = nullptr;
     for (LogFile* file : m_files) {
         delete file;
     }
@@ -37,11 +42,13 @@ CpDirectory::FileIter CpDirectory::find(LogFile* file) {
     return it;
 }
 
-// Takes a file out of the list and deletes its object, which clears every reference
-// to it, the marks of this directory included. Returns the next list position.
+// Takes a file that is gone from the medium out of the list and deletes its object, which
+// clears every reference to it, the marks of this directory included. Returns the next list
+// position.
 CpDirectory::FileIter CpDirectory::drop(FileIter it) {
     LogFile* file = *it;
     FileIter next = m_files.erase(it);
+    file->forget_staged();
     delete file;
     return next;
 }
@@ -52,18 +59,12 @@ LogFile* CpDirectory::create_log_file() {
         return nullptr;
     }
     const LogTime time = LogTime::from_tm(t);
-    const android::String8 name = android::String8::format(
+    const android::String8 name = free_name(android::String8::format(
         "0-%s-%04d-%02d-%02d_%02d-%02d-%02d.log", m_name.string(), time.year, time.month, time.day,
-        time.hour, time.minute, time.second);
-    // A file of this second that could not be renumbered still has the name: writing on
-    // would overwrite it.
-    if (find(name)) {
-        errno = EEXIST;
-        err_log("log file %s exists already", name.string());
-        return nullptr;
-    }
+        time.hour, time.minute, time.second));
     LogFile* file = new LogFile(name, this, t);
     if (file->open() < 0) {
+        const SavedErrno keep;
         delete file;
         return nullptr;
     }
@@ -88,34 +89,58 @@ LogFile* CpDirectory::find(const android::String8& name) const {
     return nullptr;
 }
 
-// Gives a file a name that no other one wants, "-N" before its extension. 0 or -1. One that
-// is gone from the medium is dropped.
-int CpDirectory::set_aside(LogFile* file) {
-    const android::String8& name = file->name();
+// A name that nothing in the directory has, "-N" before the extension of the given one.
+android::String8 CpDirectory::aside_name(const android::String8& name) {
     const char* dot = strrchr(name.string(), '.');
     const size_t stem_len = dot ? static_cast<size_t>(dot - name.string()) : name.length();
     android::String8 aside;
+    struct stat st;
     do {
         aside.setTo(name.string(), stem_len);
         aside.appendFormat("-%u%s", ++m_aside_num, name.string() + stem_len);
-    } while (find(aside));
-    if (file->rename_to(m_path, aside) < 0) {
-        if (errno == ENOENT) {
-            return remove_file(file);  // somebody deleted it: nothing is in the way
+    } while (find(aside) || lstat(JoinedPath(m_path, aside).string(), &st) == 0);
+    return aside;
+}
+
+// Sees to it that a new file overwrites nothing: whatever has the name on the medium is set
+// aside under another one. Returns the name for the new file, which is another one only when
+// the older one cannot be moved.
+android::String8 CpDirectory::free_name(const android::String8& name) {
+    LogFile* older = find(name);
+    const JoinedPath path(m_path, name);
+    struct stat st;
+    if (lstat(path.string(), &st) < 0) {
+        if (!means_vanished(errno)) {
+            return aside_name(name);  // something may be there
         }
-        err_log("set aside %s failed", name.string());
-        return -1;
+        if (older) {
+            remove_file(older);  // somebody deleted it
+        }
+        return name;
     }
-    return 0;
+    const android::String8 aside = aside_name(name);
+    const int moved = older
+                          ? older->rename_to(m_path, aside)
+                          : rename_to_free_name(path.string(), JoinedPath(m_path, aside).string());
+    if (moved < 0) {
+        err_log("set aside %s failed", name.string());
+        return aside;
+    }
+    if (!older && S_ISREG(st.st_mode)) {
+        // From now on it counts, and may be trimmed.
+        LogFile* found = new LogFile(aside, this, LT_UNKNOWN, 0);
+        found->parse_name();
+        found->found(static_cast<uint64_t>(st.st_size));
+        m_files.push_back(found);
+        add_size(found->counted());
+    }
+    return name;
 }
 
 LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
-    LogFile* older = find(name);
-    if (older && set_aside(older) < 0) {
-        return nullptr;
-    }
-    LogFile* file = new LogFile(name, this, type, 0);
+    LogFile* file = new LogFile(free_name(name), this, type, 0);
     if (file->open() < 0) {
+        const SavedErrno keep;
         delete file;
         return nullptr;
     }
@@ -128,10 +153,9 @@ int CpDirectory::remove_file(LogFile* file) {
     if (it == m_files.end()) {
         return -1;
     }
-    // Closed first: what is still staged counts in the size that goes.
-    file->close();
+    const SavedErrno keep;
     file->remove(m_path);
-    dec_size(file->size());
+    dec_size(file->counted());
     drop(it);
     return 0;
 }
@@ -142,7 +166,7 @@ void CpDirectory::file_removed(LogFile* file) {
         err_log("log %s does not exist in dir %s", file->name().string(), m_name.string());
         return;
     }
-    m_size -= file->size();
+    m_size -= file->counted();
     drop(it);
 }
 
@@ -153,14 +177,16 @@ void CpDirectory::close_log_file() {
     }
 }
 
-void CpDirectory::add_size(uint32_t num) {
+void CpDirectory::add_size(uint64_t num) {
     m_size += num;
     m_set->add_size(num);
 }
 
-void CpDirectory::dec_size(uint32_t num) {
+void CpDirectory::dec_size(uint64_t num) {
     m_size -= num;
-    m_set->dec_size(num);
+    if (m_set) {
+        m_set->dec_size(num);
+    }
 }
 
 uint64_t CpDirectory::trim(uint64_t wanted) {
@@ -172,7 +198,7 @@ uint64_t CpDirectory::trim(uint64_t wanted) {
             err_log("delete %s error", file->name().string());
             break;
         }
-        const uint64_t size = file->size();
+        const uint64_t size = file->counted();
         drop(it);
         removed += size;
         if (size >= wanted) {
@@ -202,7 +228,7 @@ uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
             err_log("delete %s error", file->name().string());
             break;
         }
-        const uint64_t size = file->size();
+        const uint64_t size = file->counted();
         it = drop(it);
         removed += size;
         if (size >= wanted) {

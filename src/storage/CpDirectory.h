@@ -44,22 +44,30 @@ public:
     // Makes, opens and appends a new log file numbered 0, which becomes the current
     // one. The caller renumbers the older ones first (rotate_logs). Null on failure.
     LogFile* create_log_file();
-    // Makes, opens and appends another file. Null on failure. Owned by this directory. Names
-    // tell seconds: an older file of the same second and name is set aside as "NAME-N.EXT".
+    // Makes, opens and appends another file. Null on failure. Owned by this directory.
+    //
+    // Neither overwrites anything. Names have one-second resolution: an older file of the
+    // same name, listed or not, is set aside as "NAME-N.EXT".
     LogFile* create_file(const android::String8& name, LogType type);
-    // Drops a file from the list and deletes it, on the medium too. The object is gone
-    // when this returns 0; -1 when it is not in the list.
+    // Drops a file from the list and deletes it, on the medium too, where it may be gone
+    // already. The object is gone when this returns 0; -1 when it is not in the list.
     int remove_file(LogFile* file);
     // The file vanished from the medium: drops the object. Only this directory's size
-    // changes, not the set's and the medium's.
+    // changes; the set's and the medium's are known to be uncertain from now on.
     void file_removed(LogFile* file);
     // Closes the current log file; the next one starts fresh.
     void close_log_file();
-    // Adds 1 to the number of every log file.
+    // Makes the number 0 free for a new log file: adds 1 to the number of every log file,
+    // more where two have one number, because renaming failed once. Does nothing while no
+    // log file has the number 0. Never replaces a file; one that is gone is dropped.
     void rotate_logs();
 
-    void add_size(uint32_t num);
-    void dec_size(uint32_t num);
+    // Bytes that came or went; the set and the medium count them too.
+    void add_size(uint64_t num);
+    void dec_size(uint64_t num);
+    // Counts again what the listed files have on the medium and drops those that are gone.
+    // Only this directory's size changes.
+    void recount();
 
     // Deletes files from the front until at least the bytes wanted are gone (at least
     // one file is deleted, if there is one). Returns the bytes removed.
@@ -72,7 +80,9 @@ private:
     typedef android::List<LogFile*>::iterator FileIter;
 
     LogFile* find(const android::String8& name) const;
-    int set_aside(LogFile* file);
+    android::String8 free_name(const android::String8& name);
+    android::String8 aside_name(const android::String8& name);
+    bool taken_by_stranger(const android::String8& name) const;
     FileIter find(LogFile* file);
     FileIter drop(FileIter it);
     bool is_protected(const LogFile* file) const;
@@ -86,7 +96,7 @@ private:
     ObjectRef<LogFile> m_first_log;
     android::List<LogFile*> m_files;
     ObjectRef<LogFile> m_cur_log;
-    unsigned int m_aside_num = 0;  // last N given by set_aside
+    unsigned int m_aside_num = 0;  // last N given by aside_name
 };
 
 #endif  // STORAGE_CPDIRECTORY_H_

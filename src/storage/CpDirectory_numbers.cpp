@@ -1,24 +1,75 @@
-// The part of CpDirectory that numbers the log files: 0 is the newest.
+// The part of CpDirectory that numbers the log files: 0 is the newest, and each older one
+// has a larger number than the next younger.
+#include <errno.h>
 #include <stdint.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <vector>
 
 #include "core/log.h"
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/log_name.h"
+#include "storage/paths.h"
 
+namespace {
+
+struct Numbered {
+    LogFile* file;
+    uint32_t number;
+    size_t digits;
+    uint64_t target;  // above UINT32_MAX: there is no such number
+};
+
+}  // namespace
+
+// True when something that no list knows has the name: a file in a set taken over, say.
+bool CpDirectory::taken_by_stranger(const android::String8& name) const {
+    struct stat st;
+    return !find(name) && lstat(JoinedPath(m_path, name).string(), &st) == 0;
+}
+
+// A file takes its number plus 1, and at least the new number of the next younger one plus
+// 1. So two files that have one number, because a renaming failed between them, get two.
 void CpDirectory::rotate_logs() {
-    // A file that could not be renumbered keeps its name. A younger one of the same second
-    // would take that very name and so replace it on the medium: it stays as well.
-    const LogFile* stuck = nullptr;
+    std::vector<Numbered> logs;  // youngest first; of equal numbers the later in the list
+    bool renumber = false;
     for (LogFile* file : m_files) {
         if (file->type() != LT_LOG) {
             continue;
         }
-        if (stuck && file->next_name() == stuck->name()) {
-            err_log("%s is in the way of %s", stuck->name().string(), file->name().string());
-            stuck = file;
-        } else if (file->rotate(m_path) < 0) {
-            stuck = file;
+        Numbered log = {file, 0, 0, 0};
+        if (parse_log_number(file->name(), log.number, log.digits) < 0) {
+            log.number = UINT32_MAX;  // too large for a number: rotate says so
+        }
+        renumber = renumber || log.number == 0;
+        logs.push_back(log);
+    }
+    if (!renumber) {
+        return;  // the number 0 is free: the file that was to take it could not be made
+    }
+    std::reverse(logs.begin(), logs.end());
+    std::stable_sort(logs.begin(), logs.end(),
+                     [](const Numbered& a, const Numbered& b) { return a.number < b.number; });
+    uint64_t least = 0;
+    for (Numbered& log : logs) {
+        log.target = std::max(uint64_t{log.number} + 1, least);
+        while (log.target <= UINT32_MAX &&
+               taken_by_stranger(
+                   with_number(log.file->name(), static_cast<uint32_t>(log.target), log.digits))) {
+            ++log.target;
+        }
+        least = log.target + 1;
+    }
+    // The oldest first: it makes room for the next one.
+    for (size_t i = logs.size(); i-- > 0;) {
+        const Numbered& log = logs[i];
+        const bool next = log.target == uint64_t{log.number} + 1 || log.target > UINT32_MAX;
+        const int result = next ? log.file->rotate(m_path)
+                                : log.file->change_name_num(static_cast<uint32_t>(log.target));
+        if (result < 0 && errno == ENOENT) {
+            remove_file(log.file);  // somebody deleted it
         }
     }
 }

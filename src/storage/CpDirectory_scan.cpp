@@ -1,5 +1,6 @@
 // The part of CpDirectory that finds out what is on the medium.
 #include <dirent.h>
+#include <errno.h>
 #include <fcntl.h>
 #include <string.h>
 #include <sys/stat.h>
@@ -10,6 +11,7 @@
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/log_name.h"
+#include "storage/paths.h"
 
 int CpDirectory::stat() {
     DIR* dir = opendir(m_path.string());
@@ -27,15 +29,34 @@ int CpDirectory::stat() {
             !S_ISREG(st.st_mode)) {
             continue;
         }
-        LogFile* file = new LogFile(android::String8(entry->d_name), this, LT_UNKNOWN,
-                                    static_cast<uint32_t>(st.st_size));
+        LogFile* file = new LogFile(android::String8(entry->d_name), this, LT_UNKNOWN, 0);
         file->parse_name();
+        file->found(static_cast<uint64_t>(st.st_size));
         found.push_back(file);
         m_size += static_cast<uint64_t>(st.st_size);
     }
     closedir(dir);
     insert_scanned(found.data(), found.size());
     return 0;
+}
+
+void CpDirectory::recount() {
+    m_size = 0;
+    FileIter it = m_files.begin();
+    while (it != m_files.end()) {
+        LogFile* file = *it;
+        struct stat st;
+        const bool known = lstat(JoinedPath(m_path, file->name()).string(), &st) == 0;
+        if (!known && means_vanished(errno)) {
+            it = drop(it);
+            continue;
+        }
+        if (known && !file->is_open()) {  // of an open file a part may still be staged
+            file->found(static_cast<uint64_t>(st.st_size));
+        }
+        m_size += file->counted();
+        ++it;
+    }
 }
 
 // Puts a scan's files into the list order. They are sorted first, so that a directory

@@ -5,6 +5,7 @@
 #include <string.h>
 #include <sys/stat.h>
 
+#include "core/SavedErrno.h"
 #include "storage/CpDirectory.h"
 #include "storage/MediaStorage.h"
 #include "storage/paths.h"
@@ -76,6 +77,7 @@ CpDirectory* CpSetDirectory::prepare_cp_dir(const android::String8& cp_name, boo
     }
     CpDirectory* dir = new CpDirectory(this, cp_name);
     if (dir->create() < 0) {
+        const SavedErrno keep;
         delete dir;
         return nullptr;
     }
@@ -101,14 +103,30 @@ LogFile* CpSetDirectory::create_log_file(const android::String8& cp_name, bool& 
     return file;
 }
 
-void CpSetDirectory::add_size(uint32_t num) {
+void CpSetDirectory::add_size(uint64_t num) {
     m_size += num;
     m_media->add_size(num);
 }
 
-void CpSetDirectory::dec_size(uint32_t num) {
+void CpSetDirectory::dec_size(uint64_t num) {
     m_size -= num;
     m_media->dec_size(num);
+}
+
+void CpSetDirectory::recount() {
+    m_size = 0;
+    android::List<CpDirectory*>::iterator it = m_dirs.begin();
+    while (it != m_dirs.end()) {
+        CpDirectory* dir = *it;
+        dir->recount();
+        if (dir_usable(dir->path())) {
+            m_size += dir->size();
+            ++it;
+        } else {
+            it = m_dirs.erase(it);
+            delete dir;
+        }
+    }
 }
 
 uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted) {

@@ -48,8 +48,11 @@ public:
     // made by this call.
     LogFile* create_log_file(const android::String8& cp_name, bool& new_dir);
 
-    void add_size(uint32_t num);
-    void dec_size(uint32_t num);
+    // Bytes that came or went; the medium counts them too.
+    void add_size(uint64_t num);
+    void dec_size(uint64_t num);
+    // Counts again what is listed and drops what is gone. Only this set's size changes.
+    void recount();
 
     // Frees at least the bytes wanted, if possible, CP directory by CP directory,
     // removing those that become empty. Returns the bytes removed; the caller subtracts

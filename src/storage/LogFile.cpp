@@ -7,25 +7,22 @@
 #include <sys/uio.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
+#include "core/open_file.h"
 #include "storage/CpDirectory.h"
 #include "storage/paths.h"
 
-namespace {
-
-android::String8 with_number(const android::String8& name, uint32_t number, size_t old_digits) {
-    android::String8 result = android::String8::format("%u", number);
-    result.append(name.string() + old_digits);
-    return result;
-}
-
-}  // namespace
-
 LogFile::LogFile(const android::String8& name, CpDirectory* dir, LogType type, uint32_t size)
-    : m_dir(dir), m_name(name), m_type(type), m_size(size) {}
+    : m_dir(dir), m_name(name), m_type(type), m_size(size), m_counted(size) {}
 
 LogFile::LogFile(const android::String8& name, CpDirectory* dir, const struct tm& t)
-    : m_dir(dir), m_name(name), m_type(LT_LOG), m_time(LogTime::from_tm(t)), m_size(0) {}
+    : m_dir(dir),
+      m_name(name),
+      m_type(LT_LOG),
+      m_time(LogTime::from_tm(t)),
+      m_size(0),
+      m_counted(0) {}
 
 LogFile::~LogFile() {
     if (m_destroy_hook) {
@@ -67,19 +64,36 @@ int LogFile::write_out() {
     if (m_fd < 0 || m_staged == 0) {
         return 0;
     }
-    const ssize_t n = write_data(m_buffer, m_staged);
+    const size_t dropped = m_staged - write_some(m_buffer, m_staged);
     m_staged = 0;
-    return n < 0 ? -1 : 0;
+    if (dropped == 0) {
+        return 0;
+    }
+    shrink(dropped);
+    return -1;
 }
 
 void LogFile::grow(size_t len) {
     m_size += static_cast<uint32_t>(len);
-    m_dir->add_size(static_cast<uint32_t>(len));
+    m_counted += len;
+    m_dir->add_size(len);
+}
+
+void LogFile::shrink(size_t len) {
+    m_size -= static_cast<uint32_t>(len);
+    m_counted -= len;
+    m_dir->dec_size(len);
 }
 
 void LogFile::set_size(uint32_t size) {
     m_size = size;
+    m_counted += size;
     m_dir->add_size(size);
+}
+
+void LogFile::found(uint64_t bytes) {
+    m_size = static_cast<uint32_t>(bytes);
+    m_counted = bytes;
 }
 
 ssize_t LogFile::write(const void* data, size_t len) {
@@ -138,22 +152,26 @@ ssize_t LogFile::write_data(const void* data, size_t len) {
         err_log("write file not opened");
         return -1;
     }
-    const uint8_t* rest = static_cast<const uint8_t*>(data);
-    size_t left = len;
-    while (left > 0) {
-        const ssize_t n = ::write(m_fd, rest, left);
+    return write_some(data, len) == len ? static_cast<ssize_t>(len) : -1;
+}
+
+// Writes until everything is out or a write fails; the bytes that went out.
+size_t LogFile::write_some(const void* data, size_t len) {
+    const uint8_t* const bytes = static_cast<const uint8_t*>(data);
+    size_t done = 0;
+    while (done < len) {
+        const ssize_t n = ::write(m_fd, bytes + done, len - done);
         if (n < 0) {
-            return n;
+            break;
         }
         if (n == 0) {
             // Nothing was taken and no reason given: trying again could go on for ever.
             errno = EIO;
-            return -1;
+            break;
         }
-        rest += n;
-        left -= static_cast<size_t>(n);
+        done += static_cast<size_t>(n);
     }
-    return static_cast<ssize_t>(len);
+    return done;
 }
 
 ssize_t LogFile::write_raw(const void* data, size_t len) {
@@ -165,7 +183,7 @@ int LogFile::copy(const char* source) {
     if (m_fd < 0) {
         return -1;
     }
-    const int src = ::open(source, O_RDONLY | O_CLOEXEC);
+    const int src = open_to_read(source, Links::FOLLOW);
     if (src < 0) {
         err_log("open %s error", source);
         return -1;
@@ -186,40 +204,30 @@ int LogFile::copy(const char* source) {
             break;
         }
     }
-    const int saved_errno = errno;
+    const SavedErrno keep;
     grow(copied);
     ::close(src);
-    errno = saved_errno;
     return result;
 }
 
 int LogFile::rename_to(const android::String8& dir_path, const android::String8& new_name) {
-    if (rename(JoinedPath(dir_path, m_name).string(), JoinedPath(dir_path, new_name).string()) <
-        0) {
+    if (rename_to_free_name(JoinedPath(dir_path, m_name).string(),
+                            JoinedPath(dir_path, new_name).string()) < 0) {
         return -1;
     }
     m_name = new_name;
     return 0;
 }
 
-android::String8 LogFile::next_name() const {
+int LogFile::rotate(const android::String8& dir_path) {
     uint32_t number;
     size_t digits;
-    // The largest number has no successor: it would wrap to 0 and could replace the
-    // newest file.
+    // The largest number has no successor: it would wrap to 0, the newest file's.
     if (parse_log_number(m_name, number, digits) < 0 || number == UINT32_MAX) {
-        return android::String8();
-    }
-    return with_number(m_name, number + 1, digits);
-}
-
-int LogFile::rotate(const android::String8& dir_path) {
-    const android::String8 new_name = next_name();
-    if (new_name.isEmpty()) {
         err_log("invalid log file name %s", m_name.string());
         return -1;
     }
-    if (rename_to(dir_path, new_name) < 0) {
+    if (rename_to(dir_path, with_number(m_name, number + 1, digits)) < 0) {
         err_log("rename %s failed", m_name.string());
         return -1;
     }
@@ -252,7 +260,8 @@ int LogFile::remove(const android::String8& dir_path) {
 }
 
 bool LogFile::exists() const {
-    return access(JoinedPath(m_dir->path(), m_name).string(), R_OK | W_OK) == 0;
+    return access(JoinedPath(m_dir->path(), m_name).string(), R_OK | W_OK) == 0 ||
+           !means_vanished(errno);
 }
 
 void LogFile::parse_name() {

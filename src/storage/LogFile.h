@@ -34,6 +34,10 @@ public:
     LogType type() const { return m_type; }
     const LogTime& time() const { return m_time; }
     uint32_t size() const { return m_size; }
+    // What the totals of the directory, the set and the medium hold for this file. The size
+    // is kept in 32 bits; a file found on a medium may be larger.
+    uint64_t counted() const { return m_counted; }
+    bool is_open() const { return m_fd >= 0; }
     CpDirectory* dir() const { return m_dir; }
     int fd() const { return m_fd; }
 
@@ -51,12 +55,17 @@ public:
     // As write_data, with -2 for a full medium. Touches nothing but the descriptor, so
     // that the I/Q thread may call it while it alone uses the file.
     ssize_t write_raw(const void* data, size_t len);
-    // Hands what is staged to the system; dropped when that fails.
+    // Hands what is staged to the system; what it does not take is dropped, and leaves the
+    // sizes.
     void flush() { write_out(); }
     // The same; 0, or -1 when bytes were dropped.
     int write_out();
     // Accounts for a file that was filled with write_raw. Once per file.
     void set_size(uint32_t size);
+    // Forgets what is staged, for a file that is being deleted. The sizes stay.
+    void forget_staged() { m_staged = 0; }
+    // Corrects size and counted(), here only, to what a scan found on the medium.
+    void found(uint64_t bytes);
 
     // Fills this freshly opened file with the source file's content. 0 or -1; what was
     // copied before a failure stays and counts.
@@ -64,15 +73,14 @@ public:
 
     // Adds 1 to the number at the head of the name, on the medium and here. 0 or -1.
     int rotate(const android::String8& dir_path);
-    // The name that rotate would give; empty when the name has no number to add to.
-    android::String8 next_name() const;
     // Sets that number. 0 or -1; does nothing when the name carries it already.
     int change_name_num(unsigned int num);
-    // Gives the file another name in its directory. 0 or -1, without a message.
+    // Gives the file another name in its directory, never one that is taken (EEXIST). 0 or
+    // -1, without a message.
     int rename_to(const android::String8& dir_path, const android::String8& new_name);
     // Deletes the file from the medium; one that is gone already counts as deleted.
     int remove(const android::String8& dir_path);
-    // True when the file can be read and written on the medium.
+    // False when the file vanished: it cannot be read and written on the medium any more.
     bool exists() const;
 
     // A hook that runs at the start of the object's destruction, while the file is still
@@ -87,13 +95,16 @@ public:
 
 private:
     ssize_t write_staged_with(const void* data, size_t len);
+    size_t write_some(const void* data, size_t len);
     void grow(size_t len);
+    void shrink(size_t len);
 
     CpDirectory* m_dir;
     android::String8 m_name;
     LogType m_type;
     LogTime m_time;
     uint32_t m_size;
+    uint64_t m_counted;
     int m_fd = -1;
     uint8_t* m_buffer = nullptr;
     size_t m_capacity = 0;

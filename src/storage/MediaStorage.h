@@ -63,8 +63,8 @@ public:
     // The CP's directory in the working set, or null.
     CpDirectory* get_cp_dir(const android::String8& cp_name) const;
 
-    void add_size(uint32_t num) { m_size += num; }
-    void dec_size(uint32_t num) { m_size -= num; }
+    void add_size(uint64_t num) { m_size += num; }
+    void dec_size(uint64_t num) { m_size -= num; }
 
     // Frees at least the bytes wanted, if possible; returns the bytes freed.
     uint64_t trim(uint64_t wanted);

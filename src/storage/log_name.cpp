@@ -135,6 +135,12 @@ int parse_log_number(const android::String8& name, uint32_t& number, size_t& dig
     return 0;
 }
 
+android::String8 with_number(const android::String8& name, uint32_t number, size_t old_digits) {
+    android::String8 result = android::String8::format("%u", number);
+    result.append(name.string() + old_digits);
+    return result;
+}
+
 int get_local_time(struct tm& t) {
     const time_t now = time(nullptr);
     if (now == static_cast<time_t>(-1) || !localtime_r(&now, &t)) {

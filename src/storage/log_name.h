@@ -32,6 +32,9 @@ LogType parse_log_name(const char* name, size_t len, LogTime& time);
 // digits gets the length of the run. -1 when the name has none.
 int parse_log_number(const android::String8& name, uint32_t& number, size_t& digits);
 
+// The name with another number in place of the old_digits digits at its head.
+android::String8 with_number(const android::String8& name, uint32_t number, size_t old_digits);
+
 // The current local time; -1 when the clock or the conversion fails.
 int get_local_time(struct tm& t);
 

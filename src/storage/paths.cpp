@@ -1,6 +1,7 @@
 #include "storage/paths.h"
 
 #include <errno.h>
+#include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
@@ -55,6 +56,10 @@ android::String8 shell_path(const android::String8& path) {
 }
 
 int remove_tree(const android::String8& path) {
+    // A shell for each of many empty sets would hold the loop for a minute.
+    if (rmdir(path.string()) == 0) {
+        return 0;
+    }
     android::String8 command("rm -fr ");
     command.append(shell_path(path));
     return system(command.string());
@@ -71,6 +76,31 @@ int make_log_dir(const android::String8& path) {
     return mkdir(path.string(), 0775) == 0 || errno == EEXIST ? 0 : -1;
 }
 
+bool means_vanished(int error) {
+    switch (error) {
+        case ENOENT:
+        case ENOTDIR:
+        case EACCES:
+        case EROFS:
+        case ELOOP:
+            return true;
+        default:
+            return false;
+    }
+}
+
 bool dir_usable(const android::String8& path) {
-    return access(path.string(), R_OK | W_OK | X_OK) == 0;
+    return access(path.string(), R_OK | W_OK | X_OK) == 0 || !means_vanished(errno);
+}
+
+int rename_to_free_name(const char* old_path, const char* new_path) {
+    struct stat st;
+    if (lstat(new_path, &st) == 0) {
+        errno = EEXIST;
+        return -1;
+    }
+    if (errno != ENOENT) {
+        return -1;
+    }
+    return rename(old_path, new_path);
 }

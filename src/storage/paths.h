@@ -21,7 +21,8 @@ private:
 // gets "./" in front.
 android::String8 shell_path(const android::String8& path);
 
-// Deletes a directory with everything below it; returns what system() returns.
+// Deletes a directory with everything below it: by rmdir when it is empty, else by a shell.
+// 0, or what system() returns.
 int remove_tree(const android::String8& path);
 
 // As remove_tree, for every entry of the directory whose name begins with a digit.
@@ -31,7 +32,14 @@ int remove_numbered_entries(const android::String8& dir);
 // exists already, else -1.
 int make_log_dir(const android::String8& path);
 
-// True when the directory can be read, written and searched.
+// True when an access that failed with this errno tells that the file or directory is not
+// there any more, for us at least. Any other failure is a passing one and tells nothing.
+bool means_vanished(int error);
+
+// False when the directory vanished: it cannot be read, written and searched any more.
 bool dir_usable(const android::String8& path);
+
+// rename() that never replaces anything: EEXIST when new_path exists. 0 or -1.
+int rename_to_free_name(const char* old_path, const char* new_path);
 
 #endif  // STORAGE_PATHS_H_

@@ -109,25 +109,78 @@ TEST_F(CpDirectoryTest, ScanIsNotQuadratic) {
     EXPECT_EQ(0, next);
 }
 
-// Log files of one second: a failed renaming made the next younger file, or a new one,
-// take the name and with it the place of an older file on the medium.
-TEST_F(CpDirectoryTest, FilesOfOneSecondAreNeverReplaced) {
+// A file of the same second and name was written over when renaming it had failed, or when
+// no list knew it.
+TEST_F(CpDirectoryTest, NoFileIsEverWrittenOver) {
     start();
+    const std::string name = log_name(0, "09-15-00"), aside = "0-cp_wcn-2016-03-01_09-15-00-1.log";
+    // Not listed: set aside, and it counts from now on.
+    m_root.write_file(DIR_REL + name, "stranger");
+    LogFile* first = m_dir->create_log_file();
+    first->write("first", 5);
+    EXPECT_EQ((Names{aside, name}), file_names(*m_dir));
+    EXPECT_EQ("stranger", m_root.read_file(DIR_REL + aside));
+    EXPECT_EQ(13u, m_dir->size());
+    // Listed: likewise.
+    EXPECT_NE(nullptr, m_dir->create_log_file());
+    first->close();
+    EXPECT_EQ("first", m_root.read_file(DIR_REL + "0-cp_wcn-2016-03-01_09-15-00-2.log"));
+    // Listed, but gone: dropped. What cannot be moved keeps its name; the new file has another.
+    ObjectRef<LogFile> gone(add("a.dmp", LT_DUMP, 7));
+    unlink(m_root.path(DIR_REL + "a.dmp").c_str());
+    LogFile* stuck = m_dir->create_file("a.dmp", LT_DUMP);
+    EXPECT_FALSE(gone);
+    stuck->write("stuck", 5);
+    faults::fail(faults::RENAME, 1, EIO);
+    EXPECT_STREQ("a-3.dmp", m_dir->create_file("a.dmp", LT_DUMP)->name().string());
+    EXPECT_STREQ("a.dmp", stuck->name().string());
+    m_dir->create_file("a.dmp", LT_DUMP);
+    stuck->close();
+    EXPECT_EQ("stuck", m_root.read_file(DIR_REL + "a-4.dmp"));
+    EXPECT_EQ(18u, m_dir->size());
+    check_sums(internal());
     faults::set_time(-1);
     EXPECT_EQ(nullptr, m_dir->create_log_file());
-    faults::set_time(NOW);
-    m_dir->create_log_file()->write("first", 5);
-    m_dir->rotate_logs();
-    m_dir->create_log_file()->write("second", 6);
-    faults::fail(faults::RENAME, 1, EIO);
-    m_dir->rotate_logs();
-    EXPECT_EQ("1 0 ", numbers());
-    EXPECT_EQ(nullptr, m_dir->create_log_file());
-    EXPECT_EQ(2u, m_root.list(DIR_REL).size());
-    // Once it can be renumbered the log goes on.
-    m_dir->rotate_logs();
-    EXPECT_NE(nullptr, m_dir->create_log_file());
-    EXPECT_EQ(3u, m_root.list(DIR_REL).size());
+}
+
+// Numbers ran away while no log file could be made, and two files kept one number for ever
+// when a renaming had failed once.
+TEST_F(CpDirectoryTest, NumbersStayInOrder) {
+    auto number = [&](int second) {
+        faults::set_time(NOW + second);
+        m_dir->rotate_logs();
+    };
+    start();
+    for (int second : {0, 1, 2}) {
+        number(second);
+        m_dir->create_log_file()->set_size(10);
+    }
+    ASSERT_EQ("2 1 0 ", numbers());
+    for (int tries = 0; tries < 3; ++tries) {
+        number(3);
+        EXPECT_EQ("3 2 1 ", numbers());  // once: then the number 0 is free
+    }
+    m_dir->create_log_file();
+    faults::fail(faults::RENAME, 3, EIO);  // that of number 1
+    number(4);
+    m_dir->create_log_file();
+    ASSERT_EQ("4 3 1 1 0 ", numbers());
+    number(5);
+    EXPECT_EQ("5 4 3 2 1 ", numbers());
+    m_dir->create_log_file();
+    // Deleted by somebody else: dropped, the others go on.
+    unlink(m_root.path(DIR_REL + log_name(4, "09-15-01")).c_str());
+    const uint64_t size = m_dir->size();
+    number(6);
+    EXPECT_EQ("6 4 3 2 1 ", numbers());
+    EXPECT_EQ(size - 10, m_dir->size());
+    check_sums(internal());
+    // A stranger has the name that a file is to take: the next number, and above it likewise.
+    m_dir->create_log_file();
+    m_root.write_file(DIR_REL + log_name(3, "09-15-04"), "stranger");
+    number(7);
+    EXPECT_EQ("7 6 5 4 2 1 ", numbers());
+    EXPECT_EQ("stranger", m_root.read_file(DIR_REL + log_name(3, "09-15-04")));
 }
 
 TEST_F(CpDirectoryTest, TrimTakesWholeFilesFromTheFront) {

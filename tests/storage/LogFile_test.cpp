@@ -93,14 +93,17 @@ TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
     faults::shorten(faults::WRITE, 0);
     EXPECT_EQ(-1, file->write_raw("x", 1));  // no endless loop
     EXPECT_EQ(0u, file->size());
-    // A failed flush drops what was staged; it stays counted.
+    // A failed flush drops what was staged, and the sizes with it.
     file->write("lost", 4);
-    faults::fail(faults::WRITE, 1, ENOSPC);
+    faults::shorten(faults::WRITE, 1);
+    faults::fail(faults::WRITE, 2, ENOSPC);
     file->flush();
+    EXPECT_EQ(1u, file->size());
+    check_sums(internal());
     file->write("kept", 4);
     file->flush();
-    EXPECT_EQ(data + data + "kept", content());
-    EXPECT_EQ(8u, file->size());
+    EXPECT_EQ(data + data + "lkept", content());
+    EXPECT_EQ(5u, file->size());
 }
 
 TEST_F(LogFileTest, OpenAndClosed) {
@@ -149,6 +152,12 @@ TEST_F(LogFileTest, RotateRenumberRemove) {
     EXPECT_TRUE(log.has("rename number in 5" + STAMP + " failed [28("));
     EXPECT_EQ(Names{"5" + STAMP}, m_root.list(REL));
     EXPECT_EQ("5" + STAMP, file->name().string());
+    // So does a name that a file has, also one that nobody listed.
+    m_root.write_file(REL + "6" + STAMP, "stranger");
+    EXPECT_EQ(-1, file->rotate(m_dir->path()));
+    EXPECT_TRUE(log.has("rename 5" + STAMP + " failed [17(File exists)]"));
+    EXPECT_EQ("stranger", m_root.read_file(REL + "6" + STAMP));
+    EXPECT_EQ(0, unlink(m_root.path(REL + "6" + STAMP).c_str()));
     EXPECT_EQ(0, file->change_name_num(77));
     EXPECT_EQ(Names{"77" + STAMP}, m_root.list(REL));
     EXPECT_EQ(0, file->remove(m_dir->path()));

@@ -94,7 +94,7 @@ protected:
             for (const CpDirectory* dir : set->dirs()) {
                 uint64_t files = 0;
                 for (const LogFile* file : dir->files()) {
-                    files += file->size();
+                    files += file->counted();
                 }
                 EXPECT_EQ(files, dir->size()) << dir->path().string();
                 dirs += dir->size();

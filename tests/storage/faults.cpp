@@ -24,6 +24,7 @@ struct Fault {
 
 Fault s_faults[faults::NUM_CALLS];
 time_t s_time;
+std::string s_part;
 std::vector<std::string> s_commands;
 
 // Counts a call; true when it has to fail, with errno set.
@@ -39,7 +40,7 @@ bool fails(faults::Call call) {
 }
 
 bool fails(faults::Call call, const char* path) {
-    return strstr(path, "/modem_log") && fails(call);
+    return strstr(path, s_part.c_str()) && fails(call);
 }
 
 // The bytes of a transfer that are left when it is to be short.
@@ -55,6 +56,7 @@ namespace faults {
 void reset() {
     std::fill(s_faults, s_faults + NUM_CALLS, Fault());
     s_time = 0;
+    s_part = "/modem_log";
     s_commands.clear();
 }
 
@@ -64,6 +66,10 @@ void fail(Call call, int nth, int error, int times) {
     fault.until = fault.from + times;
     fault.error = error;
     fault.hit = false;
+}
+
+void only_on(const char* part) {
+    s_part = part;
 }
 
 void shorten(Call call, size_t max) {

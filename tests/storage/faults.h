@@ -19,6 +19,8 @@ enum Call { WRITE, WRITEV, OPEN, MKDIR, RENAME, UNLINK, ACCESS, NUM_CALLS };
 void reset();
 // The nth call from now on (1: the next one) and the times - 1 after it fail with error.
 void fail(Call call, int nth, int error, int times = 1);
+// Only calls on paths with this part in them count from now on; "/modem_log" after a reset.
+void only_on(const char* part);
 // The next call of write or writev transfers at most max bytes.
 void shorten(Call call, size_t max);
 // Calls of the kind since the last reset.
