@@ -8,6 +8,7 @@
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
+#include "storage/MediaStorage.h"
 #include "storage/log_name.h"
 #include "storage/paths.h"
 
@@ -167,6 +168,7 @@ void CpDirectory::file_removed(LogFile* file) {
         return;
     }
     m_size -= file->counted();
+    m_set->media()->totals_uncertain();
     drop(it);
 }
 

@@ -72,6 +72,7 @@ CpDirectory* CpSetDirectory::prepare_cp_dir(const android::String8& cp_name, boo
         }
         m_dirs.erase(it);
         m_size -= dir->size();
+        m_media->totals_uncertain();
         delete dir;
         break;
     }

@@ -1,5 +1,7 @@
 #include "storage/CpStorage.h"
 
+#include <errno.h>
+
 #include "channels/LogPipeHandler.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpSetDirectory.h"
@@ -29,21 +31,10 @@ int CpStorage::write(const void* data, size_t len) {
     if (m_manager->check_media_change()) {
         stop();
     }
-    // The channel's hooks for a new file make files of their own and so may bring a change
-    // of medium with them, which closes the file just started: then once more.
-    if (!prepare_file() || (!m_cur_file && (!prepare_file() || !m_cur_file))) {
+    if (!prepare_write(len)) {
         return -1;
     }
     MediaStorage* media = m_manager->get_media_stor();
-    if (m_quota_pending) {
-        if (media->check_quota() != 0) {
-            return -1;
-        }
-        m_quota_pending = false;
-        if (!m_cur_file) {
-            return -1;  // trimmed: it was not in the working set any more
-        }
-    }
     const int n = static_cast<int>(m_cur_file->write(data, len));
     if (n <= 0) {
         if (n == -2 && media->free_space() != 0) {
@@ -61,6 +52,37 @@ int CpStorage::write(const void* data, size_t len) {
         flush();
     }
     return n;
+}
+
+// Sees to it that there is a current file that may take len bytes more. The hooks for a new
+// file may create files themselves, which can switch the medium, and room may have to be made
+// with a new set: both close the file just opened, hence the further tries.
+bool CpStorage::prepare_write(size_t len) {
+    MediaStorage* in_use = m_manager->get_media_stor();
+    if (in_use) {
+        in_use->data_arrived(len);
+    }
+    for (int tries = 0; tries < 3; ++tries) {
+        if (!prepare_file()) {
+            return false;
+        }
+        if (m_cur_file && !pass_quota(m_manager->get_media_stor())) {
+            return false;
+        }
+        if (m_cur_file) {
+            return true;
+        }
+    }
+    return false;
+}
+
+// False while the medium is above its quota after an earlier write.
+bool CpStorage::pass_quota(MediaStorage* media) {
+    if (m_quota_pending && media->check_quota() != 0 && !media->make_room_with_new_set()) {
+        return false;
+    }
+    m_quota_pending = false;
+    return true;
 }
 
 // Sees to it that there is a current file that exists on the medium. False when none could
@@ -94,6 +116,7 @@ bool CpStorage::open_log_file(MediaStorage* media) {
     bool new_dir = false;
     m_cur_file = media->create_file(m_channel->name(), LT_LOG, new_dir, android::String8());
     if (!m_cur_file) {
+        m_manager->creation_failed(media, errno);  // the next write tries again
         return false;
     }
     if (new_dir && m_new_dir_cb) {
@@ -106,16 +129,24 @@ bool CpStorage::open_log_file(MediaStorage* media) {
 }
 
 LogFile* CpStorage::create_file(const android::String8& name, LogType type, MediaType media_type) {
-    if (media_type == MT_NONE) {
-        m_manager->check_media_change();
-        media_type = m_manager->media_type();
+    // Crash material has no next write: a medium that was full or has failed is tried a
+    // second time, or the other one instead of it.
+    for (int tries = 0; tries < 2; ++tries) {
+        if (media_type == MT_NONE) {
+            m_manager->check_media_change();
+        }
+        MediaStorage* media =
+            media_type == MT_NONE ? m_manager->get_media_stor() : m_manager->get_media(media_type);
+        if (!media) {
+            return nullptr;
+        }
+        bool new_dir = false;
+        LogFile* file = media->create_file(m_channel->name(), type, new_dir, name);
+        if (file || !m_manager->creation_failed(media, errno)) {
+            return file;
+        }
     }
-    MediaStorage* media = m_manager->get_media(media_type);
-    if (!media) {
-        return nullptr;
-    }
-    bool new_dir = false;
-    return media->create_file(m_channel->name(), type, new_dir, name);
+    return nullptr;
 }
 
 int CpStorage::check_quota(MediaType media_type) {

@@ -46,7 +46,7 @@ public:
     // An open file of another kind in the CP's directory on the given medium (MT_NONE:
     // the one in use, after a check for a change). Owned by its directory: keep an
     // ObjectRef. Null on failure.
-    LogFile* create_file(const android::String8& name, LogType type, MediaType media);
+    LogFile* create_file(const android::String8& name, LogType type, MediaType media = MT_NONE);
     // Trims the medium to its quota. 0 when it is within it now or there is no such
     // medium, else -1.
     int check_quota(MediaType media);
@@ -62,8 +62,10 @@ public:
     LogFile* current_file() const { return m_cur_file.get(); }
 
 private:
+    bool prepare_write(size_t len);
     bool prepare_file();
     bool open_log_file(MediaStorage* media);
+    bool pass_quota(MediaStorage* media);
 
     StorageManager* m_manager;
     LogPipeHandler* m_channel;

@@ -47,9 +47,15 @@ int MediaStorage::prepare_top_dir() const {
 }
 
 int MediaStorage::stat() {
-    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0) {
+    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0 || scan_sets() < 0) {
         return -1;
     }
+    m_scanned = true;
+    return 0;
+}
+
+// Lists the sets in the log root, beside those that are listed already.
+int MediaStorage::scan_sets() {
     DIR* dir = opendir(m_log_root.string());
     if (!dir) {
         return -1;
@@ -80,7 +86,6 @@ int MediaStorage::stat() {
     for (CpSetDirectory* set : found) {
         insert_scanned(set);
     }
-    m_scanned = true;
     return 0;
 }
 
@@ -105,6 +110,15 @@ void MediaStorage::insert_scanned(CpSetDirectory* set) {
     m_size += set->size();
 }
 
+CpSetDirectory* MediaStorage::find_set(const android::String8& path) const {
+    for (CpSetDirectory* set : m_sets) {
+        if (set->path() == path) {
+            return set;
+        }
+    }
+    return nullptr;
+}
+
 CpSetDirectory* MediaStorage::create_cp_set() {
     struct tm t;
     if (get_local_time(t) < 0) {
@@ -114,29 +128,29 @@ CpSetDirectory* MediaStorage::create_cp_set() {
     android::String8 path(m_log_root);
     path.appendFormat("/%04d-%02d-%02d-%02d-%02d-%02d", time.year, time.month, time.day, time.hour,
                       time.minute, time.second);
-    for (CpSetDirectory* set : m_sets) {
-        if (set->path() == path) {
-            if (set->create() < 0) {
-                err_log("create CP set %s failed", path.string());
-                return nullptr;
-            }
-            m_working_set = set;
-            return set;
-        }
-    }
-    CpSetDirectory* set = new CpSetDirectory(this, path);
-    if (set->create() < 0) {
-        delete set;
+    if (make_log_dir(path) < 0 &&
+        (errno != ENOENT || remake_log_root() < 0 || make_log_dir(path) < 0)) {
         err_log("create CP set %s failed", path.string());
         return nullptr;
     }
-    // Normally the directory is new and empty. One that was there already, unlisted, is
-    // taken over with what it holds, so that nothing in it is overwritten or uncounted.
-    set->stat();
-    m_size += set->size();
-    m_sets.push_back(set);
+    CpSetDirectory* set = find_set(path);
+    if (!set) {
+        set = new CpSetDirectory(this, path);
+        // Normally the directory is new and empty. One that was there already, unlisted, is
+        // taken over with what it holds, so that nothing in it is uncounted.
+        set->stat();
+        m_size += set->size();
+        m_sets.push_back(set);
+    }
     m_working_set = set;
     return set;
+}
+
+// Somebody deleted the whole log root, or the card is another one: begins afresh.
+int MediaStorage::remake_log_root() {
+    m_manager->media_vanished(this);
+    forget_sets();
+    return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root);
 }
 
 CpSetDirectory* MediaStorage::prepare_cur_set() {
@@ -147,18 +161,25 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
     if (!dir_usable(m_log_root)) {
         m_manager->media_vanished(this);
         forget_sets();
+        m_rescan = true;
         if (make_log_dir(m_log_root) < 0) {
             err_log("create top dir error");
             return nullptr;
         }
     }
-    if (!m_working_set) {
-        return create_cp_set();
+    if (m_working_set && !dir_usable(m_working_set->path())) {
+        m_manager->media_vanished(this);
+        drop_working_set();
     }
-    if (dir_usable(m_working_set->path())) {
-        return m_working_set;
+    CpSetDirectory* set = m_working_set ? m_working_set : create_cp_set();
+    if (set && m_rescan) {
+        // The log root may have been there all the time: what it holds counts.
+        m_rescan = scan_sets() < 0;
     }
-    m_manager->media_vanished(this);
+    return set;
+}
+
+void MediaStorage::drop_working_set() {
     CpSetDirectory* vanished = m_working_set;
     m_working_set = nullptr;
     android::List<CpSetDirectory*>::iterator it = m_sets.begin();
@@ -168,7 +189,6 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
     m_sets.erase(it);
     m_size -= vanished->size();
     delete vanished;
-    return create_cp_set();
 }
 
 LogFile* MediaStorage::create_file(const android::String8& cp_name, LogType type, bool& new_dir,
@@ -185,9 +205,21 @@ CpDirectory* MediaStorage::get_cp_dir(const android::String8& cp_name) const {
     return m_working_set ? m_working_set->get_cp_dir(cp_name) : nullptr;
 }
 
+bool MediaStorage::can_make_files() const {
+    const JoinedPath probe(m_log_root, android::String8(".write_test"));
+    unlink(probe.string());
+    const int fd = open(probe.string(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644);
+    if (fd < 0) {
+        return false;
+    }
+    close(fd);
+    return unlink(probe.string()) == 0;
+}
+
 void MediaStorage::clear() {
     forget_sets();
     m_scanned = false;
+    m_rescan = false;
 }
 
 void MediaStorage::clear_all() {

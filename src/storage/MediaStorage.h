@@ -50,26 +50,41 @@ public:
 
     // Makes the log root if needed and scans it. 0 or -1.
     int stat();
-    // Starts a new working set, named by the local time. Null on failure.
+    // Starts a new working set, named by the local time; makes the log root too when that
+    // is missing. Null on failure, with errno.
     CpSetDirectory* create_cp_set();
     // A usable working set: the present one, or a new one when there is none, when it
-    // vanished or when the whole log root vanished. Null on failure.
+    // vanished or when the whole log root vanished. Null on failure, with errno.
     CpSetDirectory* prepare_cur_set();
     // An open file in the CP's directory of the working set: a new log file for
     // LT_LOG (name unused; new_dir tells whether the CP's directory was made for it),
-    // else a file of that name. Null on failure.
+    // else a file of that name. Null on failure, with errno.
     LogFile* create_file(const android::String8& cp_name, LogType type, bool& new_dir,
                          const android::String8& name);
     // The CP's directory in the working set, or null.
     CpDirectory* get_cp_dir(const android::String8& cp_name) const;
 
+    // True when a file can be made in the log root now: makes one and deletes it.
+    bool can_make_files() const;
+
     void add_size(uint64_t num) { m_size += num; }
     void dec_size(uint64_t num) { m_size -= num; }
+    // Something vanished from the medium: the totals may hold what is no longer there.
+    // check_quota counts again before it deletes anything for them.
+    void totals_uncertain() { m_uncertain = true; }
+    // Bytes of log data arrived for this medium, whether they can be written or not.
+    void data_arrived(size_t len) { m_arrived += len; }
 
     // Frees at least the bytes wanted, if possible; returns the bytes freed.
     uint64_t trim(uint64_t wanted);
-    // Trims to the quota. 0 when the total is within it now, else -1.
+    // Trims to the quota. 0 when the total is within it now, else -1. Files deleted by
+    // somebody else are found missing before it gives up.
     int check_quota();
+    // For a medium that check_quota left above its quota: when only files that trimming
+    // spares in the working set keep it there, starts a new set, so that the old one can be
+    // trimmed like any other. At most once for each file size of data that arrived. True when
+    // the total is within the quota now; the CP storages have closed their files then.
+    bool make_room_with_new_set();
     // Frees one file size after the medium ran full. 0 when at least half of it could
     // be freed, else -1.
     int free_space();
@@ -81,11 +96,18 @@ public:
 
 private:
     int prepare_top_dir() const;
+    int remake_log_root();
+    int scan_sets();
     void forget_sets();
     void insert_scanned(CpSetDirectory* set);
+    CpSetDirectory* find_set(const android::String8& path) const;
+    void drop_working_set();
+    bool recount_helps();
+    void recount();
 
     StorageManager* m_manager;
     bool m_scanned = false;
+    bool m_rescan = false;  // the log root was given up and has to be scanned when it is there
     uint64_t m_quota = 0;
     uint32_t m_file_size = 512u << 20;
     bool m_overwrite = true;
@@ -94,6 +116,9 @@ private:
     android::List<CpSetDirectory*> m_sets;
     CpSetDirectory* m_working_set = nullptr;
     uint64_t m_size = 0;
+    bool m_uncertain = false;         // something vanished since the last recount
+    unsigned int m_refusals = 0;      // checks that failed since the last recount
+    uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; at first enough
 };
 
 #endif  // STORAGE_MEDIASTORAGE_H_

@@ -2,6 +2,16 @@
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
+#include "storage/StorageManager.h"
+#include "storage/paths.h"
+
+namespace {
+
+// A medium above its quota is counted again at the first failing check and then at every
+// one of so many: somebody may delete files at any time, and counting looks at every file.
+constexpr unsigned int CHECKS_PER_RECOUNT = 16;
+
+}  // namespace
 
 uint64_t MediaStorage::trim(uint64_t wanted) {
     uint64_t removed = 0;
@@ -40,13 +50,61 @@ int MediaStorage::check_quota() {
     if (m_quota == 0 || m_size <= m_quota) {
         return 0;
     }
+    if (m_uncertain) {
+        recount();
+        if (m_size <= m_quota) {
+            return 0;
+        }
+    }
     if (!m_overwrite) {
-        return -1;
+        return recount_helps() ? 0 : -1;
     }
     info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
              static_cast<unsigned int>(m_quota >> 20));
     trim(m_size - m_quota);
-    return m_size <= m_quota ? 0 : -1;
+    return m_size <= m_quota || recount_helps() ? 0 : -1;
+}
+
+// True when the total is within the quota once what somebody else deleted has left it.
+bool MediaStorage::recount_helps() {
+    if (m_refusals++ % CHECKS_PER_RECOUNT == 0) {
+        recount();
+    }
+    return m_size <= m_quota;
+}
+
+// Counts again what the lists hold and drops what is gone from the medium. A working set
+// that is gone stays until prepare_cur_set finds it so.
+void MediaStorage::recount() {
+    m_uncertain = false;
+    m_size = 0;
+    android::List<CpSetDirectory*>::iterator it = m_sets.begin();
+    while (it != m_sets.end()) {
+        CpSetDirectory* set = *it;
+        set->recount();
+        if (set == m_working_set || dir_usable(set->path())) {
+            m_size += set->size();
+            ++it;
+        } else {
+            it = m_sets.erase(it);
+            delete set;
+        }
+    }
+}
+
+bool MediaStorage::make_room_with_new_set() {
+    if (!m_overwrite || !m_working_set || m_arrived < m_file_size) {
+        return false;
+    }
+    const CpSetDirectory* old = m_working_set;
+    const CpSetDirectory* set = create_cp_set();
+    if (!set || set == old) {
+        return false;  // set names have one-second resolution: later
+    }
+    m_arrived = 0;
+    m_manager->stop_all_storages();
+    info_log("nothing else is left to trim, new set %s", set->path().string());
+    return check_quota() == 0;
 }
 
 int MediaStorage::free_space() {

@@ -1,9 +1,11 @@
 #include "storage/StorageManager.h"
 
 #include <cutils/properties.h>
+#include <errno.h>
 #include <string.h>
 
 #include "config/property_names.h"
+#include "core/Multiplexer.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
@@ -11,13 +13,15 @@
 StorageManager::StorageManager() : m_internal(this), m_external(this) {}
 
 StorageManager::~StorageManager() {
+    cancel_card_rest();
     for (CpStorage* storage : m_storages) {
         delete storage;
     }
 }
 
 int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*/,
-                         Multiplexer* /*mux*/) {
+                         Multiplexer* mux) {
+    m_multiplexer = mux;
     android::String8 internal_top = system_path(PATH_DATA_PARTITION);
     // Without a known SD card the external log root is a path that the service fixes.
     android::String8 external_top = sd_root.isEmpty() ? system_path("") : sd_root;
@@ -75,6 +79,9 @@ bool StorageManager::check_media_change() {
         if (m_media_type == MT_EXTERNAL) {
             return false;
         }
+        if (m_card_rest_timer) {
+            return use_internal();
+        }
         info_log("Storage changing to external SD");
         bool usable = m_external.scanned();
         if (!usable) {
@@ -85,23 +92,78 @@ bool StorageManager::check_media_change() {
         }
         return (usable && use_external()) || use_internal();
     }
-    if (m_media_type == MT_INTERNAL) {
-        return false;
-    }
     if (m_media_type == MT_EXTERNAL) {
         info_log("sd card is umounted!");
         m_ext_umount_clients.notify();
         stop_all_storages();
-        m_external.clear();
     }
-    m_internal.create_cp_set();
+    card_removed();
+    if (m_media_type == MT_INTERNAL) {
+        return false;
+    }
+    start_set(m_internal);
     change_media(MT_INTERNAL);
     return true;
 }
 
+// Whatever is known of the SD card is not true of the next one, in use or not.
+void StorageManager::card_removed() {
+    if (m_external.scanned() || !m_external.sets().empty()) {
+        m_external.clear();
+    }
+    m_card_suspect = false;
+    cancel_card_rest();
+}
+
+// Starts a new set. One that fails on a full medium frees space for the next try.
+CpSetDirectory* StorageManager::start_set(MediaStorage& media) {
+    CpSetDirectory* set = media.create_cp_set();
+    if (!set && errno == ENOSPC) {
+        media.free_space();
+    }
+    return set;
+}
+
+bool StorageManager::creation_failed(MediaStorage* media, int error) {
+    if (error == ENOSPC) {
+        return media->free_space() == 0;
+    }
+    return media == &m_external && m_media_type == MT_EXTERNAL && card_failed(error);
+}
+
+// How a dying card fails: its file system becomes read-only, or its driver gives up.
+bool StorageManager::card_failed(int error) {
+    if (error != EROFS && error != EIO && error != ENODEV && error != ENOTCONN) {
+        return false;
+    }
+    errno = error;
+    err_log("SD card can not be written, not in use for now");
+    stop_all_storages();
+    m_media_type = MT_NONE;
+    if (m_card_suspect && m_multiplexer && !m_card_rest_timer) {
+        // It was tried again, seemed to work, and failed: not from block to block.
+        m_card_rest_timer =
+            m_multiplexer->timer_mgr().create_timer(CARD_REST_MS, on_card_rest_over, this);
+    }
+    m_card_suspect = true;
+    return true;
+}
+
+void StorageManager::on_card_rest_over(void* manager) {
+    static_cast<StorageManager*>(manager)->m_card_rest_timer = nullptr;
+}
+
+void StorageManager::cancel_card_rest() {
+    if (m_card_rest_timer) {
+        m_multiplexer->timer_mgr().del_timer(m_card_rest_timer);
+        m_card_rest_timer = nullptr;
+    }
+}
+
 // Takes the SD card into use with a new set. False when no set can be started there.
 bool StorageManager::use_external() {
-    if (!m_external.create_cp_set()) {
+    // A directory can sometimes be made, or is there, where no file can.
+    if ((m_card_suspect && !m_external.can_make_files()) || !start_set(m_external)) {
         return false;
     }
     if (m_media_type == MT_INTERNAL) {
@@ -114,7 +176,7 @@ bool StorageManager::use_external() {
 // Falls back to the internal medium while the SD card cannot be used. False when it is
 // in use already or no set can be started there.
 bool StorageManager::use_internal() {
-    if (m_media_type == MT_INTERNAL || !m_internal.create_cp_set()) {
+    if (m_media_type == MT_INTERNAL || !start_set(m_internal)) {
         return false;
     }
     change_media(MT_INTERNAL);

@@ -13,6 +13,7 @@
 #include <utils/List.h>
 #include <utils/String8.h>
 
+#include "core/TimerManager.h"
 #include "storage/MediaStorage.h"
 #include "storage/MediaType.h"
 #include "storage/SubscriberList.h"
@@ -34,9 +35,10 @@ public:
     StorageManager& operator=(const StorageManager&) = delete;
 
     // Sets the directories of both media and scans them. sd_root: the SD card's root,
-    // as given by the environment; empty: its log root is "/modem_log". 0, or -1 when
-    // the internal medium cannot be scanned.
-    int init(const android::String8& sd_root, LogController* ctrl, Multiplexer* mux);
+    // as given by the environment; empty: its log root is "/modem_log". mux, not owned, has
+    // the timers. 0, or -1 when the internal medium cannot be scanned.
+    int init(const android::String8& sd_root, LogController* ctrl = nullptr,
+             Multiplexer* mux = nullptr);
 
     // Places the log roots in the kest directories. Call before init.
     void set_kest_layout(bool kest_layout) { m_kest_layout = kest_layout; }
@@ -65,6 +67,11 @@ public:
     void stop_all_storages();
     // Called by a medium whose log root or working set vanished.
     void media_vanished(MediaStorage* media);
+    // A file or directory could not be made on the medium, for the reason errno gives. A
+    // full medium frees space, once. An SD card in use that cannot be written any more is
+    // not in use from now on: the next check for a change falls back to the internal medium
+    // and tries the card again. True when another try may succeed.
+    bool creation_failed(MediaStorage* media, int error);
     // Deletes every set on both media; the next write chooses the medium afresh.
     void clear_all();
 
@@ -76,8 +83,17 @@ public:
     void unsubscribe_ext_stor_umount_evt(void* client);
 
 private:
+    // How long an SD card that failed again and again is left alone.
+    static constexpr unsigned int CARD_REST_MS = 3000;
+
+    static void on_card_rest_over(void* manager);
+
+    bool card_failed(int error);
+    void card_removed();
+    void cancel_card_rest();
     bool use_external();
     bool use_internal();
+    CpSetDirectory* start_set(MediaStorage& media);
     void change_media(MediaType type);
 
     MediaType m_media_type = MT_NONE;
@@ -88,6 +104,9 @@ private:
     SubscriberList<media_change_callback> m_media_change_clients;
     SubscriberList<ext_umount_callback> m_ext_umount_clients;
     bool m_kest_layout = false;
+    Multiplexer* m_multiplexer = nullptr;
+    bool m_card_suspect = false;  // it failed in use since it was mounted
+    TimerManager::Timer* m_card_rest_timer = nullptr;
 };
 
 #endif  // STORAGE_STORAGEMANAGER_H_

@@ -195,6 +195,115 @@ TEST_F(CpStorageTest, FullMedium) {
     }
 }
 
+// A service started on a full medium lost everything: space was freed only after a failed
+// write, and no file to write could be made.
+TEST_F(CpStorageTest, MediumIsFullWhenAFileHasToBeMade) {
+    const struct {
+        faults::Call call;
+        const char* path;  // of what cannot be made
+    } cases[] = {{faults::MKDIR, "/2016-"}, {faults::MKDIR, "/cp_gnss"}, {faults::OPEN, "/0-"}};
+    m_mgr.set_file_size(1000);
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.path);
+        m_mgr.clear_all();
+        for (const char* day : {"01", "02", "03", "04"}) {
+            put(INT + "2016-02-" + day + "-00-00-00/cp/f", 1000);
+        }
+        internal().clear();
+        ASSERT_EQ(0, internal().stat());
+        // Full until room was made twice.
+        faults::only_on(c.path);
+        faults::fail(c.call, 1, ENOSPC, 2);
+        int lost = 0;
+        while (write_later("data") < 0) {
+            ASSERT_LT(++lost, 3);
+        }
+        EXPECT_EQ("2016-02-03-00-00-00", m_root.list(INT)[0]);
+        // Crash material does not wait for a next write.
+        ASSERT_EQ(0, system(("rm -fr " + m_root.path(INT + "2016-03*")).c_str()));
+        faults::fail(c.call, 1, ENOSPC);
+        EXPECT_NE(nullptr, m_store->create_file("0-dump", LT_DUMP));
+        EXPECT_EQ("2016-02-04-00-00-00", m_root.list(INT)[0]);
+        faults::reset();
+        check_sums(internal());
+    }
+}
+
+// With the default sizes the first and the newest files of three co-processors fill the
+// quota; trimming spares them, and every block was refused until somebody cleared the logs.
+TEST_F(CpStorageTest, SparedFilesDoNotEndTheLogging) {
+    m_mgr.set_file_size(1000);
+    m_mgr.set_data_part_size(2500);
+    const std::string block(100, 'x');
+    int refused = 0;
+    for (int i = 0; i < 600; ++i) {
+        faults::set_time(++m_now);
+        for (CpStorage* store : {m_store, m_other}) {
+            refused += store->write(block.data(), block.size()) != 100;
+        }
+        EXPECT_LE(internal().size(), 2700u);  // each may cross the limit once
+    }
+    EXPECT_EQ(0, refused);
+    check_sums(internal());
+    // One new set at the most for each file size of data that arrived.
+    m_mgr.set_data_part_size(150);
+    LogCapture log;
+    int written = 0;
+    for (int i = 0; i < 100; ++i) {
+        written += write_later(block) == 100;
+    }
+    EXPECT_LE(log.count("make_room_with_new_set(): nothing else is left to trim, new set "), 11u);
+    EXPECT_GE(written, 10);
+    // Nothing is forced without overwriting.
+    m_mgr.set_overwrite(false);
+    log.clear();
+    for (int i = 0; i < 30; ++i) {
+        write_later(block);
+    }
+    EXPECT_FALSE(log.has("new set"));
+}
+
+// A medium whose log root somebody deleted while it was not in use was never taken again.
+TEST_F(CpStorageTest, LogRootIsMadeAgain) {
+    plug_card();
+    EXPECT_EQ(1, write_later("1"));
+    m_mgr.clear_all();
+    remove_tree(m_root.path("sd/modem_log").c_str());
+    EXPECT_EQ(1, write_later("2"));
+    EXPECT_EQ(MT_EXTERNAL, m_mgr.media_type());
+    // The card's place is empty for a while, though it counts as mounted.
+    m_mgr.clear_all();
+    ASSERT_EQ(0, rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()));
+    EXPECT_EQ(1, write_later("3"));
+    EXPECT_EQ(MT_INTERNAL, m_mgr.media_type());
+    ASSERT_EQ(0, rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()));
+    EXPECT_EQ(1, write_later("4"));
+    EXPECT_EQ(MT_EXTERNAL, m_mgr.media_type());
+}
+
+// A log root given up because it could not be accessed, but there after all, is counted again.
+// Other failures of access are passing ones.
+TEST_F(CpStorageTest, FailedAccessIsNotAlwaysALoss) {
+    const struct {
+        int error;
+        bool vanished;
+    } cases[] = {{EIO, false}, {ENOMEM, false}, {EACCES, true}, {ENOENT, true}, {ELOOP, true}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.error);
+        m_mgr.clear_all();
+        write_later("12345");
+        const LogFile* file = m_store->current_file();
+        faults::fail(faults::ACCESS, 1, c.error, 2);  // that of the file, that of the log root
+        EXPECT_EQ(3, write("678"));
+        EXPECT_EQ(c.vanished, m_store->current_file() != file);
+        // What was lost from sight is set aside and counts.
+        EXPECT_EQ(8u, internal().size());
+        m_store->flush();
+        EXPECT_EQ(c.vanished ? 2u : 1u, files(INT + set_names(internal()).back()).size());
+        check_sums(internal());
+    }
+}
+
 TEST_F(CpStorageTest, CardComesAndGoes) {
     write("first");
     ObjectRef<LogFile> in_file(m_store->current_file());
@@ -226,6 +335,77 @@ TEST_F(CpStorageTest, CardComesAndGoes) {
     EXPECT_EQ(3u, external().sets().size());
     check_sums(internal());
     check_sums(external());
+}
+
+// A card that was known but not in use when it was replaced was not used again: what was
+// known of the first one hid the second.
+TEST_F(CpStorageTest, CardIsReplacedWhileNotInUse) {
+    m_root.write_file("sd/modem_log/2016-01-01-00-00-00/cp/f", "12345");
+    plug_card();
+    ASSERT_EQ(0, external().stat());
+    pull_card();
+    EXPECT_EQ(1, write_later("1"));
+    EXPECT_EQ(0u, external().sets().size());
+    plug_card();
+    EXPECT_EQ(1, write_later("2"));
+    // In use until its log root cannot be written, then replaced.
+    remove_tree(m_root.path("sd/modem_log").c_str());
+    m_root.write_file("sd/modem_log", "");
+    EXPECT_EQ(-1, write_later("x"));
+    m_mgr.clear_all();
+    EXPECT_EQ(1, write_later("3"));
+    EXPECT_EQ(MT_INTERNAL, m_mgr.media_type());
+    pull_card();
+    ASSERT_EQ(0, unlink(m_root.path("sd/modem_log").c_str()));
+    EXPECT_EQ(1, write_later("4"));
+    plug_card();
+    EXPECT_EQ(1, write_later("5"));
+    EXPECT_EQ(MT_EXTERNAL, m_mgr.media_type());
+    EXPECT_EQ(1u, external().sets().size());
+}
+
+// A card whose file system has become read-only, which is how cards die, lost every block
+// for as long as it counted as mounted.
+TEST_F(CpStorageTest, CardThatCanNoLongerBeWritten) {
+    const struct {
+        int error;
+        bool directories;  // cannot be made either
+    } cases[] = {{EROFS, true}, {EIO, true}, {ENODEV, true}, {EIO, false}};
+    plug_card();
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::to_string(c.error) + (c.directories ? " all" : " files"));
+        EXPECT_EQ(1, write_later("1"));
+        ASSERT_EQ(MT_EXTERNAL, m_mgr.media_type());
+        m_store->stop();
+        faults::only_on("/sd/");
+        faults::fail(faults::OPEN, 1, c.error, 100000);
+        if (c.directories) {
+            faults::fail(faults::MKDIR, 1, c.error, 100000);
+        }
+        m_events.clear();
+        EXPECT_EQ(-1, write_later("x"));  // the block that finds out
+        const size_t sets = internal().sets().size();
+        for (int i = 0; i < 20; ++i) {
+            EXPECT_EQ(1, write_later("y"));
+            EXPECT_EQ(MT_INTERNAL, m_mgr.media_type());
+        }
+        EXPECT_EQ(sets + 1, internal().sets().size());
+        EXPECT_EQ("DL", m_events);
+        // Crash material goes to the other medium at once.
+        EXPECT_NE(nullptr, m_store->create_file("a.dmp", LT_DUMP));
+        faults::reset();
+        EXPECT_EQ(1, write_later("z"));  // tried again with each block
+        EXPECT_EQ(MT_EXTERNAL, m_mgr.media_type());
+        pull_card();
+        write_later("i");
+        plug_card();
+    }
+    EXPECT_EQ(1, write_later("1"));
+    m_store->stop();
+    faults::only_on("/sd/");
+    faults::fail(faults::OPEN, 1, EIO, 100000);
+    EXPECT_NE(nullptr, m_store->create_file("b.dmp", LT_DUMP));
+    EXPECT_EQ(MT_INTERNAL, m_mgr.media_type());
 }
 
 TEST_F(CpStorageTest, CardFlapsWithinOneSecond) {
