@@ -7,6 +7,7 @@
 #include <string.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -120,8 +121,8 @@ TEST_F(KestctlTest, EveryRequestIsReachedByACommand) {
     const std::string commands =
         "flush=FLUSH|reload=kestctl reload|clear=kestctl clear|enable-md=ENABLE_MD|"
         "disable-md=DISABLE_MD|mini-dump=MINI_DUMP|enable-iq wcdma=ENABLE_IQ WCDMA WCDMA|"
-        "disable-iq Td WCDMA=DISABLE_IQ TD WCDMA|enable-log wcdma TDD-LTE fdd-lte 5mode ag-dsp="
-        "ENABLE_LOG WCDMA TDD-LTE FDD-LTE 5MODE AG-DSP|disable-log gnss=DISABLE_LOG GNSS|"
+        "disable-iq Td WCDMA=DISABLE_IQ TD WCDMA|disable-log wcdma TDD-LTE fdd-lte 5mode ag-dsp="
+        "DISABLE_LOG WCDMA TDD-LTE FDD-LTE 5MODE AG-DSP|"
         "get-log-state wcn=GET_LOG_STATE WCN=ON|save-ringbuf wcdma=SAVE_RINGBUF WCDMA|"
         "save-sleep-log wcdma=SAVE_SLEEP_LOG WCDMA|get-log-file-size=GET_LOG_FILE_SIZE=10|"
         "set-log-file-size 4294967295=SET_LOG_FILE_SIZE 4294967295|set-sd-max-size "
@@ -131,8 +132,8 @@ TEST_F(KestctlTest, EveryRequestIsReachedByACommand) {
         "set-md-stor-pos internal=SET_MD_STOR_POS "
         "INTERNAL|get-log-overwrite=GET_LOG_OVERWRITE=ENABLE|"
         "enable-log-overwrite=ENABLE_LOG_OVERWRITE|disable-log-overwrite=DISABLE_LOG_OVERWRITE";
-    // No use on a connection that ends; watch is tested below.
-    std::set<std::string> reached = {"SUBSCRIBE", "UNSUBSCRIBE"};
+    // Of no use on a connection that ends, or tested below.
+    std::set<std::string> reached = {"UNSUBSCRIBE", "SUBSCRIBE", "ENABLE_LOG"};
     for (const std::string& command : split(commands, '|')) {
         const Strings parts = split(command, '=');
         const bool has_value = parts.size() > 2;
@@ -145,6 +146,18 @@ TEST_F(KestctlTest, EveryRequestIsReachedByACommand) {
     for (const ClientHandler::Request& request : ClientHandler::REQUESTS) {
         EXPECT_EQ(reached.count(request.keyword), 1u) << request.keyword;
     }
+}
+
+TEST_F(KestctlTest, EnableLogTellsWhatIsStillOff) {
+    EXPECT_EQ(exchange("enable-log wcn td", {"OK\n", "OK ON\n", "OK ON\n"}), 0) << err();
+    EXPECT_EQ(m_requests, "ENABLE_LOG WCN TD\nGET_LOG_STATE WCN\nGET_LOG_STATE TD\n");
+    EXPECT_EQ(out() + err(), "OK\n");
+    const Strings one_is_off = {"OK\n", "OK OFF\n", "OK ON\n"};
+    EXPECT_EQ(exchange("--json enable-log ag-dsp gnss", one_is_off), 6);
+    EXPECT_EQ(err().find("kestctl: still off: AG-DSP ("), 0u) << err();
+    EXPECT_EQ(out().find("{\"ok\":false,\"status\":6,"), 0u) << out();
+    EXPECT_EQ(exchange("enable-log TD", {"ERROR 3\n"}), 13);
+    EXPECT_EQ(exchange("enable-log TD", {"OK\n", ""}), 4);
 }
 
 TEST_F(KestctlTest, EveryErrorCodeHasItsStatusAndWords) {
@@ -205,6 +218,7 @@ TEST_F(KestctlTest, NoReplyAndNoService) {
     m_listen = -1;
     EXPECT_EQ(run({"flush", "--json"}), 2);
     EXPECT_NE(out().find("{\"ok\":false,\"status\":2,"), std::string::npos) << out();
+    EXPECT_NE(err().find(" kestmodem@" + m_root.root() + " ("), std::string::npos) << err();
 }
 
 TEST_F(KestctlTest, WatchPrintsAtOnceUntilInterrupted) {
@@ -245,6 +259,38 @@ TEST_F(KestctlTest, StatusAndValuesForPeopleAndAsJson) {
     }
     EXPECT_EQ(exchange("status --json", replies), 0) << err();
     EXPECT_EQ(out().find("{\"ok\":true,\"log_file_size\":10,\"data_max_size\":512,"), 0u) << out();
+
+    // What no request tells is in the settings file, each line as the service takes it.
+    static const struct {
+        const char* file;  // null: a FIFO, which nobody may wait for
+        const char *md, *iq;
+    } CASES[] = {
+        {"", "DISABLE", "{\"WCDMA\":\"NONE\",\"TD\":\"NONE\","},
+        {"minidump enable\nminidump\niq cp_wcdma WCDMA GSM\niq cp_wcdma GSM\n"
+         "iq cp_td-scdma LTE GSM\niq\niq cp_lte GSM\niq cp_td-scdma GSM",
+         "ENABLE", "{\"WCDMA\":\"GSM WCDMA\",\"TD\":\"GSM\","},
+        {"#minidump enable\nminidump on internal\niq cp_wcdma \niq cp_wcdma WCDMA\n", "DISABLE",
+         "{\"WCDMA\":\"WCDMA\",\"TD\":\"NONE\","},
+        {nullptr, "UNKNOWN", "{\"WCDMA\":\"UNKNOWN\",\"TD\":\"UNKNOWN\","},
+    };
+    const std::string settings = &PATH_CONFIG_FILE[1];
+    for (const auto& c : CASES) {
+        m_root.write_file(settings, c.file ? c.file : "");
+        if (!c.file) {
+            unlink(m_root.path(settings).c_str());
+            ASSERT_EQ(mkfifo(m_root.path(settings).c_str(), 0600), 0);
+        }
+        EXPECT_EQ(exchange("status --json", replies), 0) << err();
+        const std::string md = std::string(",\"md\":\"") + c.md + "\",\"log\":{";
+        EXPECT_NE(out().find(md), std::string::npos) << out();
+        EXPECT_NE(out().find(std::string(",\"iq\":") + c.iq), std::string::npos) << out();
+        EXPECT_EQ(err().empty(), c.file != nullptr) << err();
+    }
+    unlink(m_root.path(settings).c_str());
+    EXPECT_EQ(exchange("status", replies), 0) << err();
+    EXPECT_NE(out().find("\nmd               UNKNOWN\n"), std::string::npos) << out();
+    EXPECT_NE(out().find("\niq TD            UNKNOWN\n"), std::string::npos) << out();
+    EXPECT_FALSE(m_root.exists(settings));  // not made either
     EXPECT_EQ(exchange("--json raw X", {"OK \"\\\n"}), 0);
     EXPECT_EQ(out(), "{\"ok\":true,\"value\":\"\\\"\\\\\"}\n");
     EXPECT_EQ(exchange("get-log-file-size", {"OK 10\n"}, "/dev/full"), 5);

@@ -19,6 +19,12 @@ namespace {
 // How often a connection is tried again while the service's queue is full.
 const int CONNECT_RETRY_MS = 50;
 
+// As it is addressed: on a host the root is a part of it.
+std::string socket_name() {
+    const std::string root = system_path("").string();
+    return root.empty() ? SOCKET_CONTROL : SOCKET_CONTROL "@" + root;
+}
+
 }  // namespace
 
 ControlConnection::~ControlConnection() {
@@ -39,7 +45,7 @@ int ControlConnection::open(double timeout) {
         }
         if (errno != EAGAIN) {
             return fail(ES_NO_CONNECTION, std::string("no connection to the control socket ") +
-                                              SOCKET_CONTROL + " (" + strerror(errno) +
+                                              socket_name() + " (" + strerror(errno) +
                                               "): is the service running?");
         }
         // The queue of waiting clients is full, which poll cannot wait for.

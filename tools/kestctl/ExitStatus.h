@@ -10,6 +10,7 @@ enum ExitStatus : int {
     ES_TIMEOUT = 3,        // no reply in time
     ES_BAD_REPLY = 4,      // a reply that makes no sense, or the service closed the connection
     ES_OUTPUT = 5,         // standard output could not be written
+    ES_STILL_OFF = 6,      // enable-log: a CP is not logged all the same
     // Error code N of the service gives ES_SERVICE_ERROR + N.
     ES_SERVICE_ERROR = 10
 };

@@ -27,6 +27,22 @@ std::string json_value(const std::string& value) {
     return is_number(value) ? value : json_string(value);
 }
 
+void print_rows(const char* prefix, const Output::Table& table) {
+    for (const auto& row : table) {
+        printf("%-16s %s%s\n", (prefix + row.first).c_str(), escape_text(row.second).c_str(),
+               is_number(row.second) ? " MB" : "");
+    }
+}
+
+std::string json_object(const Output::Table& table) {
+    std::string object = "{";
+    for (const auto& row : table) {
+        object +=
+            (object.size() == 1 ? "" : ",") + json_string(row.first) + ":" + json_value(row.second);
+    }
+    return object + "}";
+}
+
 }  // namespace
 
 std::string escape_text(const std::string& text) {
@@ -66,15 +82,11 @@ void Output::notification(const Notification& notification) const {
                  : "CP_" + event + " " + escape_text(notification.cp));
 }
 
-void Output::status(const Table& settings, const Table& cps) const {
+void Output::status(const Table& settings, const Table& logs, const Table& iqs) const {
     if (!m_json) {
-        for (const Table* table : {&settings, &cps}) {
-            for (const auto& row : *table) {
-                const std::string name = (table == &cps ? "log " : "") + row.first;
-                printf("%-16s %s%s\n", name.c_str(), escape_text(row.second).c_str(),
-                       is_number(row.second) ? " MB" : "");
-            }
-        }
+        print_rows("", settings);
+        print_rows("log ", logs);
+        print_rows("iq ", iqs);
         fflush(stdout);
         return;
     }
@@ -84,12 +96,11 @@ void Output::status(const Table& settings, const Table& cps) const {
         std::replace(name.begin(), name.end(), '-', '_');
         object += "," + json_string(name) + ":" + json_value(row.second);
     }
-    object += ",\"log\":{";
-    for (const auto& row : cps) {
-        object += (&row == &cps.front() ? "" : ",") + json_string(row.first) + ":" +
-                  json_value(row.second);
-    }
-    print(object + "}}");
+    print(object + ",\"log\":" + json_object(logs) + ",\"iq\":" + json_object(iqs) + "}");
+}
+
+void Output::remark(const std::string& words) const {
+    fprintf(stderr, "kestctl: %s\n", escape_text(words).c_str());
 }
 
 void Output::line(const std::string& line) const {
@@ -106,7 +117,7 @@ int Output::error_reply(int code) const {
 }
 
 int Output::failure(int status, const std::string& words) const {
-    fprintf(stderr, "kestctl: %s\n", escape_text(words).c_str());
+    remark(words);
     if (m_json) {
         print("{\"ok\":false,\"status\":" + std::to_string(status) +
               ",\"meaning\":" + json_string(words) + "}");

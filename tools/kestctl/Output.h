@@ -26,9 +26,11 @@ public:
     // A result; in JSON a number when is_number() says so.
     void value(const std::string& value) const;
     void notification(const Notification& notification) const;
-    // Settings by their names, and the CPs with their log states.
+    // Settings by their names, and for every CP its log state and its I/Q types.
     typedef std::vector<std::pair<std::string, std::string>> Table;
-    void status(const Table& settings, const Table& cps) const;
+    void status(const Table& settings, const Table& logs, const Table& iqs) const;
+    // Something that is not as it should be, on standard error only.
+    void remark(const std::string& words) const;
     // A line as the service sent it. Not for JSON.
     void line(const std::string& line) const;
     bool json() const { return m_json; }

@@ -21,7 +21,7 @@ const long MAX_CODE = 99;
 const char* const MEANINGS[MAX_ERROR_CODE + 1] = {
     "OK",
     "the service does not know the request",
-    "a parameter is missing, malformed, unknown or too much",
+    "a parameter is missing, wrong or too much, or the CP has no log channel",
     "the operation failed",
     "the service is busy: a dump or another request is running",
     "logging of that CP is disabled",

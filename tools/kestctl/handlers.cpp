@@ -8,8 +8,12 @@
 #include "kestctl/ExitStatus.h"
 #include "kestctl/Output.h"
 #include "kestctl/Reply.h"
+#include "kestctl/SettingsFile.h"
 
 namespace {
+
+// What a setting is shown as that could not be found out.
+const char UNKNOWN[] = "UNKNOWN";
 
 bool fits(ReplyKind kind, const std::string& value) {
     switch (kind) {
@@ -60,8 +64,31 @@ int run_request(const Command& command, const Args& args, ControlConnection& con
     return status;
 }
 
+int run_enable_log(const Command& command, const Args& args, ControlConnection& connection,
+                   const Output& output) {
+    std::string value;
+    int status = ask(command, args, connection, output, &value);
+    std::string off;
+    for (size_t i = 0; status == ES_OK && i < args.size(); ++i) {
+        status = ask(*find_command("get-log-state"), {args[i]}, connection, output, &value);
+        if (status == ES_OK && value != "ON") {
+            off += " " + args[i];
+        }
+    }
+    if (status != ES_OK) {
+        return status;
+    }
+    if (!off.empty()) {
+        return output.failure(ES_STILL_OFF, "still off:" + off +
+                                                " (no device of it is known, or no stream line of "
+                                                "it was in the settings when the service started)");
+    }
+    output.ok();
+    return ES_OK;
+}
+
 int run_status(const Command&, const Args&, ControlConnection& connection, const Output& output) {
-    Output::Table settings, cps;
+    Output::Table settings, logs, iqs;
     std::string value;
     for (const Command& getter : COMMANDS) {
         if (getter.reply == RK_NONE || getter.run != run_request) {
@@ -80,10 +107,20 @@ int run_status(const Command&, const Args&, ControlConnection& connection, const
             if (status != ES_OK) {
                 return status;
             }
-            cps.emplace_back(cp, value);
+            logs.emplace_back(cp, value);
         }
     }
-    output.status(settings, cps);
+    FileSettings file;
+    std::string reason;
+    const bool known = file.read(&reason);
+    if (!known) {
+        output.remark(reason);
+    }
+    settings.emplace_back("md", !known ? UNKNOWN : file.md ? "ENABLE" : "DISABLE");
+    for (size_t i = 0; const char* cp = param_word(PK_CP, i); ++i) {
+        iqs.emplace_back(cp, !known ? UNKNOWN : file.iq[i].empty() ? "NONE" : file.iq[i]);
+    }
+    output.status(settings, logs, iqs);
     return ES_OK;
 }
 

@@ -8,7 +8,13 @@
 int run_request(const Command& command, const Args& args, ControlConnection& connection,
                 const Output& output);
 
-// Asks every parameterless getter of the table and the log state of every CP.
+// As run_request, and asks afterwards whether the CPs are logged now: the service answers
+// OK also for one that it cannot log.
+int run_enable_log(const Command& command, const Args& args, ControlConnection& connection,
+                   const Output& output);
+
+// Asks every parameterless getter of the table and the log state of every CP. What no
+// request tells comes from the settings file; UNKNOWN when that cannot be read.
 int run_status(const Command& command, const Args& args, ControlConnection& connection,
                const Output& output);
 

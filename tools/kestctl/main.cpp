@@ -43,8 +43,9 @@ void print_help() {
         "\n\nExit status:\n"
         "  %2d  done\n  %2d  wrong usage, nothing was sent\n  %2d  no connection\n"
         "  %2d  no reply in time\n  %2d  unexpected reply, or the connection was closed\n"
-        "  %2d  the result could not be written\n",
-        ES_OK, ES_USAGE, ES_NO_CONNECTION, ES_TIMEOUT, ES_BAD_REPLY, ES_OUTPUT);
+        "  %2d  the result could not be written\n  %2d  enable-log: a CP is not logged all the "
+        "same\n",
+        ES_OK, ES_USAGE, ES_NO_CONNECTION, ES_TIMEOUT, ES_BAD_REPLY, ES_OUTPUT, ES_STILL_OFF);
     for (int code = 1; code <= MAX_ERROR_CODE; ++code) {
         printf("  %2d  error %d: %s\n", ES_SERVICE_ERROR + code, code, error_meaning(code));
     }
