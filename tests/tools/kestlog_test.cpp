@@ -140,6 +140,15 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         {WCN + "1-cp_gnss-2016-02-01_00-00-00.log", "x", "name", true, -1},
         {WCN + "1-cp_wcn-2016-02-01_24-00-00.log", "x", "name", true, -1},
         {WCN + "x\x1b[2J\"", "x", "name", true, -1},
+        {WCN + "0-cp_wcn-" + STAMP + ".log.bak", "x", "name", true, -1},
+        {WCN + "0-cp_wcn-" + STAMP + "-01.log", "x", "name", true, -1},
+        {WCN + "0-cp_wcn-" + STAMP + "-1.log", "x", "double", false, -1},
+        {"modem_log/System Volume Information/x", "x", "foreign", false, -1},
+        {SET + ".DS_Store", "x", "foreign", false, -1},
+        {WCN + "._0-cp_wcn-" + STAMP + ".log", "x", "foreign", false, -1},
+        {WCN + "THUMBS.DB", "x", "foreign", false, -1},
+        {SET + "LOST.DIR/x", "x", "foreign", false, -1},
+        {WCN + "desktop.ini", "x", "foreign", false, -1},
         {WCN + "0-cp_wcn-2016-03-01_09-15-01.log", "x", "double", true, -1},
         {WCN + "2-cp_wcn-2016-03-01_09-00-00.log", "x", "gap", false, -1},
         {WCN + "1-cp_wcn-2016-04-01_00-00-00.log", "x", "order", false, -1},
@@ -180,6 +189,20 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         rmdir(m_root.path(c.file.substr(0, c.file.rfind('/'))).c_str());
     }
     write_good_tree();
+    // What one command takes for a log file the other does too.
+    write(WCN + "2-cp_wcn-2016-03-01_09-00-00.log", "x");
+    write(WCN + "6-cp_wcn-2016-03-01_08-00-00-2.log", "x");
+    write(WCN + "1-cp_wcn-2016-03-01_09-00-00.log~", "x");
+    EXPECT_EQ(run("verify " + WCN), 3);
+    EXPECT_TRUE(said("note: number 1 is missing\n") && said("note: numbers 3 to 5 are missing\n"));
+    EXPECT_EQ(run("ls --json " + WCN), 0);
+    EXPECT_TRUE(said("-00-2.log\",\"kind\":\"log\",\"number\":6,")) << m_out;
+    EXPECT_TRUE(said(".log~\",\"kind\":\"unknown\",\"size\"")) << m_out;
+    for (const char* name :
+         {"2-cp_wcn-2016-03-01_09-00-00.log", "6-cp_wcn-2016-03-01_08-00-00-2.log",
+          "1-cp_wcn-2016-03-01_09-00-00.log~"}) {
+        unlink(m_root.path(WCN + name).c_str());
+    }
     m_root.write_file(MODEM_DUMP, frame("in progress"));  // just now
     ASSERT_EQ(symlink("/dev/zero", m_root.path(WCN + "smsg_" + STAMP + ".log").c_str()), 0);
     EXPECT_EQ(run("verify ."), 3);

@@ -2,6 +2,7 @@
 
 #include <stdio.h>
 #include <string.h>
+#include <strings.h>
 
 #include <algorithm>
 
@@ -73,21 +74,25 @@ bool cut_number(std::string* text, uint32_t* number) {
     return exact;
 }
 
-// Takes the time off the end; behind it may stand the "-N" of a file that was set aside for
-// a younger one of the same second.
-bool cut_stamp(std::string* text, bool may_be_aside, LogTime* time) {
+// Takes the time off the end.
+bool cut_stamp(std::string* text, LogTime* time) {
     const std::string last = text->substr(text->size() - std::min(text->size(), STAMP_LEN));
-    if (parse_stamp(last, time) && stamp(*time, '_', '-') == last) {
-        text->resize(text->size() - STAMP_LEN);
-        return true;
+    if (!parse_stamp(last, time) || stamp(*time, '_', '-') != last) {
+        return false;
     }
+    text->resize(text->size() - STAMP_LEN);
+    return true;
+}
+
+// Takes the "-N" off the end: of a file that was set aside for a younger namesake.
+bool cut_aside(std::string* text) {
     const size_t dash = text->find_last_not_of("0123456789");
-    if (!may_be_aside || dash == std::string::npos || dash + 1 == text->size() ||
-        (*text)[dash] != '-') {
+    if (dash == std::string::npos || (*text)[dash] != '-' || dash + 1 == text->size() ||
+        (*text)[dash + 1] == '0') {
         return false;
     }
     text->resize(dash);
-    return cut_stamp(text, false, time);
+    return true;
 }
 
 bool match(const Form& form, FileName* name) {
@@ -96,14 +101,19 @@ bool match(const Form& form, FileName* name) {
     if (!cut_tail(&rest, form.tail)) {
         return false;
     }
-    if (form.stamp && !cut_stamp(&rest, form.type != LT_LOG, &time)) {
-        return false;
+    bool aside = false;
+    if (form.stamp && !cut_stamp(&rest, &time)) {
+        aside = cut_aside(&rest);
+        if (!aside || !cut_stamp(&rest, &time)) {
+            return false;
+        }
     }
     uint32_t number = 0;
     if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &number)) ||
         (form.cp ? cp_type_of(rest) == CT_UNKNOWN : !rest.empty())) {
         return false;
     }
+    name->aside = aside;
     name->type = form.type;
     name->kind = form.kind;
     name->cp = rest;
@@ -128,18 +138,17 @@ FileName::FileName(const std::string& name) : text(name) {
             return;
         }
     }
-    // Not ours, yet the service takes it for something.
-    type = parse_log_name(name.data(), name.size(), time);
-    for (const Form& form : FORMS) {
-        if (form.type == type) {
-            kind = form.kind;
-            break;
-        }
-    }
-    size_t digits;
-    if (is_log() && parse_log_number(android::String8(name.c_str()), number, digits) < 0) {
-        type = LT_UNKNOWN;
-    }
+}
+
+bool is_foreign_name(const std::string& name) {
+    static const char* const NAMES[] = {
+        ".DS_Store",   ".Trashes",  ".fseventsd", ".Spotlight-V100",           "$RECYCLE.BIN",
+        "desktop.ini", "Thumbs.db", "LOST.DIR",   "System Volume Information", "lost+found",
+    };
+    return name.compare(0, 2, "._") == 0 ||
+           std::any_of(std::begin(NAMES), std::end(NAMES), [&](const char* foreign) {
+               return strcasecmp(foreign, name.c_str()) == 0;  // as on a FAT
+           });
 }
 
 bool has_time(const LogTime& time) {

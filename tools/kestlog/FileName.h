@@ -1,5 +1,6 @@
 // What the name of a file of the log tree tells. The service's own parsers take a name
-// for what it may be, here it has to be exactly one that the service gives.
+// for what it may be, here it has to be exactly one that the service gives: any other
+// name tells nothing.
 #ifndef KESTLOG_FILENAME_H_
 #define KESTLOG_FILENAME_H_
 
@@ -20,6 +21,7 @@ struct FileName {
 
     std::string text;
     bool exact = false;  // the name is one that the service gives
+    bool aside = false;  // with the "-N" of one that was set aside for a namesake
     LogType type = LT_UNKNOWN;
     const char* kind = "unknown";  // in words; a memory dump and its substitute differ
     bool framed_dump = false;      // a memory dump as it came over the diag device
@@ -32,6 +34,9 @@ struct FileName {
 bool has_time(const LogTime& time);
 // "2016-03-01 09:15:00", or "-" without a time.
 std::string time_text(const LogTime& time);
+
+// What a PC leaves on every card, files and directories.
+bool is_foreign_name(const std::string& name);
 
 // Is the name that of a set directory? Stores its time.
 bool parse_set_name(const std::string& name, LogTime* time);

@@ -74,7 +74,7 @@ public:
         const bool raw = strcmp(m_name.kind, "memory copy") == 0 || m_name.type == LT_MINI_DUMP ||
                          m_name.type == LT_IPC_INFO || m_name.type == LT_WCDMA_IQ ||
                          m_name.text == DATABASE_NAME ||
-                         (m_name.type == LT_DUMP && m_name.exact && !m_name.framed_dump);
+                         (m_name.type == LT_DUMP && !m_name.framed_dump);
         m_report.chunked = is_chunked(m_in, m_name);
         if (got == 0 || raw) {
             return;

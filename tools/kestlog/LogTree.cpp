@@ -13,35 +13,6 @@
 
 namespace {
 
-struct Entry {
-    std::string name;
-    bool dir;
-    bool file;
-    uint64_t size;
-};
-
-// The entries of a directory by name; false, with a failure, when it cannot be read.
-bool list_dir(const std::string& path, std::vector<Entry>* entries,
-              std::vector<std::string>* failures) {
-    DIR* dir = opendir(path.c_str());
-    if (!dir) {
-        failures->push_back(path + ": " + strerror(errno));
-        return false;
-    }
-    while (const struct dirent* entry = readdir(dir)) {
-        struct stat st;
-        if (strcmp(entry->d_name, ".") != 0 && strcmp(entry->d_name, "..") != 0 &&
-            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
-            entries->push_back({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
-                                static_cast<uint64_t>(st.st_size)});
-        }
-    }
-    closedir(dir);
-    std::sort(entries->begin(), entries->end(),
-              [](const Entry& a, const Entry& b) { return a.name < b.name; });
-    return true;
-}
-
 bool is_dir(const std::string& path) {
     struct stat st;
     return stat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
@@ -64,6 +35,30 @@ bool older(const TreeFile& a, const TreeFile& b) {
 
 }  // namespace
 
+bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
+    DIR* dir = opendir(path.c_str());
+    if (!dir) {
+        failures.push_back(path + ": " + strerror(errno));
+        return false;
+    }
+    while (const struct dirent* entry = readdir(dir)) {
+        struct stat st;
+        if (strcmp(entry->d_name, ".") == 0 || strcmp(entry->d_name, "..") == 0) {
+            continue;
+        }
+        if (is_foreign_name(entry->d_name)) {
+            foreign.push_back(path + "/" + entry->d_name);
+        } else if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
+            entries->push_back({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
+                                static_cast<uint64_t>(st.st_size)});
+        }
+    }
+    closedir(dir);
+    std::sort(entries->begin(), entries->end(),
+              [](const Entry& a, const Entry& b) { return a.name < b.name; });
+    return true;
+}
+
 bool LogTree::read(const std::string& path) {
     bool found = false;
     for (const char* below : {DIR_MODEM_LOG, DIR_KEST DIR_MODEM_LOG}) {
@@ -76,9 +71,10 @@ bool LogTree::read(const std::string& path) {
         return true;
     }
     std::vector<Entry> entries;
-    if (!list_dir(path, &entries, &failures)) {
+    if (!list_dir(path, &entries)) {
         return true;
     }
+    foreign.clear();  // the directory is read again below
     // The directory's own name tells what it is; of a copy, that of what lies in it.
     const std::string name = base_name(path);
     LogTime time;
@@ -108,7 +104,7 @@ bool LogTree::read(const std::string& path) {
 
 void LogTree::read_root(const std::string& path) {
     std::vector<Entry> entries;
-    list_dir(path, &entries, &failures);
+    list_dir(path, &entries);
     for (const Entry& entry : entries) {
         const std::string full = path + "/" + entry.name;
         LogTime time;
@@ -124,7 +120,7 @@ void LogTree::read_root(const std::string& path) {
 
 void LogTree::read_set(const std::string& path, const std::string& name) {
     std::vector<Entry> entries;
-    list_dir(path, &entries, &failures);
+    list_dir(path, &entries);
     sets.push_back({name, path, {}});
     for (const Entry& entry : entries) {
         if (entry.dir && cp_type_of(entry.name) != CT_UNKNOWN) {
@@ -137,7 +133,7 @@ void LogTree::read_set(const std::string& path, const std::string& name) {
 
 void LogTree::read_cp(const std::string& path, const std::string& name, TreeSet* set) {
     std::vector<Entry> entries;
-    list_dir(path, &entries, &failures);
+    list_dir(path, &entries);
     set->cps.push_back({name, path, {}});
     std::vector<TreeFile>& files = set->cps.back().files;
     for (const Entry& entry : entries) {

@@ -34,9 +34,20 @@ struct LogTree {
     std::vector<TreeFile> root_files;  // in the log roots themselves
     std::vector<TreeSet> sets;         // oldest first
     std::vector<std::string> strays;   // paths of what does not belong where it is
+    std::vector<std::string> foreign;  // paths of what a PC left there
     std::vector<std::string> failures;
 
 private:
+    struct Entry {
+        std::string name;
+        bool dir;
+        bool file;
+        uint64_t size;
+    };
+
+    // The entries of a directory by name, without foreign ones. False, with a failure, when
+    // it cannot be read.
+    bool list_dir(const std::string& path, std::vector<Entry>* entries);
     void read_root(const std::string& path);
     void read_set(const std::string& path, const std::string& name);
     void read_cp(const std::string& path, const std::string& name, TreeSet* set);

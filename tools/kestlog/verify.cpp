@@ -21,6 +21,9 @@ public:
         for (const std::string& path : tree.strays) {
             find(path, {true, "name", "does not belong here", -1});
         }
+        for (const std::string& path : tree.foreign) {
+            find(path, {false, "foreign", "left by a PC", -1});
+        }
         for (const TreeFile& file : tree.root_files) {
             content(file);
         }
@@ -89,7 +92,7 @@ private:
         const CpType type = cp_type_of(cp.name);
         for (const TreeFile& file : cp.files) {
             const FileName& name = file.name;
-            if (!name.exact || name.type == LT_UNKNOWN) {
+            if (name.type == LT_UNKNOWN) {
                 find(file.path, {true, "name", "no name that the service gives", -1});
             } else if (type != CT_UNKNOWN && name.cp_type != CT_UNKNOWN && name.cp_type != type) {
                 find(file.path, {true, "name", "the name of another CP", -1});
@@ -113,11 +116,12 @@ private:
         for (const TreeFile* log : logs) {
             const uint32_t number = log->name.number;
             if (newer && newer->name.number == number) {
-                find(log->path, {true, "double", "two log files with this number", -1});
+                // A file that was set aside keeps its number until the next renumbering.
+                const bool damage = !log->name.aside && !newer->name.aside;
+                find(log->path, {damage, "double", "two log files with this number", -1});
             } else if (number != due) {
                 // Trimming may take the file that has just been closed.
-                find(log->path,
-                     {false, "gap", "number " + std::to_string(due) + " is missing", -1});
+                find(log->path, {false, "gap", missing(due, number - 1), -1});
             }
             if (newer && newer->name.number < number && newer->name.time < log->name.time) {
                 find(log->path, {false, "order", "newer than a log file of a lower number", -1});
@@ -125,6 +129,12 @@ private:
             due = static_cast<uint64_t>(number) + 1;
             newer = log;
         }
+    }
+
+    static std::string missing(uint64_t first, uint64_t last) {
+        return first == last ? "number " + std::to_string(first) + " is missing"
+                             : "numbers " + std::to_string(first) + " to " + std::to_string(last) +
+                                   " are missing";
     }
 
     void content(const TreeFile& file) {
