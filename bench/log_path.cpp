@@ -51,6 +51,11 @@ constexpr double TARGET = 1.15;  // CPU of the service relative to cat
 constexpr uint64_t FILE_MIB = 5;
 constexpr int START_TIMEOUT_MS = 5000;
 
+// scripts/bench --help prints the same file.
+const char USAGE[] =
+#include "usage.txt"
+    ;
+
 struct Options {
     uint64_t mib = 1024;
     uint64_t kept_mib = 50;  // 0: everything
@@ -684,12 +689,7 @@ bool parse_options(int argc, char** argv, Options& options) {
 int main(int argc, char** argv) {
     Options options;
     if (!parse_options(argc, argv, options)) {
-        fprintf(stderr,
-                "usage: bench_log_path [--mib N] [--rounds N] [--kept MIB] [--block BYTES]\n"
-                "                      [--dir DIR] [--service PROGRAM] [--spread] [--strace]\n"
-                "--kept: how much each reader keeps on the file system; 0: everything\n"
-                "--spread: let writer and reader run on all CPUs instead of on one\n"
-                "--strace: count the service's system calls instead of measuring its CPU time\n");
+        fputs(USAGE, stderr);
         return 2;
     }
     if (options.service.empty()) {

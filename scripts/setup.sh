@@ -1,21 +1,88 @@
-# Sourced by the other scripts: installs the Debian packages that are missing.
-# kest_need PACKAGE...: says what it installs; does nothing when all are there.
+# shellcheck shell=bash
+# Sourced by the other scripts, with the checkout as the current directory: what they need,
+# and builds that show their progress in one line.
+
+# Whether there is what a Debian package brings. Looks for the tool itself, so that it also
+# tells on a system that has no such package.
+kest_has() {
+    case "$1" in
+        g++) command -v c++ >/dev/null ;;
+        clang) command -v clang++ >/dev/null ;;
+        libgtest-dev) echo '#include <gtest/gtest.h>' | c++ -E -x c++ - >/dev/null 2>&1 ;;
+        libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;
+        sanitizers) kest_links c++ address,undefined main && kest_links c++ thread main ;;
+        *) command -v "$1" >/dev/null ;;
+    esac
+}
+
+# kest_links COMPILER SANITIZERS FUNCTION: whether a program of that one function links.
+kest_links() {
+    local dir status=0
+    dir=$(mktemp -d) || return 1
+    echo "extern \"C\" { int $3() { return 0; } }" |
+        "$1" "-fsanitize=$2" -o "$dir/test" -x c++ - 2>/dev/null || status=1
+    rm -r "$dir"
+    return "$status"
+}
+
+# kest_need PACKAGE...: installs the Debian packages whose tools are missing and says which.
+# Where there is no apt-get it only says what is missing.
 kest_need() {
-    local missing=() pkg
+    local missing=() sudo=() pkg
     for pkg in "$@"; do
-        dpkg-query -W -f='${Status}' "$pkg" 2>/dev/null | grep -q 'ok installed' || missing+=("$pkg")
+        kest_has "$pkg" || missing+=("$pkg")
     done
     [ ${#missing[@]} -eq 0 ] && return 0
-    local sudo=()
+    if ! command -v apt-get >/dev/null; then
+        echo "Missing: ${missing[*]} (package names are Debian's). Install them, then run this again." >&2
+        return 1
+    fi
     if [ "$(id -u)" -ne 0 ]; then
-        command -v sudo >/dev/null 2>&1 || {
+        command -v sudo >/dev/null || {
             echo "These packages are missing: ${missing[*]}. Install them as root, then run this again." >&2
             return 1
         }
         sudo=(sudo)
     fi
+    # The sanitizers' libraries come with the compiler.
+    missing=("${missing[@]/#sanitizers/g++}")
     echo "Installing missing packages: ${missing[*]}"
     "${sudo[@]}" env DEBIAN_FRONTEND=noninteractive apt-get -q update
     "${sudo[@]}" env DEBIAN_FRONTEND=noninteractive \
         apt-get -q -y install --no-install-recommends "${missing[@]}"
+}
+
+# The percentages in what make prints, in one line.
+kest_progress() {
+    local line percent shown=-1
+    while IFS= read -r line; do
+        if [[ $line =~ ^\[\ *([0-9]+)% ]]; then
+            percent=$((BASH_REMATCH[1] / 10 * 10))
+            [ "$percent" -le "$shown" ] || {
+                shown=$percent
+                printf ' %d%%' "$percent"
+            }
+        fi
+    done
+    echo
+}
+
+# kest_build DIR TARGET CMAKE_OPTION...: configures and builds a directory; everything that
+# is printed goes to DIR/build.log and is shown when it fails.
+kest_build() {
+    local dir=$1 log=$1/build.log target=$2
+    shift 2
+    mkdir -p "$dir"
+    printf 'Building in %s:' "$dir"
+    if ! (
+        set -o pipefail
+        {
+            cmake -S . -B "$dir" "$@" &&
+                cmake --build "$dir" -j "$(nproc)" --target "$target"
+        } 2>&1 | tee "$log" | kest_progress
+    ); then
+        cat "$log" >&2
+        echo "The build in $dir failed; the messages above are in $log." >&2
+        return 1
+    fi
 }

@@ -80,11 +80,16 @@ int Demo::run() {
     if (handset.root().empty()) {
         return 1;
     }
-    // A root that this program made and never used is of no use to anybody.
-    if (m_options.remove || (!started && m_options.root.empty())) {
-        handset.remove_root();
-    } else {
+    // A root that this program made and never used is of no use to anybody; where a check
+    // failed there is something to look for.
+    const bool kept = m_options.keep || !m_options.root.empty() || (started && !good);
+    if (kept) {
         printf("Everything is in %s (remove it when done).\n", handset.root().c_str());
+    } else {
+        handset.remove_root();
+        if (started) {
+            printf("%s was removed; --keep keeps it.\n", handset.root().c_str());
+        }
     }
     return good ? 0 : 1;
 }

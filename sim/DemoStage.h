@@ -27,7 +27,7 @@ struct DemoOptions {
     unsigned rate = 500;  // KB/s for each CP
     bool sd = true;       // the SD card comes and goes
     bool fast = false;    // the scenes do not take their time
-    bool remove = false;  // remove the root at the end
+    bool keep = false;    // do not remove the root at the end
     std::string reader;   // the program kestlog; empty: the logs are not read with it
 };
 
@@ -36,7 +36,8 @@ public:
     // The options must outlive the stage. *interrupted becomes other than 0 to end early.
     DemoStage(const DemoOptions& options, const volatile sig_atomic_t* interrupted);
 
-    // Makes the handset and starts the service; says why on failure.
+    // Makes the handset and starts the service; says why on failure, before anything is
+    // made when there is no room for it.
     bool set_up();
     // Ends everything but the handset's root. The logs can be checked afterwards.
     void take_down();
@@ -105,6 +106,7 @@ public:
 
 private:
     bool fail(const std::string& text);
+    bool has_room();
     void step();
     void feed(double seconds);
     void watch();

@@ -38,15 +38,20 @@ bool ServiceProcess::start(const std::string& program, const SimHandset& handset
     std::vector<std::string> env = {"KESTMODEM_ROOT=" + handset.root(),
                                     "EXTERNAL_STORAGE=" + handset.sd_root(),
                                     "SECONDARY_STORAGE=" + handset.sd_root()};
+    int library = -1;
     if (handset.needs_drivers()) {
         std::error_code ec;
-        const std::string library = std::filesystem::read_symlink("/proc/self/exe", ec)
-                                        .replace_filename("libkestsim_devices.so")
-                                        .string();
-        if (access(library.c_str(), R_OK) != 0) {
+        const std::string path = std::filesystem::read_symlink("/proc/self/exe", ec)
+                                     .replace_filename("libkestsim_devices.so")
+                                     .string();
+        library = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+        if (library < 0) {
             return false;
         }
-        env.push_back(extended_variable("LD_PRELOAD", library, ":"));
+        // LD_PRELOAD separates at blanks and colons, which the path may have; a descriptor
+        // that the service inherits has neither.
+        const std::string inherited = "/proc/self/fd/" + std::to_string(library);
+        env.push_back(extended_variable("LD_PRELOAD", inherited, ":"));
         // A build with the address sanitizer wants its own library in front.
         env.push_back(extended_variable("ASAN_OPTIONS", "verify_asan_link_order=0", ":"));
     }
@@ -80,9 +85,15 @@ bool ServiceProcess::start(const std::string& program, const SimHandset& handset
         if (getppid() == parent && log >= 0 && dup2(log, STDOUT_FILENO) >= 0 &&
             dup2(log, STDERR_FILENO) >= 0) {
             close(log);
+            if (library >= 0) {
+                fcntl(library, F_SETFD, 0);
+            }
             execve(program.c_str(), argv.data(), envp.data());
         }
         _exit(127);
+    }
+    if (library >= 0) {
+        close(library);
     }
     return m_pid > 0;
 }

@@ -1,5 +1,6 @@
 #include "sim/SharedFile.h"
 
+#include <errno.h>
 #include <fcntl.h>
 #include <sys/mman.h>
 #include <unistd.h>
@@ -12,11 +13,15 @@ bool SharedFile::create(const std::string& path, size_t size) {
     }
     m_path = path;
     void* data = MAP_FAILED;
-    if (ftruncate(fd, static_cast<off_t>(size)) == 0) {
+    // With its blocks: a write through the mapping that finds no room would be a bus error.
+    errno = posix_fallocate(fd, 0, static_cast<off_t>(size));
+    if (errno == 0) {
         data = mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
     }
+    const int error = errno;
     close(fd);
     if (data == MAP_FAILED) {
+        errno = error;
         return false;
     }
     m_data = static_cast<uint8_t*>(data);

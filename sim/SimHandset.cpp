@@ -69,12 +69,16 @@ bool SimHandset::fail(const std::string& what) {
     return false;
 }
 
+std::string SimHandset::temp_dir() {
+    const char* tmp = getenv("TMPDIR");
+    return tmp && *tmp ? tmp : "/tmp";
+}
+
 bool SimHandset::create(const std::string& dir, const SimSizes& sizes) {
     m_sizes = sizes;
     std::error_code ec;
     if (dir.empty()) {
-        const char* tmp = getenv("TMPDIR");
-        std::string made = std::string(tmp && *tmp ? tmp : "/tmp") + "/kestsim.XXXXXX";
+        std::string made = temp_dir() + "/kestsim.XXXXXX";
         if (!mkdtemp(made.data())) {
             return fail("cannot make " + made);
         }

@@ -52,8 +52,11 @@ public:
     SimHandset(const SimHandset&) = delete;
     SimHandset& operator=(const SimHandset&) = delete;
 
+    // Where new roots are made: $TMPDIR or /tmp.
+    static std::string temp_dir();
+
     // Makes the root: the given directory, which must be absent or empty, or a new one
-    // below $TMPDIR or /tmp. Starts the time service. False with error() set on failure.
+    // in temp_dir(). Starts the time service. False with error() set on failure.
     bool create(const std::string& dir, const SimSizes& sizes = SimSizes());
     // Adds a CP ("cp_wcdma", "cp_wcn", ...): its devices, properties and the line in the
     // default configuration. The handset owns it. Null with error() set on failure. With

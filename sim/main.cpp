@@ -18,26 +18,10 @@ void on_signal(int) {
     s_interrupted = 1;
 }
 
+// scripts/demo --help prints the same file.
 const char USAGE[] =
-    "usage: kestsim [options]\n"
-    "Runs the service kestmodem on a simulated handset: a modem, a connectivity chip, a GNSS\n"
-    "receiver and an audio DSP stream their logs while the SD card comes and goes, CPs crash,\n"
-    "I/Q samples are captured and a client asks for this and that. Shows the progress and\n"
-    "the resulting tree and checks that no byte was lost or doubled and that everything\n"
-    "asked for came.\n"
-    "\n"
-    "  --kestmodem PATH  the service's program (default: the one beside this program)\n"
-    "  --kestlog PATH    the program that reads the logs at the end (default: the one beside\n"
-    "                    this program, if it is there)\n"
-    "  --root DIR        root of the handset, absent or empty (default: a new one in /tmp)\n"
-    "  --seconds N       length of the run (default 60), longer if the scenes need it\n"
-    "  --rate KB         KB/s from each CP (default 500)\n"
-    "  --fast            a run of 12 seconds at 2000 KB/s, with short scenes\n"
-    "  --sd, --no-sd     whether the SD card comes and goes (default: it does)\n"
-    "  --rm              remove the root at the end\n"
-    "  --help            this text\n"
-    "\n"
-    "Exit status: 0 all checks passed, nothing lost or doubled, 1 otherwise, 2 wrong options.\n";
+#include "sim/usage.txt"
+    ;
 
 enum Option {
     OPT_PROGRAM = 1,
@@ -48,7 +32,7 @@ enum Option {
     OPT_FAST,
     OPT_SD,
     OPT_NO_SD,
-    OPT_RM,
+    OPT_KEEP,
     OPT_HELP
 };
 
@@ -61,7 +45,7 @@ const option OPTIONS[] = {
     {"fast", no_argument, nullptr, OPT_FAST},
     {"sd", no_argument, nullptr, OPT_SD},
     {"no-sd", no_argument, nullptr, OPT_NO_SD},
-    {"rm", no_argument, nullptr, OPT_RM},
+    {"keep", no_argument, nullptr, OPT_KEEP},
     {"help", no_argument, nullptr, OPT_HELP},
     {nullptr, 0, nullptr, 0},
 };
@@ -106,8 +90,8 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
             case OPT_NO_SD:
                 options.sd = opt == OPT_SD;
                 break;
-            case OPT_RM:
-                options.remove = true;
+            case OPT_KEEP:
+                options.keep = true;
                 break;
             case OPT_HELP:
                 fputs(USAGE, stdout);
@@ -149,6 +133,7 @@ int main(int argc, char** argv) {
     action.sa_flags = static_cast<int>(SA_RESETHAND);  // a second Ctrl-C ends at once
     sigaction(SIGINT, &action, nullptr);
     sigaction(SIGTERM, &action, nullptr);
+    sigaction(SIGHUP, &action, nullptr);  // the terminal was closed: still clear up
     signal(SIGPIPE, SIG_IGN);
     return Demo(options, &s_interrupted).run();
 }
