@@ -1,41 +1,18 @@
 #include "kestctl/SettingsFile.h"
 
 #include <errno.h>
-#include <fcntl.h>
 #include <stdio.h>
 #include <string.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include "config/LogConfig.h"
 #include "config/config_text.h"
+#include "core/open_file.h"
 #include "core/system_paths.h"
-
-namespace {
-
-// Opens a regular file; anything else could keep the reader waiting. Null with errno.
-FILE* open_regular(const char* path) {
-    const int fd = open(path, O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
-    struct stat st;
-    if (fd >= 0 && fstat(fd, &st) == 0) {
-        if (S_ISREG(st.st_mode)) {
-            return fdopen(fd, "r");
-        }
-        errno = EINVAL;
-    }
-    const int saved_errno = errno;
-    if (fd >= 0) {
-        close(fd);
-    }
-    errno = saved_errno;
-    return nullptr;
-}
-
-}  // namespace
 
 bool FileSettings::read(std::string* reason) {
     const android::String8 path = system_path(PATH_CONFIG_FILE);
-    FILE* const file = open_regular(path.string());
+    const int fd = open_to_read(path.string(), Links::FOLLOW);
+    FILE* const file = fd < 0 ? nullptr : fdopen(fd, "r");
     bool good = file != nullptr;
     if (good) {
         char line[CONFIG_LINE_SIZE];
