@@ -183,6 +183,35 @@ TEST_F(CpDirectoryTest, NumbersStayInOrder) {
     EXPECT_EQ("stranger", m_root.read_file(DIR_REL + log_name(3, "09-15-04")));
 }
 
+// Bytes that a file cannot write out as it goes have left the totals with the file already.
+TEST_F(CpDirectoryTest, FilesThatGoAreCountedOnce) {
+    put(DIR_REL + "a", 5ll << 30);
+    start();
+    m_dir->remove_file(*m_dir->files().begin());
+    check_sums(internal());
+    faults::fail(faults::WRITE, 1, ENOSPC, 1000);
+    for (int way = 0; way < 3; ++way) {
+        m_dir->create_file("open.dmp", LT_DUMP)->write("12345", 5);
+        if (way == 0) {
+            EXPECT_EQ(5u, m_set->trim(1));
+            internal().dec_size(5);  // as MediaStorage::trim does
+        } else if (way == 1) {
+            m_dir->remove_file(*m_dir->files().begin());
+        } else {
+            m_set->remove();
+            bool new_dir = false;
+            m_set->create();
+            m_set->prepare_cp_dir("cp_wcn", new_dir);
+            EXPECT_EQ(0u, m_set->size());
+            EXPECT_EQ(5u, internal().size());  // uncertain for now
+            break;
+        }
+        check_sums(internal());
+        bool new_dir = false;
+        m_dir = m_set->prepare_cp_dir("cp_wcn", new_dir);
+    }
+}
+
 TEST_F(CpDirectoryTest, TrimTakesWholeFilesFromTheFront) {
     const struct {
         uint64_t wanted;
