@@ -105,7 +105,7 @@ const char* cp_diag_prop(CpType type) {
 }
 
 const char* cp_mem_path(CpType type) {
-    return find_cell(&CpInfo::mem_path, type, nullptr);
+    return find_cell(&CpInfo::mem_path, type, PATH_CPTL_MEM);
 }
 
 const char* cp_mini_dump_path(CpType type) {

@@ -37,8 +37,8 @@ const char* cp_type_to_request_name(CpType type);  // control requests
 const char* cp_log_prop(CpType type);
 const char* cp_diag_prop(CpType type);
 
-// Kernel file with the modem's memory; null for a CP without one. Fixed path: pass it
-// through system_path() before use.
+// Kernel file with the modem's memory; null for a CP without one (a value that is no concrete
+// CP is taken for a modem). Fixed path: pass it through system_path() before use.
 const char* cp_mem_path(CpType type);
 
 // Kernel file with the mini dump; never null. Fixed path, as above.
