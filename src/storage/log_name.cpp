@@ -102,10 +102,12 @@ bool LogTime::operator<(const LogTime& other) const {
 
 LogType parse_log_name(const char* name, size_t len, LogTime& time) {
     if (len > 0 && digits_at(name, 1)) {
-        uint32_t number;
-        size_t digits;
-        if (parse_leading_number(reinterpret_cast<const uint8_t*>(name), len, number, digits) < 0 ||
-            digits == len || name[digits] != '-') {
+        // A run of any length: a number too large to be raised is still a log file's.
+        size_t digits = 1;
+        while (digits < len && digits_at(name + digits, 1)) {
+            ++digits;
+        }
+        if (digits == len || name[digits] != '-') {
             return LT_UNKNOWN;
         }
         return find_timestamp(name + digits + 1, len - digits - 1, time) ? LT_LOG : LT_UNKNOWN;
