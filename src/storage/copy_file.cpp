@@ -1,10 +1,12 @@
 #include "storage/copy_file.h"
 
+#include <errno.h>
 #include <fcntl.h>
 #include <stddef.h>
 #include <unistd.h>
 
 #include "core/log.h"
+#include "core/open_file.h"
 
 namespace {
 
@@ -17,7 +19,9 @@ int copy_content(int src_fd, int dst_fd) {
         if (n <= 0) {
             return static_cast<int>(n);
         }
-        if (write(dst_fd, buf, static_cast<size_t>(n)) != n) {
+        const ssize_t written = write(dst_fd, buf, static_cast<size_t>(n));
+        if (written != n) {
+            errno = written < 0 ? errno : ENOSPC;
             return -1;
         }
     }
@@ -26,19 +30,21 @@ int copy_content(int src_fd, int dst_fd) {
 }  // namespace
 
 int copy_file(const char* src, const char* dst) {
-    const int src_fd = open(src, O_RDONLY | O_CLOEXEC);
+    const int src_fd = open_to_read(src, Links::FOLLOW);
     if (src_fd < 0) {
         err_log("open source file %s failed", src);
         return -1;
     }
-    const int dst_fd = open(dst, O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
+    const int dst_fd = open_to_write(dst, O_WRONLY | O_CREAT | O_TRUNC, Links::FOLLOW);
     if (dst_fd < 0) {
         err_log("open dest file %s failed", dst);
         close(src_fd);
         return -1;
     }
     const int result = copy_content(src_fd, dst_fd);
+    const int error = errno;
     close(dst_fd);
     close(src_fd);
+    errno = error;
     return result;
 }

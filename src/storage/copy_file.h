@@ -3,8 +3,9 @@
 #define STORAGE_COPY_FILE_H_
 
 // Copies the whole file src to dst, which is created with mode 0644 or truncated. Both
-// paths are used as given. 0, or -1: a file that cannot be opened is logged; after a read
-// or write error the part already written stays in dst. Not reentrant (static buffer).
+// paths are used as given. 0, or -1 with errno: what cannot be opened, or is no regular
+// file, is logged; after a read or write error, which is not, the part already written stays
+// in dst. Not reentrant (static buffer).
 int copy_file(const char* src, const char* dst);
 
 #endif  // STORAGE_COPY_FILE_H_

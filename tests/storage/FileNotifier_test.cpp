@@ -14,6 +14,7 @@
 #include "core/Multiplexer.h"
 #include "core/system_paths.h"
 #include "storage/copy_file.h"
+#include "storage/faults.h"
 #include "support/TestRoot.h"
 
 namespace {
@@ -91,11 +92,18 @@ TEST(CopyFile, CopiesOrFails) {
         EXPECT_EQ(content, root.read_file("data/dst")) << len;
     }
     // Errors of reading and writing end the copy silently.
-    EXPECT_EQ(-1, copy("data", "data/new"));  // a directory cannot be read
-    EXPECT_EQ(-1, copy_file(root.path("data/src").c_str(), "/dev/full"));
+    EXPECT_EQ(-1, copy_file("/proc/self/mem", root.path("data/new").c_str()));
+    EXPECT_EQ(EIO, errno);
+    faults::shorten(faults::WRITE, 5);
+    EXPECT_EQ(-1, copy("data/src", "data/new"));
+    EXPECT_EQ(ENOSPC, errno);
+    EXPECT_EQ(content.substr(0, 5), root.read_file("data/new"));
     EXPECT_EQ("", log.text());
-    // Those of opening are logged.
+    // Those of opening are logged, and nothing but a file is opened.
     EXPECT_EQ(-1, copy("data/none", "data/dst"));
+    ASSERT_EQ(0, mkfifo(root.path("data/fifo").c_str(), 0600));
+    EXPECT_EQ(-1, copy("data/fifo", "data/dst"));
+    EXPECT_TRUE(log.has("/data/fifo failed [22("));
     EXPECT_EQ(content, root.read_file("data/dst"));
     EXPECT_TRUE(log.has("int copy_file(const char*, const char*): open source file " +
                         root.path("data/none") + " failed [2(No such file or directory)]\n"));
