@@ -1,7 +1,6 @@
 #include "config/KestConfig.h"
 
-#include <stdio.h>
-
+#include "config/ConfigReader.h"
 #include "config/config_text.h"
 #include "core/log.h"
 
@@ -14,18 +13,20 @@ KestConfig::~KestConfig() {
 }
 
 int KestConfig::read_config(const char* path) {
-    FILE* file = fopen(path, "rte");
-    if (!file) {
+    ConfigReader reader;
+    if (reader.open(path) < 0) {
         err_log("can not open %s", path);
         return -1;
     }
-    char line[CONFIG_LINE_SIZE];
-    for (int number = 1; fgets(line, sizeof line, file); ++number) {
+    while (const char* line = reader.next_line()) {
         if (parse_line(line) < 0) {
-            err_log("Invalid line: %d\n", number);
+            err_log("Invalid line: %d\n", reader.line_number());
         }
     }
-    fclose(file);
+    if (reader.failed()) {
+        err_log("can not open %s", path);
+        return -1;
+    }
     if (!m_enable) {
         for (StreamEntry* entry : m_streams) {
             entry->enable = false;

@@ -22,7 +22,7 @@ public:
 
     // Reads the file at path, used as given. Malformed stream lines are logged and skipped.
     // Without the global "enable" line every entry comes out disabled. Returns -1 when the
-    // file cannot be opened.
+    // file cannot be opened or read to its end.
     int read_config(const char* path);
 
     // In file order, a CP named twice included: the later entry decides. Owned here.

@@ -1,17 +1,16 @@
 #include "config/LogConfig.h"
 
 #include <cutils/properties.h>
-#include <errno.h>
-#include <fcntl.h>
 #include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
+#include "config/ConfigReader.h"
 #include "config/config_text.h"
 #include "config/property_names.h"
+#include "config/settings_file.h"
 #include "core/log.h"
 #include "core/system_paths.h"
-#include "storage/copy_file.h"
 
 using android::String8;
 
@@ -51,31 +50,34 @@ int LogConfig::read_config(int argc, char** argv) {
 
     get_sd_root();
 
-    FILE* file = open_settings();
-    if (!file) {
+    ConfigReader reader;
+    if (open_settings(reader) < 0) {
         err_log("can not open %s", m_config_file.string());
         return -1;
     }
-    char line[CONFIG_LINE_SIZE];
-    for (int number = 1; fgets(line, sizeof line, file); ++number) {
+    while (const char* line = reader.next_line()) {
         if (parse_line(line) < 0) {
-            err_log("invalid line: %d\n", number);
+            err_log("invalid line: %d\n", reader.line_number());
         }
     }
+    if (reader.failed()) {
+        // With half of the settings the next change would write the file without the rest.
+        err_log("can not open %s", m_config_file.string());
+        return -1;
+    }
     propget_wan_modem_type();
-    fclose(file);
     return 0;
 }
 
-// The settings file for reading, put in place from the system default if need be.
-FILE* LogConfig::open_settings() const {
-    FILE* file = fopen(m_config_file.string(), "rte");
-    if (!file) {
-        const String8 default_file = system_path(PATH_DEFAULT_CONFIG_FILE);
-        copy_file(default_file.string(), m_config_file.string());
-        file = fopen(m_config_file.string(), "rte");
+// Opens the settings file, put in place from the system default if need be.
+int LogConfig::open_settings(ConfigReader& reader) const {
+    const char* const file = m_config_file.string();
+    const String8 default_file = system_path(PATH_DEFAULT_CONFIG_FILE);
+    if (!is_unfinished_copy(file, default_file.string()) && reader.open(file) == 0) {
+        return 0;
     }
-    return file;
+    copy_default_settings(default_file.string(), file);
+    return reader.open(file);
 }
 
 int LogConfig::parse_line(const char* line) {
@@ -189,31 +191,34 @@ int LogConfig::iq_type_from_name(const void* text, size_t len) {
 }
 
 int LogConfig::save() {
-    // Not by fopen alone: the service runs without a file-creation mask, and a file that
-    // was deleted meanwhile must not come back writable for everybody.
-    const int fd = open(m_config_file.string(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
-    FILE* file = fd < 0 ? nullptr : fdopen(fd, "w+");
-    if (!file) {
+    // What cannot be written now is pending, also for a caller that changed nothing: the file
+    // may have suffered.
+    m_dirty = true;
+    if (put_settings(m_config_file.string(), file_text()) < 0) {
         return -1;
     }
-    fprintf(file, "minidump %s\t%s\n", m_md ? "enable" : "disable",
-            m_md_int_stor ? "internal" : "external");
-    fprintf(file, "log_file_size %u\n", m_log_file_size);
-    fprintf(file, "data_log_size %u\n", m_data_log_size);
-    fprintf(file, "sd_log_size %u\n", m_sd_log_size);
-    fprintf(file, "log_overwrite %s\n\n", m_log_overwrite ? "enable" : "disable");
-    for (const IqEntry* entry : m_iqs) {
-        fprintf(file, "iq %s %s%s\n", cp_type_to_name(entry->type), entry->gsm ? "GSM " : "",
-                entry->wcdma ? "WCDMA" : "");
-    }
-    fputs("\n#Type\tName\tState\tSize\tLevel\n", file);
-    for (const ConfigEntry* entry : m_streams) {
-        fprintf(file, "stream\t%s\t%s\t%u\t%u\n", entry->name.string(),
-                entry->enable ? "on" : "off", entry->size, entry->level);
-    }
-    fclose(file);
     m_dirty = false;
     return 0;
+}
+
+String8 LogConfig::file_text() const {
+    String8 text;
+    text.appendFormat("minidump %s\t%s\n", m_md ? "enable" : "disable",
+                      m_md_int_stor ? "internal" : "external");
+    text.appendFormat("log_file_size %u\n", m_log_file_size);
+    text.appendFormat("data_log_size %u\n", m_data_log_size);
+    text.appendFormat("sd_log_size %u\n", m_sd_log_size);
+    text.appendFormat("log_overwrite %s\n\n", m_log_overwrite ? "enable" : "disable");
+    for (const IqEntry* entry : m_iqs) {
+        text.appendFormat("iq %s %s%s\n", cp_type_to_name(entry->type), entry->gsm ? "GSM " : "",
+                          entry->wcdma ? "WCDMA" : "");
+    }
+    text.append("\n#Type\tName\tState\tSize\tLevel\n");
+    for (const ConfigEntry* entry : m_streams) {
+        text.appendFormat("stream\t%s\t%s\t%u\t%u\n", entry->name.string(),
+                          entry->enable ? "on" : "off", entry->size, entry->level);
+    }
+    return text;
 }
 
 template <typename T>

@@ -10,11 +10,12 @@
 
 #include <stddef.h>
 #include <stdint.h>
-#include <stdio.h>
 #include <utils/List.h>
 #include <utils/String8.h>
 
 #include "config/CpType.h"
+
+class ConfigReader;
 
 class LogConfig {
 public:
@@ -43,12 +44,14 @@ public:
     LogConfig& operator=(const LogConfig&) = delete;
 
     // Reads the command line, the SD card's root, the settings file (first copied from the
-    // system default when it cannot be opened) and the modem type. Invalid lines are
-    // logged and skipped. Returns -1 on an unknown option or when no file can be opened.
+    // system default when it cannot be opened, is empty or an unfinished copy) and the modem
+    // type. Invalid lines are logged and skipped. Returns -1 on an
+    // unknown option and when no file can be opened or it cannot be read to its end.
     int read_config(int argc, char** argv);
 
     // Rewrites the settings file in place and clears dirty(). Returns -1, with the settings
-    // still dirty, when the file cannot be opened; the caller logs.
+    // dirty, when the file cannot be opened or written; the caller logs. What the file has
+    // then, and after a kill, tells settings_file.h.
     int save();
 
     // True when a setting has changed since the file was last written.
@@ -101,7 +104,8 @@ public:
                       android::String8& diag_path);
 
 private:
-    FILE* open_settings() const;
+    int open_settings(ConfigReader& reader) const;  // 0, or -1 with errno
+    android::String8 file_text() const;             // the settings as save() writes them
     // The parsers of one line: 0, or -1 when the line is invalid.
     int parse_line(const char* line);
     int parse_stream_line(const char* rest);

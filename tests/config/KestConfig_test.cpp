@@ -1,6 +1,8 @@
 #include "config/KestConfig.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <string>
 
@@ -28,9 +30,15 @@ TEST(KestConfigTest, ReadsStreamsAndTheGlobalSwitch) {
     };
     TestRoot root;
     LogCapture log;
-    const std::string missing = root.path("none.conf");
-    EXPECT_EQ(KestConfig().read_config(missing.c_str()), -1);
-    EXPECT_TRUE(log.has("int KestConfig::read_config(const char*): can not open " + missing));
+    // Missing, nothing to read to an end, and read with an error.
+    ASSERT_EQ(mkfifo(root.path("fifo").c_str(), 0600), 0);
+    ASSERT_EQ(symlink("/proc/self/mem", root.path("eio").c_str()), 0);
+    for (const std::string file : {"none [2(", "fifo [22(", "data [21(", "eio [5("}) {
+        const std::string path = root.path(file.substr(0, file.find(' ')));
+        EXPECT_EQ(KestConfig().read_config(path.c_str()), -1);
+        EXPECT_TRUE(
+            log.has("int KestConfig::read_config(const char*): can not open " + root.path(file)));
+    }
     for (const auto& c : CASES) {
         SCOPED_TRACE(c.text);
         root.write_file("kest.conf", c.text);

@@ -1,0 +1,174 @@
+// The settings file through kills, faults and whatever stands in its place.
+#include <errno.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "config/ConfigFixture.h"
+
+namespace {
+
+// Called before each call that changes the file. False: it fails.
+std::function<bool()> s_before_change;
+size_t s_most = SIZE_MAX;  // bytes that one write takes
+size_t s_room = SIZE_MAX;  // bytes that fit into the file
+
+bool call_fails() {
+    return s_before_change && !s_before_change();
+}
+
+}  // namespace
+
+extern "C" {
+ssize_t __real_write(int fd, const void* data, size_t len);
+ssize_t __real_pwrite(int fd, const void* data, size_t len, off_t at);
+int __real_ftruncate(int fd, off_t len);
+int __real_close(int fd);
+
+ssize_t __wrap_write(int fd, const void* data, size_t len) {
+    return __real_write(fd, data, fd > STDERR_FILENO ? std::min(len, s_most) : len);
+}
+
+ssize_t __wrap_pwrite(int fd, const void* data, size_t len, off_t at) {
+    const size_t begin = static_cast<size_t>(at);
+    if (call_fails() || begin >= s_room) {
+        errno = ENOSPC;
+        return -1;
+    }
+    return __real_pwrite(fd, data, std::min({len, s_most, s_room - begin}), at);
+}
+
+int __wrap_ftruncate(int fd, off_t len) {
+    return call_fails() ? -1 : __real_ftruncate(fd, len);
+}
+
+int __wrap_close(int fd) {
+    const bool fails = call_fails();
+    return __real_close(fd) < 0 || fails ? -1 : 0;
+}
+}
+
+namespace {
+
+const std::string HEAD =
+    "minidump disable\texternal\nlog_file_size 5\ndata_log_size 25\nsd_log_size 250\n"
+    "log_overwrite enable\n\n\n#Type\tName\tState\tSize\tLevel\n";
+const std::string ON = HEAD + "stream\tcp_wcn\ton\t1\t1\n";
+
+class SettingsFileTest : public ConfigFixture {
+protected:
+    ~SettingsFileTest() override { s_most = s_room = SIZE_MAX; }
+
+    // A start with this text in the settings file finds the stream, on or off, and has
+    // nothing to say.
+    void expect_whole(const std::string& text) {
+        root.write_file("moment.conf", text);
+        LogConfig config(root.path("moment.conf").c_str());
+        log.clear();
+        EXPECT_EQ(read(config), 0);
+        EXPECT_TRUE(log.text().empty() && config.find_stream(CT_WCN)) << log.text() << text;
+    }
+};
+
+TEST_F(SettingsFileTest, KillsAndFaultsLeaveTheOldSettingsOrTheNew) {
+    s_most = 4096;  // a kill between two pages is a moment of its own
+    const std::string line = "stream cp_wcn off 1 1";
+    std::string commented = line;
+    while (commented.size() < 10000) {
+        commented += "\n# settings\n";
+    }
+    for (const std::string& old : {HEAD + line + "    \n", commented, line}) {
+        for (int failing = 1; failing < 8; ++failing) {
+            SCOPED_TRACE(std::to_string(old.size()) + ", fault " + std::to_string(failing));
+            root.write_file("kest_modem.conf", old);
+            LogConfig config(file.c_str());
+            ASSERT_EQ(read(config), 0);
+            config.set_stream(CT_WCN, true);
+            std::vector<std::string> moments;
+            s_before_change = [&] {
+                moments.push_back(root.read_file("kest_modem.conf"));
+                return static_cast<int>(moments.size()) != failing;
+            };
+            const int result = config.save();
+            s_before_change = nullptr;
+            EXPECT_EQ(result, static_cast<int>(moments.size()) < failing ? 0 : -1);
+            EXPECT_EQ(config.dirty(), result < 0);
+            moments.push_back(root.read_file("kest_modem.conf"));
+            EXPECT_TRUE(failing > 1 || moments.back() == old);
+            for (const std::string& moment : moments) {
+                expect_whole(moment);
+            }
+            EXPECT_EQ(config.save(), 0);
+            EXPECT_EQ(root.read_file("kest_modem.conf"), ON);
+        }
+    }
+}
+
+TEST_F(SettingsFileTest, AFullMediumLeavesTheFileAsItWas) {
+    const mode_t mask = umask(0);
+    for (const std::string old : {"stream cp_wcn on 1 1\n", ""}) {  // "": it was deleted
+        LogConfig config(file.c_str());
+        root.write_file("kest_modem.conf", old);
+        ASSERT_EQ(read(config), 0);
+        unlink(old.empty() ? file.c_str() : "");
+        s_room = 30;
+        EXPECT_EQ(config.save(), -1);
+        EXPECT_EQ(root.read_file("kest_modem.conf"), old);
+        EXPECT_TRUE(config.dirty()) << "pending, though nothing was changed";
+        s_room = SIZE_MAX;
+        EXPECT_EQ(config.save(), 0);
+        EXPECT_EQ(root.read_file("kest_modem.conf"), old.empty() ? HEAD : ON);
+    }
+    umask(mask);
+    struct stat st;
+    EXPECT_TRUE(stat(file.c_str(), &st) == 0 && (st.st_mode & 07777) == 0644);
+    LogConfig homeless((file + "/below_a_file").c_str());
+    EXPECT_TRUE(homeless.save() == -1 && homeless.dirty());
+}
+
+TEST_F(SettingsFileTest, TheDefaultReplacesWhatIsMissingEmptyOrAnUnfinishedCopy) {
+    const std::string whole = "stream cp_wcn on 1 2\n" + std::string(5000, '#');
+    root.write_file("system/etc/kest_modem.conf", whole);
+    const size_t before = open_descriptors();
+    const std::string other(1024, '#');  // as long as a block, not the default's beginning
+    for (const std::string& text : {whole.substr(0, 0), whole.substr(0, 1024),
+                                    whole.substr(0, 4096), whole, whole.substr(0, 1000), other}) {
+        SCOPED_TRACE(text.size());
+        root.write_file("kest_modem.conf", text);
+        LogConfig config(file.c_str());
+        EXPECT_EQ(read(config), 0);
+        const bool kept = text.size() == 1000 || text == other;
+        EXPECT_EQ(root.read_file("kest_modem.conf"), kept ? text : whole);
+        EXPECT_TRUE(log.text().empty() && (text == other || config.find_stream(CT_WCN)));
+    }
+    for (const size_t room : {0u, 5u, 5021u}) {  // a medium that is full, then one that is not
+        unlink(file.c_str());
+        s_most = room;
+        const bool fits = room == whole.size();
+        LogConfig config(file.c_str());
+        EXPECT_EQ(read(config), fits ? 0 : -1) << room;
+        EXPECT_EQ(root.exists("kest_modem.conf"), fits);
+        EXPECT_EQ(log.has("incomplete copy " + file + " deleted [28("), !fits);
+        log.clear();
+    }
+    EXPECT_EQ(open_descriptors(), before);
+}
+
+TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
+    auto refused = [&](const char* error) {
+        log.clear();
+        LogConfig config(file.c_str());
+        return read(config) == -1 && log.has("can not open " + file + " [" + error + "(");
+    };
+    EXPECT_TRUE(refused("2")) << "neither settings nor a default";
+    root.write_file("system/etc/kest_modem.conf", "stream cp_wcn on 1 2\n");
+    ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
+    EXPECT_TRUE(refused("22") && unlink(file.c_str()) == 0) << "a FIFO, which stays";
+    root.make_dir("kest_modem.conf");
+    EXPECT_TRUE(refused("21") && rmdir(file.c_str()) == 0) << "a directory";
+    ASSERT_EQ(symlink("/proc/self/mem", file.c_str()), 0);
+    EXPECT_TRUE(refused("5")) << "a read error is no end";
+}
+
+}  // namespace
