@@ -65,6 +65,7 @@ int LogConfig::read_config(int argc, char** argv) {
         err_log("can not open %s", m_config_file.string());
         return -1;
     }
+    report_zero_limits();
     propget_wan_modem_type();
     return 0;
 }
@@ -78,6 +79,19 @@ int LogConfig::open_settings(ConfigReader& reader) const {
     }
     copy_default_settings(default_file.string(), file);
     return reader.open(file);
+}
+
+// A 0 is rarely meant: it is also what a missing or misspelt number gives.
+void LogConfig::report_zero_limits() const {
+    if (m_log_file_size << 20 == 0) {  // kept in 32 bits
+        info_log("log_file_size %u: every write starts a new log file", m_log_file_size);
+    }
+    if (m_data_log_size == 0) {
+        info_log("data_log_size 0: the internal medium has no quota");
+    }
+    if (m_sd_log_size == 0) {
+        info_log("sd_log_size 0: the SD card has no quota");
+    }
 }
 
 int LogConfig::parse_line(const char* line) {

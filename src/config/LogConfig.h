@@ -45,7 +45,7 @@ public:
 
     // Reads the command line, the SD card's root, the settings file (first copied from the
     // system default when it cannot be opened, is empty or an unfinished copy) and the modem
-    // type. Invalid lines are logged and skipped. Returns -1 on an
+    // type. Invalid lines are logged and skipped, limits of 0 MB logged. Returns -1 on an
     // unknown option and when no file can be opened or it cannot be read to its end.
     int read_config(int argc, char** argv);
 
@@ -105,7 +105,8 @@ public:
 
 private:
     int open_settings(ConfigReader& reader) const;  // 0, or -1 with errno
-    android::String8 file_text() const;             // the settings as save() writes them
+    void report_zero_limits() const;
+    android::String8 file_text() const;  // the settings as save() writes them
     // The parsers of one line: 0, or -1 when the line is invalid.
     int parse_line(const char* line);
     int parse_stream_line(const char* rest);
