@@ -26,39 +26,47 @@ int DeviceFileHandler::open() {
     return m_fd;
 }
 
-bool DeviceFileHandler::first_failure() {
-    const bool first = !m_failing;
-    m_failing = true;
-    return first;
+bool DeviceFileHandler::is_news(FailureKind kind, int detail) {
+    if (m_failure == kind && m_failure_detail == detail) {
+        return false;
+    }
+    m_failure = kind;
+    m_failure_detail = detail;
+    return true;
+}
+
+void DeviceFileHandler::note_nothing() {
+    note_idle(m_own_fd ? m_path.string() : "diag device");
 }
 
 void DeviceFileHandler::process(int events) {
     if (!(events & POLLIN)) {
-        if (first_failure()) {
+        if (is_news(UNEXPECTED_EVENT, events)) {
             err_log("file %s unexpected event %#x", m_path.string(),
                     static_cast<unsigned int>(events));
         }
+        note_nothing();
         return;
     }
-    for (;;) {
+    for (int reads = 0; reads < MAX_READS; ++reads) {
         const size_t used = m_buf.data_start + m_buf.data_len;
         const ssize_t n = read(m_fd, m_buf.buffer + used, m_buf.capacity - used);
-        if (n < 0) {
-            if (errno != EAGAIN && errno != ENODATA && first_failure()) {
+        if (n <= 0) {
+            if (n == 0 && is_news(READ_NOTHING, 0)) {
+                err_log("read %s return 0", m_path.string());
+            } else if (n < 0 && errno != EAGAIN && errno != ENODATA && is_news(READ_ERROR, errno)) {
                 err_log("read %s error", m_path.string());
             }
-            return;
-        }
-        if (n == 0) {
-            if (first_failure()) {
-                err_log("read %s return 0", m_path.string());
+            if (reads == 0) {
+                note_nothing();
             }
             return;
         }
-        m_failing = false;
+        m_failure = NONE;
+        note_alive();
         m_buf.data_len += static_cast<size_t>(n);
         if (process_data(m_buf)) {
-            return;
+            return;  // this object may be gone
         }
     }
 }

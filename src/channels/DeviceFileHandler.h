@@ -13,6 +13,10 @@
 
 class DeviceFileHandler : public FdHandler {
 public:
+    // Reads of one wake-up. The rest of a device that never runs dry comes at the next one,
+    // after the other handlers had their turn.
+    static constexpr int MAX_READS = 8;
+
     struct DataBuffer {
         explicit DataBuffer(size_t size)
             : buffer(new uint8_t[size]), capacity(size), data_start(0), data_len(0) {}
@@ -40,9 +44,9 @@ public:
     // Opens the device; the descriptor or -1.
     int open();
 
-    // Reads until the device has no more data or process_data wants no more now. A device
-    // that fails stays polled; of failures in a row only the first is logged, because a
-    // device that hung up is reported at every pass of the loop.
+    // Reads until the device has no more data, process_data wants no more now or MAX_READS
+    // are made. A device that fails stays polled, in the end at long intervals (note_idle);
+    // a failure that exactly repeats the one before is not logged again.
     void process(int events) override;
 
     // Takes what the buffer holds. True: stop reading now; the handler may be destroyed
@@ -52,10 +56,16 @@ public:
     const android::String8& path() const { return m_path; }
 
 private:
-    bool first_failure();
+    enum FailureKind { NONE, UNEXPECTED_EVENT, READ_ERROR, READ_NOTHING };
+
+    // Remembers a failure and its events or errno; false when it repeats the last one.
+    bool is_news(FailureKind kind, int detail);
+    // The wake-up came to nothing.
+    void note_nothing();
 
     bool m_own_fd;
-    bool m_failing = false;  // a failure was logged and nothing was read since
+    FailureKind m_failure = NONE;  // the last one, unless data was read since
+    int m_failure_detail = 0;
     android::String8 m_path;
     DataBuffer m_buf;
 };

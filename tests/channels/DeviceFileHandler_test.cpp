@@ -46,18 +46,23 @@ protected:
     const std::string path = root.path("diag");
 };
 
-TEST_F(DeviceFileHandlerTest, OneWakeUpDrainsTheDeviceUnlessToldToStop) {
+TEST_F(DeviceFileHandlerTest, OneWakeUpDrainsTheDeviceUnlessItIsToldToStopOrHasReadMuch) {
     const Fifo fifo(path);
     const std::string data = pattern_bytes(50000, 1);
-    for (bool stop : {false, true}) {
-        auto handler = make(8192);
+    const struct {
+        size_t capacity;
+        bool stop;
+        int chunks, passes;
+    } cases[] = {{8192, false, 7, 1}, {8192, true, 7, 7}, {2500, false, 20, 3}};
+    for (const auto& c : cases) {
+        auto handler = make(c.capacity);
         EXPECT_EQ(fcntl(handler->fd(), F_GETFL) & (O_ACCMODE | O_NONBLOCK), O_RDWR | O_NONBLOCK);
-        handler->stop_after_chunk = stop;
+        handler->stop_after_chunk = c.stop;
         ASSERT_TRUE(fifo.put(data));
         ASSERT_TRUE(pump_until(mux, [&] { return handler->received.size() == data.size(); }));
         EXPECT_TRUE(handler->received == data);
-        EXPECT_EQ(handler->passes, stop ? 7 : 1);
-        EXPECT_EQ(handler->chunks, 7);
+        EXPECT_EQ(handler->passes, c.passes);
+        EXPECT_EQ(handler->chunks, c.chunks);
     }
     auto handler = make(10);
     handler->keep = true;
@@ -70,23 +75,29 @@ TEST_F(DeviceFileHandlerTest, OneWakeUpDrainsTheDeviceUnlessToldToStop) {
     EXPECT_EQ(log.text(), "");
 }
 
-TEST_F(DeviceFileHandlerTest, ReportsTheFirstOfFailuresInARow) {
+TEST_F(DeviceFileHandlerTest, ReportsFailuresButForRepeatsAndEndsInARest) {
     root.write_file("diag", "");
     auto handler = make(100);
-    const std::string ended = "void DeviceFileHandler::process(int): read " + path + " return 0 [";
-    const auto hang_up = [&] { handler->process(POLLHUP | POLLERR); };
-    for (int i = 0; i < 3; ++i) {
-        pump_once(mux);
-        hang_up();
+    size_t lines = 0;
+    int last = 0;
+    for (int events :
+         {POLLIN, POLLIN, POLLHUP, POLLHUP, POLLHUP | POLLERR, POLLIN, POLLHUP, POLLHUP, POLLHUP}) {
+        lines += events != last;
+        last = events;
+        handler->process(events);
+        EXPECT_EQ(log.count("\n"), lines) << log.text();
     }
-    EXPECT_EQ(log.count(ended), 1u);
-    EXPECT_EQ(log.count("\n"), 1u) << log.text();
-    root.write_file("diag", "data");
-    hang_up();
+    EXPECT_EQ(log.count("void DeviceFileHandler::process(int): read " + path + " return 0 ["), 2u);
+    EXPECT_EQ(log.count(path + " unexpected event 0x10 ["), 2u);
+    EXPECT_FALSE(handler->resting());
     pump_once(mux);
-    EXPECT_EQ(handler->received, "data");
-    EXPECT_EQ(log.count("\n"), 2u) << "and the end of the file, once more";
+    EXPECT_TRUE(handler->resting());
     EXPECT_EQ(Filler::free_slots(mux), Multiplexer::MAX_HANDLERS - 1) << "still registered";
+    root.write_file("diag", "data");
+    handler->process(POLLIN);
+    EXPECT_EQ(handler->received, "data");
+    EXPECT_FALSE(handler->resting());
+    EXPECT_EQ(log.count(path + " return 0 ["), 4u) << "and the end of the file, once more";
 
     const size_t before = open_descriptors();
     int fds[2];
@@ -97,6 +108,7 @@ TEST_F(DeviceFileHandlerTest, ReportsTheFirstOfFailuresInARow) {
         log.clear();
         idle.process(POLLIN);
         EXPECT_EQ(log.text(), "") << "no data is no failure";
+        EXPECT_EQ(idle.idle_wakeups(), 1u) << "but there should have been some";
         idle.process(POLLHUP | POLLERR);
         EXPECT_TRUE(log.has(": file  unexpected event 0x18 ["));
         unreadable.process(POLLIN);
