@@ -1,17 +1,6 @@
 // What comes between a transaction and its end.
 #include "channels/FaultFixture.h"
 
-int64_t g_clock_ahead_ms = 0;
-
-extern "C" int __real_clock_gettime(clockid_t clock, struct timespec* t);
-extern "C" int __wrap_clock_gettime(clockid_t clock, struct timespec* t) {
-    const int result = __real_clock_gettime(clock, t);
-    if (clock == CLOCK_BOOTTIME) {
-        *t = TimerManager::add_ms(*t, static_cast<unsigned int>(g_clock_ahead_ms));
-    }
-    return result;
-}
-
 namespace {
 
 enum Transaction { DUMP, RINGBUF, SLEEP_LOG };
