@@ -8,6 +8,10 @@ const DiagReplyConsumer::Exchange CpRingBufConsumer::EXCHANGE = {
 CpRingBufConsumer::CpRingBufConsumer(const char* cp_name, CpStorage* storage)
     : DiagReplyConsumer(cp_name, storage, EXCHANGE) {}
 
+int CpRingBufConsumer::start() {
+    return start_exchange(open_file());
+}
+
 LogFile* CpRingBufConsumer::open_file() {
     android::String8 name;
     LogFile* file = nullptr;

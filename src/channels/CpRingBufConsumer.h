@@ -8,13 +8,16 @@ class CpRingBufConsumer : public DiagReplyConsumer {
 public:
     CpRingBufConsumer(const char* cp_name, CpStorage* storage);
 
-protected:
-    LogFile* open_file() override;
+    int start() override;
+
+    // Makes the result file, named by the present local time. Null on failure.
+    LogFile* open_file();
+
+    // Called by both time-outs of the exchange.
+    static void ring_buffer_read_timeout(void* consumer);
 
 private:
     static const Exchange EXCHANGE;
-
-    static void ring_buffer_read_timeout(void* consumer);
 };
 
 #endif  // CHANNELS_CPRINGBUFCONSUMER_H_

@@ -8,6 +8,10 @@ const DiagReplyConsumer::Exchange CpSleepLogConsumer::EXCHANGE = {
 CpSleepLogConsumer::CpSleepLogConsumer(const char* cp_name, CpStorage* storage)
     : DiagReplyConsumer(cp_name, storage, EXCHANGE) {}
 
+int CpSleepLogConsumer::start() {
+    return start_exchange(open_file());
+}
+
 LogFile* CpSleepLogConsumer::open_file() {
     android::String8 name;
     LogFile* file = nullptr;

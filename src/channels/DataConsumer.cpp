@@ -2,6 +2,9 @@
 
 #include <poll.h>
 
+#include "channels/ExchangeTimer.h"
+#include "core/Multiplexer.h"
+
 DataConsumer::DataConsumer(const char* cp_name, CpStorage* storage)
     : m_cp_name(cp_name), m_storage(storage) {}
 
@@ -25,4 +28,19 @@ bool DataConsumer::data_waits() const {
     pfd.revents = 0;
     // A device that hung up or failed is readable as well, for ever and without data.
     return poll(&pfd, 1, 0) > 0 && pfd.revents == POLLIN;
+}
+
+bool DataConsumer::goes_on(ExchangeTimer& read_timer) {
+    read_timer.fired();
+    if (!data_waits() || read_timer.start(m_handler->multiplexer()->timer_mgr()) < 0) {
+        return false;
+    }
+    // Once only: a device may be readable for ever and yet give nothing.
+    const ObjectRef<DataConsumer> self(this);
+    m_handler->process(POLLIN);
+    if (!self || m_handler->idle_wakeups() == 0) {
+        return true;
+    }
+    read_timer.stop();
+    return false;
 }

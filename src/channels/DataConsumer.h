@@ -9,10 +9,12 @@
 #define CHANNELS_DATACONSUMER_H_
 
 #include "channels/DeviceFileHandler.h"
+#include "core/ObjectRef.h"
 
 class CpStorage;
+class ExchangeTimer;
 
-class DataConsumer {
+class DataConsumer : public RefTarget {
 public:
     enum LogProcResult : int {
         LPR_SUCCESS = 0,
@@ -38,17 +40,23 @@ public:
     // Takes a chunk. True: stop reading now (always so after notify_result).
     virtual bool process(DeviceFileHandler::DataBuffer& buf) = 0;
 
-protected:
+    // Tells the owner the outcome, which destroys this object and its handler.
     void notify_result(LogProcResult result);
-    // True when the device has data that has not been read yet: a read time-out that comes
-    // then tells that the loop was busy, not that the CP is silent.
-    bool data_waits() const;
+
+protected:
+    // For a read time-out that has fired. A device with data waiting may mean that the loop
+    // was busy, not that the CP is silent: then what waits is read now. True when that
+    // brought something and the exchange goes on, the time-out armed again, or when it
+    // ended the exchange: this object may be gone. False: the CP is silent.
+    bool goes_on(ExchangeTimer& read_timer);
 
     const char* m_cp_name;
     DeviceFileHandler* m_handler = nullptr;
     CpStorage* m_storage;
 
 private:
+    bool data_waits() const;
+
     void* m_client = nullptr;
     trans_result_callback m_callback = nullptr;
 };

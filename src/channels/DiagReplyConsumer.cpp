@@ -19,18 +19,18 @@ constexpr uint8_t REPLY_DATA = 0x64;
 
 DiagReplyConsumer::DiagReplyConsumer(const char* cp_name, CpStorage* storage,
                                      const Exchange& exchange)
-    : DataConsumer(cp_name, storage), m_exchange(exchange) {}
+    : DataConsumer(cp_name, storage),
+      m_exchange(exchange),
+      m_read_timer(READ_TIMEOUT_MS, exchange.read_timeout, this),
+      m_reply_timer(REPLY_TIMEOUT_MS, on_no_reply, this) {}
 
 DiagReplyConsumer::~DiagReplyConsumer() {
-    stop_timer();
     close_file();
 }
 
-void DiagReplyConsumer::stop_timer() {
-    if (m_read_timer) {
-        m_handler->multiplexer()->timer_mgr().del_timer(m_read_timer);
-        m_read_timer = nullptr;
-    }
+void DiagReplyConsumer::stop_timers() {
+    m_read_timer.stop();
+    m_reply_timer.stop();
 }
 
 bool DiagReplyConsumer::create_result_file(android::String8& name, LogFile*& file) {
@@ -55,22 +55,19 @@ bool DiagReplyConsumer::send_request() {
     return n == static_cast<ssize_t>(len);
 }
 
-int DiagReplyConsumer::start() {
-    m_file = open_file();
+int DiagReplyConsumer::start_exchange(LogFile* file) {
+    m_file = file;
     if (!m_file) {
         return -1;
     }
-    if (!send_request()) {
+    // The time-outs first: no request leaves whose exchange nothing would end.
+    TimerManager& timers = m_handler->multiplexer()->timer_mgr();
+    if (m_read_timer.start(timers) < 0 || m_reply_timer.start(timers) < 0 || !send_request()) {
+        stop_timers();
         discard_file();
         return -1;
     }
-    start_timer();
     return 0;
-}
-
-void DiagReplyConsumer::start_timer() {
-    m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(
-        READ_TIMEOUT_MS, m_exchange.read_timeout, this);
 }
 
 void DiagReplyConsumer::close_file() {
@@ -87,21 +84,26 @@ void DiagReplyConsumer::discard_file() {
 }
 
 bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
-    if (m_read_timer) {
-        m_handler->multiplexer()->timer_mgr().set_new_due_time(m_read_timer, READ_TIMEOUT_MS);
-    }
+    m_read_timer.restart();
+    bool answered = false;
     const uint8_t* data = buf.data();
     size_t left = buf.data_len;
     while (left > 0) {
         uint8_t* frame;
         size_t frame_len;
         size_t used;
-        if (m_parser.unescape(data, left, frame, frame_len, used) &&
-            process_frame(frame, frame_len) == ENDED) {
-            return true;
+        if (m_parser.unescape(data, left, frame, frame_len, used)) {
+            const Outcome outcome = process_frame(frame, frame_len);
+            if (outcome == ENDED) {
+                return true;
+            }
+            answered = answered || outcome == TAKEN;
         }
         data += used;
         left -= used;
+    }
+    if (answered) {
+        m_reply_timer.restart();
     }
     buf.consume_all();
     return false;
@@ -111,11 +113,11 @@ bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame, size_t len) {
     DiagHeader header;
     if (len < sizeof(header)) {
-        return GO_ON;
+        return NOT_OURS;
     }
     memcpy(&header, frame, sizeof(header));
     if (header.type != m_exchange.diag_type) {
-        return GO_ON;
+        return NOT_OURS;
     }
     if (header.sub_type == REPLY_NOT_SERVED) {
         discard_file();
@@ -130,6 +132,7 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
     // The file may have gone with its set or its medium, or been trimmed.
     if (!m_file || !m_file->exists()) {
         err_log("result file of %s is gone", m_cp_name);
+        discard_file();
         end(LPR_FAILURE);
         return ENDED;
     }
@@ -150,20 +153,25 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
         end(LPR_FAILURE);
         return ENDED;
     }
-    return GO_ON;
+    return TAKEN;
 }
 
 void DiagReplyConsumer::end(LogProcResult result) {
-    stop_timer();
+    stop_timers();
     notify_result(result);
 }
 
 bool DiagReplyConsumer::end_by_timeout() {
-    m_read_timer = nullptr;
-    if (data_waits()) {
-        start_timer();
+    if (m_reply_timer.pending() && goes_on(m_read_timer)) {
         return false;
     }
+    stop_timers();
     close_file();
     return true;
+}
+
+void DiagReplyConsumer::on_no_reply(void* param) {
+    DiagReplyConsumer* consumer = static_cast<DiagReplyConsumer*>(param);
+    consumer->m_reply_timer.fired();
+    consumer->m_exchange.read_timeout(consumer);
 }

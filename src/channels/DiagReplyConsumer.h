@@ -1,23 +1,30 @@
 // What the ring buffer and the sleep log consumers share: one request frame to the CP,
-// the payload of its data frames into a file, until an end frame, a refusal, an error or
-// a silence of 3 seconds. Owned by the channel for one transaction.
+// the payload of its data frames into a file, until an end frame, a refusal, an error, a
+// silence of 3 seconds or 30 seconds of frames that are no answer. Owned by the channel for
+// one transaction.
 #ifndef CHANNELS_DIAGREPLYCONSUMER_H_
 #define CHANNELS_DIAGREPLYCONSUMER_H_
 
 #include "channels/DataConsumer.h"
 #include "channels/DiagFrameParser.h"
-#include "core/ObjectRef.h"
-#include "core/TimerManager.h"
+#include "channels/ExchangeTimer.h"
 #include "storage/LogFile.h"
 
 class DiagReplyConsumer : public DataConsumer {
 public:
     static constexpr unsigned int READ_TIMEOUT_MS = 3000;
+    // A CP that logs on the same device may never fall silent and never answer.
+    static constexpr unsigned int REPLY_TIMEOUT_MS = 30000;
 
     ~DiagReplyConsumer() override;
 
-    int start() override;
     bool process(DeviceFileHandler::DataBuffer& buf) override;
+
+    // Closes the result file; it stays on the medium.
+    void close_file();
+    // Closes the result file and removes it from the medium, its lists and totals; one that
+    // vanished from the medium, too.
+    void discard_file();
 
 protected:
     // Where the exchanges differ.
@@ -31,30 +38,29 @@ protected:
 
     DiagReplyConsumer(const char* cp_name, CpStorage* storage, const Exchange& exchange);
 
-    // Makes the result file, named by the present local time. Null on failure.
-    virtual LogFile* open_file() = 0;
-    // The same for the subclasses: false when the time is not known, else name is the
-    // file's and file the result of its creation.
+    // Makes the result file, named by the present local time. False when the time is not
+    // known, else name is the file's and file the result of its creation.
     bool create_result_file(android::String8& name, LogFile*& file);
-
-    // Ends the exchange after a silence; what was received stays. False when it goes on
-    // because data has arrived after all.
+    // Begins the exchange on its result file, null when it could not be made. 0 or -1.
+    int start_exchange(LogFile* file);
+    // For a time-out: ends the exchange, what was received stays. False when it goes on or
+    // is over already; this object may be gone then.
     bool end_by_timeout();
-    void close_file();
-    void discard_file();
 
 private:
-    enum Outcome { GO_ON, ENDED };
+    enum Outcome { NOT_OURS, TAKEN, ENDED };
+
+    static void on_no_reply(void* consumer);
 
     Outcome process_frame(const uint8_t* frame, size_t len);
     void end(LogProcResult result);
     bool send_request();
-    void start_timer();
-    void stop_timer();
+    void stop_timers();
 
     const Exchange& m_exchange;
     DiagFrameParser m_parser;
-    TimerManager::Timer* m_read_timer = nullptr;
+    ExchangeTimer m_read_timer;   // until the next chunk
+    ExchangeTimer m_reply_timer;  // until the next frame of this exchange
     ObjectRef<LogFile> m_file;
 };
 

@@ -17,21 +17,19 @@ constexpr char DUMP_REQUEST[] = {'3', '\n'};
 
 ModemDumpConsumer::ModemDumpConsumer(const char* cp_name, CpStorage* storage,
                                      const struct tm& dump_time, const char* mem_path)
-    : CpDumpConsumer(cp_name, storage, dump_time), m_mem_path(mem_path) {}
+    : CpDumpConsumer(cp_name, storage, dump_time),
+      m_mem_path(mem_path),
+      m_read_timer(READ_TIMEOUT_MS, dump_read_timeout, this) {}
 
 ModemDumpConsumer::~ModemDumpConsumer() {
-    stop_timer();
     m_storage->unsubscribe_ext_stor_umount_evt(this);
 }
 
-void ModemDumpConsumer::stop_timer() {
-    if (m_read_timer) {
-        m_handler->multiplexer()->timer_mgr().del_timer(m_read_timer);
-        m_read_timer = nullptr;
-    }
-}
-
 int ModemDumpConsumer::start() {
+    // The time-out first: no request leaves whose dump nothing would end.
+    if (m_read_timer.start(m_handler->multiplexer()->timer_mgr()) < 0) {
+        return -1;
+    }
     if (write(m_handler->fd(), DUMP_REQUEST, sizeof(DUMP_REQUEST)) !=
         static_cast<ssize_t>(sizeof(DUMP_REQUEST))) {
         return -1;
@@ -40,13 +38,7 @@ int ModemDumpConsumer::start() {
         return -1;
     }
     m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
-    start_timer();
     return 0;
-}
-
-void ModemDumpConsumer::start_timer() {
-    m_read_timer = m_handler->multiplexer()->timer_mgr().create_timer(READ_TIMEOUT_MS,
-                                                                      dump_read_timeout, this);
 }
 
 bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& buf) {
@@ -70,9 +62,7 @@ bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& b
 
 bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     const bool end = check_end_of_dump(buf);
-    if (m_read_timer) {
-        m_handler->multiplexer()->timer_mgr().set_new_due_time(m_read_timer, READ_TIMEOUT_MS);
-    }
+    m_read_timer.restart();
     const size_t len = buf.data_len;
     ssize_t written = write_dump(buf.data(), len);
     if (end && written == static_cast<ssize_t>(len) && write_out_dump_file() < 0) {
@@ -84,7 +74,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         if (end) {
             m_handler->del_events(POLLIN);
             close_dump_file();
-            stop_timer();
+            m_read_timer.stop();
             notify_result(LPR_SUCCESS);
             info_log("dump complete");
         }
@@ -92,7 +82,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     }
     const int write_errno = errno;
     discard_dump_file();
-    stop_timer();
+    m_read_timer.stop();
     errno = write_errno;
     err_log("need to write %lu, write returns %d", static_cast<unsigned long>(len),
             static_cast<int>(written));
@@ -102,9 +92,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 
 void ModemDumpConsumer::dump_read_timeout(void* param) {
     ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
-    consumer->m_read_timer = nullptr;
-    if (consumer->data_waits()) {
-        consumer->start_timer();
+    if (consumer->goes_on(consumer->m_read_timer)) {
         return;
     }
     consumer->discard_dump_file();
@@ -137,7 +125,7 @@ void ModemDumpConsumer::on_ext_stor_umount(void* param) {
     if (!consumer->dump_on_sd()) {
         return;
     }
-    consumer->stop_timer();
+    consumer->m_read_timer.stop();
     info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
     consumer->notify_result(LPR_FAILURE);
 }

@@ -7,7 +7,7 @@
 
 #include "channels/CpDumpConsumer.h"
 #include "channels/DiagFrameParser.h"
-#include "core/TimerManager.h"
+#include "channels/ExchangeTimer.h"
 
 // The payload of the frame that ends a dump.
 constexpr char MODEM_DUMP_END[] = "\nmodem_memdump_finish";
@@ -25,19 +25,18 @@ public:
     int start() override;
     bool process(DeviceFileHandler::DataBuffer& buf) override;
 
-private:
+    // Copies the kernel's memory file; false when that failed.
+    bool save_dump_file();
+
     static void dump_read_timeout(void* consumer);
     static void on_ext_stor_umount(void* consumer);
 
+private:
     // Follows the frames of the chunk; true when one of them was the end marker.
     bool check_end_of_dump(const DeviceFileHandler::DataBuffer& buf);
-    // Copies the kernel's memory file; false when that failed.
-    bool save_dump_file();
-    void start_timer();
-    void stop_timer();
 
     const char* m_mem_path;
-    TimerManager::Timer* m_read_timer = nullptr;
+    ExchangeTimer m_read_timer;
     DiagFrameParser m_parser;
 };
 

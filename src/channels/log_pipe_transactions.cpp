@@ -115,15 +115,28 @@ DiagDeviceHandler* LogPipeHandler::create_diag_device(DataConsumer* consumer) {
 
 int LogPipeHandler::run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer,
                                     CpWorkState state) {
-    if (diag && diag->add_events(POLLIN) == 0) {
-        consumer->bind(diag);
-        if (consumer->start() == 0) {
-            start_transaction(diag, consumer, state);
-            return 0;
-        }
+    if (!diag) {
+        delete consumer;
+        return -1;
     }
+    if (m_log_diag_same) {
+        // Only the diag handler reads the device now. It takes this one's place in the loop,
+        // which may have no other left.
+        del_events(POLLIN);
+    }
+    diag->poll_when_room(POLLIN, (m_log_diag_same ? m_log_dev_path : m_diag_dev_path).string());
+    consumer->bind(diag);
+    if (consumer->start() == 0) {
+        start_transaction(diag, consumer, state);
+        return 0;
+    }
+    const int start_errno = errno;
     delete consumer;
     delete diag;
+    if (m_log_diag_same) {
+        poll_dev();
+    }
+    errno = start_errno;
     return -1;
 }
 
@@ -132,9 +145,6 @@ void LogPipeHandler::start_transaction(DiagDeviceHandler* diag, DataConsumer* co
     m_diag_handler = diag;
     m_consumer = consumer;
     m_state = state;
-    if (m_log_diag_same) {
-        del_events(POLLIN);
-    }
 }
 
 void LogPipeHandler::stop_transaction(CpWorkState new_state) {

@@ -174,21 +174,23 @@ inline std::string log_content(const TestRoot& root, const std::vector<std::stri
     return all;
 }
 
-// Fills the loop's table to see how many handlers it still takes.
+// Fills the loop's table, or sees how many handlers it still takes.
 class Filler : public FdHandler {
 public:
     explicit Filler(Multiplexer* mux) : FdHandler(-1, nullptr, mux) {}
     void process(int) override {}
 
-    static size_t free_slots(Multiplexer& mux) {
+    static std::vector<std::unique_ptr<Filler>> fill(Multiplexer& mux) {
         std::vector<std::unique_ptr<Filler>> fillers;
         for (;;) {
-            fillers.push_back(std::make_unique<Filler>(&mux));
-            if (fillers.back()->add_events(POLLIN) < 0) {
-                return fillers.size() - 1;
+            auto filler = std::make_unique<Filler>(&mux);
+            if (filler->add_events(POLLIN) < 0) {
+                return fillers;
             }
+            fillers.push_back(std::move(filler));
         }
     }
+    static size_t free_slots(Multiplexer& mux) { return fill(mux).size(); }
 };
 
 class ChannelFixture : public testing::Test {

@@ -1,6 +1,7 @@
 #include "channels/DiagReplyConsumer.h"
 
 #include "channels/FaultFixture.h"
+#include "storage/MediaStorage.h"
 
 namespace {
 
@@ -113,6 +114,12 @@ TEST_F(DiagReplyTest, FaultsOfTheStorageAndTheDevice) {
         {"cut", false, [] { faults::shorten(faults::WRITEV, 64001); }, ""},
         {"full at the end", false, [] { faults::fail(faults::WRITE, 1, ENOSPC); },
          ": result file of cp_wcdma is not complete [28("},
+        {"deleted", false,
+         [&] {
+             const std::string dir = set + root.list(set)[0] + "/cp_wcdma/";
+             remove_tree(dir + root.list(dir).back());
+         },
+         "is gone ["},
         {"gone", false, [&] { remove_tree(set + root.list(set)[0] + "/cp_wcdma"); }, "is gone ["},
         {"set gone", false, [&] { remove_tree(set + root.list(set)[0]); }, "is gone ["},
         {"card pulled", false,
@@ -133,6 +140,7 @@ TEST_F(DiagReplyTest, FaultsOfTheStorageAndTheDevice) {
             Client client;
             ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
             const auto before = resources();
+            const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
             if (c.at_start) {
                 c.arrange();
                 ASSERT_EQ(ask(client, kind.request, "ERROR 3\n"), "ERROR 3\n");
@@ -150,6 +158,9 @@ TEST_F(DiagReplyTest, FaultsOfTheStorageAndTheDevice) {
             EXPECT_TRUE(log.has(c.message)) << log.text();
             repair();
             EXPECT_EQ(files(), Files{});
+            if (logged("cp_wcdma", "<start>")) {
+                EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size);
+            }
             EXPECT_EQ(modem()->state(), CWS_WORKING);
             EXPECT_TRUE(both_log("<again>"));
             EXPECT_EQ(resources(), before);
@@ -175,6 +186,47 @@ TEST_F(DiagReplyTest, ASilentCpFailsAndLeavesWhatItSent) {
         run_clock(150);
         ASSERT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
         EXPECT_EQ(files()[kind.file + STAMP + ".log"], "parts");
+        EXPECT_TRUE(log.has(kind.timeout));
+        log.clear();
+    }
+    // Without a clock nothing would end an exchange that begins, or whose end is put off.
+    diag_dev.forget();
+    const size_t left = files().size();
+    boot_clock::fail();
+    EXPECT_EQ(modem()->save_ringbuf(nullptr), -1);
+    repair();
+    EXPECT_EQ(diag_dev.received(), "");
+    EXPECT_EQ(files().size(), left);
+    ASSERT_TRUE(request(KINDS[0], client));
+    ASSERT_TRUE(diag_dev.put("data"));
+    mux().timer_mgr().add_timer(
+        2999, [](void*) { boot_clock::fail(); }, nullptr);
+    run_clock(3000);
+    EXPECT_EQ(modem()->state(), CWS_WORKING);
+    repair();
+    EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
+    diag_dev.forget();
+    EXPECT_TRUE(both_log("<again>"));
+}
+
+TEST_F(DiagReplyTest, ACpThatSendsOtherFramesOnlyFails) {
+    boot_modem(true);
+    Client client;
+    for (const Kind& kind : KINDS) {
+        ASSERT_TRUE(request(kind, client));
+        const auto log_for = [&](int seconds) {
+            for (int i = 0; i < seconds; ++i) {
+                ASSERT_TRUE(supply(diag_dev, frame(0x98, 'd', "log")));
+                run_clock(1000);
+            }
+        };
+        log_for(29);
+        ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', "part")));
+        log_for(29);
+        EXPECT_NE(modem()->state(), CWS_WORKING);
+        log_for(1);
+        ASSERT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
+        EXPECT_EQ(files()[kind.file + STAMP + ".log"], "part");
         EXPECT_TRUE(log.has(kind.timeout));
         log.clear();
     }

@@ -136,22 +136,74 @@ TEST_F(TransactionsTest, TheClientMayLeaveOrTheServiceEnd) {
     }
 }
 
-// A diag device that hangs up is no endless wait, a log device that the loop has no room
-// for is tried again.
-TEST_F(TransactionsTest, DevicesThatFailEndTheirTransactionAndComeBack) {
-    auto pty = std::make_unique<Pty>();
+// Hung up, or readable for ever without data.
+TEST_F(TransactionsTest, ADeviceThatGivesNothingEndsItsTransactionAfterOneTimeout) {
+    root.write_file("empty", "");
+    for (Transaction transaction : {DUMP, RINGBUF, SLEEP_LOG}) {
+        auto pty = std::make_unique<Pty>();
+        for (const std::string& path :
+             {root.path("empty"), std::string("/dev/null"), pty->path()}) {
+            SCOPED_TRACE(path + " " + REQUESTS[transaction]);
+            boot_modem(false);
+            modem()->set_dev_paths(own_log_dev.path().c_str(), path.c_str());
+            Client client;
+            EXPECT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
+            if (transaction == DUMP) {
+                modem()->process_assert(false);
+            } else {
+                client.say(REQUESTS[transaction]);
+            }
+            ASSERT_TRUE(pump([&] { return modem()->state() > CWS_WORKING; }));
+            if (path == pty->path()) {
+                pty.reset();
+            }
+            ASSERT_TRUE(pump([&] { return log.has(" gave nothing "); }));
+            run_clock(2999);
+            EXPECT_GT(modem()->state(), CWS_WORKING);
+            run_clock(1);
+            if (transaction == DUMP) {
+                EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+                EXPECT_EQ(count_files(".mem") - count_files(".dmp"), 1u);
+            } else {
+                EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
+            }
+            EXPECT_EQ(log.count("unexpected event") + log.count(" return 0 ["), 1u);
+            end_service();
+        }
+    }
+}
+
+// The log device makes room for a diag handler on the same device. On one of its own the
+// exchange begins, and what comes is read once there is room.
+TEST_F(TransactionsTest, ALoopWithoutRoomServesTransactions) {
+    for (bool one_device : {true, false}) {
+        boot_modem(one_device);
+        Client client;
+        EXPECT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
+        auto fillers = Filler::fill(mux());
+        faults::fail(faults::WRITE, 1, EIO);
+        EXPECT_EQ(ask(client, REQUESTS[RINGBUF], "ERROR 3\n"), "ERROR 3\n");
+        EXPECT_TRUE(both_log("<again>"));
+        ASSERT_TRUE(begin_dump());
+        ASSERT_TRUE(diag_dev.put(end_marker()));
+        if (!one_device) {
+            pump_once(mux());
+            EXPECT_EQ(modem()->state(), CWS_DUMP);
+            fillers.pop_back();
+        }
+        EXPECT_TRUE(pump([&] { return modem()->state() == CWS_NOT_WORKING; }));
+        EXPECT_EQ(log.count("no room to poll " + diag_dev.path()), one_device ? 0u : 2u);
+        fillers.clear();
+        end_service();
+    }
+}
+
+// A log device that the loop has no room for is tried again.
+TEST_F(TransactionsTest, ALogDeviceComesBackWhenTheLoopHasRoom) {
     boot_modem(false);
-    modem()->set_dev_paths(own_log_dev.path().c_str(), pty->path().c_str());
     modem()->process_assert(false);
-    ASSERT_EQ(modem()->state(), CWS_DUMP);
-    pty.reset();
-    pump_once(mux());
     run_clock(3100);
     EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
-    EXPECT_EQ(count_files(".mem"), 1u);
-    EXPECT_EQ(count_files(".dmp"), 0u);
-    EXPECT_EQ(log.count("unexpected event") + log.count(" return 0 ["), 1u);
-
     const auto before = resources();
     std::vector<std::unique_ptr<Filler>> fillers;
     do {
