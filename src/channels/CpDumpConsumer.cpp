@@ -46,8 +46,18 @@ void CpDumpConsumer::close_dump_file() {
     }
 }
 
+bool CpDumpConsumer::dump_file_there() {
+    if (m_dump_file && m_dump_file->exists()) {
+        return true;
+    }
+    info_log("dump file of %s is gone", m_cp_name);
+    discard_dump_file();
+    errno = ENOENT;
+    return false;
+}
+
 int CpDumpConsumer::write_out_dump_file() {
-    return m_dump_file ? m_dump_file->write_out() : -1;
+    return dump_file_there() ? m_dump_file->write_out() : -1;
 }
 
 bool CpDumpConsumer::dump_on_sd() const {
@@ -61,10 +71,5 @@ void CpDumpConsumer::discard_dump_file() {
 }
 
 ssize_t CpDumpConsumer::write_dump(const void* data, size_t len) {
-    if (!m_dump_file || !m_dump_file->exists()) {
-        info_log("dump file of %s is gone", m_cp_name);
-        errno = ENOENT;
-        return -1;
-    }
-    return m_dump_file->write(data, len);
+    return dump_file_there() ? m_dump_file->write(data, len) : -1;
 }

@@ -16,24 +16,28 @@ public:
     // Closes the dump file.
     ~CpDumpConsumer() override;
 
-protected:
     // Makes the ".dmp" file, kept as the dump file. Null, with a message, on failure.
     LogFile* open_dump_file();
     // Makes the ".mem" file for the copy of the kernel's memory file. Not kept.
     LogFile* open_dump_mem_file();
+    // Closes the dump file and removes it from the medium, its lists and totals; one that
+    // vanished from the medium, too.
+    void discard_dump_file();
+
+protected:
     // Writes out and closes the dump file, if it still exists; it stays on the medium.
     void close_dump_file();
-    // Writes out what is staged; 0, or -1 when bytes were lost.
+    // Writes out what is staged; 0, or -1 when bytes were lost or the file is gone.
     int write_out_dump_file();
     // True when the SD card carries the dump file.
     bool dump_on_sd() const;
-    // Closes the dump file and removes it from the medium.
-    void discard_dump_file();
-    // Writes a chunk to the dump file; the bytes stored, or a negative value. The file may
-    // have gone with its set or its medium, or been trimmed: -1 with a message then.
+    // Writes a chunk to the dump file; the bytes stored, or a negative value.
     ssize_t write_dump(const void* data, size_t len);
 
 private:
+    // The file may have gone with its set or its medium, been trimmed or deleted: false with
+    // a message then, errno ENOENT and nothing of it left in lists and totals.
+    bool dump_file_there();
     android::String8 file_name(const char* extension) const;
 
     struct tm m_dump_time;

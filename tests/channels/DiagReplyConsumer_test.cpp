@@ -14,10 +14,10 @@ const struct Kind {
     const char* timeout;
 } KINDS[] = {
     {"SAVE_RINGBUF WCDMA\n", "data:cp_wcdma_ringbuf", 0x3A, "ERROR 7\n",
-     "LogFile* CpRingBufConsumer::open_file(): open ring buffer file ",
+     "): LogFile* CpRingBufConsumer::open_file(): open ring buffer file ",
      "static void CpRingBufConsumer::ring_buffer_read_timeout(void*): read ring buffer timeout ["},
     {"SAVE_SLEEP_LOG WCDMA\n", "data:cp_wcdma_sleeplog", 0x3B, "ERROR 6\n",
-     "LogFile* CpSleepLogConsumer::open_file(): open sleep log file ",
+     "): LogFile* CpSleepLogConsumer::open_file(): open sleep log file ",
      "static void CpSleepLogConsumer::sleep_log_read_timeout(void*): read sleep log timeout ["},
 };
 

@@ -1,5 +1,6 @@
 // The memory dump of the connectivity chip. A FIFO hands over exactly the chunks put in.
 #include "channels/FaultFixture.h"
+#include "storage/MediaStorage.h"
 
 namespace {
 
@@ -98,6 +99,19 @@ TEST_F(ExtWcnDumpTest, ADumpThatCannotBeStored) {
     faults::fail(faults::WRITE, 2, ENOSPC);  // after the write of this test
     ASSERT_TRUE(feed(wcn_dev, MARKER));
     EXPECT_TRUE(log.has(": dump of cp_wcn is not complete [28("));
+    expect_over();
+    // The file is gone when the end comes.
+    const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
+    begin();
+    ASSERT_TRUE(feed(wcn_dev, memory(30000)));
+    for (const std::string& name : root.tree("data/modem_log")) {
+        if (name.find(".dmp") != std::string::npos) {
+            remove_tree("data/modem_log/" + name);
+        }
+    }
+    ASSERT_TRUE(feed(wcn_dev, MARKER));
+    EXPECT_TRUE(log.has(": dump of cp_wcn is not complete [2("));
+    EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size);
     expect_over();
     EXPECT_EQ(lasting_descriptors(), before + 1) << "the log file";
     // No file at all.
