@@ -67,7 +67,12 @@ void AgDspLogHandler::fill_header(uint8_t* buffer, size_t n, DspLogType type) {
 
 int AgDspLogHandler::write_chunk(size_t n, DspLogType type) {
     fill_header(s_io_buffer, n, type);
-    return storage()->write(s_io_buffer, n + DSP_CHUNK_HEADER_LEN);
+    const int len = static_cast<int>(n + DSP_CHUNK_HEADER_LEN);
+    const int written = storage()->write(s_io_buffer, n + DSP_CHUNK_HEADER_LEN);
+    if (written >= 0 && written < len) {
+        info_log("%s save log: %d of %d bytes lost", name().string(), len - written, len);
+    }
+    return written;
 }
 
 void AgDspLogHandler::process(int /*events*/) {

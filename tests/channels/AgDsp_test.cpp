@@ -106,6 +106,9 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
         ASSERT_TRUE(yields(mem, {{"", 0}}));
         completions = mem.count(COMPLETE);
     }
+    faults::shorten(faults::WRITEV, 50000);
+    ASSERT_TRUE(yields(logs, {{big, 0}, {big, 0}}));
+    EXPECT_TRUE(log.has(": agdsp save log: 15536 of 32768 bytes lost\n")) << log.text();
     // No file at all.
     remove_tree("data/modem_log");
     root.write_file("data/modem_log", "in the way");
