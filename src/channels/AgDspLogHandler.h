@@ -19,22 +19,24 @@ public:
     int start() override;
     int stop() override;
     void process(int events) override;
-
-protected:
     int start_dump(const struct tm& t) override;
+
+    // Stores one read of the notifier's device as a chunk.
+    void save_audio_log(FileNotifier* notifier, DspLogType type);
+    // Stores the notifier's device to its end and tells the device so.
+    void save_dump(FileNotifier* notifier);
+    // Puts the header of a chunk of n data bytes at the start of the buffer.
+    void fill_header(uint8_t* buffer, size_t n, DspLogType type);
+
+    static void notify_pcm(FileNotifier* notifier, void* client);
+    static void notify_dump(FileNotifier* notifier, void* client);
 
 private:
     // What fits into the shared buffer behind the header.
     static constexpr size_t MAX_CHUNK = IO_BUFFER_SIZE - DSP_CHUNK_HEADER_LEN;
 
-    static void notify_pcm(FileNotifier* notifier, void* client);
-    static void notify_dump(FileNotifier* notifier, void* client);
-
-    void save_audio_log(FileNotifier* notifier, DspLogType type);
-    void save_dump(FileNotifier* notifier);
-    // Puts the header of a chunk of n data bytes at the start of the buffer.
-    void fill_header(uint8_t* buffer, size_t n, DspLogType type);
-    // Writes the chunk in the shared buffer, header and n data bytes; as CpStorage::write.
+    // Writes the chunk in the shared buffer, header and n data bytes; as CpStorage::write, and
+    // reports a chunk that is taken in part only.
     int write_chunk(size_t n, DspLogType type);
 
     FileNotifier m_pcm_notifier;

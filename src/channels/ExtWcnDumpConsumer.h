@@ -14,7 +14,6 @@ public:
     int start() override;
     bool process(DeviceFileHandler::DataBuffer& buf) override;
 
-private:
     static void on_ext_stor_umount(void* consumer);
 };
 

@@ -11,11 +11,8 @@ public:
 
     int start() override;
     int stop() override;
-
-protected:
     int start_dump(const struct tm& t) override;
 
-private:
     static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
 };
 

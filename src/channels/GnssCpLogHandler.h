@@ -11,8 +11,6 @@ public:
 
     int start() override;
     int stop() override;
-
-protected:
     int start_dump(const struct tm& t) override;
 };
 

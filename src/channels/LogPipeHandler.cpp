@@ -141,8 +141,8 @@ int LogPipeHandler::create_storage() {
         return -1;
     }
     if (is_modem()) {
-        m_storage->set_new_log_callback(new_log_cb);
-        m_storage->set_new_dir_callback(new_dir_cb);
+        m_storage->set_new_log_callback(new_log_callback);
+        m_storage->set_new_dir_callback(new_dir_callback);
     }
     return 0;
 }
@@ -153,7 +153,7 @@ bool LogPipeHandler::need_storage() {
         if (!m_storage) {
             return false;
         }
-        m_storage->set_new_log_callback(new_log_cb);
+        m_storage->set_new_log_callback(new_log_callback);
     }
     return true;
 }

@@ -59,6 +59,19 @@ public:
     // Switches the CP's logging on and off. 0 or -1.
     virtual int start() = 0;
     virtual int stop() = 0;
+    // Starts the exchange that saves the memory of the CP, which asserted at that local time,
+    // as the running transaction (CWS_DUMP). 0 or -1.
+    virtual int start_dump(const struct tm& t) = 0;
+
+    // What start and stop of all channels have in common. 0.
+    int start_logging();
+    int stop_logging();
+    // Makes the CP's storage, for a modem with the hooks that head new directories and log
+    // files. 0 or -1.
+    int create_storage();
+    // Writes the time record to a new log file; it may take a second. False, with a message,
+    // without an answer of the time service.
+    bool save_timestamp(LogFile* file);
 
     // The CP asserted or is blocked; save_md: a mini dump is wanted.
     void process_assert(bool save_md);
@@ -84,6 +97,14 @@ public:
     // Reads the log device once into the storage.
     void process(int events) override;
 
+    // Ends a client's transaction; the result of its consumer.
+    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
+    // Timer: opens the log device again.
+    static void reopen_log_dev(void* handler);
+    // Hooks of the storage: a log file, a CP directory was made.
+    static void new_log_callback(LogPipeHandler* handler, LogFile* file);
+    static void new_dir_callback(LogPipeHandler* handler);
+
 protected:
     static constexpr size_t IO_BUFFER_SIZE = 32768;
     // Shared by all channels: only one read is in progress at any time.
@@ -91,25 +112,20 @@ protected:
 
     StorageManager* stor_mgr() const { return m_stor_mgr; }
 
-    int start_logging();
-    int stop_logging();
-    int create_storage();
-
     // Opens the log device; 0 or -1. Nothing happens when it is open.
     int open_dev();
     void close_dev();
     // Stops polling a log device that failed, and opens it again now or in a while.
     void recover_dev();
 
-    // Starts the exchange that saves the CP's memory. 0 or -1.
-    virtual int start_dump(const struct tm& t) = 0;
-
     // The diag device of a transaction, opened or borrowed; null on failure.
     DiagDeviceHandler* create_diag_device(DataConsumer* consumer);
     void start_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
     void stop_transaction(CpWorkState new_state);
-    // Registers the diag handler, binds it and starts the consumer as a transaction. Takes
-    // both over; on failure (-1) they are destroyed.
+    // Registers the diag handler, in place of the log device when both are one, binds it and
+    // starts the consumer as a transaction. Takes both over; on failure (-1) they are
+    // destroyed. A handler that the loop has no room for is polled once there is some: until
+    // then the exchange's time-out counts.
     int run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
     // Ends a transaction that a client waits for; the client gets the result.
     void end_client_transaction(int result);
@@ -118,11 +134,6 @@ protected:
     void notify_cp_dump(CpDumpEvent event);
 
 private:
-    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
-    static void reopen_log_dev(void* handler);
-    static void new_log_cb(LogPipeHandler* handler, LogFile* file);
-    static void new_dir_cb(LogPipeHandler* handler);
-
     int check_client_transaction() const;
     int begin_client_transaction(DataConsumer* consumer, CpWorkState state, ClientHandler* client);
     bool client_transaction_runs() const {
@@ -138,7 +149,6 @@ private:
     bool is_modem() const { return m_type >= CT_WCDMA && m_type <= CT_5MODE; }
     void close_on_assert();
     bool save_version();
-    bool save_timestamp(LogFile* file);
 
     bool m_enabled = false;
     bool m_save_wcdma_iq = false;

@@ -18,11 +18,11 @@
 
 // ---- What heads a new directory and a new log file
 
-void LogPipeHandler::new_log_cb(LogPipeHandler* handler, LogFile* file) {
+void LogPipeHandler::new_log_callback(LogPipeHandler* handler, LogFile* file) {
     handler->save_timestamp(file);
 }
 
-void LogPipeHandler::new_dir_cb(LogPipeHandler* handler) {
+void LogPipeHandler::new_dir_callback(LogPipeHandler* handler) {
     handler->save_version();
 }
 
