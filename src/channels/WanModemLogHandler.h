@@ -16,17 +16,16 @@ public:
 
     int start() override;
     int stop() override;
-
-protected:
     int start_dump(const struct tm& t) override;
 
-private:
+    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
+
     // ---- The log parsing database beside the logs. 0 or -1; every failure is logged and
     // leaves no half-written file. sha1_hex: SHA1_HEX_LEN characters, no terminator.
 
-    // Path of the modem's firmware image, from the properties.
+    // Path of the modem's firmware image, from the properties; cut when it does not fit.
     static int get_image_path(CpType type, char* buf, size_t size);
-    // A descriptor, or -1.
+    // A descriptor, or -1. A path that was cut is not opened.
     static int open_modem_img();
     // Finds the database in the image: its digest, its place and its size in bytes.
     static int get_modem_img(int fd, uint8_t* sha1_hex, size_t& offset, size_t& size);
@@ -34,15 +33,17 @@ private:
     static int check_cur_parsing_lib(const android::String8& db_path,
                                      const android::String8& sha1_path, uint8_t* sha1_hex,
                                      size_t& size);
+    // Writes the database that lies in fd, and its digest. The digest goes first and comes
+    // last: wherever this ends, what counts as current is complete.
     static int save_log_lib(const android::String8& db_path, const android::String8& sha1_path,
                             int fd, size_t offset, size_t size, const uint8_t* sha1_hex);
     // Brings the files in the medium's log root up to date.
     int save_log_parsing_lib(MediaStorage& media);
-    void save_current_parsing_lib();
-    void unsubscribe();
     static void on_media_change(void* handler, MediaType type);
 
-    static void diag_transaction_notify(void* client, DataConsumer::LogProcResult result);
+private:
+    void save_current_parsing_lib();
+    void unsubscribe();
 
     android::String8 m_mem_path;
     bool m_subscribed = false;  // to changes of the medium

@@ -1,6 +1,7 @@
 // The part of WanModemLogHandler that keeps the modem's log parsing database beside its
 // logs: taken from the firmware image, with the digest that tells whether it is current.
 #include <cutils/properties.h>
+#include <errno.h>
 #include <fcntl.h>
 #include <stdio.h>
 #include <string.h>
@@ -11,6 +12,7 @@
 #include "channels/WanModemLogHandler.h"
 #include "config/property_names.h"
 #include "core/log.h"
+#include "core/open_file.h"
 #include "storage/CpStorage.h"
 #include "storage/MediaStorage.h"
 
@@ -18,11 +20,22 @@ namespace {
 
 constexpr char DB_FILE_NAME[] = "/modem_db.gz";
 constexpr char SHA1_FILE_NAME[] = "/sha1.txt";
-// A link of that name on a card must not be written through.
-constexpr int LIB_FILE_FLAGS = O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC;
+constexpr size_t IMAGE_PATH_SIZE = 128;
 // An image has a handful of entries; a table that goes on for longer is garbage.
 constexpr int MAX_ENTRIES = 1024;
 constexpr size_t COPY_SIZE = 32768;
+
+// 0 when nothing has the name any more. A directory stays and is a failure.
+int remove_file(const char* path) {
+    return unlink(path) == 0 || errno == ENOENT ? 0 : -1;
+}
+
+// Makes a file that is new: whatever else had the name, a link or a FIFO put there by
+// somebody else included, is not written to but replaced.
+int create_anew(const char* path) {
+    return remove_file(path) < 0 ? -1
+                                 : open_to_write(path, O_WRONLY | O_CREAT | O_EXCL, Links::REFUSE);
+}
 
 int copy_bytes(int src, int dst, size_t n) {
     static uint8_t buffer[COPY_SIZE];
@@ -61,13 +74,7 @@ int WanModemLogHandler::get_image_path(CpType type, char* buf, size_t size) {
         err_log("no %s property", prop);
         return -1;
     }
-    const int len = snprintf(buf, size, "%s%smodem", partition, value);
-    if (len < 0 || static_cast<size_t>(len) >= size) {
-        // A path cut short could name another file.
-        errno = ENAMETOOLONG;
-        err_log("MODEM image path %s%smodem too long", partition, value);
-        return -1;
-    }
+    snprintf(buf, size, "%s%smodem", partition, value);
     return 0;
 }
 
@@ -77,12 +84,18 @@ int WanModemLogHandler::open_modem_img() {
         err_log("can not get MODEM type");
         return -1;
     }
-    char path[128];
+    char path[IMAGE_PATH_SIZE + 1];  // one more than a path may fill, to know one that was cut
     if (get_image_path(type, path, sizeof(path)) < 0) {
         err_log("can not get MODEM image file path");
         return -1;
     }
-    return open(path, O_RDONLY | O_CLOEXEC);
+    if (strlen(path) >= IMAGE_PATH_SIZE) {
+        // Cut short it could name another file.
+        errno = ENAMETOOLONG;
+        err_log("MODEM image path %s... is too long", path);
+        return -1;
+    }
+    return open_to_read(path, Links::FOLLOW);
 }
 
 int WanModemLogHandler::get_modem_img(int fd, uint8_t* sha1_hex, size_t& offset, size_t& size) {
@@ -156,7 +169,12 @@ int WanModemLogHandler::check_cur_parsing_lib(const android::String8& db_path,
         err_log("lstat(%s) error", db_path.string());
         return -1;
     }
-    const int fd = open(sha1_path.string(), O_RDONLY | O_CLOEXEC);
+    if (!S_ISREG(st.st_mode)) {
+        errno = S_ISDIR(st.st_mode) ? EISDIR : EINVAL;
+        err_log("%s is not a regular file", db_path.string());
+        return -1;
+    }
+    const int fd = open_to_read(sha1_path.string(), Links::REFUSE);
     if (fd < 0) {
         err_log("open(%s) error", sha1_path.string());
         return -1;
@@ -178,20 +196,26 @@ int WanModemLogHandler::save_log_lib(const android::String8& db_path,
         err_log("seek MODEM image file %u error", static_cast<unsigned int>(offset));
         return -1;
     }
-    const int db = open(db_path.string(), LIB_FILE_FLAGS, 0644);
+    if (remove_file(sha1_path.string()) < 0) {
+        err_log("remove %s failed", sha1_path.string());
+        return -1;
+    }
+    const int db = create_anew(db_path.string());
     if (db < 0) {
         err_log("open %s failed", db_path.string());
         return -1;
     }
-    const int copied = copy_bytes(fd, db, size);
+    // An image that ends early is copied without an error, but is not the whole database.
+    const bool copied =
+        copy_bytes(fd, db, size) == 0 && lseek(db, 0, SEEK_CUR) == static_cast<off_t>(size);
     // What the medium could not take may come out only now.
     const int closed = ::close(db);
-    if (copied < 0 || closed < 0) {
+    if (!copied || closed < 0) {
         err_log("save parsing lib error");
         unlink(db_path.string());
         return -1;
     }
-    const int sha1 = open(sha1_path.string(), LIB_FILE_FLAGS, 0644);
+    const int sha1 = create_anew(sha1_path.string());
     if (sha1 < 0) {
         err_log("create SHA-1 file error");
         unlink(db_path.string());

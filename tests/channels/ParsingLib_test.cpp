@@ -1,6 +1,10 @@
 // The modem's log parsing database, taken from the firmware image to the log root.
+#include <sys/resource.h>
+#include <sys/wait.h>
+
 #include "channels/FaultFixture.h"
 #include "channels/ModemImage.h"
+#include "channels/WanModemLogHandler.h"
 
 namespace {
 
@@ -147,8 +151,8 @@ TEST_F(ParsingLibTest, AFailureLeavesNoHalfWrittenFile) {
         if (!hit || saved(DB) == db) {
             expect_saved(db);
         } else {
-            EXPECT_TRUE(saved(DB) == "(none)" || (saved(DB) == "older" && saved(SHA1) == zeros));
-            EXPECT_TRUE(saved(SHA1) == "(none)" || saved(SHA1) == zeros) << saved(SHA1);
+            EXPECT_TRUE(saved(SHA1) == "(none)" || (saved(DB) == "older" && saved(SHA1) == zeros));
+            EXPECT_TRUE(saved(DB) == "(none)" || saved(DB) == "older");
         }
         restart();
         expect_saved(db);
@@ -163,8 +167,99 @@ TEST_F(ParsingLibTest, AFailureLeavesNoHalfWrittenFile) {
         while (attempt(faults::OPEN, ++opens, older)) {
         }
         EXPECT_EQ(opens, older ? 4 : 3);
+        int unlinks = 0;
+        while (attempt(faults::UNLINK, ++unlinks, older)) {
+        }
+        EXPECT_EQ(unlinks, 4) << "three names were to be free";
     }
+    // An image that ends before its database does.
+    const int cut = open(root.path("part/nv_wmodem").c_str(), O_RDONLY | O_CLOEXEC);
+    EXPECT_EQ(WanModemLogHandler::save_log_lib(root.path("db").c_str(), root.path("sha1").c_str(),
+                                               cut, 1020, db.size() + 1,
+                                               reinterpret_cast<const uint8_t*>(HEX)),
+              -1);
+    close(cut);
+    EXPECT_FALSE(root.exists("db") || root.exists("sha1"));
     EXPECT_EQ(lasting_descriptors(), descriptors);
+}
+
+TEST_F(ParsingLibTest, AKillLeavesNoDigestBesideAnotherDatabase) {
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    root.write_file("part/nv_wmodem", good(pattern_bytes(100002, 4)));
+    modem()->stop();
+    const pid_t pid = fork();
+    if (pid == 0) {
+        const struct rlimit size = {32768, 32768};  // killed by the second write
+        setrlimit(RLIMIT_FSIZE, &size);
+        modem()->start();
+        _exit(0);
+    }
+    int status;
+    ASSERT_EQ(waitpid(pid, &status, 0), pid);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGXFSZ);
+    EXPECT_EQ(saved(DB).size(), 32768u);
+    EXPECT_EQ(saved(SHA1), "(none)");
+    restart();
+    expect_saved(pattern_bytes(100002, 4));
+}
+
+// Whatever somebody has put in the place of the files: it is not waited for, not followed
+// and replaced, but for a directory.
+TEST_F(ParsingLibTest, NothingButItsOwnFilesIsTakenForTheLibrary) {
+    root.write_file("other", db);
+    root.write_file("digest", HEX);
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    const struct {
+        const char* what;
+        std::function<int(const char* path)> put;
+    } strangers[] = {
+        {"FIFO", [](const char* path) { return mkfifo(path, 0600); }},
+        {"link", [&](const char* path) { return symlink(root.path("other").c_str(), path); }},
+        {"link to the digest",
+         [&](const char* path) { return symlink(root.path("digest").c_str(), path); }},
+        {"link to nothing", [](const char* path) { return symlink("/nowhere/x", path); }},
+        {"directory", [](const char* path) { return mkdir(path, 0700); }},
+    };
+    for (const auto& s : strangers) {
+        for (const std::string name : {DB, SHA1}) {
+            SCOPED_TRACE(s.what + (" as " + name));
+            remove_tree("data/modem_log/" + name);
+            ASSERT_EQ(s.put(root.path("data/modem_log/" + name).c_str()), 0);
+            restart();
+            EXPECT_TRUE(log.has(name + " is not a regular file [") || log.has(name + ") error ["));
+            if (s.what == std::string("directory")) {
+                EXPECT_TRUE(log.has(name + " failed [21(Is a directory)]")) << log.text();
+                EXPECT_FALSE(root.exists("data/modem_log/sha1.txt") && name == DB);
+                remove_tree("data/modem_log/" + name);
+                restart();
+            }
+            expect_saved(db);
+            struct stat st;
+            EXPECT_EQ(lstat(root.path("data/modem_log/" + name).c_str(), &st), 0);
+            EXPECT_TRUE(S_ISREG(st.st_mode));
+        }
+    }
+    EXPECT_TRUE(root.read_file("other") == db);
+    EXPECT_EQ(root.read_file("digest"), HEX);
+    // Nor is an image that is no file, or whose path does not fit.
+    remove_tree("part/nv_wmodem");
+    ASSERT_EQ(mkfifo(root.path("part/nv_wmodem").c_str(), 0600), 0);
+    restart();
+    EXPECT_TRUE(log.has("save_log_parsing_lib(MediaStorage&): open MODEM image failed [22("));
+    remove_saved();
+    for (size_t len : {127u, 128u}) {
+        const std::string value(len - root.path("part/modem").size(), 'n');
+        root.set_prop("persist.modem.w.nvp", value);
+        root.write_file("part/" + value + "modem", good(db));
+        restart();
+        EXPECT_EQ(saved(SHA1), HEX);
+        EXPECT_EQ(log.has("is too long [36("), len == 128);
+    }
+    char path[10];
+    EXPECT_EQ(WanModemLogHandler::get_image_path(CT_WCDMA, path, sizeof(path)), 0);
+    EXPECT_EQ(path, root.path("part").substr(0, 9));
 }
 
 TEST_F(ParsingLibTest, StaysCurrentOnBothMediaWithSeveralModems) {
