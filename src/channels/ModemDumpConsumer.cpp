@@ -102,9 +102,6 @@ void ModemDumpConsumer::dump_read_timeout(void* param) {
 
 bool ModemDumpConsumer::save_dump_file() {
     m_handler->del_events(POLLIN);
-    // Making the file may find that the SD card is gone. The dump that lay on it has been
-    // given up already, so that must not end this transaction under our feet.
-    m_storage->unsubscribe_ext_stor_umount_evt(this);
     LogFile* file = open_dump_mem_file();
     if (!file) {
         err_log("create dump mem file failed");
@@ -122,6 +119,8 @@ bool ModemDumpConsumer::save_dump_file() {
 
 void ModemDumpConsumer::on_ext_stor_umount(void* param) {
     ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
+    // Also when making the ".mem" file finds that the card is gone: the dump that lay on it has
+    // been given up by then, and the transaction goes on.
     if (!consumer->dump_on_sd()) {
         return;
     }

@@ -1,5 +1,7 @@
 #include "channels/ModemDumpConsumer.h"
 
+#include <malloc.h>
+
 #include "channels/FaultFixture.h"
 #include "storage/MediaStorage.h"
 
@@ -77,6 +79,16 @@ TEST_F(ModemDumpTest, KeepsEveryByteAndOnlyTheMarkerEndsIt) {
     modem()->process_alive();
     EXPECT_TRUE(both_log("<after>"));
     EXPECT_EQ(logged("cp_wcdma", "finish"), 0u);
+    // A dump that has ended does not mind the card any more: it is gone, memory and all.
+    mallopt(M_PERTURB, 0xa5);
+    set_card(true);
+    ASSERT_TRUE(both_log("<card>"));
+    ASSERT_TRUE(begin_dump());
+    ASSERT_TRUE(supply(diag_dev, end_marker()));
+    set_card(false);
+    modem()->process_alive();
+    EXPECT_TRUE(both_log("<no card>"));
+    mallopt(M_PERTURB, 0);
 }
 
 // Two modems fall silent: one after some data, one without an answer.
