@@ -159,34 +159,27 @@ TEST_F(ParsingLibTest, AFailureLeavesNoHalfWrittenFile) {
         return hit;
     };
     for (bool older : {false, true}) {
-        int writes = -1;
-        while (attempt(faults::WRITE, ++writes, older)) {
+        const struct {
+            faults::Call call;
+            int end;  // nobody is called that often
+        } calls[] = {{faults::WRITE, 6}, {faults::OPEN, older ? 4 : 3}, {faults::UNLINK, 4}};
+        for (const auto& c : calls) {
+            int nth = c.call == faults::WRITE ? -1 : 0;
+            while (attempt(c.call, ++nth, older)) {
+            }
+            EXPECT_EQ(nth, c.end);
         }
-        EXPECT_EQ(writes, 6) << "four pieces and the digest were made to fail";
-        int opens = 0;
-        while (attempt(faults::OPEN, ++opens, older)) {
-        }
-        EXPECT_EQ(opens, older ? 4 : 3);
-        int unlinks = 0;
-        while (attempt(faults::UNLINK, ++unlinks, older)) {
-        }
-        EXPECT_EQ(unlinks, 4) << "three names were to be free";
     }
     // An image that ends before its database does.
     const int cut = open(root.path("part/nv_wmodem").c_str(), O_RDONLY | O_CLOEXEC);
-    EXPECT_EQ(WanModemLogHandler::save_log_lib(root.path("db").c_str(), root.path("sha1").c_str(),
-                                               cut, 1020, db.size() + 1,
-                                               reinterpret_cast<const uint8_t*>(HEX)),
-              -1);
+    const auto* hex = reinterpret_cast<const uint8_t*>(HEX);
+    EXPECT_LT(WanModemLogHandler::save_log_lib(root.path("db").c_str(), root.path("sha").c_str(),
+                                               cut, 1020, db.size() + 1, hex),
+              0);
     close(cut);
-    EXPECT_FALSE(root.exists("db") || root.exists("sha1"));
-    EXPECT_EQ(lasting_descriptors(), descriptors);
-}
-
-TEST_F(ParsingLibTest, AKillLeavesNoDigestBesideAnotherDatabase) {
-    boot_modem(false);
-    ASSERT_TRUE(write_log());
-    root.write_file("part/nv_wmodem", good(pattern_bytes(100002, 4)));
+    EXPECT_FALSE(root.exists("db") || root.exists("sha"));
+    // A kill leaves no digest beside another database.
+    root.write_file("part/nv_wmodem", good(db + "2"));
     modem()->stop();
     const pid_t pid = fork();
     if (pid == 0) {
@@ -195,13 +188,13 @@ TEST_F(ParsingLibTest, AKillLeavesNoDigestBesideAnotherDatabase) {
         modem()->start();
         _exit(0);
     }
-    int status;
-    ASSERT_EQ(waitpid(pid, &status, 0), pid);
-    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGXFSZ);
-    EXPECT_EQ(saved(DB).size(), 32768u);
-    EXPECT_EQ(saved(SHA1), "(none)");
+    int status = 0;
+    EXPECT_EQ(waitpid(pid, &status, 0), pid);
+    EXPECT_EQ(status & 0x7f, SIGXFSZ);
+    EXPECT_EQ(saved(SHA1) + std::to_string(saved(DB).size()), "(none)32768");
     restart();
-    expect_saved(pattern_bytes(100002, 4));
+    expect_saved(db + "2");
+    EXPECT_EQ(lasting_descriptors(), descriptors);
 }
 
 // Whatever somebody has put in the place of the files: it is not waited for, not followed
@@ -211,34 +204,30 @@ TEST_F(ParsingLibTest, NothingButItsOwnFilesIsTakenForTheLibrary) {
     root.write_file("digest", HEX);
     boot_modem(false);
     ASSERT_TRUE(write_log());
-    const struct {
-        const char* what;
-        std::function<int(const char* path)> put;
-    } strangers[] = {
-        {"FIFO", [](const char* path) { return mkfifo(path, 0600); }},
-        {"link", [&](const char* path) { return symlink(root.path("other").c_str(), path); }},
-        {"link to the digest",
-         [&](const char* path) { return symlink(root.path("digest").c_str(), path); }},
-        {"link to nothing", [](const char* path) { return symlink("/nowhere/x", path); }},
-        {"directory", [](const char* path) { return mkdir(path, 0700); }},
+    const auto link_to = [](const std::string& target) {
+        return [target](const char* path) { return symlink(target.c_str(), path); };
     };
-    for (const auto& s : strangers) {
+    const std::function<int(const char* path)> strangers[] = {
+        [](const char* path) { return mkdir(path, 0700); },
+        [](const char* path) { return mkfifo(path, 0600); },
+        link_to(root.path("other")),
+        link_to(root.path("digest")),
+        link_to("/nowhere/x"),
+    };
+    for (const auto& put : strangers) {
         for (const std::string name : {DB, SHA1}) {
-            SCOPED_TRACE(s.what + (" as " + name));
+            SCOPED_TRACE(name + " " + std::to_string(&put - strangers));
             remove_tree("data/modem_log/" + name);
-            ASSERT_EQ(s.put(root.path("data/modem_log/" + name).c_str()), 0);
+            ASSERT_EQ(put(root.path("data/modem_log/" + name).c_str()), 0);
             restart();
             EXPECT_TRUE(log.has(name + " is not a regular file [") || log.has(name + ") error ["));
-            if (s.what == std::string("directory")) {
+            if (&put == strangers) {
                 EXPECT_TRUE(log.has(name + " failed [21(Is a directory)]")) << log.text();
-                EXPECT_FALSE(root.exists("data/modem_log/sha1.txt") && name == DB);
                 remove_tree("data/modem_log/" + name);
                 restart();
             }
             expect_saved(db);
-            struct stat st;
-            EXPECT_EQ(lstat(root.path("data/modem_log/" + name).c_str(), &st), 0);
-            EXPECT_TRUE(S_ISREG(st.st_mode));
+            EXPECT_FALSE(std::filesystem::is_symlink(root.path("data/modem_log/" + name)));
         }
     }
     EXPECT_TRUE(root.read_file("other") == db);
