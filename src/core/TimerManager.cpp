@@ -1,5 +1,7 @@
 #include "core/TimerManager.h"
 
+#include <limits.h>
+
 #include "core/log.h"
 
 namespace {
@@ -31,8 +33,10 @@ struct timespec TimerManager::add_ms(const struct timespec& t, unsigned int ms) 
     return sum;
 }
 
-int TimerManager::diff_ms(const struct timespec& a, const struct timespec& b) {
-    return static_cast<int>((a.tv_nsec - b.tv_nsec) / NS_PER_MS + 1000 * (a.tv_sec - b.tv_sec));
+int64_t TimerManager::diff_ms(const struct timespec& a, const struct timespec& b) {
+    // Before the subtraction: both are of 32 bits on a 32-bit handset.
+    const int64_t seconds = static_cast<int64_t>(a.tv_sec) - b.tv_sec;
+    return (a.tv_nsec - b.tv_nsec) / NS_PER_MS + 1000 * seconds;
 }
 
 bool TimerManager::is_earlier(const struct timespec& a, const struct timespec& b) {
@@ -104,6 +108,18 @@ void TimerManager::del_timer(Timer* t) {
     }
 }
 
+void TimerManager::cancel_timers(timer_callback cb, void* client_data) {
+    for (auto it = m_timers.begin(); it != m_timers.end();) {
+        Timer* const t = *it;
+        if (t->cb == cb && t->client_data == client_data) {
+            it = m_timers.erase(it);
+            delete t;
+        } else {
+            ++it;
+        }
+    }
+}
+
 int TimerManager::get_timeout(int* ms) {
     if (m_timers.empty()) {
         *ms = -1;
@@ -114,7 +130,8 @@ int TimerManager::get_timeout(int* ms) {
         return -1;
     }
     const struct timespec& due = (*m_timers.begin())->due;
-    *ms = is_earlier(now, due) ? diff_ms(due, now) : 0;
+    const int64_t left = is_earlier(now, due) ? diff_ms(due, now) : 0;
+    *ms = left > INT_MAX ? INT_MAX : static_cast<int>(left);
     return 0;
 }
 

@@ -32,7 +32,11 @@ public:
 
     // Calls cb(client_data) once, ms milliseconds from now. Timers due at the same time
     // fire in the order they were added. 0, or -1 (logged) when the clock cannot be read.
+    // Whoever may go before the timer fires takes it back with cancel_timers.
     int add_timer(unsigned int ms, timer_callback cb, void* client_data);
+
+    // Cancels every pending timer with that callback and that client.
+    void cancel_timers(timer_callback cb, void* client_data);
 
     // As add_timer, for a caller that wants to cancel or re-arm the timer. The handle is
     // valid until the timer fires or is cancelled. Null, not logged, without a clock.
@@ -45,8 +49,9 @@ public:
     // Cancels a timer; nothing happens when t is not pending.
     void del_timer(Timer* t);
 
-    // Stores the time-out for poll: whole milliseconds to the earliest timer, 0 when it
-    // is overdue, -1 without timers. Returns 0, or -1 when the clock cannot be read.
+    // Stores the time-out for poll: whole milliseconds to the earliest timer (INT_MAX when
+    // it is further away), 0 when it is overdue, -1 without timers. Returns 0, or -1 when the clock
+    // cannot be read.
     int get_timeout(int* ms);
 
     // Runs the timers that are due now, earliest first. Those added meanwhile wait for
@@ -56,7 +61,7 @@ public:
     // Time arithmetic on normalised values: t plus ms milliseconds; a minus b in
     // milliseconds, the difference of the nanoseconds cut towards zero; a before b.
     static struct timespec add_ms(const struct timespec& t, unsigned int ms);
-    static int diff_ms(const struct timespec& a, const struct timespec& b);
+    static int64_t diff_ms(const struct timespec& a, const struct timespec& b);
     static bool is_earlier(const struct timespec& a, const struct timespec& b);
 
 private:

@@ -55,7 +55,7 @@ protected:
 TEST(TimerArithmetic, SumDifferenceAndOrder) {
     const struct {
         struct timespec a, b;
-        int ms;  // a - b
+        int64_t ms;  // a - b
     } table[] = {
         {{5, 0}, {5, 0}, 0},
         {{5, 1999999}, {5, 0}, 1},
@@ -63,6 +63,7 @@ TEST(TimerArithmetic, SumDifferenceAndOrder) {
         {{6, 0}, {5, 999999999}, 1},  // -999 ms of the nanoseconds, cut towards zero
         {{8, 500000000}, {5, 250000000}, 3250},
         {{5, 250000000}, {8, 500000000}, -3250},
+        {{2000000000, 0}, {-2000000000, 0}, 4000000000000},
         {TimerManager::add_ms({5, 500000000}, 499), {5, 999000000}, 0},
         {TimerManager::add_ms({5, 500000000}, 500), {6, 0}, 0},
         {TimerManager::add_ms({5, 999999999}, 1), {6, 999999}, 0},
@@ -99,6 +100,13 @@ TEST_F(TimerManagerTest, CancelAndRearm) {
         }
         EXPECT_EQ(row.fired, after(200));
     }
+    // Those without a handle, of one client.
+    for (size_t i : {0u, 1u, 0u}) {
+        create(i, 10);
+    }
+    m_mgr.cancel_timers(fire, &m_clients[0]);
+    m_mgr.cancel_timers([](void*) {}, &m_clients[1]);
+    EXPECT_EQ("b", after(10));
 }
 
 // The timer that would run next is cancelled or re-armed by a callback.
@@ -137,6 +145,11 @@ TEST_F(TimerManagerTest, UnreadableClockChangesNothing) {
     create(0, 10);
     EXPECT_TRUE(m_mgr.get_timeout(&ms) == 0 && ms == 10);
     m_mgr.del_timer(m_clients[1].timer);
+    // The farthest a poll may wait; it was negative, which is for ever.
+    m_clients[0].timer->due.tv_sec += 3000000;
+    EXPECT_TRUE(m_mgr.get_timeout(&ms) == 0 && ms == 2147483647);
+    m_clients[0].timer->due.tv_sec -= 3000000;
+    ms = 10;
     LogCapture log;
     boot_clock::fail();
     EXPECT_EQ(nullptr, m_mgr.create_timer(0, fire, nullptr));
