@@ -1,6 +1,5 @@
 #include "storage/FileNotifier.h"
 
-#include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
 
@@ -18,16 +17,13 @@ int FileNotifier::open() {
     if (m_fd >= 0) {
         return 0;
     }
-    m_fd = ::open(m_path.string(), O_RDONLY | O_CLOEXEC);
+    // Non-blocking: a FIFO would hold up the service until somebody writes to it.
+    m_fd = ::open(m_path.string(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
     if (m_fd < 0) {
         return -1;
     }
-    if (add_events(POLLIN) < 0) {
-        // Open but never polled would be a silent failure: let the owner report it.
-        FdHandler::close();
-        errno = ENOBUFS;
-        return -1;
-    }
+    note_alive();  // what an earlier descriptor came to does not count
+    poll_when_room(POLLIN, m_path.string());
     return 0;
 }
 
@@ -41,5 +37,7 @@ void FileNotifier::close() {
 void FileNotifier::process(int) {
     if (m_callback) {
         m_callback(this, m_client);
+    } else {
+        note_idle(m_path.string());
     }
 }

@@ -1,8 +1,8 @@
 // Tells its owner that a file, in practice a device of a CP, can be read: it keeps the
 // file open and registered with the loop and calls the owner back each time the
-// descriptor is ready. The owner reads the descriptor itself and may close the notifier
-// from the callback. Closed after construction; may be opened and closed any number of
-// times.
+// descriptor is ready. The owner reads the descriptor itself, says what that came to
+// (note_alive, note_idle) and may close the notifier from the callback. Closed after
+// construction; may be opened and closed any number of times.
 #ifndef STORAGE_FILENOTIFIER_H_
 #define STORAGE_FILENOTIFIER_H_
 
@@ -20,12 +20,16 @@ public:
     // Sets whom to call; a null callback (the initial state) leaves readiness unanswered.
     void set_callback(void* client, notify_callback callback);
 
-    // Opens the file for reading and has the loop watch it. 0, also when it is open
-    // already; -1 with errno, not logged, when it cannot be opened or watched.
+    // Opens the file for reading, non-blocking, without ever waiting for it, and has the
+    // loop watch it, as soon as there is room. 0, also when it is open already; -1 with
+    // errno, not logged, when it cannot be opened.
     int open();
 
     // Stops watching and closes the file, if open.
     void close();
+
+    // The path that is opened.
+    const android::String8& path() const { return m_path; }
 
     void process(int events) override;
 
