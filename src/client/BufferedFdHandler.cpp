@@ -16,9 +16,12 @@ void BufferedFdHandler::process(int /*events*/) {
     if (n == 0) {
         process_conn_closed();
     } else if (n > 0) {
+        note_alive();
         m_data_len += static_cast<size_t>(n);
         process_data();
-    } else if (errno != EAGAIN && errno != EINTR) {
+    } else if (errno == EAGAIN) {
+        note_idle("connection");
+    } else if (errno != EINTR) {
         process_conn_error(errno);
     }
 }

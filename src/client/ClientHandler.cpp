@@ -12,6 +12,12 @@
 
 namespace {
 
+// What a client is polled for while its transaction runs and nothing is read from it. poll
+// reports a hang-up unasked; this only keeps the client in the loop's table. It means that
+// both directions are gone. A client that shut down its writing end alone, as a pipe into
+// a network tool does after its last request, still waits for its reply.
+constexpr int GONE_EVENTS = POLLHUP;
+
 // One write: what a client that does not read has no room for is lost, and a late
 // rest of a line would only garble the next one.
 int send_all(int fd, const char* text, size_t len) {
@@ -28,7 +34,6 @@ ClientHandler::~ClientHandler() {
 }
 
 int ClientHandler::process_data() {
-    m_in_data = true;
     const uint8_t* const end = m_buffer + m_data_len;
     const uint8_t* req = m_buffer;
     for (const uint8_t* p = m_buffer; p < end; ++p) {
@@ -40,10 +45,6 @@ int ClientHandler::process_data() {
     m_data_len = static_cast<size_t>(end - req);
     if (req != m_buffer) {
         memmove(m_buffer, req, m_data_len);
-    }
-    m_in_data = false;
-    if (m_unreadable) {
-        process_conn_closed();
     }
     return 0;
 }
@@ -118,6 +119,8 @@ int ClientHandler::start_trans(ClientTransType type, LogPipeHandler* channel) {
         m_trans_state = CTS_IDLE;
         m_trans_channel = nullptr;
     } else if (m_trans_state == CTS_EXECUTING) {
+        // First the new event: the place in the loop's table must not be lost.
+        poll_when_room(GONE_EVENTS, "client");
         del_events(POLLIN);
     }
     return result;
@@ -126,15 +129,9 @@ int ClientHandler::start_trans(ClientTransType type, LogPipeHandler* channel) {
 void ClientHandler::end_trans(int result) {
     m_trans_state = CTS_IDLE;
     m_trans_channel = nullptr;
-    if (add_events(POLLIN) < 0) {
-        info_log("no room to poll the client, closing it");
-        m_unreadable = true;
-    }
+    poll_when_room(POLLIN, "client");
+    del_events(GONE_EVENTS);
     reply(result_to_error(result));
-    // While requests are being handled the object is still in use: process_data closes.
-    if (m_unreadable && !m_in_data) {
-        process_conn_closed();
-    }
 }
 
 void ClientHandler::cancel_trans() {

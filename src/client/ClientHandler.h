@@ -21,6 +21,9 @@ class LogPipeHandler;
 
 class ClientHandler : public BufferedFdHandler, public RefTarget {
 public:
+    enum ClientTransType : int { CTT_NONE = 0, CTT_SLEEP_LOG = 1, CTT_RINGBUF = 2 };
+    enum ClientTransState : int { CTS_IDLE = 0, CTS_EXECUTING = 1 };
+
     // One kind of request: a row of the request table in RequestTable.cpp.
     struct Request {
         const char* keyword;
@@ -43,7 +46,7 @@ public:
     void process_conn_closed() override;
     void process_conn_error(int err) override;
 
-    // Handles one request, given without its terminator.
+    // Handles one request, given without its terminator. Never destroys the object.
     void process_req(const uint8_t* req, size_t len);
 
     // Sends the line on the CP's dump if the client has subscribed to the CP. 0, or -1
@@ -51,13 +54,19 @@ public:
     int notify_cp_dump(CpType type, CpDumpEvent event);
 
     // Called once by the channel when the client's transaction has ended: 0, -1 failure,
-    // -4 no sleep log support, -5 no ring buffer support. May destroy the object.
+    // -4 no sleep log support, -5 no ring buffer support.
     void notify_trans_result(int result);
+    // The same for a client whose transaction of that kind runs.
+    void proc_sleep_log_result(int result);
+    void proc_ringbuf_result(int result);
+
+    // Reply code for the result of an operation.
+    static int result_to_error(int result);
+    // Writes the reply with that code to a client's socket: OK for 0, else the error. 0, or
+    // -1 when it could not be written whole.
+    static int send_response(int fd, int code);
 
 private:
-    enum ClientTransType : int { CTT_NONE = 0, CTT_SLEEP_LOG = 1, CTT_RINGBUF = 2 };
-    enum ClientTransState : int { CTS_IDLE = 0, CTS_EXECUTING = 1 };
-
     // Codes of error replies.
     enum ReplyCode : int {
         RC_OK = 0,
@@ -101,9 +110,6 @@ private:
     void proc_enable_overwrite(const uint8_t* params, size_t len);
     void proc_disable_overwrite(const uint8_t* params, size_t len);
 
-    void proc_sleep_log_result(int result);
-    void proc_ringbuf_result(int result);
-
     // Has the channel start a transaction for this client: 1 when it runs (or has even
     // ended already), otherwise why not, as a negative number.
     int start_trans(ClientTransType type, LogPipeHandler* channel);
@@ -111,10 +117,6 @@ private:
     void end_trans(int result);
     void cancel_trans();
 
-    // Reply code for the result of an operation.
-    static int result_to_error(int result);
-    // Writes the reply with that code; 0, or -1 when it could not be written whole.
-    static int send_response(int fd, int code);
     void reply(int code) { send_response(m_fd, code); }
     void reply_number(unsigned int number);
     void reply_word(const char* word);
@@ -124,8 +126,6 @@ private:
     ClientTransState m_trans_state = CTS_IDLE;
     ObjectRef<LogPipeHandler> m_trans_channel;
     bool m_dump_subscribed[CP_TYPE_NUM] = {};
-    bool m_in_data = false;     // process_data is on the stack
-    bool m_unreadable = false;  // the loop had no room to poll the client again
 };
 
 #endif  // CLIENT_CLIENTHANDLER_H_

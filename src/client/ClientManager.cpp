@@ -1,6 +1,7 @@
 #include "client/ClientManager.h"
 
 #include <cutils/sockets.h>
+#include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/socket.h>
@@ -22,9 +23,6 @@ ClientManager::ClientManager(LogController* ctrl, Multiplexer* mux, size_t max_c
     : FdHandler(-1, ctrl, mux), m_max_clients(max_clients) {}
 
 ClientManager::~ClientManager() {
-    if (m_listen_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_listen_timer);
-    }
     for (ClientHandler* client : m_clients) {
         delete client;
     }
@@ -51,6 +49,7 @@ int ClientManager::init(const char* name) {
 void ClientManager::process(int /*events*/) {
     const int fd = accept4(m_fd, nullptr, nullptr, SOCK_CLOEXEC);
     if (fd < 0) {
+        note_idle("server socket");
         return;
     }
     if (set_nonblock(fd) < 0) {
@@ -58,10 +57,13 @@ void ClientManager::process(int /*events*/) {
     }
     ClientHandler* client = new ClientHandler(fd, m_log_ctrl, m_multiplexer, this);
     if (client->add_events(POLLIN) < 0) {
-        info_log("no room to poll a new client, closing it");
+        errno = ENOBUFS;
+        err_log("no room to poll a new client, closing it");
+        note_idle("server socket");
         delete client;
         return;
     }
+    note_alive();
     m_clients.push_back(client);
     info_log("new client accepted");
     if (full()) {
@@ -91,18 +93,5 @@ void ClientManager::notify_cp_dump(CpType type, CpDumpEvent event) {
 }
 
 void ClientManager::resume_listening() {
-    if (add_events(POLLIN) == 0 || m_listen_timer) {
-        return;
-    }
-    // The server must not stay deaf for ever because the loop was full for a moment.
-    info_log("no room to poll the server socket, trying again later");
-    m_listen_timer = m_multiplexer->timer_mgr().create_timer(LISTEN_RETRY_MS, listen_again, this);
-}
-
-void ClientManager::listen_again(void* manager) {
-    ClientManager* const self = static_cast<ClientManager*>(manager);
-    self->m_listen_timer = nullptr;
-    if (!self->full()) {
-        self->resume_listening();
-    }
+    poll_when_room(POLLIN, "server socket");
 }

@@ -11,7 +11,6 @@
 #include "client/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "core/FdHandler.h"
-#include "core/TimerManager.h"
 
 class ClientHandler;
 
@@ -25,7 +24,8 @@ public:
     // Listens on the local socket of that name. 0, or -1 (logged).
     int init(const char* name);
 
-    // Accepts one connection.
+    // Accepts one connection. A refusal, for want of descriptors say, leaves the client
+    // waiting.
     void process(int events) override;
 
     // Destroys the handler of a connection that has ended; its code must return at once.
@@ -37,16 +37,11 @@ public:
     size_t client_num() const { return m_clients.size(); }
 
 private:
-    // How long a loop without room for the listening socket is left alone.
-    static constexpr unsigned int LISTEN_RETRY_MS = 3000;
-
-    static void listen_again(void* manager);
     bool full() const { return m_max_clients && m_clients.size() >= m_max_clients; }
     void resume_listening();
 
     const size_t m_max_clients;
     android::List<ClientHandler*> m_clients;
-    TimerManager::Timer* m_listen_timer = nullptr;
 };
 
 #endif  // CLIENT_CLIENTMANAGER_H_

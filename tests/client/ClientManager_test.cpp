@@ -1,8 +1,29 @@
 #include "client/ClientManager.h"
 
+#include <errno.h>
 #include <gtest/gtest.h>
+#include <sys/socket.h>
 
 #include "client/ControlFixture.h"
+#include "support/boot_clock.h"
+
+namespace {
+
+bool g_no_descriptors = false;
+int g_refused_accepts;
+
+}  // namespace
+
+extern "C" int __real_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags);
+extern "C" int __wrap_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags);
+extern "C" int __wrap_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags) {
+    if (g_no_descriptors) {
+        ++g_refused_accepts;
+        errno = EMFILE;
+        return -1;
+    }
+    return __real_accept4(fd, addr, len, flags);
+}
 
 namespace {
 
@@ -44,7 +65,8 @@ TEST_F(ClientManagerTest, FullLoop) {
         Peer client(TEST_SERVER);
         EXPECT_TRUE(run_until(mux(), [&] { return client.ended(); }));
         EXPECT_EQ(manager->client_num(), 0u);
-        EXPECT_TRUE(log.has("void ClientManager::process(int): no room to poll a new client"));
+        EXPECT_TRUE(log.has(
+            "void ClientManager::process(int): no room to poll a new client, closing it [105("));
         EXPECT_FALSE(log.has("new client accepted"));
     }
     EXPECT_EQ(open_descriptors(), descriptors);
@@ -52,11 +74,34 @@ TEST_F(ClientManagerTest, FullLoop) {
     {
         Occupants occupants(mux());
         serve(3);
-        EXPECT_TRUE(log.has("no room to poll the server socket"));
+        EXPECT_TRUE(log.has("no room to poll server socket, waiting for it [105("));
     }
     // It listens as soon as there is room.
     Peer client(TEST_SERVER);
     talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
+}
+
+// A client that cannot be accepted stays ready for ever: it took a whole core.
+TEST_F(ClientManagerTest, NoDescriptorsLeft) {
+    boot_clock::freeze();
+    Peer client(TEST_SERVER);
+    g_refused_accepts = 0;
+    g_no_descriptors = true;
+    const auto refused = [&](int passes) {
+        for (int i = 0; i < passes; ++i) {
+            pass(mux());
+        }
+        return g_refused_accepts;
+    };
+    EXPECT_EQ(refused(30), 10);
+    EXPECT_EQ(log.count("server socket gave nothing 10 times in a row"), 1u);
+    boot_clock::advance(3000);
+    EXPECT_EQ(refused(30), 11);
+    g_no_descriptors = false;
+    boot_clock::advance(3000);
+    talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
+    EXPECT_EQ(manager->idle_wakeups(), 0u);
+    boot_clock::real();
 }
 
 TEST_F(ClientManagerTest, NameThatIsTaken) {
