@@ -12,17 +12,13 @@
 
 namespace {
 
-// Writes len bytes as one line of printable text: line ends and NULs at the end are left
-// out, whatever is not printable ASCII, and the backslash, becomes \xNN. text has room
-// for four bytes a byte and a NUL.
-void make_printable(const uint8_t* bytes, size_t len, char* text) {
+// Writes the bytes up to the first NUL as text of one line: control bytes other than a tab
+// become \xNN, all others stay as they are. text has room for four bytes a byte and a NUL.
+void make_line(const uint8_t* bytes, size_t len, char* text) {
     static const char digits[] = "0123456789abcdef";
-    while (len && (bytes[len - 1] == '\n' || bytes[len - 1] == '\r' || bytes[len - 1] == '\0')) {
-        --len;
-    }
-    for (size_t i = 0; i < len; ++i) {
+    for (size_t i = 0; i < len && bytes[i]; ++i) {
         const uint8_t c = bytes[i];
-        if (c >= ' ' && c <= '~' && c != '\\') {
+        if ((c >= ' ' && c != 0x7f) || c == '\t') {
             *text++ = static_cast<char>(c);
         } else {
             *text++ = '\\';
@@ -46,10 +42,7 @@ CpStateHandler::~CpStateHandler() {
 int CpStateHandler::init() {
     cancel_reconnect();
     if (m_fd < 0 && !connect()) {
-        m_reconnect_timer = m_multiplexer->timer_mgr().create_timer(RECONNECT_MS, reconnect, this);
-        if (!m_reconnect_timer) {
-            err_log("clock_gettime CLOCK_BOOTTIME error");
-        }
+        m_multiplexer->timer_mgr().add_timer(RECONNECT_MS, reconnect, this);
     }
     return 0;
 }
@@ -61,30 +54,23 @@ bool CpStateHandler::connect() {
     if (m_fd < 0) {
         return false;
     }
-    if (add_events(POLLIN) < 0) {
-        info_log("no room to poll %s, trying again later", m_serv_name.string());
-        close();
-        return false;
-    }
+    m_used = false;
+    poll_when_room(POLLIN, m_serv_name.string());
     return true;
 }
 
 void CpStateHandler::cancel_reconnect() {
-    if (m_reconnect_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_reconnect_timer);
-        m_reconnect_timer = nullptr;
-    }
+    m_multiplexer->timer_mgr().cancel_timers(reconnect, this);
 }
 
 void CpStateHandler::reconnect(void* handler) {
-    CpStateHandler* const self = static_cast<CpStateHandler*>(handler);
-    self->m_reconnect_timer = nullptr;
-    self->init();
+    static_cast<CpStateHandler*>(handler)->init();
 }
 
 int CpStateHandler::process_data() {
+    m_used = true;
     char text[4 * BUFFER_SIZE + 1];
-    make_printable(m_buffer, m_data_len, text);
+    make_line(m_buffer, m_data_len, text);
     info_log("%u bytes: %s", static_cast<unsigned int>(m_data_len), text);
     CpType type = CT_UNKNOWN;
     const CpEvent event = parse_notify(m_buffer, m_data_len, type);
@@ -96,6 +82,9 @@ int CpStateHandler::process_data() {
 }
 
 void CpStateHandler::process_conn_closed() {
+    if (!m_used) {
+        note_idle(m_serv_name.string());
+    }
     del_events(POLLIN);
     close();
     init();

@@ -1,6 +1,8 @@
 // Connection to a supervisor, a process that watches a CP and announces what happens to
 // it in short texts. Connects and reconnects for ever, hands what it reads to the
-// subclass to recognise, and passes events on to the LogController.
+// subclass to recognise, and passes events on to the LogController. A connection that
+// ends before it gave anything is an idle wake-up, so that a supervisor which accepts and
+// closes at once is not reconnected without end.
 //
 // Owned by the LogController. The supervisor's bytes are not trusted. Loop thread only.
 #ifndef STATE_CPSTATEHANDLER_H_
@@ -10,7 +12,6 @@
 
 #include "client/BufferedFdHandler.h"
 #include "config/CpType.h"
-#include "core/TimerManager.h"
 
 class CpStateHandler : public BufferedFdHandler {
 public:
@@ -57,7 +58,7 @@ private:
     void cancel_reconnect();
 
     const android::String8 m_serv_name;
-    TimerManager::Timer* m_reconnect_timer = nullptr;
+    bool m_used = false;  // the connection has given something
 };
 
 #endif  // STATE_CPSTATEHANDLER_H_

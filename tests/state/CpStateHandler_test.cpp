@@ -7,6 +7,7 @@
 #include "client/ControlFixture.h"
 #include "state/ExtWcnStateHandler.h"
 #include "state/ModemStateHandler.h"
+#include "support/boot_clock.h"
 
 namespace {
 
@@ -32,6 +33,7 @@ protected:
         root.set_prop("persist.sys.vexa.modemreset", "1");
         root.set_prop("persist.sys.vexa.wcnreset", "1");
     }
+    ~CpStateHandlerTest() override { boot_clock::real(); }
 
     // Sends one message, which is read in one piece; gives the state of the CP then.
     CpWorkState say(const std::string& message, const std::string& logged) {
@@ -99,7 +101,7 @@ TEST_F(CpStateHandlerTest, MessagesBecomeEventsOfTheCp) {
         CpWorkState state;
     } CASES[] = {
         {"Modem Assert", "12 bytes: Modem Assert", CWS_NOT_WORKING},
-        {"Modem Alive\n", "12 bytes: Modem Alive", CWS_WORKING},
+        {"Modem Alive\n", "12 bytes: Modem Alive\\x0a", CWS_WORKING},
         {"Modem Blocked", "13 bytes: Modem Blocked", CWS_NOT_WORKING},
         {"Modem Al", "8 bytes: Modem Al", CWS_NOT_WORKING},
         {"ive", "3 bytes: ive", CWS_NOT_WORKING},  // reads are never combined
@@ -115,16 +117,17 @@ TEST_F(CpStateHandlerTest, MessagesBecomeEventsOfTheCp) {
     EXPECT_EQ(state(CT_WCN), CWS_WORKING);
 }
 
-// One line a read, in printable text, with nothing hidden behind a NUL.
+// One line a read; the text itself stays as it is.
 TEST_F(CpStateHandlerTest, AnyBytesAreLoggedSafely) {
     connect(*modem);
     static const struct {
         std::string message, logged;
     } CASES[] = {
-        {std::string("a\0b\n", 4), "4 bytes: a\\x00b"},
-        {"a\nE/KESTCP(1): b\r\n", "18 bytes: a\\x0aE/KESTCP(1): b"},
-        {"%s%n\t\\\x1b[2J\xff\x7f", "12 bytes: %s%n\\x09\\x5c\\x1b[2J\\xff\\x7f"},
-        {std::string("\n\0", 2), "2 bytes: "},
+        {std::string("a\0b\n", 4), "4 bytes: a"},
+        {"a\nE/KESTCP(1): b\r\n", "18 bytes: a\\x0aE/KESTCP(1): b\\x0d\\x0a"},
+        {"%s%n\t\\\x1b[2J\xff\x7f", "12 bytes: %s%n\t\\\\x1b[2J\xff\\x7f"},
+        {"Grüße \\x0a", "12 bytes: Grüße \\x0a"},
+        {std::string("\0\n", 2), "2 bytes: "},
     };
     for (const auto& c : CASES) {
         say(c.message, c.logged);
@@ -138,14 +141,16 @@ TEST_F(CpStateHandlerTest, AnyBytesAreLoggedSafely) {
 
 // No supervisor, or no room in the loop: it tries again later.
 TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
+    boot_clock::freeze();
     supervisor.reset();
     log.clear();
     EXPECT_EQ(modem->init(), 0);
     EXPECT_EQ(modem->init(), 0);  // still one attempt pending
     EXPECT_EQ(modem->fd(), -1);
-    EXPECT_GT(timeout(), 2500);
+    EXPECT_EQ(timeout(), 3000);
     supervisor.reset(new Supervisor);
-    loop.run_once();  // until the timer fires
+    boot_clock::advance(3000);
+    loop.run_once();
     ASSERT_TRUE((peer = supervisor->accept()));
     EXPECT_EQ(timeout(), -1);
     EXPECT_EQ(log.text(), "");
@@ -153,12 +158,51 @@ TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     modem->init();  // connected: nothing to do
     EXPECT_FALSE(supervisor->accept());
 
-    Occupants occupants(loop);
+    // Connected without a place in the loop: heard as soon as there is one.
+    modem->process_conn_error(EIO);
+    supervisor->accept();
     ModemStateHandler second(&ctrl, &loop, SUPERVISOR);
-    EXPECT_EQ(second.init(), 0);
-    EXPECT_EQ(second.fd(), -1);
-    EXPECT_GT(timeout(), 2500);
-    EXPECT_TRUE(log.has("no room to poll"));
+    {
+        Occupants occupants(loop);
+        EXPECT_EQ(second.init(), 0);
+        ASSERT_TRUE((peer = supervisor->accept()));
+        EXPECT_TRUE(log.has("no room to poll supervisor_test, waiting for it [105("));
+    }
+    EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
+
+    // Without a clock there is no later.
+    boot_clock::fail();
+    supervisor.reset();
+    log.clear();
+    second.process_conn_closed();
+    EXPECT_TRUE(log.has("int TimerManager::add_timer(unsigned int, "));
+    EXPECT_EQ(log.count("clock_gettime CLOCK_BOOTTIME error [22("), 1u);
+}
+
+// It was connected 19,000 times a second.
+TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
+    boot_clock::freeze();
+    modem->init();
+    int connections = 0;
+    const auto accept_and_close = [&] {
+        for (int i = 0; i < 30; ++i) {
+            connections += supervisor->accept() != nullptr;
+            pass(loop);
+        }
+        return connections;
+    };
+    EXPECT_EQ(accept_and_close(), 11);
+    EXPECT_EQ(log.count("supervisor_test gave nothing 10 times in a row"), 1u);
+    boot_clock::advance(3000);
+    EXPECT_EQ(accept_and_close(), 12);
+    boot_clock::advance(3000);
+    // The next one has something to say; then it counts afresh.
+    ASSERT_TRUE(run_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+    boot_clock::advance(3000);
+    EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
+    peer.reset();
+    EXPECT_EQ(accept_and_close(), 12 + 11);
+    EXPECT_EQ(log.count("gave nothing"), 1u);
 }
 
 TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
