@@ -1,6 +1,7 @@
 #include "channels/AgDspLogHandler.h"
 
 #include <errno.h>
+#include <poll.h>
 #include <string.h>
 #include <sys/ioctl.h>
 #include <unistd.h>
@@ -19,6 +20,21 @@ void complete_dump(int fd) {
     const int saved_errno = errno;
     ioctl(fd, CMD_DUMP_COMPLETE, 0);
     errno = saved_errno;
+}
+
+// How long the driver may take for the next part of a dump, and a step of that time.
+constexpr int DUMP_PATIENCE_MS = 3000;
+constexpr int DUMP_STEP_MS = 10;
+
+// Lets a step of time pass. The first one ends with new data; a driver that goes on to have
+// none may claim to be ready all the same.
+void await_dump(int fd, bool first) {
+    if (first) {
+        struct pollfd device = {fd, POLLIN, 0};
+        poll(&device, 1, DUMP_STEP_MS);
+    } else {
+        usleep(DUMP_STEP_MS * 1000);
+    }
 }
 
 }  // namespace
@@ -78,15 +94,15 @@ int AgDspLogHandler::write_chunk(size_t n, DspLogType type) {
 void AgDspLogHandler::process(int /*events*/) {
     const ssize_t n = read(m_fd, s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
     if (n < 0) {
-        if (errno != EAGAIN && errno != EINTR) {
-            recover_dev();
-        }
+        dev_read_failed();
         return;
     }
     if (n == 0) {
         err_log("AG-DSP log device driver bug: read returns 0");
+        dev_gave_nothing();
         return;
     }
+    note_alive();
     if (!storage() && create_storage() < 0) {
         return;
     }
@@ -102,12 +118,15 @@ void AgDspLogHandler::notify_pcm(FileNotifier* notifier, void* client) {
 void AgDspLogHandler::save_audio_log(FileNotifier* notifier, DspLogType type) {
     const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
     if (n < 0) {
-        if (errno != EAGAIN && errno != EINTR) {
+        if (errno == EAGAIN) {
+            notifier->note_read(false);
+        } else if (errno != EINTR) {
             err_log("read PCM device error");
             notifier->close();
         }
         return;
     }
+    notifier->note_read(n > 0);
     if (!storage() && create_storage() < 0) {
         err_log("create CpStorage error");
         return;
@@ -127,12 +146,27 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
     if (!storage() && create_storage() < 0) {
         complete_dump(notifier->fd());
         err_log("create AG-DSP CpStorage error");
+        notifier->note_read(false);
         return;
     }
+    bool stored = false;
+    int waited_ms = 0;  // since the last data
     for (;;) {
         const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
         if (n < 0 && errno == EINTR) {
             continue;
+        }
+        if (n < 0 && errno == EAGAIN) {
+            if (!stored) {
+                // The dump has not begun: the loop tells when there is something to read.
+                notifier->note_read(false);
+                return;
+            }
+            if (waited_ms < DUMP_PATIENCE_MS) {
+                await_dump(notifier->fd(), waited_ms == 0);
+                waited_ms += DUMP_STEP_MS;
+                continue;
+            }
         }
         if (n < 0) {
             err_log("read AG-DSP dump device error");
@@ -146,7 +180,10 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
             err_log("%s save AG-DSP dump error", name().string());
             break;
         }
+        stored = true;
+        waited_ms = 0;
     }
+    notifier->note_read(stored);
     complete_dump(notifier->fd());
     flush();
 }

@@ -59,31 +59,36 @@ void LogPipeHandler::close_dev() {
     }
 }
 
+android::String8 LogPipeHandler::dev_label() const {
+    return android::String8("log device of ") + m_name;
+}
+
 void LogPipeHandler::poll_dev() {
-    if (add_events(POLLIN) < 0) {
-        err_log("can not poll the log device of %s", m_name.string());
-        // Open but never read it would stay silent for good.
-        close();
-        arm_reopen();
-    }
+    poll_when_room(POLLIN, dev_label().string());
 }
 
 // One timer at the most is pending, so that a device is never opened twice.
 void LogPipeHandler::arm_reopen() {
     cancel_reopen();
-    m_reopen_timer = m_multiplexer->timer_mgr().create_timer(REOPEN_MS, reopen_log_dev, this);
+    m_reopen_pending = m_multiplexer->timer_mgr().add_timer(REOPEN_MS, reopen_log_dev, this) == 0;
 }
 
 void LogPipeHandler::cancel_reopen() {
-    if (m_reopen_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_reopen_timer);
-        m_reopen_timer = nullptr;
+    if (m_reopen_pending) {
+        m_multiplexer->timer_mgr().cancel_timers(reopen_log_dev, this);
+        m_reopen_pending = false;
+    }
+}
+
+void LogPipeHandler::open_missing_dev() {
+    if (m_fd < 0 && !m_reopen_pending) {
+        reopen_log_dev(this);
     }
 }
 
 void LogPipeHandler::reopen_log_dev(void* handler) {
     LogPipeHandler* channel = static_cast<LogPipeHandler*>(handler);
-    channel->m_reopen_timer = nullptr;
+    channel->m_reopen_pending = false;
     if (!channel->m_enabled || channel->m_state != CWS_WORKING) {
         return;
     }
@@ -98,6 +103,7 @@ void LogPipeHandler::reopen_log_dev(void* handler) {
 int LogPipeHandler::start_logging() {
     m_enabled = true;
     if (m_state == CWS_WORKING) {
+        note_alive();  // what the device came to before does not count
         if (open_dev() < 0) {
             err_log("kestcp: open %s error", m_name.string());
             arm_reopen();
@@ -158,27 +164,37 @@ bool LogPipeHandler::need_storage() {
     return true;
 }
 
-void LogPipeHandler::recover_dev() {
-    close_dev();
-    if (open_dev() == 0) {
-        poll_dev();
-    } else {
-        arm_reopen();
+void LogPipeHandler::dev_gave_nothing() {
+    note_idle(dev_label().string());
+}
+
+void LogPipeHandler::dev_read_failed() {
+    if (errno == EINTR) {
+        return;
     }
+    if (errno != EAGAIN) {
+        close_dev();
+        if (open_dev() == 0) {
+            poll_dev();
+        } else {
+            arm_reopen();
+        }
+    }
+    dev_gave_nothing();
 }
 
 void LogPipeHandler::process(int /*events*/) {
     const ssize_t n = read(m_fd, s_io_buffer, IO_BUFFER_SIZE);
     if (n < 0) {
-        if (errno != EAGAIN && errno != EINTR) {
-            recover_dev();
-        }
+        dev_read_failed();
         return;
     }
     if (n == 0) {
         err_log("log device driver bug: read returns 0");
+        dev_gave_nothing();
         return;
     }
+    note_alive();
     if (!m_storage && create_storage() < 0) {
         return;
     }
@@ -192,6 +208,7 @@ void LogPipeHandler::process(int /*events*/) {
 }
 
 void LogPipeHandler::flush() {
+    open_missing_dev();
     if (m_storage) {
         m_storage->flush();
     }

@@ -20,7 +20,6 @@
 #include "config/LogConfig.h"
 #include "core/FdHandler.h"
 #include "core/ObjectRef.h"
-#include "core/TimerManager.h"
 #include "iq/WcdmaIqManager.h"
 
 class ClientHandler;
@@ -115,8 +114,10 @@ protected:
     // Opens the log device; 0 or -1. Nothing happens when it is open.
     int open_dev();
     void close_dev();
-    // Stops polling a log device that failed, and opens it again now or in a while.
-    void recover_dev();
+    // A wake-up in which the log device gave nothing. On a failed read, with its errno, the
+    // device is closed and opened again, now or in a while.
+    void dev_gave_nothing();
+    void dev_read_failed();
 
     // The diag device of a transaction, opened or borrowed; null on failure.
     DiagDeviceHandler* create_diag_device(DataConsumer* consumer);
@@ -139,9 +140,14 @@ private:
     bool client_transaction_runs() const {
         return m_state == CWS_SAVE_SLEEP_LOG || m_state == CWS_SAVE_RINGBUF;
     }
+    android::String8 dev_label() const;
     void poll_dev();
+    // The log device is tried again in a while. Should the timer fail, as it does without a
+    // clock, the next chance is a flush, the end of a transaction, a start or an alive event.
     void arm_reopen();
     void cancel_reopen();
+    // Opens a log device that is missing without being tried again.
+    void open_missing_dev();
     // For the crash path, which may come before the first log data: makes the storage
     // with the hook for new log files only. False when there is none.
     bool need_storage();
@@ -164,7 +170,7 @@ private:
     ObjectRef<ClientHandler> m_trans_client;
     StorageManager* m_stor_mgr;
     CpStorage* m_storage = nullptr;
-    TimerManager::Timer* m_reopen_timer = nullptr;
+    bool m_reopen_pending = false;
     WcdmaIqManager m_iq;
 };
 

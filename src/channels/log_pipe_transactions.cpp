@@ -66,8 +66,8 @@ void LogPipeHandler::process_assert(bool save_md) {
 void LogPipeHandler::close_on_assert() {
     close_dev();
     cancel_reopen();
-    flush();
     m_state = CWS_NOT_WORKING;
+    flush();
 }
 
 void LogPipeHandler::process_alive() {
@@ -83,6 +83,7 @@ void LogPipeHandler::process_alive() {
     if (!m_enabled) {
         return;
     }
+    note_alive();  // what the device came to before does not count
     if (open_dev() < 0) {
         err_log("kestcp: open %s error", m_name.string());
         arm_reopen();
@@ -218,10 +219,8 @@ void LogPipeHandler::cancel_trans_result_notify(ClientHandler* client) {
 
 void LogPipeHandler::end_client_transaction(int result) {
     stop_transaction(CWS_WORKING);
-    if (m_enabled && m_fd < 0 && !m_reopen_timer) {
-        // The next try to open the log device fell into the transaction and was passed over.
-        arm_reopen();
-    }
+    // The next try to open the log device may have fallen into the transaction.
+    open_missing_dev();
     ClientHandler* client = m_trans_client.get();
     m_trans_client = nullptr;
     if (client) {

@@ -34,10 +34,18 @@ void FileNotifier::close() {
     }
 }
 
+void FileNotifier::note_read(bool got_data) {
+    if (got_data) {
+        note_alive();
+    } else {
+        note_idle(m_path.string());
+    }
+}
+
 void FileNotifier::process(int) {
     if (m_callback) {
         m_callback(this, m_client);
     } else {
-        note_idle(m_path.string());
+        note_read(false);
     }
 }

@@ -1,7 +1,7 @@
 // Tells its owner that a file, in practice a device of a CP, can be read: it keeps the
 // file open and registered with the loop and calls the owner back each time the
-// descriptor is ready. The owner reads the descriptor itself, says what that came to
-// (note_alive, note_idle) and may close the notifier from the callback. Closed after
+// descriptor is ready. The owner reads the descriptor itself, says whether it
+// got something and may close the notifier from the callback. Closed after
 // construction; may be opened and closed any number of times.
 #ifndef STORAGE_FILENOTIFIER_H_
 #define STORAGE_FILENOTIFIER_H_
@@ -28,8 +28,8 @@ public:
     // Stops watching and closes the file, if open.
     void close();
 
-    // The path that is opened.
-    const android::String8& path() const { return m_path; }
+    // For the owner: whether its read got something.
+    void note_read(bool got_data);
 
     void process(int events) override;
 

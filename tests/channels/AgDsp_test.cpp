@@ -3,6 +3,7 @@
 #include "channels/DspChunkHeader.h"
 #include "channels/FaultFixture.h"
 #include "iq/fake_devices.h"
+#include "support/boot_clock.h"
 
 namespace {
 
@@ -81,7 +82,10 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
          chunk(0, DUMP, "a") + chunk(1, DUMP, "b"),
          ""},
         {{{"", EIO}}, "", "save_dump(FileNotifier*): read AG-DSP dump device error [5("},
-        {{{"c", 0}, {"", EAGAIN}}, chunk(2, DUMP, "c"), "read AG-DSP dump device error [11("},
+        // The driver needs a moment.
+        {{{"c", 0}, {"", EAGAIN}, {"", EAGAIN}, {"d", 0}, {"", 0}},
+         chunk(2, DUMP, "c") + chunk(3, DUMP, "d"),
+         ""},
     };
     size_t completions = 0;
     std::string expected;
@@ -93,6 +97,17 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
         EXPECT_TRUE(log.has(c.message)) << log.text();
         EXPECT_EQ(content("agdsp"), expected += c.stored);
     }
+    // It gets three seconds after the last data.
+    FakeDevice::Steps slow(400, {"", EAGAIN});
+    slow.push_front({"e", 0});
+    const int64_t started = monotonic_ms();
+    mem.script_reads(slow);
+    ASSERT_TRUE(pump([&] { return mem.count(COMPLETE) > completions; }));
+    EXPECT_EQ(mem.reads_left(), 99u);
+    EXPECT_GE(monotonic_ms() - started, 2990);
+    EXPECT_TRUE(log.has("save_dump(FileNotifier*): read AG-DSP dump device error [11("));
+    ASSERT_TRUE(yields(mem, {{"", 0}}));
+    completions = mem.count(COMPLETE);
     // A write that fails, one that is short: the rest of the dump is not read.
     const std::string big = pattern_bytes(32748, 3);
     for (const auto& arrange : {+[] { faults::shorten(faults::WRITEV, 50000); },
@@ -143,6 +158,51 @@ TEST_F(AgDspTest, FailingDevices) {
     ASSERT_TRUE(yields(logs, {{"c", 0}}));
     EXPECT_EQ(stored(),
               chunk(0, LOG, "a") + chunk(1, LOG, "b") + chunk(2, PCM, "p") + chunk(3, LOG, "c"));
+}
+
+// Whatever is ready for ever took a whole core: in a second a hung-up dump device gave 45,000
+// lines, a PCM device at its end 2.5 MB of headers.
+TEST_F(AgDspTest, DevicesThatGiveNothingAreLeftAlone) {
+    boot_clock::freeze();
+    const auto pass = [&] {
+        for (int i = 0; i < 15; ++i) {
+            pump_once(mux());
+        }
+    };
+    const struct {
+        FakeDevice& device;
+        int error;  // 0: its end
+        const char* line;
+        size_t lines;
+    } cases[] = {
+        {logs, 0, "log device driver bug", 11},
+        {logs, EAGAIN, "", 0},
+        {logs, EIO, "", 0},
+        {pcm, 0, "", 0},
+        {pcm, EAGAIN, "", 0},
+        {mem, 0, "assert\n", 11},
+        {mem, EAGAIN, "assert\n", 11},
+        {mem, EIO, "dump device error [5(", 11},
+    };
+    for (const auto& c : cases) {
+        log.clear();
+        c.device.script_reads(FakeDevice::Steps(40, {"", c.error}));
+        pass();
+        EXPECT_EQ(c.device.reads_left(), 30u);
+        boot_clock::advance(3000);
+        pass();
+        EXPECT_EQ(c.device.reads_left(), 29u);
+        EXPECT_EQ(log.count("gave nothing 10 times in a row"), 1u);
+        if (c.lines) {
+            EXPECT_EQ(log.count(c.line), c.lines);
+        }
+        c.device.script_reads({{"x", 0}});
+        boot_clock::advance(3000);
+        ASSERT_TRUE(pump([&] { return c.device.reads_left() == 0; }));
+    }
+    // A chunk of data for each case, and the headers of the PCM device at its end.
+    EXPECT_EQ(stored().size(), 8 * 21u + 11 * 20);
+    boot_clock::real();
 }
 
 }  // namespace

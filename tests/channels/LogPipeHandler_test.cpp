@@ -2,6 +2,7 @@
 
 #include "channels/ChannelFixture.h"
 #include "storage/CpStorage.h"
+#include "support/boot_clock.h"
 
 namespace {
 
@@ -14,6 +15,13 @@ protected:
     LogPipeHandlerTest() {
         setenv("TZ", "UTC0", 1);
         tzset();
+    }
+    ~LogPipeHandlerTest() override { boot_clock::real(); }
+
+    void pass(int times) {
+        for (int i = 0; i < times; ++i) {
+            pump_once(mux());
+        }
     }
     std::string cp_dir(const std::string& cp) const {
         const std::vector<std::string> sets = root.list("data/modem_log");
@@ -103,6 +111,56 @@ TEST_F(LogPipeHandlerTest, GoesOnAfterAReadOfNothingAndAStorageFailure) {
     ASSERT_TRUE(feed(fifo, "kept"));
     gnss->flush();
     EXPECT_EQ(content("cp_gnss"), "kept");
+}
+
+// Both are ready for ever: they took a whole core. The memory has no byte at its start.
+TEST_F(LogPipeHandlerTest, DeviceThatGivesNothingIsLeftAlone) {
+    boot_clock::freeze();
+    const struct {
+        const char* device;
+        size_t lines;  // of each wake-up
+    } cases[] = {{"/dev/null", 1}, {"/proc/self/mem", 0}};
+    for (const auto& c : cases) {
+        const std::string name = root.path("gnss");
+        ASSERT_EQ(symlink(c.device, name.c_str()), 0);
+        ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
+        gnss = ctrl->get_cp(CT_GNSS);
+        pass(9);
+        EXPECT_FALSE(gnss->resting()) << c.device;
+        pass(6);
+        EXPECT_TRUE(gnss->resting()) << c.device;
+        EXPECT_EQ(log.count("read returns 0"), 10 * c.lines);
+        boot_clock::advance(3000);
+        pass(6);
+        EXPECT_EQ(log.count("read returns 0"), 11 * c.lines);
+        EXPECT_EQ(log.count("log device of cp_gnss gave nothing 10 times in a row"), 1u);
+        // A CP that has come up deserves a fresh start; so does one whose log is switched on.
+        gnss->process_alive();
+        pass(15);
+        EXPECT_EQ(log.count("read returns 0"), 21 * c.lines);
+        ASSERT_EQ(unlink(name.c_str()), 0);
+        const Fifo fifo(name);
+        gnss->stop();
+        gnss->start();
+        EXPECT_TRUE(feed(fifo, "data")) << c.device;
+        EXPECT_EQ(gnss->idle_wakeups(), 0u);
+        end_service();
+        ASSERT_EQ(unlink(name.c_str()), 0);
+    }
+}
+
+// No timer can be made then: the device stayed closed for good.
+TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
+    boot_clock::fail();
+    ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
+    EXPECT_TRUE(log.has("int TimerManager::add_timer(unsigned int, "));
+    const Fifo fifo(root.path("gnss"));
+    ctrl->flush();
+    boot_clock::real();
+    EXPECT_TRUE(feed(fifo, "data"));
+    ctrl->get_cp(CT_GNSS)->process_assert(false);
+    ctrl->flush();
+    EXPECT_LT(ctrl->get_cp(CT_GNSS)->fd(), 0) << "the CP is down";
 }
 
 // ---- CP events
