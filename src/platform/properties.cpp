@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -30,10 +31,18 @@ int64_t nanoseconds(const struct timespec& t) {
     return static_cast<int64_t>(t.tv_sec) * 1000000000 + t.tv_nsec;
 }
 
-int64_t now(clockid_t clock) {
+// Nothing when the clock cannot be read.
+std::optional<int64_t> now(clockid_t clock) {
     struct timespec t;
-    clock_gettime(clock, &t);
+    if (clock_gettime(clock, &t) < 0) {
+        return std::nullopt;
+    }
     return nanoseconds(t);
+}
+
+// Whether then lies back far enough. Not when a time is unknown.
+bool is_settled(std::optional<int64_t> now, std::optional<int64_t> then) {
+    return now && then && *now - *then >= SETTLE_NS;
 }
 
 // What tells one state of a file from another.
@@ -83,10 +92,10 @@ private:
     std::string m_root;
     std::string m_path;
     Stamp m_stamp;
-    bool m_settled = false;      // m_stamp was old enough when the content was read
-    int64_t m_first_seen = 0;    // monotonic time of the first load with m_stamp
-    std::string m_content;       // what the entries point into
-    std::vector<Entry> m_table;  // sorted by key, each key once
+    bool m_settled = false;               // m_stamp was old enough when the content was read
+    std::optional<int64_t> m_first_seen;  // monotonic time of the first load with m_stamp
+    std::string m_content;                // what the entries point into
+    std::vector<Entry> m_table;           // sorted by key, each key once
 };
 
 bool PropertyFile::find(const char* root, const char* key, std::string_view& value) {
@@ -127,8 +136,8 @@ bool PropertyFile::load() {
     }
     // The times and the stamp come before the content: a change while it is being read
     // gives a later stamp.
-    const int64_t monotonic = now(CLOCK_MONOTONIC);
-    const int64_t realtime = now(CLOCK_REALTIME);
+    const std::optional<int64_t> monotonic = now(CLOCK_MONOTONIC);
+    const std::optional<int64_t> realtime = now(CLOCK_REALTIME);
     struct stat st;
     const bool usable = fstat(fd, &st) == 0 && acceptable(st) && read_content(fd);
     close(fd);
@@ -144,7 +153,7 @@ bool PropertyFile::load() {
     }
     // Either the change lies back far enough by the wall clock or, when that was set
     // back, the stamp has been known for long enough.
-    m_settled = realtime - stamp.ctime >= SETTLE_NS || monotonic - m_first_seen >= SETTLE_NS;
+    m_settled = is_settled(realtime, stamp.ctime) || is_settled(monotonic, m_first_seen);
     return true;
 }
 
