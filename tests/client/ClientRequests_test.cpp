@@ -144,7 +144,6 @@ TEST_F(ClientRequestsTest, EveryRequestRepliesAndLogsAsItShould) {
         EXPECT_TRUE(std::any_of(std::begin(CASES), std::end(CASES), [&](const auto& c) {
             return (c.request + std::string(" ")).find(keyword + " ") == 0;
         })) << keyword;
-        EXPECT_STRNE(request.help, "") << keyword;
     }
 }
 

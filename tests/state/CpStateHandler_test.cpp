@@ -42,6 +42,7 @@ protected:
         EXPECT_TRUE(run_until(loop, [&] { return log.has("bytes: "); }));
         EXPECT_TRUE(log.has("virtual int CpStateHandler::process_data(): " + logged + "\n"))
             << log.text();
+        EXPECT_EQ(log.count("\n"), 1u);
         return state(CT_WCDMA);
     }
     // The peer is then the supervisor's end of the handler's new connection.
@@ -94,10 +95,12 @@ TEST_F(CpStateHandlerTest, Patterns) {
     }
 }
 
-TEST_F(CpStateHandlerTest, MessagesBecomeEventsOfTheCp) {
+// One line a read, in which the text stays as it is.
+TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
     connect(*modem);
-    static const struct {
-        const char *message, *logged;
+    const std::string full(256, 'x');
+    const struct {
+        std::string message, logged;
         CpWorkState state;
     } CASES[] = {
         {"Modem Assert", "12 bytes: Modem Assert", CWS_NOT_WORKING},
@@ -105,38 +108,26 @@ TEST_F(CpStateHandlerTest, MessagesBecomeEventsOfTheCp) {
         {"Modem Blocked", "13 bytes: Modem Blocked", CWS_NOT_WORKING},
         {"Modem Al", "8 bytes: Modem Al", CWS_NOT_WORKING},
         {"ive", "3 bytes: ive", CWS_NOT_WORKING},  // reads are never combined
+        {std::string("a\0Modem Alive", 13), "13 bytes: a", CWS_WORKING},
+        {"a\nE/KESTCP(1): b\r\n", "18 bytes: a\\x0aE/KESTCP(1): b\\x0d\\x0a", CWS_WORKING},
+        {"%s%n\t\\\x1b[2J\xff\x7f", "12 bytes: %s%n\t\\\\x1b[2J\xff\\x7f", CWS_WORKING},
+        {"Grüße \\x0a", "12 bytes: Grüße \\x0a", CWS_WORKING},
+        {full, "256 bytes: " + full, CWS_WORKING},
     };
     for (const auto& c : CASES) {
         EXPECT_EQ(say(c.message, c.logged), c.state) << c.message;
     }
-    ExtWcnStateHandler wcn(&ctrl, &loop, SUPERVISOR);
-    connect(wcn);
-    EXPECT_EQ(say("WCN-EXTERNAL-DUMP", "17 bytes: WCN-EXTERNAL-DUMP"), CWS_NOT_WORKING);
-    EXPECT_EQ(state(CT_WCN), CWS_NOT_WORKING);
-    EXPECT_EQ(say("WCN-EXTERNAL-ALIVE", "18 bytes: WCN-EXTERNAL-ALIVE"), CWS_NOT_WORKING);
-    EXPECT_EQ(state(CT_WCN), CWS_WORKING);
-}
-
-// One line a read; the text itself stays as it is.
-TEST_F(CpStateHandlerTest, AnyBytesAreLoggedSafely) {
-    connect(*modem);
-    static const struct {
-        std::string message, logged;
-    } CASES[] = {
-        {std::string("a\0b\n", 4), "4 bytes: a"},
-        {"a\nE/KESTCP(1): b\r\n", "18 bytes: a\\x0aE/KESTCP(1): b\\x0d\\x0a"},
-        {"%s%n\t\\\x1b[2J\xff\x7f", "12 bytes: %s%n\t\\\\x1b[2J\xff\\x7f"},
-        {"Grüße \\x0a", "12 bytes: Grüße \\x0a"},
-        {std::string("\0\n", 2), "2 bytes: "},
-    };
-    for (const auto& c : CASES) {
-        say(c.message, c.logged);
-        EXPECT_EQ(log.count("\n"), 1u) << log.text();
-    }
-    // Longer than the buffer.
-    say(std::string(256 + 3, 'x') + "Modem Assert", "256 bytes: " + std::string(256, 'x'));
+    // Longer than the buffer: a pattern in the second read.
+    say(full + "xxxModem Assert", "256 bytes: " + full);
     EXPECT_TRUE(run_until(loop, [&] { return log.has("15 bytes: xxxModem Assert\n"); }));
     EXPECT_EQ(state(CT_WCDMA), CWS_NOT_WORKING);
+
+    ExtWcnStateHandler wcn(&ctrl, &loop, SUPERVISOR);
+    connect(wcn);
+    say("WCN-EXTERNAL-DUMP", "17 bytes: WCN-EXTERNAL-DUMP");
+    EXPECT_EQ(state(CT_WCN), CWS_NOT_WORKING);
+    say("WCN-EXTERNAL-ALIVE", "18 bytes: WCN-EXTERNAL-ALIVE");
+    EXPECT_EQ(state(CT_WCN), CWS_WORKING);
 }
 
 // No supervisor, or no room in the loop: it tries again later.
