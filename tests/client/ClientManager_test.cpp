@@ -46,7 +46,7 @@ TEST_F(ClientManagerTest, FourthClientWaitsUntilOneLeaves) {
         EXPECT_EQ(replies(clients.back(), "OK 5\n"), "OK 5\n");
         EXPECT_EQ(log.count("(ClientHandler*): client disconnected, remaining 2 clients\n"), 1u);
         clients.clear();
-        ASSERT_TRUE(run_until(mux(), [&] { return manager->client_num() == 0; }));
+        ASSERT_TRUE(pump_until(mux(), [&] { return manager->client_num() == 0; }));
         log.clear();
     }
     serve(0);  // no limit
@@ -63,7 +63,7 @@ TEST_F(ClientManagerTest, FullLoop) {
     {
         Occupants occupants(mux());
         Peer client(TEST_SERVER);
-        EXPECT_TRUE(run_until(mux(), [&] { return client.ended(); }));
+        EXPECT_TRUE(pump_until(mux(), [&] { return client.ended(); }));
         EXPECT_EQ(manager->client_num(), 0u);
         EXPECT_TRUE(log.has(
             "void ClientManager::process(int): no room to poll a new client, closing it [105("));
@@ -88,7 +88,7 @@ TEST_F(ClientManagerTest, NoDescriptorsLeft) {
     g_no_descriptors = true;
     for (int refused : {10, 11, 12}) {
         for (int i = 0; i < 15; ++i) {
-            pass(mux());
+            pump_once(mux());
         }
         EXPECT_EQ(g_refused_accepts, refused);
         boot_clock::advance(3000);

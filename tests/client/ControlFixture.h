@@ -3,20 +3,9 @@
 #ifndef TESTS_CLIENT_CONTROLFIXTURE_H_
 #define TESTS_CLIENT_CONTROLFIXTURE_H_
 
-#include <cutils/sockets.h>
-#include <fcntl.h>
-#include <poll.h>
-#include <signal.h>
-#include <sys/socket.h>
-#include <sys/stat.h>
-#include <termios.h>
-#include <unistd.h>
-
 #include <list>
-#include <memory>
-#include <string>
 
-#include "channels/LogPipeHandler.h"
+#include "channels/CrashFixture.h"
 #include "client/ClientHandler.h"
 #include "client/ClientManager.h"
 #include "config/ConfigFixture.h"
@@ -65,42 +54,18 @@ protected:
         mkfifo(root.path("w_log").c_str(), 0600);
         root.set_prop("ro.modem.w.log", root.path("w_log"));
         // A CP that takes requests on its diag device and never answers.
-        m_diag = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
-        grantpt(m_diag);
-        unlockpt(m_diag);
-        struct termios raw;
-        tcgetattr(m_diag, &raw);
-        cfmakeraw(&raw);
-        tcsetattr(m_diag, TCSANOW, &raw);
-        root.set_prop("ro.modem.w.diag", ptsname(m_diag));
+        root.set_prop("ro.modem.w.diag", m_diag.path());
         root.write_file("kest_modem.conf",
                         "stream cp_wcdma off 0 3\nstream cp_wcn off 0 3\nlog_file_size 5\n");
         EXPECT_EQ(read(config), 0);
         EXPECT_EQ(ctrl.init(&config), 0);
     }
-    ~ControlFixture() override { close(m_diag); }
 
     Multiplexer& mux() { return ctrl.multiplexer(); }
 
-    // One pass of the loop that does not wait long.
-    static void pass(Multiplexer& loop) {
-        bool fired = false;
-        TimerManager::Timer* const guard = loop.timer_mgr().create_timer(
-            5, [](void* flag) { *static_cast<bool*>(flag) = true; }, &fired);
-        loop.run_once();
-        if (!fired) {
-            loop.timer_mgr().del_timer(guard);
-        }
-    }
-    // Runs the loop until the condition holds.
-    template <typename Condition>
-    static bool run_until(Multiplexer& loop, Condition condition) {
-        return wait_until([&] { return pass(loop), condition(); });
-    }
-
     // What the peer got when it got as many bytes as expected, or when time is over.
     std::string replies(Peer& peer, const std::string& expected) {
-        run_until(mux(), [&] { return peer.receive().size() >= expected.size(); });
+        pump_until(mux(), [&] { return peer.receive().size() >= expected.size(); });
         std::string got;
         got.swap(peer.got);
         return got;
@@ -114,7 +79,7 @@ protected:
     LogController ctrl;
 
 private:
-    int m_diag;
+    Pty m_diag;
 };
 
 // With the server and its clients of the test.
@@ -129,29 +94,19 @@ protected:
     // Passes enough for whatever is there to be handled.
     void settle() {
         for (int i = 0; i < 5; ++i) {
-            pass(mux());
+            pump_once(mux());
         }
     }
     std::unique_ptr<ClientManager> manager;
 };
 
 // Takes every place that is free in the loop's table.
-class Occupants {
-public:
+struct Occupants : std::list<Filler> {
     explicit Occupants(Multiplexer& mux) {
-        do {
-            m_handlers.emplace_back(&mux);
-        } while (m_handlers.back().add_events(POLLIN) == 0);
-        m_handlers.pop_back();
+        while (emplace_back(&mux).add_events(POLLIN) == 0) {
+        }
+        pop_back();
     }
-    size_t size() const { return m_handlers.size(); }
-
-private:
-    struct Occupant : FdHandler {
-        explicit Occupant(Multiplexer* mux) : FdHandler(-1, nullptr, mux) {}
-        void process(int) override {}
-    };
-    std::list<Occupant> m_handlers;
 };
 
 #endif  // TESTS_CLIENT_CONTROLFIXTURE_H_

@@ -39,7 +39,7 @@ protected:
     CpWorkState say(const std::string& message, const std::string& logged) {
         log.clear();
         EXPECT_TRUE(peer->send(message));
-        EXPECT_TRUE(run_until(loop, [&] { return log.has("bytes: "); }));
+        EXPECT_TRUE(pump_until(loop, [&] { return log.has("bytes: "); }));
         EXPECT_TRUE(log.has("virtual int CpStateHandler::process_data(): " + logged + "\n"))
             << log.text();
         EXPECT_EQ(log.count("\n"), 1u);
@@ -119,7 +119,7 @@ TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
     }
     // Longer than the buffer: a pattern in the second read.
     say(full + "xxxModem Assert", "256 bytes: " + full);
-    EXPECT_TRUE(run_until(loop, [&] { return log.has("15 bytes: xxxModem Assert\n"); }));
+    EXPECT_TRUE(pump_until(loop, [&] { return log.has("15 bytes: xxxModem Assert\n"); }));
     EXPECT_EQ(state(CT_WCDMA), CWS_NOT_WORKING);
 
     ExtWcnStateHandler wcn(&ctrl, &loop, SUPERVISOR);
@@ -178,7 +178,7 @@ TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
     const auto accept_and_close = [&] {
         for (int i = 0; i < 30; ++i) {
             connections += supervisor->accept() != nullptr;
-            pass(loop);
+            pump_once(loop);
         }
         return connections;
     };
@@ -188,7 +188,7 @@ TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
     EXPECT_EQ(accept_and_close(), 12);
     boot_clock::advance(3000);
     // The next one has something to say; then it counts afresh.
-    ASSERT_TRUE(run_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+    ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
     boot_clock::advance(3000);
     EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
     peer.reset();
@@ -202,7 +202,7 @@ TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     for (int i = 0; i < 5; ++i) {
         peer->send("Modem Al");
         peer->hang_up();
-        ASSERT_TRUE(run_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+        ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
         EXPECT_EQ(open_descriptors(), descriptors);
         EXPECT_EQ(say("ive", "3 bytes: ive"), CWS_WORKING);
     }
@@ -212,7 +212,7 @@ TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     // Gone for good: the retry is armed, once, and goes with the handler.
     supervisor.reset();
     peer.reset();
-    ASSERT_TRUE(run_until(loop, [&] { return modem->fd() == -1 && timeout() > 100; }));
+    ASSERT_TRUE(pump_until(loop, [&] { return modem->fd() == -1 && timeout() > 100; }));
     EXPECT_EQ(Occupants(loop).size(), Multiplexer::MAX_HANDLERS);
     modem.reset();
     EXPECT_EQ(timeout(), -1);
