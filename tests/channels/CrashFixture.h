@@ -118,9 +118,13 @@ public:
         while ((n = recv(m_fd, buf, sizeof(buf), MSG_DONTWAIT)) > 0) {
             m_heard.append(buf, static_cast<size_t>(n));
         }
+        m_ended = m_ended || n == 0 || (errno != EAGAIN && errno != EINTR);
         return m_heard;
     }
     void forget() { m_heard.clear(); }
+    // The other end is gone.
+    bool ended() { return heard(), m_ended; }
+    int fd() const { return m_fd; }
     void hang_up() {
         if (m_fd >= 0) {
             close(m_fd);
@@ -131,6 +135,7 @@ public:
 private:
     int m_fd;
     std::string m_heard;
+    bool m_ended = false;
 };
 
 class CrashFixture : public ChannelFixture {

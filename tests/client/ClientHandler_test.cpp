@@ -10,7 +10,7 @@ namespace {
 class ClientHandlerTest : public ClientFixture {
 protected:
     // With the last reply, nothing else came before or after the others.
-    void talk_to_end(Peer& peer, const std::string& requests, const std::string& expected) {
+    void talk_to_end(Client& peer, const std::string& requests, const std::string& expected) {
         talk(peer, requests + "GET_LOG_FILE_SIZE\n", expected + "OK 5\n");
     }
     CpWorkState wcdma_state() { return ctrl.get_cp(CT_WCDMA)->state(); }
@@ -30,22 +30,22 @@ TEST_F(ClientHandlerTest, Framing) {
         {std::string(240, ' ') + "FLUSH\n" + std::string(250, ' ') + "FLUSH\n", "OK\nOK\n"},
         {"SET_SD_MAX_SIZE " + std::string(239, '0') + "\nSET_SD_MAX_SIZE 250\n", "OK\nOK\n"},
     };
-    Peer client(TEST_SERVER);
+    Client client(TEST_SERVER);
     for (const auto& c : CASES) {
         talk_to_end(client, c.sent, c.replies);
         // Split before its end.
-        ASSERT_TRUE(client.send("GET_LOG_FI"));
+        ASSERT_TRUE(client.say("GET_LOG_FI"));
         settle();
-        ASSERT_EQ(client.receive(), "");
+        ASSERT_EQ(client.heard(), "");
         talk(client, "LE_SIZE\n", "OK 5\n");
     }
     // Without a terminator the buffer is full: alone that is no reason to hang up.
-    ASSERT_TRUE(client.send(std::string(256, 'x')));
+    ASSERT_TRUE(client.say(std::string(256, 'x')));
     settle();
     EXPECT_FALSE(client.ended());
-    ASSERT_TRUE(client.send("\n"));
+    ASSERT_TRUE(client.say("\n"));
     EXPECT_TRUE(pump_until(mux(), [&] { return client.ended(); }));
-    EXPECT_EQ(client.got, "");
+    EXPECT_EQ(client.heard(), "");
     EXPECT_TRUE(
         log.has("void ClientManager::process_client_disconn(ClientHandler*): client disconnected, "
                 "remaining 0 clients\n"));
@@ -54,9 +54,9 @@ TEST_F(ClientHandlerTest, Framing) {
 TEST_F(ClientHandlerTest, PeersThatVanishLeaveNothingBehind) {
     const size_t descriptors = open_descriptors();
     for (const char* last_words : {"", "FLUSH\n", "GET_LOG", "SUBSCRIBE WCN DUMP\nFLUSH\n"}) {
-        Peer client(TEST_SERVER);
+        Client client(TEST_SERVER);
         ASSERT_TRUE(pump_until(mux(), [&] { return manager->client_num() == 1; }));
-        ASSERT_TRUE(client.send(last_words));
+        ASSERT_TRUE(client.say(last_words));
         pump_once(mux());
         // Replies that are never read make the last read of the server fail.
         client.hang_up();
@@ -67,9 +67,9 @@ TEST_F(ClientHandlerTest, PeersThatVanishLeaveNothingBehind) {
 }
 
 TEST_F(ClientHandlerTest, NotificationsGoToSubscribersOnly) {
-    Peer one(TEST_SERVER);
-    Peer all(TEST_SERVER);
-    Peer none(TEST_SERVER);
+    Client one(TEST_SERVER);
+    Client all(TEST_SERVER);
+    Client none(TEST_SERVER);
     talk(one, "SUBSCRIBE WCN DUMP\nSUBSCRIBE WCN DUMP\n", "OK\nOK\n");
     std::string lines;
     for (const char* name :
@@ -92,35 +92,35 @@ TEST_F(ClientHandlerTest, NotificationsGoToSubscribersOnly) {
 
 // The socket's buffer fills up; whatever the client misses, nobody waits for it.
 TEST_F(ClientHandlerTest, ClientThatDoesNotReadHoldsUpNobody) {
-    Peer lazy(TEST_SERVER);
-    Peer other(TEST_SERVER);
+    Client lazy(TEST_SERVER);
+    Client other(TEST_SERVER);
     talk(lazy, "SUBSCRIBE WCN DUMP\n", "OK\n");
     for (int i = 0; i < 20000; ++i) {
         manager->notify_cp_dump(CT_WCN, CDE_START);
     }
-    EXPECT_TRUE(lazy.send("FLUSH\nFLUSH\nFLUSH\n"));
+    EXPECT_TRUE(lazy.say("FLUSH\nFLUSH\nFLUSH\n"));
     talk(other, "GET_LOG_FILE_SIZE\n", "OK 5\n");
     settle();
     EXPECT_EQ(manager->client_num(), 2u);
     // It gets whole lines, and is served again as soon as it reads.
-    const std::string got = lazy.receive();
+    const std::string got = lazy.heard();
     ASSERT_FALSE(got.empty());
     EXPECT_EQ(got.size() % strlen("CP_DUMP_START WCN\n"), 0u);
-    lazy.got.clear();
+    lazy.forget();
     talk_to_end(lazy, "", "");
 }
 
 TEST_F(ClientHandlerTest, SecondTransactionIsRefusedWhileTheFirstRuns) {
-    Peer client(TEST_SERVER);
-    Peer other(TEST_SERVER);
+    Client client(TEST_SERVER);
+    Client other(TEST_SERVER);
     talk(client, "ENABLE_LOG WCDMA\n", "OK\n");
     talk(client, "SAVE_RINGBUF WCDMA\nSAVE_SLEEP_LOG WCDMA\nSAVE_RINGBUF WCDMA\n",
          "ERROR 4\nERROR 4\n");
     EXPECT_TRUE(log.has("proc_sleep_log(const uint8_t*, size_t): Save sleep log error -2 ["));
     EXPECT_EQ(wcdma_state(), CWS_SAVE_RINGBUF);
-    ASSERT_TRUE(client.send("GET_LOG_STATE WCDMA\nGET_SD_MAX_SIZE\n"));
+    ASSERT_TRUE(client.say("GET_LOG_STATE WCDMA\nGET_SD_MAX_SIZE\n"));
     talk(other, "SAVE_RINGBUF WCDMA\nkestctl clear\n", "ERROR 4\nERROR 4\n");
-    EXPECT_EQ(client.receive(), "");
+    EXPECT_EQ(client.heard(), "");
     // The first goes on: its result is what a stopped transaction gives.
     talk(other, "DISABLE_LOG WCDMA\n", "OK\n");
     EXPECT_EQ(replies(client, "ERROR 3\nOK OFF\nOK 250\n"), "ERROR 3\nOK OFF\nOK 250\n");
@@ -133,28 +133,28 @@ TEST_F(ClientHandlerTest, SecondTransactionIsRefusedWhileTheFirstRuns) {
 }
 
 TEST_F(ClientHandlerTest, ClientGoneBeforeItsResult) {
-    Peer client(TEST_SERVER);
-    Peer other(TEST_SERVER);
+    Client client(TEST_SERVER);
+    Client other(TEST_SERVER);
     talk(client, "ENABLE_LOG WCDMA\n", "OK\n");
-    ASSERT_TRUE(client.send("SAVE_SLEEP_LOG WCDMA\n"));
+    ASSERT_TRUE(client.say("SAVE_SLEEP_LOG WCDMA\n"));
     ASSERT_TRUE(pump_until(mux(), [&] { return wcdma_state() == CWS_SAVE_SLEEP_LOG; }));
     // Its place is free at once, what it had sent is done, and the transaction runs on.
-    ASSERT_TRUE(client.send("SAVE_RINGBUF WCDMA\nSET_SD_MAX_SIZE 77\n"));
+    ASSERT_TRUE(client.say("SAVE_RINGBUF WCDMA\nSET_SD_MAX_SIZE 77\n"));
     client.hang_up();
     ASSERT_TRUE(pump_until(mux(), [&] { return manager->client_num() == 1; }));
     EXPECT_EQ(wcdma_state(), CWS_SAVE_SLEEP_LOG);
     talk(other, "GET_SD_MAX_SIZE\nDISABLE_LOG WCDMA\nENABLE_LOG WCDMA\n", "OK 77\nOK\nOK\n");
 
     // One that only has nothing more to say gets its reply, and is closed then.
-    Peer piped(TEST_SERVER);
-    ASSERT_TRUE(piped.send("SAVE_SLEEP_LOG WCDMA\n"));
-    shutdown(piped.fd, SHUT_WR);
+    Client piped(TEST_SERVER);
+    ASSERT_TRUE(piped.say("SAVE_SLEEP_LOG WCDMA\n"));
+    shutdown(piped.fd(), SHUT_WR);
     ASSERT_TRUE(pump_until(mux(), [&] { return wcdma_state() == CWS_SAVE_SLEEP_LOG; }));
     settle();
     EXPECT_EQ(manager->client_num(), 2u);
     talk(other, "DISABLE_LOG WCDMA\nENABLE_LOG WCDMA\n", "OK\nOK\n");
     ASSERT_TRUE(pump_until(mux(), [&] { return piped.ended(); }));
-    EXPECT_EQ(piped.got, "ERROR 3\n");
+    EXPECT_EQ(piped.heard(), "ERROR 3\n");
 
     talk(other, "SAVE_SLEEP_LOG WCDMA\nSET_SD_MAX_SIZE 250\n", "OK\n");
     // Destroyed with its transaction running: the result comes to nobody.
@@ -169,7 +169,7 @@ TEST_F(ClientHandlerTest, ClientGoneBeforeItsResult) {
 TEST_F(ClientHandlerTest, ResultCodesInAFullLoop) {
     int fds[2];
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, fds), 0);
-    Peer peer(fds[0]);
+    Client peer(fds[0]);
     ClientHandler* const client = new ClientHandler(fds[1], &ctrl, &mux(), manager.get());
     client->add_events(POLLIN);
     client->process(POLLIN);  // nothing is there
@@ -188,7 +188,7 @@ TEST_F(ClientHandlerTest, ResultCodesInAFullLoop) {
         ASSERT_EQ(channel->state(), CWS_SAVE_RINGBUF);
         {
             // It keeps its place in the loop.
-            const Occupants occupants(mux());
+            const auto fillers = Filler::fill(mux());
             client->notify_trans_result(c.result);
             talk(peer, "GET_LOG_FILE_SIZE\n", std::string(c.reply) + "OK 5\n");
         }

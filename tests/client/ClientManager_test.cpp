@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 
+#include <list>
+
 #include "client/ControlFixture.h"
 #include "support/boot_clock.h"
 
@@ -31,16 +33,16 @@ typedef ClientFixture ClientManagerTest;
 
 TEST_F(ClientManagerTest, FourthClientWaitsUntilOneLeaves) {
     for (int round = 0; round < 2; ++round) {
-        std::list<Peer> clients;
+        std::list<Client> clients;
         for (int i = 0; i < 3; ++i) {
             clients.emplace_back(TEST_SERVER);
             talk(clients.back(), "GET_LOG_FILE_SIZE\n", "OK 5\n");
         }
         clients.emplace_back(TEST_SERVER);
-        ASSERT_TRUE(clients.back().send("GET_LOG_FILE_SIZE\n"));
+        ASSERT_TRUE(clients.back().say("GET_LOG_FILE_SIZE\n"));
         settle();
         EXPECT_FALSE(clients.back().ended());
-        EXPECT_EQ(clients.back().got, "");
+        EXPECT_EQ(clients.back().heard(), "");
         EXPECT_EQ(log.count("void ClientManager::process(int): new client accepted\n"), 3u);
         clients.pop_front();
         EXPECT_EQ(replies(clients.back(), "OK 5\n"), "OK 5\n");
@@ -50,7 +52,7 @@ TEST_F(ClientManagerTest, FourthClientWaitsUntilOneLeaves) {
         log.clear();
     }
     serve(0);  // no limit
-    std::list<Peer> clients;
+    std::list<Client> clients;
     for (size_t i = 1; i <= 8; ++i) {
         clients.emplace_back(TEST_SERVER);
         talk(clients.back(), "GET_LOG_FILE_SIZE\n", "OK 5\n");
@@ -61,8 +63,8 @@ TEST_F(ClientManagerTest, FourthClientWaitsUntilOneLeaves) {
 TEST_F(ClientManagerTest, FullLoop) {
     const size_t descriptors = open_descriptors();
     {
-        Occupants occupants(mux());
-        Peer client(TEST_SERVER);
+        const auto fillers = Filler::fill(mux());
+        Client client(TEST_SERVER);
         EXPECT_TRUE(pump_until(mux(), [&] { return client.ended(); }));
         EXPECT_EQ(manager->client_num(), 0u);
         EXPECT_TRUE(log.has(
@@ -72,19 +74,19 @@ TEST_F(ClientManagerTest, FullLoop) {
     EXPECT_EQ(open_descriptors(), descriptors);
     manager.reset();
     {
-        Occupants occupants(mux());
+        const auto fillers = Filler::fill(mux());
         serve(3);
         EXPECT_TRUE(log.has("no room to poll server socket, waiting for it [105("));
     }
     // It listens as soon as there is room.
-    Peer client(TEST_SERVER);
+    Client client(TEST_SERVER);
     talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
 }
 
 // A client that cannot be accepted stays ready for ever: it took a whole core.
 TEST_F(ClientManagerTest, NoDescriptorsLeft) {
     boot_clock::freeze();
-    Peer client(TEST_SERVER);
+    Client client(TEST_SERVER);
     g_no_descriptors = true;
     for (int refused : {10, 11, 12}) {
         for (int i = 0; i < 15; ++i) {

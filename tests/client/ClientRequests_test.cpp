@@ -128,7 +128,7 @@ const struct {
 };
 
 TEST_F(ClientRequestsTest, EveryRequestRepliesAndLogsAsItShould) {
-    Peer client(TEST_SERVER);
+    Client client(TEST_SERVER);
     talk(client, "FLUSH\n", "OK\n");
     log.clear();
     for (const auto& c : CASES) {

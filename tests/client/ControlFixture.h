@@ -3,8 +3,6 @@
 #ifndef TESTS_CLIENT_CONTROLFIXTURE_H_
 #define TESTS_CLIENT_CONTROLFIXTURE_H_
 
-#include <list>
-
 #include "channels/CrashFixture.h"
 #include "client/ClientHandler.h"
 #include "client/ClientManager.h"
@@ -12,40 +10,6 @@
 #include "control/LogController.h"
 
 constexpr char TEST_SERVER[] = "control_test";
-
-// One end of a connection, closed at the end; never blocks.
-struct Peer {
-    explicit Peer(int fd_in) : fd(fd_in) { fcntl(fd, F_SETFL, O_RDWR | O_NONBLOCK); }
-    explicit Peer(const char* server)
-        : Peer(socket_local_client(server, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)) {}
-    ~Peer() { hang_up(); }
-    Peer(const Peer&) = delete;
-    Peer& operator=(const Peer&) = delete;
-
-    void hang_up() {
-        close(fd);
-        fd = -1;
-    }
-    bool send(const std::string& bytes) const {
-        return ::send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL) ==
-               static_cast<ssize_t>(bytes.size());
-    }
-    // Adds what has arrived to got; "closed" tells whether the other end is gone.
-    const std::string& receive() {
-        char buf[4096];
-        ssize_t n;
-        while ((n = recv(fd, buf, sizeof(buf), 0)) > 0) {
-            got.append(buf, static_cast<size_t>(n));
-        }
-        closed = closed || n == 0 || (errno != EAGAIN && errno != EINTR);
-        return got;
-    }
-    bool ended() { return receive(), closed; }
-
-    int fd;
-    std::string got;
-    bool closed = false;
-};
 
 class ControlFixture : public ConfigFixture {
 protected:
@@ -64,14 +28,14 @@ protected:
     Multiplexer& mux() { return ctrl.multiplexer(); }
 
     // What the peer got when it got as many bytes as expected, or when time is over.
-    std::string replies(Peer& peer, const std::string& expected) {
-        pump_until(mux(), [&] { return peer.receive().size() >= expected.size(); });
-        std::string got;
-        got.swap(peer.got);
+    std::string replies(Client& peer, const std::string& expected) {
+        pump_until(mux(), [&] { return peer.heard().size() >= expected.size(); });
+        const std::string got = peer.heard();
+        peer.forget();
         return got;
     }
-    void talk(Peer& peer, const std::string& request, const std::string& expected) {
-        EXPECT_TRUE(peer.send(request));
+    void talk(Client& peer, const std::string& request, const std::string& expected) {
+        EXPECT_TRUE(peer.say(request));
         EXPECT_EQ(replies(peer, expected), expected) << request;
     }
 
@@ -98,15 +62,6 @@ protected:
         }
     }
     std::unique_ptr<ClientManager> manager;
-};
-
-// Takes every place that is free in the loop's table.
-struct Occupants : std::list<Filler> {
-    explicit Occupants(Multiplexer& mux) {
-        while (emplace_back(&mux).add_events(POLLIN) == 0) {
-        }
-        pop_back();
-    }
 };
 
 #endif  // TESTS_CLIENT_CONTROLFIXTURE_H_

@@ -18,11 +18,11 @@ struct Supervisor {
     Supervisor()
         : server(socket_local_server(SUPERVISOR, ANDROID_SOCKET_NAMESPACE_ABSTRACT,
                                      SOCK_STREAM | SOCK_NONBLOCK)) {}
-    std::unique_ptr<Peer> accept() const {
-        const int fd = accept4(server.fd, nullptr, nullptr, SOCK_CLOEXEC);
-        return std::unique_ptr<Peer>(fd < 0 ? nullptr : new Peer(fd));
+    std::unique_ptr<Client> accept() const {
+        const int fd = accept4(server.fd(), nullptr, nullptr, SOCK_CLOEXEC);
+        return std::unique_ptr<Client>(fd < 0 ? nullptr : new Client(fd));
     }
-    Peer server;
+    Client server;
 };
 
 // The handler has a loop of its own, so that nothing else is in it.
@@ -38,7 +38,7 @@ protected:
     // Sends one message, which is read in one piece; gives the state of the CP then.
     CpWorkState say(const std::string& message, const std::string& logged) {
         log.clear();
-        EXPECT_TRUE(peer->send(message));
+        EXPECT_TRUE(peer->say(message));
         EXPECT_TRUE(pump_until(loop, [&] { return log.has("bytes: "); }));
         EXPECT_TRUE(log.has("virtual int CpStateHandler::process_data(): " + logged + "\n"))
             << log.text();
@@ -61,7 +61,7 @@ protected:
     Multiplexer loop;
     std::unique_ptr<Supervisor> supervisor{new Supervisor};
     std::unique_ptr<ModemStateHandler> modem{new ModemStateHandler(&ctrl, &loop, SUPERVISOR)};
-    std::unique_ptr<Peer> peer;
+    std::unique_ptr<Client> peer;
 };
 
 TEST_F(CpStateHandlerTest, Patterns) {
@@ -154,7 +154,7 @@ TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     supervisor->accept();
     ModemStateHandler second(&ctrl, &loop, SUPERVISOR);
     {
-        Occupants occupants(loop);
+        const auto fillers = Filler::fill(loop);
         EXPECT_EQ(second.init(), 0);
         ASSERT_TRUE((peer = supervisor->accept()));
         EXPECT_TRUE(log.has("no room to poll supervisor_test, waiting for it [105("));
@@ -200,7 +200,7 @@ TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     connect(*modem);
     const size_t descriptors = open_descriptors();
     for (int i = 0; i < 5; ++i) {
-        peer->send("Modem Al");
+        peer->say("Modem Al");
         peer->hang_up();
         ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
         EXPECT_EQ(open_descriptors(), descriptors);
@@ -213,7 +213,7 @@ TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     supervisor.reset();
     peer.reset();
     ASSERT_TRUE(pump_until(loop, [&] { return modem->fd() == -1 && timeout() > 100; }));
-    EXPECT_EQ(Occupants(loop).size(), Multiplexer::MAX_HANDLERS);
+    EXPECT_EQ(Filler::free_slots(loop), Multiplexer::MAX_HANDLERS);
     modem.reset();
     EXPECT_EQ(timeout(), -1);
 }
