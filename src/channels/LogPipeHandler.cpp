@@ -21,7 +21,7 @@ LogPipeHandler::LogPipeHandler(LogController* ctrl, Multiplexer* mux,
       m_type(entry->type),
       m_reset_prop(entry->type == CT_WCN ? PROP_WCN_RESET : PROP_MODEM_RESET),
       m_stor_mgr(stor_mgr),
-      m_iq(this, ctrl, mux) {}
+      m_iq(this) {}
 
 LogPipeHandler::~LogPipeHandler() {
     m_iq.stop();

@@ -38,6 +38,7 @@ public:
     // The descriptor, -1 when none is open.
     int fd() const { return m_fd; }
 
+    LogController* log_ctrl() const { return m_log_ctrl; }
     Multiplexer* multiplexer() const { return m_multiplexer; }
 
     // Adds poll events to the registration, or makes it. 0, or -1 when the loop's table

@@ -26,8 +26,8 @@ void set_nonblock(int fd) {
 
 }  // namespace
 
-WcdmaIqManager::WcdmaIqManager(LogPipeHandler* channel, LogController* ctrl, Multiplexer* mux)
-    : FdHandler(-1, ctrl, mux), m_channel(channel) {}
+WcdmaIqManager::WcdmaIqManager(LogPipeHandler* channel)
+    : FdHandler(-1, channel->log_ctrl(), channel->multiplexer()), m_channel(channel) {}
 
 WcdmaIqManager::~WcdmaIqManager() {
     stop();

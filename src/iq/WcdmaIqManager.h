@@ -38,7 +38,8 @@ public:
 
     static constexpr size_t MAX_FILES = 60;
 
-    WcdmaIqManager(LogPipeHandler* channel, LogController* ctrl, Multiplexer* mux);
+    // The channel's controller and loop serve the manager as well.
+    explicit WcdmaIqManager(LogPipeHandler* channel);
     // Stops the capture.
     ~WcdmaIqManager() override;
 
@@ -61,27 +62,32 @@ public:
     void process(int events) override;
     void process_stor_response(int response);
 
-private:
-    static void* save_thread(void* manager);
+    // Steps of the above, each 0 or -1; a file or null.
+    int prepare_iq_mem_map();
+    int start_save_thread();
+    LogFile* create_iq_file();
+    int gen_iq_file_name(android::String8& name);
+    // Ends the save in progress and forgets all files: their medium is going.
+    int cancel_save();
     static void on_ext_stor_umount(void* manager);
+
+    // On the saving thread. process_save: false when the thread is to end.
+    static void* save_thread(void* manager);
+    bool process_save();
+
+private:
     static void on_file_destroyed(void* manager);
     static void on_next_second(void* manager);
 
-    bool process_save();
     int next_command();
     void respond(int response);
 
-    int prepare_iq_mem_map();
     void release_iq_mem_map();
-    int start_save_thread();
     void stop_save_thread();
-    LogFile* create_iq_file();
-    int gen_iq_file_name(android::String8& name);
     bool name_in_use(const android::String8& name);
     void prune_files();
     void cancel_name_timer();
     void wait_for_stop();
-    int cancel_save();
     void settle_file();
     void release_buffer();
     void poll_device();

@@ -117,7 +117,7 @@ protected:
         s_script = &script;
         device.on_buf_info = [this] { script.pass(0); };
         EXPECT_EQ(boot("stream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
-        iq = std::make_unique<WcdmaIqManager>(ctrl->get_cp(CT_GNSS), ctrl.get(), &mux());
+        iq = std::make_unique<WcdmaIqManager>(ctrl->get_cp(CT_GNSS));
     }
     ~WcdmaIqManagerTest() override {
         iq.reset();
