@@ -3,6 +3,7 @@
 #include <errno.h>
 #include <poll.h>
 #include <stdint.h>
+#include <sys/socket.h>
 #include <unistd.h>
 
 #include "core/log.h"
@@ -21,8 +22,12 @@ IqStorRespHandler::IqStorRespHandler(int fd, LogController* ctrl, Multiplexer* m
 
 void IqStorRespHandler::process(int /*events*/) {
     uint8_t response;
-    while (read(m_fd, &response, 1) > 0) {
+    ssize_t n;
+    while ((n = read(m_fd, &response, 1)) > 0) {
         m_manager->process_stor_response(response);
+    }
+    if (n == 0 || (errno != EAGAIN && errno != EINTR)) {
+        m_manager->process_thread_lost();  // destroys this
     }
 }
 
@@ -57,5 +62,18 @@ int IqStorRespHandler::wait_response() {
         if (n == 0 || (errno != EAGAIN && errno != EINTR)) {
             return -1;
         }
+    }
+}
+
+void IqStorRespHandler::end_thread() {
+    send_cmd(IQST_QUIT);
+    // Should the command not get through, its end of the connection tells the thread.
+    shutdown(m_fd, SHUT_WR);
+    struct pollfd pfd;
+    pfd.fd = m_fd;
+    pfd.events = 0;  // the hang-up alone
+    pfd.revents = 0;
+    if (poll(&pfd, 1, PATIENCE_MS) == 0) {
+        info_log("I/Q saving thread does not end, waiting on");
     }
 }

@@ -19,7 +19,8 @@ class IqStorRespHandler : public FdHandler {
 public:
     IqStorRespHandler(int fd, LogController* ctrl, Multiplexer* mux, WcdmaIqManager* manager);
 
-    // Hands every response that has arrived to the manager.
+    // Hands every response that has arrived to the manager, and the end of the connection:
+    // the manager destroys this then.
     void process(int events) override;
 
     // 0 when the command was handed over, else -1.
@@ -27,6 +28,9 @@ public:
     // Blocks until the thread responds; the response. While it waits it says so every few
     // seconds. -1 when the thread can not respond any more.
     int wait_response();
+    // Makes the thread end, which the caller waits for by joining it. No failure of the
+    // connection keeps the thread running.
+    void end_thread();
 
 private:
     WcdmaIqManager* m_manager;

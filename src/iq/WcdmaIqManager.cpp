@@ -18,14 +18,6 @@
 #include "storage/CpStorage.h"
 #include "storage/log_name.h"
 
-namespace {
-
-void set_nonblock(int fd) {
-    fcntl(fd, F_SETFL, fcntl(fd, F_GETFL) | O_NONBLOCK);
-}
-
-}  // namespace
-
 WcdmaIqManager::WcdmaIqManager(LogPipeHandler* channel)
     : FdHandler(-1, channel->log_ctrl(), channel->multiplexer()), m_channel(channel) {}
 
@@ -40,23 +32,20 @@ int WcdmaIqManager::start(CpStorage* storage) {
         return -1;
     }
     m_storage = storage;
-    const bool thread_runs = start_save_thread() == 0;
-    // A device that is never polled would be a capture that silently does nothing.
-    if (!thread_runs || add_events(POLLIN) < 0) {
-        if (thread_runs) {
-            stop_save_thread();
-        }
+    if (start_save_thread() < 0) {
         release_iq_mem_map();
         m_storage = nullptr;
         return -1;
     }
+    note_alive();
+    poll_device();
     m_state = IQS_WAITING;
     m_storage->subscribe_ext_stor_umount_evt(this, on_ext_stor_umount);
     return 0;
 }
 
 int WcdmaIqManager::prepare_iq_mem_map() {
-    m_fd = open(system_path(PATH_IQ_MEM).string(), O_RDONLY | O_CLOEXEC);
+    m_fd = open(system_path(PATH_IQ_MEM).string(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     if (m_fd < 0) {
         err_log("can not open /dev/iq_mem");
         return -1;
@@ -91,31 +80,27 @@ void WcdmaIqManager::release_iq_mem_map() {
 
 int WcdmaIqManager::start_save_thread() {
     int pair[2];
-    if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, pair) < 0) {
+    if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, pair) < 0) {
         return -1;
     }
-    set_nonblock(pair[0]);
-    set_nonblock(pair[1]);
     m_resp_handler = new IqStorRespHandler(pair[0], m_log_ctrl, m_multiplexer, this);
     m_thread_sock = pair[1];
-    if (m_resp_handler->add_events(POLLIN) < 0 ||
-        pthread_create(&m_thread, nullptr, save_thread, this) != 0) {
+    if (pthread_create(&m_thread, nullptr, save_thread, this) != 0) {
         delete m_resp_handler;
         m_resp_handler = nullptr;
         ::close(m_thread_sock);
         m_thread_sock = -1;
         return -1;
     }
+    m_resp_handler->poll_when_room(POLLIN, "the I/Q saving thread");
     return 0;
 }
 
 void WcdmaIqManager::stop_save_thread() {
-    if (m_resp_handler->send_cmd(IQST_QUIT) < 0) {
-        // The thread takes the end of the connection for the same command.
-        shutdown(m_resp_handler->fd(), SHUT_WR);
+    if (!m_resp_handler) {
+        return;
     }
-    while (m_resp_handler->wait_response() >= 0) {
-    }
+    m_resp_handler->end_thread();
     pthread_join(m_thread, nullptr);
     m_thread = 0;
     delete m_resp_handler;
@@ -129,7 +114,6 @@ int WcdmaIqManager::stop() {
         return 0;
     }
     m_storage->unsubscribe_ext_stor_umount_evt(this);
-    cancel_name_timer();
     stop_save_thread();
     settle_file();
     m_storage = nullptr;
@@ -139,7 +123,6 @@ int WcdmaIqManager::stop() {
 }
 
 int WcdmaIqManager::pause() {
-    cancel_name_timer();
     switch (m_state) {
         case IQS_IDLE:
             return -1;
@@ -163,9 +146,8 @@ int WcdmaIqManager::resume() {
         return -1;
     }
     if (m_state == IQS_PAUSED) {
-        poll_device();
-        release_buffer();
-        m_state = IQS_WAITING;
+        note_alive();
+        await_buffer();
     }
     return 0;
 }
@@ -173,31 +155,42 @@ int WcdmaIqManager::resume() {
 // ---- One buffer
 
 void WcdmaIqManager::poll_device() {
-    if (add_events(POLLIN) < 0) {
-        err_log("can not poll the I/Q memory device");
-    }
+    poll_when_room(POLLIN, "the I/Q memory device");
 }
 
 void WcdmaIqManager::release_buffer() {
     ioctl(m_fd, CMD_RELEASE_IQ_BUF);
 }
 
+// The buffer is done with, the next one may come.
+void WcdmaIqManager::await_buffer() {
+    poll_device();
+    m_state = IQS_WAITING;
+    release_buffer();
+}
+
+// What a filled buffer came to. A driver that reports buffers and gives none, or a medium that
+// takes none, would go on at once, for ever.
+void WcdmaIqManager::note_saved(bool something) {
+    if (something) {
+        note_alive();
+    } else {
+        note_idle("the I/Q memory device");
+    }
+}
+
 void WcdmaIqManager::process(int /*events*/) {
-    android::String8 name;
-    if (gen_iq_file_name(name) == 0 && name_in_use(name)) {
-        // File names tell seconds. The driver keeps the buffer until it is released, so a
-        // second one within the same second waits for a name of its own.
-        del_events(POLLIN);
-        m_name_timer = m_multiplexer->timer_mgr().create_timer(200, on_next_second, this);
-        if (m_name_timer) {
-            return;
-        }
-        poll_device();
+    if (!m_resp_handler && start_save_thread() < 0) {
+        release_buffer();
+        err_log("no thread to save WCDMA I/Q");
+        note_saved(false);
+        return;
     }
     m_cur_file = create_iq_file();
     if (!m_cur_file) {
         release_buffer();
         err_log("create WCDMA I/Q file error");
+        note_saved(false);
         return;
     }
     m_save_file = m_cur_file.get();
@@ -207,26 +200,12 @@ void WcdmaIqManager::process(int /*events*/) {
         m_cur_file->dir()->remove_file(m_cur_file.get());
         prune_files();
         release_buffer();
+        note_saved(false);
         return;
     }
     m_cur_file->set_destroy_hook(on_file_destroyed, this);
     m_state = IQS_SAVING;
     del_events(POLLIN);
-}
-
-void WcdmaIqManager::on_next_second(void* param) {
-    WcdmaIqManager* manager = static_cast<WcdmaIqManager*>(param);
-    manager->m_name_timer = nullptr;
-    if (manager->m_state == IQS_WAITING) {
-        manager->poll_device();
-    }
-}
-
-void WcdmaIqManager::cancel_name_timer() {
-    if (m_name_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_name_timer);
-        m_name_timer = nullptr;
-    }
 }
 
 int WcdmaIqManager::gen_iq_file_name(android::String8& name) {
@@ -271,17 +250,6 @@ void WcdmaIqManager::prune_files() {
     }
 }
 
-bool WcdmaIqManager::name_in_use(const android::String8& name) {
-    prune_files();
-    // Not the newest only: the clock may have been set back.
-    for (const FileRef& file : m_files) {
-        if (file->name() == name) {
-            return true;
-        }
-    }
-    return false;
-}
-
 size_t WcdmaIqManager::num_files() {
     prune_files();
     return m_files.size();
@@ -306,13 +274,22 @@ void WcdmaIqManager::process_stor_response(int response) {
     if (response == IQST_SAVED && m_state == IQS_SAVING) {
         info_log("WCDMA I/Q saved");
         settle_file();
-        poll_device();
-        m_state = IQS_WAITING;
-        release_buffer();
+        await_buffer();
+        note_saved(m_saved_bytes != 0);
     } else if (response == IQST_SAVED) {
         err_log("IQST_SAVED received in state %d", m_state);
     } else {
         err_log("response %d received in state %d", response, m_state);
+    }
+}
+
+void WcdmaIqManager::process_thread_lost() {
+    err_log("I/Q saving thread is gone");
+    stop_save_thread();
+    if (m_state == IQS_SAVING) {
+        settle_file();
+        await_buffer();
+        note_saved(false);
     }
 }
 
@@ -327,7 +304,9 @@ void WcdmaIqManager::wait_for_stop() {
         response = m_resp_handler->wait_response();
     } while (response >= 0 && response != IQST_STOPPED && (sent || response != IQST_SAVED));
     if (response < 0) {
+        // The file is free only when the thread has ended for certain.
         err_log("I/Q saving thread is gone");
+        stop_save_thread();
     }
 }
 
@@ -340,9 +319,7 @@ int WcdmaIqManager::cancel_save() {
         m_cur_file = nullptr;
     }
     clear_files();
-    release_buffer();
-    poll_device();
-    m_state = IQS_WAITING;
+    await_buffer();
     return 0;
 }
 
@@ -363,7 +340,5 @@ void WcdmaIqManager::on_file_destroyed(void* param) {
     manager->wait_for_stop();
     manager->m_save_file = nullptr;
     manager->m_cur_file = nullptr;
-    manager->release_buffer();
-    manager->poll_device();
-    manager->m_state = IQS_WAITING;
+    manager->await_buffer();
 }

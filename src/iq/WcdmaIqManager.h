@@ -20,7 +20,6 @@
 
 #include "core/FdHandler.h"
 #include "core/ObjectRef.h"
-#include "core/TimerManager.h"
 #include "storage/LogFile.h"
 
 class CpStorage;
@@ -48,7 +47,8 @@ public:
     size_t num_files();
 
     // Starts the capture into the channel's storage, which outlives it. 0, or -1 when it
-    // runs already or the device or the thread is not to be had.
+    // runs already or the device or the thread is not to be had. A loop without room takes
+    // the device later.
     int start(CpStorage* storage);
     // Ends it; a save in progress ends with what is written. 0.
     int stop();
@@ -61,6 +61,9 @@ public:
 
     void process(int events) override;
     void process_stor_response(int response);
+    // The thread ended, or cannot be reached: the save in progress ends, and the next
+    // buffer starts another thread.
+    void process_thread_lost();
 
     // Steps of the above, each 0 or -1; a file or null.
     int prepare_iq_mem_map();
@@ -77,20 +80,19 @@ public:
 
 private:
     static void on_file_destroyed(void* manager);
-    static void on_next_second(void* manager);
 
     int next_command();
     void respond(int response);
 
     void release_iq_mem_map();
     void stop_save_thread();
-    bool name_in_use(const android::String8& name);
     void prune_files();
-    void cancel_name_timer();
     void wait_for_stop();
     void settle_file();
     void release_buffer();
     void poll_device();
+    void await_buffer();
+    void note_saved(bool something);
 
     typedef ObjectRef<LogFile> FileRef;
 
@@ -100,8 +102,7 @@ private:
     android::List<FileRef> m_files;  // oldest first
     uint8_t* m_mem_base = nullptr;
     FileRef m_cur_file;
-    IqStorRespHandler* m_resp_handler = nullptr;
-    TimerManager::Timer* m_name_timer = nullptr;  // a buffer waits for the next second
+    IqStorRespHandler* m_resp_handler = nullptr;  // null: no thread
     pthread_t m_thread = 0;
     int m_thread_sock = -1;
     LogFile* m_save_file = nullptr;  // m_cur_file as the saving thread sees it

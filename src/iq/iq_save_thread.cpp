@@ -15,24 +15,31 @@ namespace {
 // Between two chunks the thread looks for a command.
 constexpr uint32_t CHUNK_SIZE = 10u << 20;
 constexpr int NO_COMMAND = -1;
+// A poll that fails is not tried again at once.
+constexpr unsigned int POLL_FAILED_WAIT_US = 100000;
 
 }  // namespace
 
-// The next command, if one is there: a value below 0 if not. The end of the connection
-// counts as IQST_QUIT.
+// The next command, if one is there: a value below 0 if not. The end of the connection, in
+// whatever way, counts as IQST_QUIT.
 int WcdmaIqManager::next_command() {
     uint8_t cmd;
     const ssize_t n = read(m_thread_sock, &cmd, 1);
     if (n == 1) {
         return cmd;
     }
-    return n == 0 ? static_cast<int>(IQST_QUIT) : NO_COMMAND;
+    if (n < 0 && (errno == EAGAIN || errno == EINTR)) {
+        return NO_COMMAND;
+    }
+    return IQST_QUIT;
 }
 
 void WcdmaIqManager::respond(int response) {
     const uint8_t byte = static_cast<uint8_t>(response);
     if (write(m_thread_sock, &byte, 1) != 1) {
         err_log("I/Q saving thread can not respond %d", response);
+        // Nobody shall wait for it: the connection is over for both ends.
+        shutdown(m_thread_sock, SHUT_RDWR);
     }
 }
 
@@ -44,8 +51,8 @@ void* WcdmaIqManager::save_thread(void* param) {
         pfd.fd = manager->m_thread_sock;
         pfd.events = POLLIN;
         pfd.revents = 0;
-        if (poll(&pfd, 1, -1) <= 0) {
-            continue;
+        if (poll(&pfd, 1, -1) < 0 && errno != EINTR) {
+            usleep(POLL_FAILED_WAIT_US);  // and reads all the same: a command may be there
         }
         switch (manager->next_command()) {
             case IQST_QUIT:

@@ -2,6 +2,7 @@
 
 #include <errno.h>
 #include <pthread.h>
+#include <signal.h>
 
 #include <filesystem>
 
@@ -11,11 +12,14 @@
 #include "iq/iq_mem.h"
 #include "storage/CpStorage.h"
 #include "storage/StorageManager.h"
+#include "support/boot_clock.h"
 
-// Interposed: writes of the saving thread and commands to it, the clock of the names
-// and the making of threads.
+// Interposed: writes of the saving thread and commands to it, its polls, the clock of the
+// names, the making of threads and of the connection to them.
 extern "C" {
 ssize_t __real_write(int fd, const void* data, size_t len);
+int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
+int __real_socketpair(int domain, int type, int protocol, int* pair);
 int __real_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
                           void* arg);
 }
@@ -33,10 +37,14 @@ struct Script {
     size_t fail_at = 0;          // that call and all later ones fail with ENOSPC
     int refused_cmd = -1;        // this command to the thread is not taken
     bool no_threads = false;
+    bool impatient = false;     // no poll of the loop's thread waits for longer than 1 ms
+    int pair[2];                // the connection to the thread: the loop's end, the thread's
     size_t gate_at = SIZE_MAX;  // at this step the thread waits at the gate
     // Without a lock, which would put the threads in order.
     std::atomic<bool> shut{false}, reached{false};
     std::atomic<int> saved_sent{0};
+    std::atomic<bool> no_polls[2]{{false}, {false}};  // of the thread, of the loop
+    std::atomic<int> failed_polls{0};
     std::atomic<time_t> time{1456823700};  // 2016-03-01 09:15:00
     std::atomic<int> tick{1};              // every call of time() is so much later
 
@@ -95,6 +103,25 @@ time_t __wrap_time(time_t* result) {
     return result ? *result = now : now;
 }
 
+int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
+    const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
+    if (s_script && s_script->no_polls[in_main]) {
+        ++s_script->failed_polls;
+        errno = ENOMEM;
+        return -1;
+    }
+    return __real_poll(fds, num,
+                       s_script && in_main && s_script->impatient ? std::min(timeout, 1) : timeout);
+}
+
+int __wrap_socketpair(int domain, int type, int protocol, int* pair) {
+    const int result = __real_socketpair(domain, type, protocol, pair);
+    if (s_script) {
+        std::copy(pair, pair + 2, s_script->pair);
+    }
+    return result;
+}
+
 int __wrap_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
                           void* arg) {
     return s_script && s_script->no_threads ? EAGAIN
@@ -114,6 +141,7 @@ protected:
     WcdmaIqManagerTest() {
         setenv("TZ", "UTC0", 1);
         tzset();
+        signal(SIGPIPE, SIG_IGN);  // as the service does
         s_script = &script;
         device.on_buf_info = [this] { script.pass(0); };
         EXPECT_EQ(boot("stream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
@@ -123,6 +151,7 @@ protected:
         iq.reset();
         ctrl.reset();
         s_script = nullptr;
+        boot_clock::real();
     }
 
     int start() { return iq->start(ctrl->get_cp(CT_GNSS)->storage()); }
@@ -131,8 +160,8 @@ protected:
     bool saved(size_t num) {
         return pump([&] { return released() >= num; }) && waits();
     }
-    void fill(const std::string& content) {
-        device.fill(64, static_cast<uint32_t>(content.size()), content);
+    void fill(const std::string& content, uint32_t offset = 64) {
+        device.fill(offset, static_cast<uint32_t>(content.size()), content);
     }
     bool save(const std::string& content) {
         const size_t before = released();
@@ -143,6 +172,7 @@ protected:
         script.writes.clear();
         script.gate_at = gate_at;
         script.shut = true;
+        script.reached = false;
     }
     bool begin_save(const std::string& content, size_t gate_at = SIZE_MAX) {
         arm(gate_at);
@@ -151,6 +181,8 @@ protected:
                (gate_at == SIZE_MAX ||
                 wait_until([&] { return script.reached.load(std::memory_order_relaxed); }));
     }
+    // The thread's connection breaks off.
+    void disconnect() { ASSERT_EQ(shutdown(script.pair[0], SHUT_WR), 0); }
     void log_data(CpType cp) {
         ASSERT_TRUE((cp == CT_GNSS ? gnss_dev : wcn_dev).put("log"));
         ctrl->get_cp(cp)->process(POLLIN);
@@ -186,14 +218,6 @@ protected:
 TEST_F(WcdmaIqManagerTest, AFailedStartUndoesEverything) {
     const size_t descriptors = open_descriptors();
     const size_t slots = Filler::free_slots(mux());
-    std::vector<std::unique_ptr<Filler>> fillers;
-    const auto leave_slots = [&](size_t num) {
-        fillers.clear();
-        while (Filler::free_slots(mux()) > num) {
-            fillers.push_back(std::make_unique<Filler>(&mux()));
-            fillers.back()->add_events(POLLIN);
-        }
-    };
     const std::string path = root.path("dev/iq_mem"), away = path + "_";
     const struct {
         std::function<void(bool)> set_broken;
@@ -207,8 +231,6 @@ TEST_F(WcdmaIqManagerTest, AFailedStartUndoesEverything) {
         {[&](bool on) { device.fail_mmap(on ? ENOMEM : 0); }, 1,
          "prepare_iq_mem_map(): mmap error [12("},
         {[&](bool on) { script.no_threads = on; }, 2, "mapped to 0x"},
-        {[&](bool on) { leave_slots(on ? 0 : slots); }, 2, "mapped to 0x"},
-        {[&](bool on) { leave_slots(on ? 1 : slots); }, 2, "mapped to 0x"},
         {nullptr, 2, "mapped to 0x"},  // and one that does not fail
     };
     for (const auto& c : cases) {
@@ -321,46 +343,143 @@ TEST_F(WcdmaIqManagerTest, KeepsSixtyFilesAcrossStopAndStart) {
 TEST_F(WcdmaIqManagerTest, AThreadThatDoesNotAnswerIsReported) {
     ASSERT_EQ(start(), 0);
     // The driver holds the thread until the service has said that it waits.
-    device.on_buf_info = [this] {
-        EXPECT_TRUE(wait_until([this] { return log.has("does not answer, waiting on"); }, 30000));
-    };
+    const char* message = "wait_response(): I/Q saving thread does not answer, waiting on\n";
+    script.impatient = true;
+    device.on_buf_info = [&] { EXPECT_TRUE(wait_until([&] { return log.count(message) > 1; })); };
     ASSERT_TRUE(begin_save(samples(MB)));
     EXPECT_EQ(iq->pause(), 0);
     EXPECT_EQ(iq->state(), WcdmaIqManager::IQS_PAUSED);
+    EXPECT_EQ(iq->resume(), 0);
+    message = "end_thread(): I/Q saving thread does not end, waiting on\n";
+    device.on_buf_info = [&] { EXPECT_TRUE(wait_until([&] { return log.has(message); })); };
+    ASSERT_TRUE(begin_save(samples(MB)));
+    EXPECT_EQ(iq->stop(), 0);
 }
 
-TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeAndForAName) {
+TEST_F(WcdmaIqManagerTest, AThreadThatIsLostIsReplaced) {
+    ASSERT_EQ(start(), 0);
+    disconnect();
+    EXPECT_TRUE(pump([&] { return log.has("process_thread_lost(): I/Q saving thread is gone"); }));
+    ASSERT_TRUE(save("by the second"));
+    EXPECT_EQ(newest(), "by the second");
+    // In the middle of a save: found out by the loop, and by who waits for the answer.
+    ASSERT_TRUE(begin_save(samples(25 * MB), 1));
+    disconnect();
+    script.shut = false;
+    ASSERT_TRUE(saved(2));
+    EXPECT_TRUE(newest() == samples(10 * MB));
+    ASSERT_TRUE(begin_save(samples(25 * MB), 1));
+    script.no_polls[1] = true;
+    EXPECT_EQ(iq->pause(), 0);
+    script.no_polls[1] = false;
+    EXPECT_TRUE(newest() == samples(10 * MB));
+    // A thread that cannot read its commands any more ends; without one buffers are dropped.
+    EXPECT_EQ(iq->resume(), 0);
+    ASSERT_TRUE(save("by the third"));
+    script.no_threads = true;
+    const int unreadable = open("/dev/null", O_WRONLY | O_CLOEXEC);
+    dup3(unreadable, script.pair[1], O_CLOEXEC);
+    close(unreadable);
+    ASSERT_TRUE(save("lost"));
+    ASSERT_TRUE(save("lost"));
+    EXPECT_TRUE(log.has("process(int): no thread to save WCDMA I/Q ["));
+    script.no_threads = false;
+    ASSERT_TRUE(save("by the last"));
+    EXPECT_EQ(newest(), "by the last");
+    expect_accounted();
+}
+
+TEST_F(WcdmaIqManagerTest, AThreadThatCannotPollNeitherSpinsNorIsStuck) {
+    ASSERT_EQ(start(), 0);
+    script.no_polls[0] = true;
+    const int64_t begin = monotonic_ms();
+    ASSERT_TRUE(save("one"));
+    ASSERT_TRUE(save("two"));
+    EXPECT_TRUE(wait_until([&] { return script.failed_polls >= 6; }));
+    EXPECT_GE(monotonic_ms() - begin, 500);
+    EXPECT_EQ(iq->stop(), 0);
+    EXPECT_EQ(newest(), "two");
+}
+
+TEST_F(WcdmaIqManagerTest, AFullTableOnlyDelaysTheCapture) {
+    std::vector<std::unique_ptr<Filler>> fillers;
+    while (Filler::free_slots(mux()) > 0) {
+        fillers.push_back(std::make_unique<Filler>(&mux()));
+        fillers.back()->add_events(POLLIN);
+    }
+    ASSERT_EQ(start(), 0);
+    EXPECT_TRUE(log.has("no room to poll the I/Q saving thread, waiting for it ["));
+    EXPECT_TRUE(log.has("no room to poll the I/Q memory device, waiting for it ["));
+    fillers.resize(fillers.size() - 2);
+    ASSERT_TRUE(save("one"));
+    EXPECT_EQ(newest(), "one");
+}
+
+// It made thousands of empty files a second.
+TEST_F(WcdmaIqManagerTest, ADeviceThatGivesNothingIsLeftAlone) {
+    boot_clock::freeze();
+    script.impatient = true;
+    ASSERT_EQ(start(), 0);
+    for (int i = 0; i < 40; ++i) {
+        fill(i == 9 || i == 19 ? "counts afresh" : "");
+    }
+    ASSERT_TRUE(saved(20));
+    const auto take_thread = [&] {
+        script.no_threads = true;
+        disconnect();
+    };
+    const auto take_medium = [&] {
+        remove("data/modem_log");
+        root.write_file("data/modem_log", "");
+    };
+    // Each comes on top of those before it.
+    const std::function<void()> faults[] = {[] {}, [&] { device.hang_up(); },
+                                            [&] { script.refused_cmd = IQST_SAVE; }, take_medium,
+                                            take_thread};
+    for (const auto& begin : faults) {
+        SCOPED_TRACE(&begin - faults);
+        EXPECT_EQ(iq->pause() + iq->resume(), 0);
+        EXPECT_EQ(iq->idle_wakeups(), 0u);
+        log.clear();
+        begin();
+        size_t done = released();
+        for (const size_t tries : {10, 1, 1}) {
+            done += tries;
+            EXPECT_TRUE(pump([&] { return released() == done; }) && iq->resting());
+            pump_once(mux());
+            pump_once(mux());
+            EXPECT_TRUE(waits() && released() == done);
+            boot_clock::advance(3000);
+        }
+        EXPECT_EQ(log.count("the I/Q memory device gave nothing 10 times in a row"), 1u);
+    }
+    script.no_threads = false;
+    EXPECT_EQ(iq->stop() + start(), 0) << "which does not wait for the device";
+    EXPECT_EQ(iq->idle_wakeups(), 0u);
+}
+
+TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeOnly) {
     script.tick = 0;
     EXPECT_EQ(iq->pause() + iq->resume(), -2) << "not started";
     ASSERT_EQ(start(), 0);
     iq->process_stor_response(IQST_SAVED);
     EXPECT_TRUE(log.has("process_stor_response(int): IQST_SAVED received in state 1 ["));
     EXPECT_EQ(iq->pause() + iq->pause(), 0);
-    fill("dropped");
-    fill("first");
-    fill("second");
+    uint32_t offset = 0;
+    for (const char* content : {"dropped", "first", "second", "third", "fourth"}) {
+        fill(content, offset += 64);
+    }
     pump_once(mux());
     EXPECT_EQ(iq_files().size(), 0u) << "nothing is taken while paused";
     EXPECT_EQ(iq->resume(), 0);
-    ASSERT_TRUE(saved(2));
-    EXPECT_FALSE(pump([&] { return released() > 2; }, 300)) << "within the second";
-    ++script.time;
-    ASSERT_TRUE(saved(3));
-    ASSERT_EQ(iq_files().size(), 2u);
-    EXPECT_EQ(newest(), "second");
-    // The wait ends with the capture, however often it was begun.
-    script.time = 2000000000;
-    ASSERT_TRUE(save("once"));
-    for (int i = 0; i < 3; ++i) {
-        EXPECT_EQ(iq->pause(), 0);
-        EXPECT_EQ(iq->resume(), 0);
-        fill("x");
-        mux().run_once();
-        ASSERT_TRUE(waits());
+    ASSERT_TRUE(saved(5)) << "the resume releases a buffer";
+    // All within one second.
+    std::vector<std::string> contents;
+    for (const std::string& file : iq_files()) {
+        contents.push_back(root.read_file(file));
     }
-    iq.reset();
-    EXPECT_FALSE(pump([] { return false; }, 300)) << "no timer finds the manager gone";
-    EXPECT_EQ(iq_files().size(), 3u);
+    EXPECT_EQ(contents, (std::vector<std::string>{"first", "second", "third", "fourth"}));
+    EXPECT_EQ(iq->num_files(), 4u);
 }
 
 TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
