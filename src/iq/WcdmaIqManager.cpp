@@ -325,7 +325,8 @@ int WcdmaIqManager::cancel_save() {
 
 void WcdmaIqManager::on_ext_stor_umount(void* param) {
     WcdmaIqManager* manager = static_cast<WcdmaIqManager*>(param);
-    if (manager->m_state == IQS_SAVING) {
+    if (manager->m_state == IQS_SAVING && manager->m_cur_file &&
+        manager->m_storage->on_sd(manager->m_cur_file.get())) {
         manager->cancel_save();
     }
 }

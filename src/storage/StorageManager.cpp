@@ -96,6 +96,8 @@ bool StorageManager::check_media_change() {
         info_log("sd card is umounted!");
         m_ext_umount_clients.notify();
         stop_all_storages();
+    } else if (!m_external.sets().empty()) {
+        m_ext_umount_clients.notify();  // it was in use once: a dump may lie on it
     }
     card_removed();
     if (m_media_type == MT_INTERNAL) {

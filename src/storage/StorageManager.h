@@ -77,8 +77,8 @@ public:
 
     void subscribe_media_change_evt(void* client, media_change_callback callback);
     void unsubscribe_media_change_evt(void* client);
-    // The callback runs while the SD card still counts as the medium in use; it must not
-    // make files.
+    // Called when an SD card that holds sets is found unmounted, in use or not, before they
+    // are forgotten. The callback must not make files.
     void subscribe_ext_stor_umount_evt(void* client, ext_umount_callback callback);
     void unsubscribe_ext_stor_umount_evt(void* client);
 

@@ -162,10 +162,9 @@ TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
          more,
          "create dump mem file failed [28(",
          {}},
-        // The first write is that of what is staged, when the dump file is closed.
         {"copy fails",
          false,
-         [&] { full(), faults::fail(faults::WRITE, 3, ENOSPC); },
+         [&] { full(), faults::fail(faults::WRITE, 2, ENOSPC); },
          more,
          "/proc/cpw/mem failed. [28(",
          {{mem, MEMORY.substr(0, 65536)}}},

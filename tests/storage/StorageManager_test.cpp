@@ -23,7 +23,6 @@ protected:
     }
     static void on_umount(void* client) {
         StorageManagerTest* self = static_cast<StorageManagerTest*>(client);
-        EXPECT_EQ(MT_EXTERNAL, self->m_mgr.media_type());
         EXPECT_FALSE(self->external().sets().empty());  // still there
         self->m_events += "U";
     }
@@ -78,6 +77,21 @@ TEST_F(StorageManagerTest, Transitions) {
         }
         EXPECT_EQ(c.to == MT_EXTERNAL, external().scanned());
     }
+}
+
+// A dump may still lie on a card that is not in use any more.
+TEST_F(StorageManagerTest, PullingACardThatWasInUseIsTold) {
+    plug_card();
+    m_mgr.check_media_change();
+    EXPECT_TRUE(m_mgr.creation_failed(&external(), EROFS));
+    faults::only_on("/sd/");
+    faults::fail(faults::OPEN, 1, EROFS, 100);
+    m_mgr.check_media_change();
+    ASSERT_EQ(MT_INTERNAL, m_mgr.media_type());
+    pull_card();
+    EXPECT_FALSE(m_mgr.check_media_change());
+    EXPECT_FALSE(m_mgr.check_media_change());
+    EXPECT_EQ("EIU", m_events);
 }
 
 TEST_F(StorageManagerTest, CardStateAndClearAll) {
