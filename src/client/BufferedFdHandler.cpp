@@ -16,7 +16,6 @@ void BufferedFdHandler::process(int /*events*/) {
     if (n == 0) {
         process_conn_closed();
     } else if (n > 0) {
-        note_alive();
         m_data_len += static_cast<size_t>(n);
         process_data();
     } else if (errno == EAGAIN) {

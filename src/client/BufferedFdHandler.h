@@ -18,8 +18,8 @@ public:
     // Reads once and tells the subclass. The object may be gone when this returns.
     void process(int events) override;
 
-    // Bytes have arrived: consume what is wanted of the buffer. Returns 0. May destroy
-    // the object.
+    // Bytes have arrived: consume what is wanted of the buffer, and note_alive if they are of
+    // any use. Returns 0. May destroy the object.
     virtual int process_data() = 0;
     // The peer has closed the connection, or has filled the buffer without anything being
     // consumed. May destroy the object.

@@ -34,6 +34,7 @@ ClientHandler::~ClientHandler() {
 }
 
 int ClientHandler::process_data() {
+    note_alive();
     const uint8_t* const end = m_buffer + m_data_len;
     const uint8_t* req = m_buffer;
     for (const uint8_t* p = m_buffer; p < end; ++p) {

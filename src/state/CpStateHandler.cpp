@@ -68,13 +68,15 @@ void CpStateHandler::reconnect(void* handler) {
 }
 
 int CpStateHandler::process_data() {
-    m_used = true;
     char text[4 * BUFFER_SIZE + 1];
     make_line(m_buffer, m_data_len, text);
     info_log("%u bytes: %s", static_cast<unsigned int>(m_data_len), text);
     CpType type = CT_UNKNOWN;
     const CpEvent event = parse_notify(m_buffer, m_data_len, type);
     if (event != CE_NONE) {
+        // A supervisor that says no more than some bytes before it closes is of no use.
+        m_used = true;
+        note_alive();
         m_log_ctrl->process_cp_evt(type, event);
     }
     m_data_len = 0;

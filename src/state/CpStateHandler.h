@@ -58,7 +58,7 @@ private:
     void cancel_reconnect();
 
     const android::String8 m_serv_name;
-    bool m_used = false;  // the connection has given something
+    bool m_used = false;  // the connection has told of an event
 };
 
 #endif  // STATE_CPSTATEHANDLER_H_

@@ -187,7 +187,13 @@ TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
     boot_clock::advance(3000);
     EXPECT_EQ(accept_and_close(), 12);
     boot_clock::advance(3000);
-    // The next one has something to say; then it counts afresh.
+    // Nor is one of use that says something but nothing that counts.
+    ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+    peer->say("x");
+    peer.reset();
+    EXPECT_EQ(accept_and_close(), 12);
+    boot_clock::advance(3000);
+    // The next one tells of an event; then it counts afresh.
     ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
     boot_clock::advance(3000);
     EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
