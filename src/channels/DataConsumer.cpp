@@ -2,8 +2,7 @@
 
 #include <poll.h>
 
-#include "channels/ExchangeTimer.h"
-#include "core/Multiplexer.h"
+#include "core/OneShotTimer.h"
 
 DataConsumer::DataConsumer(const char* cp_name, CpStorage* storage)
     : m_cp_name(cp_name), m_storage(storage) {}
@@ -30,9 +29,8 @@ bool DataConsumer::data_waits() const {
     return poll(&pfd, 1, 0) > 0 && pfd.revents == POLLIN;
 }
 
-bool DataConsumer::goes_on(ExchangeTimer& read_timer) {
-    read_timer.fired();
-    if (!data_waits() || read_timer.start(m_handler->multiplexer()->timer_mgr()) < 0) {
+bool DataConsumer::goes_on(OneShotTimer& read_timer, unsigned int timeout_ms) {
+    if (!data_waits() || read_timer.start(timeout_ms) < 0) {
         return false;
     }
     // Once only: a device may be readable for ever and yet give nothing.

@@ -12,7 +12,7 @@
 #include "core/ObjectRef.h"
 
 class CpStorage;
-class ExchangeTimer;
+class OneShotTimer;
 
 class DataConsumer : public RefTarget {
 public:
@@ -48,7 +48,7 @@ protected:
     // was busy, not that the CP is silent: then what waits is read now. True when that
     // brought something and the exchange goes on, the time-out armed again, or when it
     // ended the exchange: this object may be gone. False: the CP is silent.
-    bool goes_on(ExchangeTimer& read_timer);
+    bool goes_on(OneShotTimer& read_timer, unsigned int timeout_ms);
 
     const char* m_cp_name;
     DeviceFileHandler* m_handler = nullptr;

@@ -21,8 +21,8 @@ DiagReplyConsumer::DiagReplyConsumer(const char* cp_name, CpStorage* storage,
                                      const Exchange& exchange)
     : DataConsumer(cp_name, storage),
       m_exchange(exchange),
-      m_read_timer(READ_TIMEOUT_MS, exchange.read_timeout, this),
-      m_reply_timer(REPLY_TIMEOUT_MS, on_no_reply, this) {}
+      m_read_timer(nullptr, exchange.read_timeout, this),
+      m_reply_timer(nullptr, on_no_reply, this) {}
 
 DiagReplyConsumer::~DiagReplyConsumer() {
     close_file();
@@ -61,8 +61,10 @@ int DiagReplyConsumer::start_exchange(LogFile* file) {
         return -1;
     }
     // The time-outs first: no request leaves whose exchange nothing would end.
-    TimerManager& timers = m_handler->multiplexer()->timer_mgr();
-    if (m_read_timer.start(timers) < 0 || m_reply_timer.start(timers) < 0 || !send_request()) {
+    m_read_timer.bind(m_handler->multiplexer()->timer_mgr());
+    m_reply_timer.bind(m_handler->multiplexer()->timer_mgr());
+    if (m_read_timer.start(READ_TIMEOUT_MS) < 0 || m_reply_timer.start(REPLY_TIMEOUT_MS) < 0 ||
+        !send_request()) {
         stop_timers();
         discard_file();
         return -1;
@@ -84,7 +86,7 @@ void DiagReplyConsumer::discard_file() {
 }
 
 bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
-    m_read_timer.restart();
+    m_read_timer.start(READ_TIMEOUT_MS);
     bool answered = false;
     const uint8_t* data = buf.data();
     size_t left = buf.data_len;
@@ -103,7 +105,7 @@ bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         left -= used;
     }
     if (answered) {
-        m_reply_timer.restart();
+        m_reply_timer.start(REPLY_TIMEOUT_MS);
     }
     buf.consume_all();
     return false;
@@ -162,7 +164,7 @@ void DiagReplyConsumer::end(LogProcResult result) {
 }
 
 bool DiagReplyConsumer::end_by_timeout() {
-    if (m_reply_timer.pending() && goes_on(m_read_timer)) {
+    if (m_reply_timer.pending() && goes_on(m_read_timer, READ_TIMEOUT_MS)) {
         return false;
     }
     stop_timers();
@@ -172,6 +174,5 @@ bool DiagReplyConsumer::end_by_timeout() {
 
 void DiagReplyConsumer::on_no_reply(void* param) {
     DiagReplyConsumer* consumer = static_cast<DiagReplyConsumer*>(param);
-    consumer->m_reply_timer.fired();
     consumer->m_exchange.read_timeout(consumer);
 }

@@ -7,7 +7,6 @@
 
 #include "channels/DataConsumer.h"
 #include "channels/DiagFrameParser.h"
-#include "channels/ExchangeTimer.h"
 #include "storage/LogFile.h"
 
 class DiagReplyConsumer : public DataConsumer {
@@ -59,8 +58,8 @@ private:
 
     const Exchange& m_exchange;
     DiagFrameParser m_parser;
-    ExchangeTimer m_read_timer;   // until the next chunk
-    ExchangeTimer m_reply_timer;  // until the next frame of this exchange
+    OneShotTimer m_read_timer;   // until the next chunk
+    OneShotTimer m_reply_timer;  // until the next frame of this exchange
     ObjectRef<LogFile> m_file;
 };
 

@@ -21,13 +21,14 @@ LogPipeHandler::LogPipeHandler(LogController* ctrl, Multiplexer* mux,
       m_type(entry->type),
       m_reset_prop(entry->type == CT_WCN ? PROP_WCN_RESET : PROP_MODEM_RESET),
       m_stor_mgr(stor_mgr),
+      m_reopen_timer(&mux->timer_mgr(), reopen_log_dev, this),
       m_iq(this) {}
 
 LogPipeHandler::~LogPipeHandler() {
     m_iq.stop();
     // The consumer may hold a file and a subscription of the storage.
     stop_transaction(CWS_NOT_WORKING);
-    cancel_reopen();
+    m_reopen_timer.stop();
     if (m_storage) {
         m_stor_mgr->delete_storage(m_storage);
     }
@@ -67,28 +68,18 @@ void LogPipeHandler::poll_dev() {
     poll_when_room(POLLIN, dev_label().string());
 }
 
-// One timer at the most is pending, so that a device is never opened twice.
 void LogPipeHandler::arm_reopen() {
-    cancel_reopen();
-    m_reopen_pending = m_multiplexer->timer_mgr().add_timer(REOPEN_MS, reopen_log_dev, this) == 0;
-}
-
-void LogPipeHandler::cancel_reopen() {
-    if (m_reopen_pending) {
-        m_multiplexer->timer_mgr().cancel_timers(reopen_log_dev, this);
-        m_reopen_pending = false;
-    }
+    m_reopen_timer.start_or_log(REOPEN_MS);
 }
 
 void LogPipeHandler::open_missing_dev() {
-    if (m_fd < 0 && !m_reopen_pending) {
+    if (m_fd < 0 && !m_reopen_timer.pending()) {
         reopen_log_dev(this);
     }
 }
 
 void LogPipeHandler::reopen_log_dev(void* handler) {
     LogPipeHandler* channel = static_cast<LogPipeHandler*>(handler);
-    channel->m_reopen_pending = false;
     if (!channel->m_enabled || channel->m_state != CWS_WORKING) {
         return;
     }
@@ -128,7 +119,7 @@ int LogPipeHandler::stop_logging() {
         m_storage->stop();
     }
     m_enabled = false;
-    cancel_reopen();
+    m_reopen_timer.stop();
     if (m_state == CWS_DUMP) {
         // The CP has asserted and stays so until it is alive again.
         stop_transaction(CWS_NOT_WORKING);

@@ -145,7 +145,6 @@ private:
     // The log device is tried again in a while. Should the timer fail, as it does without a
     // clock, the next chance is a flush, the end of a transaction, a start or an alive event.
     void arm_reopen();
-    void cancel_reopen();
     // Opens a log device that is missing without being tried again.
     void open_missing_dev();
     // For the crash path, which may come before the first log data: makes the storage
@@ -170,7 +169,7 @@ private:
     ObjectRef<ClientHandler> m_trans_client;
     StorageManager* m_stor_mgr;
     CpStorage* m_storage = nullptr;
-    bool m_reopen_pending = false;
+    OneShotTimer m_reopen_timer;
     WcdmaIqManager m_iq;
 };
 

@@ -19,7 +19,7 @@ ModemDumpConsumer::ModemDumpConsumer(const char* cp_name, CpStorage* storage,
                                      const struct tm& dump_time, const char* mem_path)
     : CpDumpConsumer(cp_name, storage, dump_time),
       m_mem_path(mem_path),
-      m_read_timer(READ_TIMEOUT_MS, dump_read_timeout, this) {}
+      m_read_timer(nullptr, dump_read_timeout, this) {}
 
 ModemDumpConsumer::~ModemDumpConsumer() {
     m_storage->unsubscribe_ext_stor_umount_evt(this);
@@ -27,7 +27,8 @@ ModemDumpConsumer::~ModemDumpConsumer() {
 
 int ModemDumpConsumer::start() {
     // The time-out first: no request leaves whose dump nothing would end.
-    if (m_read_timer.start(m_handler->multiplexer()->timer_mgr()) < 0) {
+    m_read_timer.bind(m_handler->multiplexer()->timer_mgr());
+    if (m_read_timer.start(READ_TIMEOUT_MS) < 0) {
         return -1;
     }
     if (write(m_handler->fd(), DUMP_REQUEST, sizeof(DUMP_REQUEST)) !=
@@ -62,7 +63,7 @@ bool ModemDumpConsumer::check_end_of_dump(const DeviceFileHandler::DataBuffer& b
 
 bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     const bool end = check_end_of_dump(buf);
-    m_read_timer.restart();
+    m_read_timer.start(READ_TIMEOUT_MS);
     const size_t len = buf.data_len;
     ssize_t written = write_dump(buf.data(), len);
     if (end && written == static_cast<ssize_t>(len) && write_out_dump_file() < 0) {
@@ -92,7 +93,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 
 void ModemDumpConsumer::dump_read_timeout(void* param) {
     ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
-    if (consumer->goes_on(consumer->m_read_timer)) {
+    if (consumer->goes_on(consumer->m_read_timer, READ_TIMEOUT_MS)) {
         return;
     }
     consumer->discard_dump_file();

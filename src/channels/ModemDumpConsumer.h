@@ -7,7 +7,7 @@
 
 #include "channels/CpDumpConsumer.h"
 #include "channels/DiagFrameParser.h"
-#include "channels/ExchangeTimer.h"
+#include "core/OneShotTimer.h"
 
 // The payload of the frame that ends a dump.
 constexpr char MODEM_DUMP_END[] = "\nmodem_memdump_finish";
@@ -36,7 +36,7 @@ private:
     bool check_end_of_dump(const DeviceFileHandler::DataBuffer& buf);
 
     const char* m_mem_path;
-    ExchangeTimer m_read_timer;
+    OneShotTimer m_read_timer;
     DiagFrameParser m_parser;
 };
 

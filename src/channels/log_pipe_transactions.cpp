@@ -65,7 +65,7 @@ void LogPipeHandler::process_assert(bool save_md) {
 
 void LogPipeHandler::close_on_assert() {
     close_dev();
-    cancel_reopen();
+    m_reopen_timer.stop();
     m_state = CWS_NOT_WORKING;
     flush();
 }

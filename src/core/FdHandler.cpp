@@ -6,13 +6,15 @@
 #include "core/log.h"
 
 FdHandler::FdHandler(int fd, LogController* ctrl, Multiplexer* mux)
-    : m_fd(fd), m_log_ctrl(ctrl), m_multiplexer(mux) {}
+    : m_fd(fd),
+      m_log_ctrl(ctrl),
+      m_multiplexer(mux),
+      m_rest_timer(mux ? &mux->timer_mgr() : nullptr, on_rest_over, this) {}
 
 FdHandler::~FdHandler() {
     // Wholly, even without a descriptor: an entry left behind would be read when the
     // poll set is built next.
     if (m_multiplexer) {
-        cancel_rest();
         m_multiplexer->forget(this);
     }
     close();
@@ -46,11 +48,10 @@ void FdHandler::note_idle(const char* what) {
     if (m_idle_wakeups < IDLE_LIMIT) {
         ++m_idle_wakeups;
     }
-    if (m_idle_wakeups < IDLE_LIMIT || m_rest_timer) {
+    if (m_idle_wakeups < IDLE_LIMIT || resting()) {
         return;
     }
-    m_rest_timer = m_multiplexer->timer_mgr().create_timer(REST_MS, on_rest_over, this);
-    if (!m_rest_timer) {
+    if (m_rest_timer.start(REST_MS) < 0) {
         return;  // no clock, no rest: nothing would end it
     }
     m_multiplexer->rest_changed();
@@ -62,21 +63,14 @@ void FdHandler::note_idle(const char* what) {
 }
 
 void FdHandler::on_rest_over(void* handler) {
-    FdHandler* const self = static_cast<FdHandler*>(handler);
-    self->m_rest_timer = nullptr;
-    self->m_multiplexer->rest_changed();
+    static_cast<FdHandler*>(handler)->m_multiplexer->rest_changed();
 }
 
 void FdHandler::end_rest() {
     m_idle_wakeups = 0;
     m_rest_logged = false;
-    cancel_rest();
-}
-
-void FdHandler::cancel_rest() {
-    if (m_rest_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_rest_timer);
-        m_rest_timer = nullptr;
+    if (resting()) {
+        m_rest_timer.stop();
         m_multiplexer->rest_changed();
     }
 }

@@ -12,7 +12,7 @@
 #ifndef CORE_FDHANDLER_H_
 #define CORE_FDHANDLER_H_
 
-#include "core/TimerManager.h"
+#include "core/OneShotTimer.h"
 
 class LogController;
 class Multiplexer;
@@ -70,7 +70,7 @@ public:
     // Idle wake-ups since the last note_alive, counted up to IDLE_LIMIT.
     unsigned int idle_wakeups() const { return m_idle_wakeups; }
     // True while the loop leaves the handler alone.
-    bool resting() const { return m_rest_timer != nullptr; }
+    bool resting() const { return m_rest_timer.pending(); }
 
 protected:
     int m_fd;
@@ -80,11 +80,10 @@ protected:
 private:
     static void on_rest_over(void* handler);
     void end_rest();
-    void cancel_rest();
 
     unsigned int m_idle_wakeups = 0;
     bool m_rest_logged = false;
-    TimerManager::Timer* m_rest_timer = nullptr;
+    OneShotTimer m_rest_timer;
 };
 
 #endif  // CORE_FDHANDLER_H_

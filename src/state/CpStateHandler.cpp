@@ -33,16 +33,16 @@ void make_line(const uint8_t* bytes, size_t len, char* text) {
 }  // namespace
 
 CpStateHandler::CpStateHandler(LogController* ctrl, Multiplexer* mux, const char* serv_name)
-    : BufferedFdHandler(-1, ctrl, mux, BUFFER_SIZE), m_serv_name(serv_name) {}
+    : BufferedFdHandler(-1, ctrl, mux, BUFFER_SIZE),
+      m_serv_name(serv_name),
+      m_reconnect_timer(&mux->timer_mgr(), reconnect, this) {}
 
-CpStateHandler::~CpStateHandler() {
-    cancel_reconnect();
-}
+CpStateHandler::~CpStateHandler() = default;
 
 int CpStateHandler::init() {
-    cancel_reconnect();
+    m_reconnect_timer.stop();
     if (m_fd < 0 && !connect()) {
-        m_multiplexer->timer_mgr().add_timer(RECONNECT_MS, reconnect, this);
+        m_reconnect_timer.start_or_log(RECONNECT_MS);
     }
     return 0;
 }
@@ -57,10 +57,6 @@ bool CpStateHandler::connect() {
     m_used = false;
     poll_when_room(POLLIN, m_serv_name.string());
     return true;
-}
-
-void CpStateHandler::cancel_reconnect() {
-    m_multiplexer->timer_mgr().cancel_timers(reconnect, this);
 }
 
 void CpStateHandler::reconnect(void* handler) {

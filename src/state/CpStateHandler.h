@@ -22,7 +22,6 @@ public:
 
     // serv_name: the supervisor's local socket, copied. Connects not yet.
     CpStateHandler(LogController* ctrl, Multiplexer* mux, const char* serv_name);
-    // Cancels a reconnection that is due.
     ~CpStateHandler() override;
 
     // Connects, or arms a retry. Always 0. Nothing happens when it is connected.
@@ -55,10 +54,10 @@ private:
                               size_t pattern_num);
     static void reconnect(void* handler);
     bool connect();
-    void cancel_reconnect();
 
     const android::String8 m_serv_name;
     bool m_used = false;  // the connection has told of an event
+    OneShotTimer m_reconnect_timer;
 };
 
 #endif  // STATE_CPSTATEHANDLER_H_

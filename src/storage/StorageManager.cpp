@@ -10,10 +10,14 @@
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
 
-StorageManager::StorageManager() : m_internal(this), m_external(this) {}
+// Nothing happens when a card's rest is over: the next write tries it.
+StorageManager::StorageManager()
+    : m_internal(this),
+      m_external(this),
+      m_card_rest_timer(
+          nullptr, [](void*) {}, nullptr) {}
 
 StorageManager::~StorageManager() {
-    cancel_card_rest();
     for (CpStorage* storage : m_storages) {
         delete storage;
     }
@@ -21,7 +25,9 @@ StorageManager::~StorageManager() {
 
 int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*/,
                          Multiplexer* mux) {
-    m_multiplexer = mux;
+    if (mux) {
+        m_card_rest_timer.bind(mux->timer_mgr());
+    }
     android::String8 internal_top = system_path(PATH_DATA_PARTITION);
     // Without a known SD card the external log root is a path that the service fixes.
     android::String8 external_top = sd_root.isEmpty() ? system_path("") : sd_root;
@@ -79,7 +85,7 @@ bool StorageManager::check_media_change() {
         if (m_media_type == MT_EXTERNAL) {
             return false;
         }
-        if (m_card_rest_timer) {
+        if (m_card_rest_timer.pending()) {
             return use_internal();
         }
         info_log("Storage changing to external SD");
@@ -114,7 +120,7 @@ void StorageManager::card_removed() {
         m_external.clear();
     }
     m_card_suspect = false;
-    cancel_card_rest();
+    m_card_rest_timer.stop();
 }
 
 // Starts a new set. One that fails on a full medium frees space for the next try.
@@ -142,24 +148,12 @@ bool StorageManager::card_failed(int error) {
     err_log("SD card can not be written, not in use for now");
     stop_all_storages();
     m_media_type = MT_NONE;
-    if (m_card_suspect && m_multiplexer && !m_card_rest_timer) {
+    if (m_card_suspect) {
         // It was tried again, seemed to work, and failed: not from block to block.
-        m_card_rest_timer =
-            m_multiplexer->timer_mgr().create_timer(CARD_REST_MS, on_card_rest_over, this);
+        m_card_rest_timer.start(CARD_REST_MS);
     }
     m_card_suspect = true;
     return true;
-}
-
-void StorageManager::on_card_rest_over(void* manager) {
-    static_cast<StorageManager*>(manager)->m_card_rest_timer = nullptr;
-}
-
-void StorageManager::cancel_card_rest() {
-    if (m_card_rest_timer) {
-        m_multiplexer->timer_mgr().del_timer(m_card_rest_timer);
-        m_card_rest_timer = nullptr;
-    }
 }
 
 // Takes the SD card into use with a new set. False when no set can be started there.

@@ -13,7 +13,7 @@
 #include <utils/List.h>
 #include <utils/String8.h>
 
-#include "core/TimerManager.h"
+#include "core/OneShotTimer.h"
 #include "storage/MediaStorage.h"
 #include "storage/MediaType.h"
 #include "storage/SubscriberList.h"
@@ -86,11 +86,8 @@ private:
     // How long an SD card that failed again and again is left alone.
     static constexpr unsigned int CARD_REST_MS = 3000;
 
-    static void on_card_rest_over(void* manager);
-
     bool card_failed(int error);
     void card_removed();
-    void cancel_card_rest();
     bool use_external();
     bool use_internal();
     CpSetDirectory* start_set(MediaStorage& media);
@@ -104,9 +101,8 @@ private:
     SubscriberList<media_change_callback> m_media_change_clients;
     SubscriberList<ext_umount_callback> m_ext_umount_clients;
     bool m_kest_layout = false;
-    Multiplexer* m_multiplexer = nullptr;
-    bool m_card_suspect = false;  // it failed in use since it was mounted
-    TimerManager::Timer* m_card_rest_timer = nullptr;
+    bool m_card_suspect = false;     // it failed in use since it was mounted
+    OneShotTimer m_card_rest_timer;  // pending: it is left alone
 };
 
 #endif  // STORAGE_STORAGEMANAGER_H_

@@ -411,6 +411,28 @@ TEST_F(CpStorageTest, CardThatCanNoLongerBeWritten) {
     EXPECT_EQ(MT_INTERNAL, m_mgr.media_type());
 }
 
+// A card that seems to work each time it is tried, and fails then, is not tried from block to
+// block.
+TEST_F(CpStorageTest, CardThatKeepsFailingRests) {
+    ASSERT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &m_ctrl.multiplexer()), 0);
+    plug_card();
+    faults::only_on("/sd/modem_log/2");  // sets can be made, and files in the log root
+    faults::fail(faults::OPEN, 1, EIO, 100000);
+    int lost = 0;
+    for (int i = 0; i < 20; ++i) {
+        lost += write_later("x") < 0;
+    }
+    EXPECT_EQ(lost, 2);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    // Another card does not wait.
+    faults::reset();
+    pull_card();
+    write_later("y");
+    plug_card();
+    EXPECT_EQ(write_later("z"), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+}
+
 TEST_F(CpStorageTest, CardFlapsWithinOneSecond) {
     for (int i = 0; i < 5; ++i) {
         plug_card();
