@@ -14,10 +14,9 @@ CpDumpConsumer::~CpDumpConsumer() {
 }
 
 android::String8 CpDumpConsumer::file_name(const char* extension) const {
-    const LogTime t = LogTime::from_tm(m_dump_time);
     android::String8 name(m_cp_name);
-    name.appendFormat("_memory_%04d-%02d-%02d_%02d-%02d-%02d.%s", t.year, t.month, t.day, t.hour,
-                      t.minute, t.second, extension);
+    name.appendFormat("_memory_%s.%s", LogTime::from_tm(m_dump_time).file_stamp().string(),
+                      extension);
     return name;
 }
 

@@ -38,10 +38,9 @@ bool DiagReplyConsumer::create_result_file(android::String8& name, LogFile*& fil
     if (get_local_time(now) < 0) {
         return false;
     }
-    const LogTime t = LogTime::from_tm(now);
     name = m_cp_name;
-    name.appendFormat("_%s_%04d-%02d-%02d_%02d-%02d-%02d.log", m_exchange.name_infix, t.year,
-                      t.month, t.day, t.hour, t.minute, t.second);
+    name.appendFormat("_%s_%s.log", m_exchange.name_infix,
+                      LogTime::from_tm(now).file_stamp().string());
     file = m_storage->create_file(name, m_exchange.log_type, MT_NONE);
     return true;
 }

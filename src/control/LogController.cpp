@@ -1,7 +1,5 @@
 #include "control/LogController.h"
 
-#include <stdio.h>
-
 #include "channels/AgDspLogHandler.h"
 #include "channels/ExtWcnLogHandler.h"
 #include "channels/GnssCpLogHandler.h"
@@ -166,18 +164,16 @@ void LogController::process_cp_evt(CpType type, CpStateHandler::CpEvent event) {
 }
 
 int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType type) {
-    const LogTime t = LogTime::from_tm(time);
-    char name[80];
-    snprintf(name, sizeof(name), "mini_dump_%04d-%02d-%02d_%02d-%02d-%02d.bin", t.year, t.month,
-             t.day, t.hour, t.minute, t.second);
+    const android::String8 name =
+        android::String8::format("mini_dump_%s.bin", LogTime::from_tm(time).file_stamp().string());
     const MediaType media = m_config->md_int_stor() ? MT_INTERNAL : MT_NONE;
     if (storage->check_quota(media) < 0) {
         err_log("no space for mini dump");
         return -1;
     }
-    LogFile* file = storage->create_file(android::String8(name), LT_MINI_DUMP, media);
+    LogFile* file = storage->create_file(name, LT_MINI_DUMP, media);
     if (!file) {
-        err_log("create mini dump file %s failed", name);
+        err_log("create mini dump file %s failed", name.string());
         return -1;
     }
     const int result = file->copy(system_path(cp_mini_dump_path(type)).string());
@@ -192,7 +188,7 @@ int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType typ
 }
 
 int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
-    const LogTime t = LogTime::from_tm(time);
+    const android::String8 stamp = LogTime::from_tm(time).file_stamp();
     const struct {
         const char* record;
         const char* path;
@@ -200,10 +196,9 @@ int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
         {"smsg", PATH_DIPX_SMSG}, {"sbuf", PATH_DIPX_SBUF}, {"sblock", PATH_DIPX_SBLOCK}};
     int result = 0;
     for (const auto& source : sources) {
-        char name[64];
-        snprintf(name, sizeof(name), "%s_%04d-%02d-%02d_%02d-%02d-%02d.log", source.record, t.year,
-                 t.month, t.day, t.hour, t.minute, t.second);
-        LogFile* file = storage->create_file(android::String8(name), LT_IPC_INFO, MT_NONE);
+        const android::String8 name =
+            android::String8::format("%s_%s.log", source.record, stamp.string());
+        LogFile* file = storage->create_file(name, LT_IPC_INFO);
         if (!file) {
             continue;
         }

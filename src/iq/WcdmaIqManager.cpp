@@ -213,10 +213,8 @@ int WcdmaIqManager::gen_iq_file_name(android::String8& name) {
     if (get_local_time(now) < 0) {
         return -1;
     }
-    const LogTime t = LogTime::from_tm(now);
     name = m_channel->name();
-    name.appendFormat("_wiq_%04d-%02d-%02d_%02d-%02d-%02d.bin", t.year, t.month, t.day, t.hour,
-                      t.minute, t.second);
+    name.appendFormat("_wiq_%s.bin", LogTime::from_tm(now).file_stamp().string());
     return 0;
 }
 

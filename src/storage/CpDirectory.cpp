@@ -59,10 +59,8 @@ LogFile* CpDirectory::create_log_file() {
     if (get_local_time(t) < 0) {
         return nullptr;
     }
-    const LogTime time = LogTime::from_tm(t);
     const android::String8 name = free_name(android::String8::format(
-        "0-%s-%04d-%02d-%02d_%02d-%02d-%02d.log", m_name.string(), time.year, time.month, time.day,
-        time.hour, time.minute, time.second));
+        "0-%s-%s.log", m_name.string(), LogTime::from_tm(t).file_stamp().string()));
     LogFile* file = new LogFile(name, this, t);
     if (file->open() < 0) {
         const SavedErrno keep;

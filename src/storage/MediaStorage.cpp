@@ -124,10 +124,8 @@ CpSetDirectory* MediaStorage::create_cp_set() {
     if (get_local_time(t) < 0) {
         return nullptr;
     }
-    const LogTime time = LogTime::from_tm(t);
     android::String8 path(m_log_root);
-    path.appendFormat("/%04d-%02d-%02d-%02d-%02d-%02d", time.year, time.month, time.day, time.hour,
-                      time.minute, time.second);
+    path.appendFormat("/%s", LogTime::from_tm(t).set_stamp().string());
     if (make_log_dir(path) < 0 &&
         (errno != ENOENT || remake_log_root() < 0 || make_log_dir(path) < 0)) {
         err_log("create CP set %s failed", path.string());

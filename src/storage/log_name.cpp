@@ -95,6 +95,11 @@ LogTime LogTime::from_tm(const struct tm& t) {
     return time;
 }
 
+android::String8 LogTime::stamp(char middle) const {
+    return android::String8::format("%04d-%02d-%02d%c%02d-%02d-%02d", year, month, day, middle,
+                                    hour, minute, second);
+}
+
 bool LogTime::operator<(const LogTime& other) const {
     return std::tie(year, month, day, hour, minute, second) <
            std::tie(other.year, other.month, other.day, other.hour, other.minute, other.second);

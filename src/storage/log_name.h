@@ -21,7 +21,14 @@ struct LogTime {
     int second = 0;
 
     static LogTime from_tm(const struct tm& t);
+    // "2016-03-01_09-15-00", as file names have it, and "2016-03-01-09-15-00", as the names of
+    // sets do.
+    android::String8 file_stamp() const { return stamp('_'); }
+    android::String8 set_stamp() const { return stamp('-'); }
     bool operator<(const LogTime& other) const;
+
+private:
+    android::String8 stamp(char middle) const;
 };
 
 // Kind of a file found on a medium, from its name; the time in the name, if it has

@@ -47,9 +47,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         return 0;
     }
     // The name that the service would give comes back as it was.
-    char own[80];
-    snprintf(own, sizeof(own), "0-cp-%04d-%02d-%02d_%02d-%02d-%02d.log", time.year, time.month,
-             time.day, time.hour, time.minute, time.second);
+    const std::string own = std::string("0-cp-") + time.file_stamp().string() + ".log";
     FUZZ_CHECK(parse(own, again) == LT_LOG && same(time, again));
     return 0;
 }

@@ -35,17 +35,9 @@ constexpr Form FORMS[] = {
 };
 // clang-format on
 
-// In the form of names, with that character between date and time; "" when no calendar
-// has such a time.
-std::string stamp(const LogTime& t, char middle, char colon) {
-    if (t.month < 1 || t.month > 12 || t.day < 1 || t.day > 31 || t.hour > 23 || t.minute > 59 ||
-        t.second > 60) {
-        return "";
-    }
-    char text[64];
-    snprintf(text, sizeof(text), "%04d-%02d-%02d%c%02d%c%02d%c%02d", t.year, t.month, t.day, middle,
-             t.hour, colon, t.minute, colon, t.second);
-    return text;
+bool in_calendar(const LogTime& t) {
+    return t.month >= 1 && t.month <= 12 && t.day >= 1 && t.day <= 31 && t.hour <= 23 &&
+           t.minute <= 59 && t.second <= 60;
 }
 
 // A time in the form of file names, read by the parser of log names.
@@ -77,7 +69,7 @@ bool cut_number(std::string* text, uint32_t* number) {
 // Takes the time off the end.
 bool cut_stamp(std::string* text, LogTime* time) {
     const std::string last = text->substr(text->size() - std::min(text->size(), STAMP_LEN));
-    if (!parse_stamp(last, time) || stamp(*time, '_', '-') != last) {
+    if (!parse_stamp(last, time) || !in_calendar(*time) || time->file_stamp() != last.c_str()) {
         return false;
     }
     text->resize(text->size() - STAMP_LEN);
@@ -156,12 +148,18 @@ bool has_time(const LogTime& time) {
 }
 
 std::string time_text(const LogTime& time) {
-    const std::string text = stamp(time, ' ', ':');
-    return text.empty() ? "-" : text;
+    if (!in_calendar(time)) {
+        return "-";
+    }
+    std::string text = time.file_stamp().string();
+    text[10] = ' ';
+    text[13] = text[16] = ':';
+    return text;
 }
 
 bool parse_set_name(const std::string& name, LogTime* time) {
-    return name.size() == STAMP_LEN && parse_stamp(name, time) && stamp(*time, '-', '-') == name;
+    return name.size() == STAMP_LEN && parse_stamp(name, time) && in_calendar(*time) &&
+           time->set_stamp() == name.c_str();
 }
 
 CpType cp_type_of(const std::string& cp) {
