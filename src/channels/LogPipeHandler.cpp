@@ -125,7 +125,7 @@ int LogPipeHandler::stop_logging() {
         stop_transaction(CWS_NOT_WORKING);
         notify_cp_dump(CDE_END);
     } else if (client_transaction_runs()) {
-        end_client_transaction(-1);
+        end_client_transaction(CR_FAILED);
     }
     close_dev();
     return 0;

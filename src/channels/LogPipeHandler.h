@@ -14,6 +14,7 @@
 #include <time.h>
 #include <utils/String8.h>
 
+#include "channels/ChannelResult.h"
 #include "channels/DataConsumer.h"
 #include "client/CpDumpEvent.h"
 #include "config/CpType.h"
@@ -77,9 +78,9 @@ public:
     // The CP runs again.
     void process_alive();
 
-    // Start fetching the CP's sleep log or ring buffer for a client. 1 when the transaction
-    // runs: the client is told its result through notify_trans_result. Else -1 (failure),
-    // -2 (busy), -3 (logging is off) or -6 (the CP is not working).
+    // Start fetching the CP's sleep log or ring buffer for a client. CR_STARTED when the
+    // transaction runs: the client is told its result through notify_trans_result. Else
+    // CR_FAILED, CR_BUSY, CR_LOG_DISABLED or CR_NOT_WORKING.
     int save_sleep_log(ClientHandler* client);
     int save_ringbuf(ClientHandler* client);
     // The client does not wait for its result any more.

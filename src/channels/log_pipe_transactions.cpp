@@ -30,7 +30,7 @@ void LogPipeHandler::process_assert(bool save_md) {
         return;
     }
     if (client_transaction_runs()) {
-        end_client_transaction(-1);
+        end_client_transaction(CR_FAILED);
     }
     const bool reset = will_be_reset();
     if (reset && !save_md) {
@@ -77,7 +77,7 @@ void LogPipeHandler::process_alive() {
         notify_cp_dump(CDE_END);
     } else if (client_transaction_runs()) {
         // A CP that has just come up knows nothing of the request.
-        end_client_transaction(-1);
+        end_client_transaction(CR_FAILED);
     }
     m_state = CWS_WORKING;
     if (!m_enabled) {
@@ -166,25 +166,25 @@ void LogPipeHandler::end_dump() {
 
 // ---- Transactions for clients
 
-// 0 when a client's transaction can start, else the result that refuses it.
+// CR_OK when a client's transaction can start, else the result that refuses it.
 int LogPipeHandler::check_client_transaction() const {
     if (!m_enabled) {
-        return -3;
+        return CR_LOG_DISABLED;
     }
     if (m_state == CWS_NOT_WORKING) {
-        return -6;
+        return CR_NOT_WORKING;
     }
-    return m_state == CWS_WORKING ? 0 : -2;
+    return m_state == CWS_WORKING ? CR_OK : CR_BUSY;
 }
 
 int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState state,
                                              ClientHandler* client) {
     consumer->set_callback(this, diag_transaction_notify);
     if (run_transaction(create_diag_device(consumer), consumer, state) < 0) {
-        return -1;
+        return CR_FAILED;
     }
     m_trans_client = client;
-    return 1;
+    return CR_STARTED;
 }
 
 int LogPipeHandler::save_sleep_log(ClientHandler* client) {
@@ -193,7 +193,7 @@ int LogPipeHandler::save_sleep_log(ClientHandler* client) {
         return refusal;
     }
     if (!m_storage && create_storage() < 0) {
-        return -1;
+        return CR_FAILED;
     }
     return begin_client_transaction(new CpSleepLogConsumer(m_name.string(), m_storage),
                                     CWS_SAVE_SLEEP_LOG, client);
@@ -205,7 +205,7 @@ int LogPipeHandler::save_ringbuf(ClientHandler* client) {
         return refusal;
     }
     if (!m_storage && create_storage() < 0) {
-        return -1;
+        return CR_FAILED;
     }
     return begin_client_transaction(new CpRingBufConsumer(m_name.string(), m_storage),
                                     CWS_SAVE_RINGBUF, client);
@@ -234,13 +234,13 @@ void LogPipeHandler::diag_transaction_notify(void* client, DataConsumer::LogProc
         err_log("Receive diag notify %d under state %d, ignore", result, handler->m_state);
         return;
     }
-    int client_result = -1;
+    int client_result = CR_FAILED;
     if (result == DataConsumer::LPR_SUCCESS) {
-        client_result = 0;
+        client_result = CR_OK;
     } else if (result == DataConsumer::LPR_SLEEPLOG_NO_SUPPORT) {
-        client_result = -4;
+        client_result = CR_NO_SLEEP_LOG;
     } else if (result == DataConsumer::LPR_RINGBUF_NO_SUPPORT) {
-        client_result = -5;
+        client_result = CR_NO_RINGBUF;
     }
     handler->end_client_transaction(client_result);
 }

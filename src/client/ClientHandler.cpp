@@ -106,7 +106,7 @@ void ClientHandler::notify_trans_result(int result) {
 
 int ClientHandler::start_trans(ClientTransType type, LogPipeHandler* channel) {
     if (m_trans_state != CTS_IDLE) {
-        return -2;
+        return CR_BUSY;
     }
     // Before the channel starts: its result may come while it is starting.
     const ClientTransType last_type = m_trans_type;
@@ -115,7 +115,7 @@ int ClientHandler::start_trans(ClientTransType type, LogPipeHandler* channel) {
     m_trans_channel = channel;
     const int result =
         type == CTT_SLEEP_LOG ? channel->save_sleep_log(this) : channel->save_ringbuf(this);
-    if (result != 1) {
+    if (result != CR_STARTED) {
         m_trans_type = last_type;
         m_trans_state = CTS_IDLE;
         m_trans_channel = nullptr;
@@ -148,17 +148,17 @@ void ClientHandler::cancel_trans() {
 
 int ClientHandler::result_to_error(int result) {
     switch (result) {
-        case 0:
+        case CR_OK:
             return RC_OK;
-        case -2:
+        case CR_BUSY:
             return RC_BUSY;
-        case -3:
+        case CR_LOG_DISABLED:
             return RC_LOG_DISABLED;
-        case -4:
+        case CR_NO_SLEEP_LOG:
             return RC_NO_SLEEP_LOG;
-        case -5:
+        case CR_NO_RINGBUF:
             return RC_NO_RINGBUF;
-        case -6:
+        case CR_NOT_WORKING:
             return RC_CP_NOT_WORKING;
         default:
             return RC_FAILED;

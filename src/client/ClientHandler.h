@@ -53,14 +53,14 @@ public:
     // when the line could not be written whole.
     int notify_cp_dump(CpType type, CpDumpEvent event);
 
-    // Called once by the channel when the client's transaction has ended: 0, -1 failure,
-    // -4 no sleep log support, -5 no ring buffer support.
+    // Called once by the channel when the client's transaction has ended: CR_OK, CR_FAILED,
+    // CR_NO_SLEEP_LOG or CR_NO_RINGBUF.
     void notify_trans_result(int result);
     // The same for a client whose transaction of that kind runs.
     void proc_sleep_log_result(int result);
     void proc_ringbuf_result(int result);
 
-    // Reply code for the result of an operation.
+    // Reply code for the result of an operation (ChannelResult; any other value is a failure).
     static int result_to_error(int result);
     // Writes the reply with that code to a client's socket: OK for 0, else the error. 0, or
     // -1 when it could not be written whole.
@@ -110,8 +110,8 @@ private:
     void proc_enable_overwrite(const uint8_t* params, size_t len);
     void proc_disable_overwrite(const uint8_t* params, size_t len);
 
-    // Has the channel start a transaction for this client: 1 when it runs (or has even
-    // ended already), otherwise why not, as a negative number.
+    // Has the channel start a transaction for this client: CR_STARTED when it runs (or has
+    // even ended already), otherwise why not, as a negative ChannelResult.
     int start_trans(ClientTransType type, LogPipeHandler* channel);
     // Frees the transaction slot, resumes reading and replies.
     void end_trans(int result);

@@ -121,7 +121,7 @@ void ClientHandler::proc_kestctl(const uint8_t* params, size_t len) {
     } else if (clear) {
         info_log("remove CP log");
         const int result = m_log_ctrl->clear_log();
-        reply(result == -2 ? RC_BUSY : result ? RC_FAILED : RC_OK);
+        reply(result == CR_BUSY ? RC_BUSY : result ? RC_FAILED : RC_OK);
     } else {
         reply(RC_UNKNOWN_REQUEST);
     }
@@ -339,7 +339,7 @@ void ClientHandler::proc_sleep_log(const uint8_t* params, size_t len) {
         return reply(RC_BAD_PARAM);
     }
     const int result = start_trans(CTT_SLEEP_LOG, channel);
-    if (result != 1) {
+    if (result != CR_STARTED) {
         err_log("Save sleep log error %d", result);
         reply(result_to_error(result));
     }
@@ -354,7 +354,7 @@ void ClientHandler::proc_ringbuf(const uint8_t* params, size_t len) {
         return reply(RC_BAD_PARAM);
     }
     const int result = start_trans(CTT_RINGBUF, channel);
-    if (result != 1) {
+    if (result != CR_STARTED) {
         err_log("Save ringbuf error %d", result);
         reply(result_to_error(result));
     }

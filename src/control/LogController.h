@@ -71,12 +71,12 @@ public:
     size_t get_sd_size() const;
     int set_log_overwrite(bool enable);
     bool get_log_overwrite() const;
-    // 0, -7 when there is no channel of the type, or the channel's own result.
+    // 0, CR_NO_CHANNEL, or the channel's own result.
     int enable_wcdma_iq(CpType type);
     int disable_wcdma_iq(CpType type);
     // Hands the buffered data of every enabled channel to the system. 0.
     int flush();
-    // Deletes all CP logs on both media. 0, or -2 while a dump or transaction runs.
+    // Deletes all CP logs on both media. 0, or CR_BUSY while a dump or transaction runs.
     int clear_log();
     // Applies the stream states of the general logging service's configuration. 0, or -1
     // when its file cannot be read.

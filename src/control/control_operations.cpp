@@ -161,7 +161,7 @@ int LogController::enable_wcdma_iq(CpType type) {
     info_log("enable WCDMA I/Q on CP %d", type);
     LogPipeHandler* channel = get_cp(type);
     if (!channel) {
-        return -7;
+        return CR_NO_CHANNEL;
     }
     const int result = channel->enable_wcdma_iq();
     if (result != 0) {
@@ -175,7 +175,7 @@ int LogController::enable_wcdma_iq(CpType type) {
 int LogController::disable_wcdma_iq(CpType type) {
     LogPipeHandler* channel = get_cp(type);
     if (!channel) {
-        return -7;
+        return CR_NO_CHANNEL;
     }
     const int result = channel->disable_wcdma_iq();
     if (result != 0) {
@@ -199,7 +199,7 @@ int LogController::clear_log() {
     for (const LogPipeHandler* channel : m_log_pipes) {
         const CpWorkState state = channel->state();
         if (state == CWS_DUMP || state == CWS_SAVE_SLEEP_LOG || state == CWS_SAVE_RINGBUF) {
-            return -2;
+            return CR_BUSY;
         }
     }
     for (LogPipeHandler* channel : m_log_pipes) {

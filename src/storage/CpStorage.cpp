@@ -37,7 +37,7 @@ int CpStorage::write(const void* data, size_t len) {
     MediaStorage* media = m_manager->get_media_stor();
     const int n = static_cast<int>(m_cur_file->write(data, len));
     if (n <= 0) {
-        if (n == -2 && media->free_space() != 0) {
+        if (n == LogFile::FULL && media->free_space() != 0) {
             m_quota_pending = true;
             flush();
         }

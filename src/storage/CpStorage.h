@@ -35,8 +35,8 @@ public:
     // Called after a CP directory was made for a new log file; may be null.
     void set_new_dir_callback(new_dir_callback callback) { m_new_dir_cb = callback; }
 
-    // Writes log data. Returns the bytes taken, 0, -1 on failure or -2 for a full
-    // medium; what was not taken is lost.
+    // Writes log data. Returns the bytes taken, 0, -1 on failure or LogFile::FULL; what was
+    // not taken is lost.
     int write(const void* data, size_t len);
     // Hands what is staged in the current file to the system.
     void flush();

@@ -118,7 +118,7 @@ ssize_t LogFile::write(const void* data, size_t len) {
     if (n < 0) {
         const bool full = errno == ENOSPC;
         err_log("write file failed");
-        return full ? -2 : n;
+        return full ? FULL : n;
     }
     return n;
 }
@@ -176,7 +176,7 @@ size_t LogFile::write_some(const void* data, size_t len) {
 
 ssize_t LogFile::write_raw(const void* data, size_t len) {
     const ssize_t n = write_data(data, len);
-    return n < 0 && errno == ENOSPC ? -2 : n;
+    return n < 0 && errno == ENOSPC ? FULL : n;
 }
 
 int LogFile::copy(const char* source) {

@@ -21,6 +21,9 @@ class CpDirectory;
 
 class LogFile : public RefTarget {
 public:
+    // What the writes of log files and CP storages return for a full medium.
+    static constexpr int FULL = -2;
+
     static constexpr size_t BUFFER_SIZE = 65536;
 
     // A file found by a scan or made by a saver: no time, closed.
@@ -48,11 +51,11 @@ public:
     int close();
 
     // Buffered write. Returns the bytes taken (they count in the sizes from now on),
-    // 0 when none of the new data was taken, -1 on failure, -2 when the medium is full.
+    // 0 when none of the new data was taken, -1 on failure, FULL when the medium is full.
     ssize_t write(const void* data, size_t len);
     // Writes all bytes past the staging buffer and the sizes: len, or a negative value.
     ssize_t write_data(const void* data, size_t len);
-    // As write_data, with -2 for a full medium. Touches nothing but the descriptor, so
+    // As write_data, with FULL for a full medium. Touches nothing but the descriptor, so
     // that the I/Q thread may call it while it alone uses the file.
     ssize_t write_raw(const void* data, size_t len);
     // Hands what is staged to the system; what it does not take is dropped, and leaves the
