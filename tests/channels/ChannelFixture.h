@@ -46,7 +46,7 @@ inline void pump_once(Multiplexer& mux) {
 
 // Runs the loop until the condition holds; false when the time is over.
 inline bool pump_until(Multiplexer& mux, const std::function<bool()>& condition,
-                       int timeout_ms = 10000) {
+                       int timeout_ms = 60000) {
     const int64_t end = monotonic_ms() + timeout_ms;
     while (!condition()) {
         if (monotonic_ms() > end) {
@@ -92,29 +92,16 @@ private:
 // Answers every connection to the time service's socket on a thread of its own.
 class TimeServer : Unique {
 public:
-    // Listens after listen_ms; answers after answer_ms with the bytes, or closes on "".
-    explicit TimeServer(std::string reply, int listen_ms = 0, int answer_ms = 0) {
+    explicit TimeServer(std::string reply)
+        : m_listen(socket_local_server("cp_time_sync_server", ANDROID_SOCKET_NAMESPACE_ABSTRACT,
+                                       SOCK_STREAM)) {
         if (pipe2(m_stop, O_CLOEXEC) != 0) {
             abort();
         }
-        const auto start = [this] {
-            m_listen = socket_local_server("cp_time_sync_server", ANDROID_SOCKET_NAMESPACE_ABSTRACT,
-                                           SOCK_STREAM);
-        };
-        if (listen_ms == 0) {
-            start();
-        }
-        m_thread = std::thread([this, start, reply, listen_ms, answer_ms] {
-            if (pause(listen_ms)) {
-                return;
-            }
-            if (m_listen < 0) {
-                start();
-            }
+        m_thread = std::thread([this, reply] {
             struct pollfd fds[2] = {{m_stop[0], POLLIN, 0}, {m_listen, POLLIN, 0}};
             while (poll(fds, 2, -1) > 0 && !fds[0].revents) {
                 const int conn = accept4(m_listen, nullptr, nullptr, SOCK_CLOEXEC);
-                pause(answer_ms);
                 send(conn, reply.data(), reply.size(), MSG_NOSIGNAL);  // unless it has given up
                 close(conn);
             }
@@ -128,14 +115,8 @@ public:
     }
 
 private:
-    // True when the test is over already.
-    bool pause(int ms) {
-        struct pollfd fd = {m_stop[0], POLLIN, 0};
-        return ms > 0 && poll(&fd, 1, ms) > 0;
-    }
-
     int m_stop[2];
-    int m_listen = -1;
+    int m_listen;
     std::thread m_thread;
 };
 
@@ -239,7 +220,7 @@ protected:
     size_t polled() { return Multiplexer::MAX_HANDLERS - Filler::free_slots(mux()) - m_others; }
 
     Multiplexer& mux() { return ctrl->multiplexer(); }
-    bool pump(const std::function<bool()>& condition, int timeout_ms = 10000) {
+    bool pump(const std::function<bool()>& condition, int timeout_ms = 60000) {
         return pump_until(mux(), condition, timeout_ms);
     }
     // Sends the data through the channel's device in one piece of at most 32768 bytes.

@@ -44,7 +44,7 @@ public:
         struct pollfd slave = {m_slave, POLLIN, 0};
         return syscall(SYS_write, m_master, data.data(), data.size()) ==
                    static_cast<long>(data.size()) &&
-               poll(&slave, 1, 10000) == 1 && wait_until([&] { return unread() == data.size(); });
+               poll(&slave, 1, 60000) == 1 && wait_until([&] { return unread() == data.size(); });
     }
     // What the service has written since the last call of forget().
     const std::string& received() {
@@ -160,8 +160,7 @@ protected:
     // Has the service read the data, in chunks.
     bool supply(const Pty& dev, const std::string& data) {
         for (size_t at = 0; at < data.size(); at += Pty::CHUNK) {
-            if (!dev.put(data.substr(at, Pty::CHUNK)) ||
-                !pump([&] { return dev.unread() == 0; }, 3000)) {
+            if (!dev.put(data.substr(at, Pty::CHUNK)) || !pump([&] { return dev.unread() == 0; })) {
                 return false;
             }
         }
@@ -216,14 +215,15 @@ protected:
         }
         return found;
     }
-    // Descriptors open for longer than the time service needs for an answer.
+    // Descriptors that are open when the time service has nothing to do.
     static size_t lasting_descriptors() {
-        size_t least = open_descriptors();
-        for (int i = 0; i < 10; ++i) {
-            usleep(1000);
-            least = std::min(least, open_descriptors());
+        const int last = socket_local_client("cp_time_sync_server",
+                                             ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+        char answer[16];
+        while (recv(last, answer, sizeof(answer), 0) > 0) {  // to the end: after all before it
         }
-        return least;
+        close(last);
+        return open_descriptors();
     }
     // The loop's free places and the lasting descriptors, to be the same before and after.
     std::pair<size_t, size_t> resources() {

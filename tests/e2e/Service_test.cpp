@@ -159,8 +159,7 @@ TEST_F(ServiceTest, NoByteIsLostAcrossRestartAndMediumChanges) {
             SCOPED_TRACE(medium + " " + stream.cp);
             const auto paths = [&] { return log_files(root, medium + "/modem_log", stream.cp); };
             EXPECT_TRUE(wait_until(
-                [&] { return log_content(root, paths(), stream.head) == stream.sent[medium]; },
-                3000));
+                [&] { return log_content(root, paths(), stream.head) == stream.sent[medium]; }));
             EXPECT_EQ(paths().size(), files);
         }
     };

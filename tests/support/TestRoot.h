@@ -57,8 +57,9 @@ private:
     int m_file;
 };
 
-// Runs the condition until it is true or the time is over; true when it became true.
-bool wait_until(const std::function<bool()>& condition, int timeout_ms = 10000);
+// Runs the condition until it is true or the time is over; true when it became true. The
+// time is one that no loaded machine misses.
+bool wait_until(const std::function<bool()>& condition, int timeout_ms = 60000);
 
 // Number of descriptors that this process has open.
 size_t open_descriptors();
