@@ -120,6 +120,11 @@ TEST_F(LogFileTest, OpenAndClosed) {
     EXPECT_EQ(-1, file->copy("/dev/null"));
     faults::fail(faults::OPEN, 1, ENOSPC);
     EXPECT_EQ(-1, file->open());
+    // A link, which a card may hold, does not lead out of the log tree.
+    const std::string path = m_root.path(REL + "f"), away = m_root.path("away");
+    ASSERT_EQ(0, rename(path.c_str(), away.c_str()) + symlink(away.c_str(), path.c_str()));
+    EXPECT_EQ(-1, file->open());
+    ASSERT_EQ(0, unlink(path.c_str()) + rename(away.c_str(), path.c_str()));
     // An existing file is written from its start, not cut; the destructor writes out.
     EXPECT_EQ(0, file->open());
     file->write("ab", 2);

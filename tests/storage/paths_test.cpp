@@ -16,8 +16,9 @@ Names strange_names() {
     const std::string all =
         "x; touch pwned|$(touch pwned)|`touch pwned`|a'b|a\"b|a'; touch pwned; "
         "'|-rf|--help|*|\\|a\\|"
-        "line\ntouch pwned\n|? [a-z]* ~ {a,b}|&& rm -f canary|\xff\xfe\x80|#x|$HOME|~| |\t|!!|";
-    Names names = {std::string(255, 'n'), std::string(255, '\'')};
+        "line\ntouch pwned\n|? [a-z]* ~ {a,b}|&& rm -f canary|\xff\xfe\x80|#x|$HOME|~| |\t|!!|"
+        "x;y|x&y|x>pwned|x<canary|x(y|x\ny|";
+    Names names = {std::string(255, 'n'), std::string(255, '\''), "x|y"};
     for (size_t at = 0; at < all.size(); at = all.find('|', at) + 1) {
         names.push_back(all.substr(at, all.find('|', at) - at));
     }
