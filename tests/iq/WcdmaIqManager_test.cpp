@@ -443,7 +443,7 @@ TEST_F(WcdmaIqManagerTest, ADeviceThatGivesNothingIsLeftAlone) {
         log.clear();
         begin();
         size_t done = released();
-        for (const size_t tries : {10, 1, 1}) {
+        for (const unsigned int tries : {10u, 1u, 1u}) {
             done += tries;
             EXPECT_TRUE(pump([&] { return released() == done; }) && iq->resting());
             pump_once(mux());
