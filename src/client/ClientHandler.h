@@ -24,7 +24,7 @@ public:
     enum ClientTransType : int { CTT_NONE = 0, CTT_SLEEP_LOG = 1, CTT_RINGBUF = 2 };
     enum ClientTransState : int { CTS_IDLE = 0, CTS_EXECUTING = 1 };
 
-    // One kind of request: a row of the request table in RequestTable.cpp.
+    // One kind of request: a row of the request table in ClientHandler_table.cpp.
     struct Request {
         const char* keyword;
         // Gets the text after the keyword, which is not NUL-terminated.
