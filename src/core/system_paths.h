@@ -42,12 +42,8 @@
 #define SOCKET_WCN_SUPERVISOR "external_wcn_kest"
 #define SOCKET_TIME_SYNC "cp_time_sync_server"
 
-// Environment variable that names the directory standing for "/". Unset or empty
-// (as on a handset): the real "/".
-#define ENV_ROOT "KESTMODEM_ROOT"
-
-// The path to use for a path that the service fixes: the root directory followed by
-// path, or path itself without a root. "" gives the root directory's own prefix.
+// The path to use for a path that the service fixes: the root directory (ENV_ROOT) followed
+// by path, or path itself without a root. "" gives the root directory's own prefix.
 android::String8 system_path(const char* path);
 
 #endif  // CORE_SYSTEM_PATHS_H_

@@ -15,7 +15,7 @@
 #include <string_view>
 #include <vector>
 
-#include "core/system_paths.h"
+#include "platform/env_root.h"
 
 namespace {
 

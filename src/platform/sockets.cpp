@@ -7,7 +7,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
-#include "core/system_paths.h"
+#include "platform/env_root.h"
 
 namespace {
 
