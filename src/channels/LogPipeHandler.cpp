@@ -16,7 +16,7 @@ uint8_t LogPipeHandler::s_io_buffer[IO_BUFFER_SIZE];
 
 LogPipeHandler::LogPipeHandler(LogController* ctrl, Multiplexer* mux,
                                const LogConfig::ConfigEntry* entry, StorageManager* stor_mgr)
-    : FdHandler(-1, ctrl, mux),
+    : CpChannel(-1, ctrl, mux),
       m_name(entry->name),
       m_type(entry->type),
       m_reset_prop(entry->type == CT_WCN ? PROP_WCN_RESET : PROP_MODEM_RESET),

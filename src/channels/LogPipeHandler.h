@@ -15,19 +15,19 @@
 #include <utils/String8.h>
 
 #include "channels/ChannelResult.h"
+#include "channels/CpDumpEvent.h"
 #include "channels/DataConsumer.h"
-#include "client/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "config/LogConfig.h"
-#include "core/FdHandler.h"
 #include "core/ObjectRef.h"
 #include "iq/WcdmaIqManager.h"
+#include "storage/CpChannel.h"
 
-class ClientHandler;
 class CpStorage;
 class DiagDeviceHandler;
 class LogFile;
 class StorageManager;
+class TransClient;
 
 enum CpWorkState : int {
     CWS_NOT_WORKING = 0,  // the CP asserted; its log device is closed
@@ -37,7 +37,7 @@ enum CpWorkState : int {
     CWS_SAVE_RINGBUF = 4
 };
 
-class LogPipeHandler : public FdHandler, public RefTarget {
+class LogPipeHandler : public CpChannel, public RefTarget {
 public:
     // How long a device that cannot be opened is left alone.
     static constexpr unsigned int REOPEN_MS = 3000;
@@ -48,7 +48,7 @@ public:
 
     bool enabled() const { return m_enabled; }
     CpType type() const { return m_type; }
-    const android::String8& name() const { return m_name; }
+    const android::String8& name() const override { return m_name; }
     CpWorkState state() const { return m_state; }
     CpStorage* storage() const { return m_storage; }
 
@@ -79,12 +79,12 @@ public:
     void process_alive();
 
     // Start fetching the CP's sleep log or ring buffer for a client. CR_STARTED when the
-    // transaction runs: the client is told its result through notify_trans_result. Else
+    // transaction runs: the client is told its result through trans_ended. Else
     // CR_FAILED, CR_BUSY, CR_LOG_DISABLED or CR_NOT_WORKING.
-    int save_sleep_log(ClientHandler* client);
-    int save_ringbuf(ClientHandler* client);
+    int save_sleep_log(TransClient* client);
+    int save_ringbuf(TransClient* client);
     // The client does not wait for its result any more.
-    void cancel_trans_result_notify(ClientHandler* client);
+    void cancel_trans_result_notify(TransClient* client);
 
     int enable_wcdma_iq();
     int disable_wcdma_iq();
@@ -102,8 +102,8 @@ public:
     // Timer: opens the log device again.
     static void reopen_log_dev(void* handler);
     // Hooks of the storage: a log file, a CP directory was made.
-    static void new_log_callback(LogPipeHandler* handler, LogFile* file);
-    static void new_dir_callback(LogPipeHandler* handler);
+    static void new_log_callback(CpChannel* channel, LogFile* file);
+    static void new_dir_callback(CpChannel* channel);
 
 protected:
     static constexpr size_t IO_BUFFER_SIZE = 32768;
@@ -137,7 +137,7 @@ protected:
 
 private:
     int check_client_transaction() const;
-    int begin_client_transaction(DataConsumer* consumer, CpWorkState state, ClientHandler* client);
+    int begin_client_transaction(DataConsumer* consumer, CpWorkState state, TransClient* client);
     bool client_transaction_runs() const {
         return m_state == CWS_SAVE_SLEEP_LOG || m_state == CWS_SAVE_RINGBUF;
     }
@@ -167,7 +167,7 @@ private:
     CpWorkState m_state = CWS_WORKING;
     DiagDeviceHandler* m_diag_handler = nullptr;
     DataConsumer* m_consumer = nullptr;
-    ObjectRef<ClientHandler> m_trans_client;
+    ObjectRef<TransClient> m_trans_client;
     StorageManager* m_stor_mgr;
     CpStorage* m_storage = nullptr;
     OneShotTimer m_reopen_timer;

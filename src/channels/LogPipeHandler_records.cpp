@@ -16,14 +16,21 @@
 #include "storage/CpStorage.h"
 #include "storage/LogFile.h"
 
-// ---- What heads a new directory and a new log file
+namespace {
 
-void LogPipeHandler::new_log_callback(LogPipeHandler* handler, LogFile* file) {
-    handler->save_timestamp(file);
+// The storage calls back with the channel that it was made for.
+LogPipeHandler* log_pipe(CpChannel* channel) {
+    return static_cast<LogPipeHandler*>(channel);
 }
 
-void LogPipeHandler::new_dir_callback(LogPipeHandler* handler) {
-    handler->save_version();
+}  // namespace
+
+void LogPipeHandler::new_log_callback(CpChannel* channel, LogFile* file) {
+    log_pipe(channel)->save_timestamp(file);
+}
+
+void LogPipeHandler::new_dir_callback(CpChannel* channel) {
+    log_pipe(channel)->save_version();
 }
 
 bool LogPipeHandler::save_version() {

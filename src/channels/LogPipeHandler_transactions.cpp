@@ -10,7 +10,7 @@
 #include "channels/CpSleepLogConsumer.h"
 #include "channels/DiagDeviceHandler.h"
 #include "channels/LogPipeHandler.h"
-#include "client/ClientHandler.h"
+#include "channels/TransClient.h"
 #include "control/LogController.h"
 #include "core/Multiplexer.h"
 #include "core/log.h"
@@ -178,7 +178,7 @@ int LogPipeHandler::check_client_transaction() const {
 }
 
 int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState state,
-                                             ClientHandler* client) {
+                                             TransClient* client) {
     consumer->set_callback(this, diag_transaction_notify);
     if (run_transaction(create_diag_device(consumer), consumer, state) < 0) {
         return CR_FAILED;
@@ -187,7 +187,7 @@ int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState
     return CR_STARTED;
 }
 
-int LogPipeHandler::save_sleep_log(ClientHandler* client) {
+int LogPipeHandler::save_sleep_log(TransClient* client) {
     const int refusal = check_client_transaction();
     if (refusal < 0) {
         return refusal;
@@ -199,7 +199,7 @@ int LogPipeHandler::save_sleep_log(ClientHandler* client) {
                                     CWS_SAVE_SLEEP_LOG, client);
 }
 
-int LogPipeHandler::save_ringbuf(ClientHandler* client) {
+int LogPipeHandler::save_ringbuf(TransClient* client) {
     const int refusal = check_client_transaction();
     if (refusal < 0) {
         return refusal;
@@ -211,7 +211,7 @@ int LogPipeHandler::save_ringbuf(ClientHandler* client) {
                                     CWS_SAVE_RINGBUF, client);
 }
 
-void LogPipeHandler::cancel_trans_result_notify(ClientHandler* client) {
+void LogPipeHandler::cancel_trans_result_notify(TransClient* client) {
     if (m_trans_client.get() == client) {
         m_trans_client = nullptr;
     }
@@ -221,10 +221,10 @@ void LogPipeHandler::end_client_transaction(int result) {
     stop_transaction(CWS_WORKING);
     // The next try to open the log device may have fallen into the transaction.
     open_missing_dev();
-    ClientHandler* client = m_trans_client.get();
+    TransClient* client = m_trans_client.get();
     m_trans_client = nullptr;
     if (client) {
-        client->notify_trans_result(result);
+        client->trans_ended(result);
     }
 }
 

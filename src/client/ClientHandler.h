@@ -3,7 +3,7 @@
 //
 // Owned by the ClientManager, which destroys it when the client is gone. A channel that
 // runs a transaction for the client refers to it until it has delivered the result by
-// notify_trans_result. Nothing here ever waits for the client: what its socket does not
+// trans_ended. Nothing here ever waits for the client: what its socket does not
 // take is lost. Loop thread only.
 #ifndef CLIENT_CLIENTHANDLER_H_
 #define CLIENT_CLIENTHANDLER_H_
@@ -11,15 +11,16 @@
 #include <stddef.h>
 #include <stdint.h>
 
+#include "channels/CpDumpEvent.h"
+#include "channels/TransClient.h"
 #include "client/BufferedFdHandler.h"
-#include "client/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "core/ObjectRef.h"
 
 class ClientManager;
 class LogPipeHandler;
 
-class ClientHandler : public BufferedFdHandler, public RefTarget {
+class ClientHandler : public BufferedFdHandler, public TransClient {
 public:
     enum ClientTransType : int { CTT_NONE = 0, CTT_SLEEP_LOG = 1, CTT_RINGBUF = 2 };
     enum ClientTransState : int { CTS_IDLE = 0, CTS_EXECUTING = 1 };
@@ -53,8 +54,8 @@ public:
     // when the line could not be written whole.
     int notify_cp_dump(CpType type, CpDumpEvent event);
 
-    // Called once by the channel when the client's transaction has ended: CR_OK, CR_FAILED,
-    // CR_NO_SLEEP_LOG or CR_NO_RINGBUF.
+    void trans_ended(int result) override { notify_trans_result(result); }
+    // The client's transaction has ended. Not virtual: a log text begins with its signature.
     void notify_trans_result(int result);
     // The same for a client whose transaction of that kind runs.
     void proc_sleep_log_result(int result);

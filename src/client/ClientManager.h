@@ -8,7 +8,7 @@
 #include <stddef.h>
 #include <utils/List.h>
 
-#include "client/CpDumpEvent.h"
+#include "channels/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "core/FdHandler.h"
 

@@ -10,7 +10,7 @@
 #include <time.h>
 #include <utils/List.h>
 
-#include "client/CpDumpEvent.h"
+#include "channels/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "config/LogConfig.h"
 #include "core/Multiplexer.h"

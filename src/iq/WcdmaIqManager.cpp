@@ -8,17 +8,17 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
-#include "channels/LogPipeHandler.h"
 #include "core/Multiplexer.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
+#include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 #include "storage/log_name.h"
 
-WcdmaIqManager::WcdmaIqManager(LogPipeHandler* channel)
+WcdmaIqManager::WcdmaIqManager(CpChannel* channel)
     : FdHandler(-1, channel->log_ctrl(), channel->multiplexer()), m_channel(channel) {}
 
 WcdmaIqManager::~WcdmaIqManager() {

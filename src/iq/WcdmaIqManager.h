@@ -22,9 +22,9 @@
 #include "core/ObjectRef.h"
 #include "storage/LogFile.h"
 
+class CpChannel;
 class CpStorage;
 class IqStorRespHandler;
-class LogPipeHandler;
 
 class WcdmaIqManager : public FdHandler {
 public:
@@ -38,7 +38,7 @@ public:
     static constexpr size_t MAX_FILES = 60;
 
     // The channel's controller and loop serve the manager as well.
-    explicit WcdmaIqManager(LogPipeHandler* channel);
+    explicit WcdmaIqManager(CpChannel* channel);
     // Stops the capture.
     ~WcdmaIqManager() override;
 
@@ -96,7 +96,7 @@ private:
 
     typedef ObjectRef<LogFile> FileRef;
 
-    LogPipeHandler* m_channel;
+    CpChannel* m_channel;
     CpStorage* m_storage = nullptr;
     IqState m_state = IQS_IDLE;
     android::List<FileRef> m_files;  // oldest first

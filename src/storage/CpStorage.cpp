@@ -2,12 +2,12 @@
 
 #include <errno.h>
 
-#include "channels/LogPipeHandler.h"
+#include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
 
-CpStorage::CpStorage(StorageManager* manager, LogPipeHandler* channel)
+CpStorage::CpStorage(StorageManager* manager, CpChannel* channel)
     : m_manager(manager), m_channel(channel) {}
 
 CpStorage::~CpStorage() {

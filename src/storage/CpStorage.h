@@ -17,14 +17,14 @@
 #include "storage/MediaType.h"
 #include "storage/StorageManager.h"
 
-class LogPipeHandler;
+class CpChannel;
 
 class CpStorage {
 public:
-    typedef void (*new_log_callback)(LogPipeHandler* channel, LogFile* file);
-    typedef void (*new_dir_callback)(LogPipeHandler* channel);
+    typedef void (*new_log_callback)(CpChannel* channel, LogFile* file);
+    typedef void (*new_dir_callback)(CpChannel* channel);
 
-    CpStorage(StorageManager* manager, LogPipeHandler* channel);
+    CpStorage(StorageManager* manager, CpChannel* channel);
     // Closes the current file.
     ~CpStorage();
     CpStorage(const CpStorage&) = delete;
@@ -68,7 +68,7 @@ private:
     bool pass_quota(MediaStorage* media);
 
     StorageManager* m_manager;
-    LogPipeHandler* m_channel;
+    CpChannel* m_channel;
     new_log_callback m_new_log_cb = nullptr;
     new_dir_callback m_new_dir_cb = nullptr;
     ObjectRef<LogFile> m_cur_file;

@@ -179,7 +179,7 @@ bool StorageManager::use_internal() {
     return true;
 }
 
-CpStorage* StorageManager::create_storage(LogPipeHandler* channel) {
+CpStorage* StorageManager::create_storage(CpChannel* channel) {
     CpStorage* storage = new CpStorage(this, channel);
     m_storages.push_back(storage);
     return storage;

@@ -18,9 +18,9 @@
 #include "storage/MediaType.h"
 #include "storage/SubscriberList.h"
 
+class CpChannel;
 class CpStorage;
 class LogController;
-class LogPipeHandler;
 class Multiplexer;
 
 class StorageManager {
@@ -61,7 +61,7 @@ public:
     bool is_sd_mounted() const;
 
     // A CP storage for the channel; destroyed by delete_storage.
-    CpStorage* create_storage(LogPipeHandler* channel);
+    CpStorage* create_storage(CpChannel* channel);
     void delete_storage(CpStorage* storage);
     // Every CP storage closes and forgets its current file.
     void stop_all_storages();

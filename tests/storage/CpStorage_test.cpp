@@ -2,8 +2,8 @@
 
 #include <errno.h>
 
-#include "channels/GnssCpLogHandler.h"
-#include "control/LogController.h"
+#include "core/Multiplexer.h"
+#include "storage/CpChannel.h"
 #include "storage/StorageFixture.h"
 #include "storage/paths.h"
 
@@ -12,25 +12,33 @@ namespace {
 const std::string SET = "2016-03-01-09-15-00/";
 const std::string INT = "data/modem_log/";
 
+// A channel that has a name and nothing else.
+class NamedChannel : public CpChannel {
+public:
+    explicit NamedChannel(const char* name) : CpChannel(-1, nullptr, nullptr), m_name(name) {}
+
+    void process(int /*events*/) override {}
+    const android::String8& name() const override { return m_name; }
+
+private:
+    const android::String8 m_name;
+};
+
 class CpStorageTest : public StorageTest {
 public:  // for the hooks, which are plain functions
     using StorageTest::plug_card;
 
-    CpStorageTest()
-        : m_entry{"cp_gnss", CT_GNSS, true, 0, 0},
-          m_other_entry{"cp_wcn", CT_WCN, true, 0, 0},
-          m_channel(&m_ctrl, &m_ctrl.multiplexer(), &m_entry, &m_mgr),
-          m_other_channel(&m_ctrl, &m_ctrl.multiplexer(), &m_other_entry, &m_mgr) {
+    CpStorageTest() {
         s_test = this;
         init();
         m_store = m_mgr.create_storage(&m_channel);
         m_other = m_mgr.create_storage(&m_other_channel);
-        m_store->set_new_dir_callback([](LogPipeHandler* channel) {
+        m_store->set_new_dir_callback([](CpChannel* channel) {
             EXPECT_EQ(&s_test->m_channel, channel);
             s_test->m_events += "D";
             s_test->m_in_hook();
         });
-        m_store->set_new_log_callback([](LogPipeHandler*, LogFile* file) {
+        m_store->set_new_log_callback([](CpChannel*, LogFile* file) {
             EXPECT_EQ(s_test->m_store->current_file(), file);
             s_test->m_events += "L";
         });
@@ -52,11 +60,8 @@ public:  // for the hooks, which are plain functions
     }
 
     static CpStorageTest* s_test;
-    LogController m_ctrl;  // never started
-    LogConfig::ConfigEntry m_entry;
-    LogConfig::ConfigEntry m_other_entry;
-    GnssCpLogHandler m_channel;
-    GnssCpLogHandler m_other_channel;
+    NamedChannel m_channel{"cp_gnss"};
+    NamedChannel m_other_channel{"cp_wcn"};
     CpStorage* m_store;
     CpStorage* m_other;
     std::string m_events;
@@ -414,7 +419,8 @@ TEST_F(CpStorageTest, CardThatCanNoLongerBeWritten) {
 // A card that seems to work each time it is tried, and fails then, is not tried from block to
 // block.
 TEST_F(CpStorageTest, CardThatKeepsFailingRests) {
-    ASSERT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &m_ctrl.multiplexer()), 0);
+    static Multiplexer mux;  // outlives the manager
+    ASSERT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &mux), 0);
     plug_card();
     faults::only_on("/sd/modem_log/2");  // sets can be made, and files in the log root
     faults::fail(faults::OPEN, 1, EIO, 100000);

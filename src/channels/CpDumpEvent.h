@@ -1,7 +1,7 @@
 // What subscribed control clients are told about a CP's memory dump.
-#ifndef CLIENT_CPDUMPEVENT_H_
-#define CLIENT_CPDUMPEVENT_H_
+#ifndef CHANNELS_CPDUMPEVENT_H_
+#define CHANNELS_CPDUMPEVENT_H_
 
 enum CpDumpEvent : int { CDE_START = 0, CDE_END = 1 };
 
-#endif  // CLIENT_CPDUMPEVENT_H_
+#endif  // CHANNELS_CPDUMPEVENT_H_
