@@ -1,18 +1,11 @@
 // The part of LogPipeHandler that heads a new directory with the version file and a new log
 // file with the time record.
 #include <cutils/properties.h>
-#include <cutils/sockets.h>
-#include <errno.h>
-#include <fcntl.h>
-#include <poll.h>
-#include <sys/socket.h>
-#include <unistd.h>
 
 #include "channels/LogPipeHandler.h"
-#include "channels/TimeSyncRecord.h"
+#include "channels/TimeSyncClient.h"
 #include "config/property_names.h"
 #include "core/log.h"
-#include "core/system_paths.h"
 #include "storage/CpStorage.h"
 #include "storage/LogFile.h"
 
@@ -51,50 +44,22 @@ bool LogPipeHandler::save_version() {
 }
 
 bool LogPipeHandler::save_timestamp(LogFile* file) {
-    constexpr int ATTEMPTS = 10;
-    constexpr int ATTEMPT_MS = 100;
-    int conn = -1;
-    int slept_ms = 0;
-    for (int i = 0; i < ATTEMPTS; ++i) {
-        // Non-blocking: connecting to a service that hangs, its queue full, would wait.
-        conn = socket_local_client(SOCKET_TIME_SYNC, ANDROID_SOCKET_NAMESPACE_ABSTRACT,
-                                   SOCK_STREAM | SOCK_NONBLOCK);
-        if (conn >= 0) {
-            break;
-        }
-        const int connect_errno = errno;
-        usleep(ATTEMPT_MS * 1000);
-        slept_ms += ATTEMPT_MS;
-        errno = connect_errno;
-    }
-    if (conn < 0) {
-        err_log("connect CP time sync server error");
-        return false;
-    }
-    const int flags = fcntl(conn, F_GETFL);
-    if (flags == -1) {
-        err_log("time sync conn F_GETFL failed");
-        ::close(conn);
-        return false;
-    }
-    if (fcntl(conn, F_SETFL, flags | O_NONBLOCK) == -1) {
-        err_log("set time sync conn O_NONBLOCK failed");
-        ::close(conn);
-        return false;
-    }
-    struct pollfd pfd;
-    pfd.fd = conn;
-    pfd.events = POLLIN;
-    pfd.revents = 0;
     uint8_t reply[TIME_SYNC_REPLY_LEN];
-    ssize_t n = 0;
-    if (poll(&pfd, 1, ATTEMPTS * ATTEMPT_MS - slept_ms) > 0 && (pfd.revents & POLLIN)) {
-        n = read(conn, reply, sizeof(reply));
-    }
-    ::close(conn);
-    if (n < static_cast<ssize_t>(sizeof(reply))) {
-        err_log("can not read time info");
-        return false;
+    switch (TimeSyncClient().ask(reply)) {
+        case TimeSyncClient::TSF_NO_CONNECTION:
+            err_log("connect CP time sync server error");
+            return false;
+        case TimeSyncClient::TSF_NO_FLAGS:
+            err_log("time sync conn F_GETFL failed");
+            return false;
+        case TimeSyncClient::TSF_FLAGS_NOT_SET:
+            err_log("set time sync conn O_NONBLOCK failed");
+            return false;
+        case TimeSyncClient::TSF_NO_REPLY:
+            err_log("can not read time info");
+            return false;
+        case TimeSyncClient::TSF_NONE:
+            break;
     }
     const TimeSyncRecord record = make_time_sync_record(reply, time_zone_hours());
     return file->write(&record, sizeof(record)) == static_cast<ssize_t>(sizeof(record));
