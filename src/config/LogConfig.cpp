@@ -215,6 +215,10 @@ int LogConfig::save() {
     return 0;
 }
 
+int LogConfig::save_changes() {
+    return m_dirty ? save() : 0;
+}
+
 String8 LogConfig::file_text() const {
     String8 text;
     text.appendFormat("minidump %s\t%s\n", m_md ? "enable" : "disable",

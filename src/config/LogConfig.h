@@ -54,6 +54,9 @@ public:
     // then, and after a kill, tells settings_file.h.
     int save();
 
+    // The same if dirty(), else 0: the file is left alone.
+    int save_changes();
+
     // True when a setting has changed since the file was last written.
     bool dirty() const { return m_dirty; }
 

@@ -70,7 +70,7 @@ int LogController::enable_md() {
     }
     m_save_md = true;
     m_config->set_md(true);
-    if (m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -82,7 +82,7 @@ int LogController::disable_md() {
     }
     m_save_md = false;
     m_config->set_md(false);
-    if (m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -90,7 +90,7 @@ int LogController::disable_md() {
 
 int LogController::set_md_int_stor(bool internal) {
     m_config->set_md_int_stor(internal);
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -108,7 +108,7 @@ int LogController::set_log_file_size(size_t mb) {
     const uint32_t size = static_cast<uint32_t>(mb);
     m_stor_mgr.set_file_size(size << MB_TO_BYTES_SHIFT);
     m_config->set_log_file_size(size);
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -121,7 +121,7 @@ size_t LogController::get_log_file_size() const {
 int LogController::set_data_part_size(size_t mb) {
     m_stor_mgr.set_data_part_size(static_cast<uint64_t>(mb) << MB_TO_BYTES_SHIFT);
     m_config->set_data_log_size(static_cast<uint32_t>(mb));
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -134,7 +134,7 @@ size_t LogController::get_data_part_size() const {
 int LogController::set_sd_size(size_t mb) {
     m_stor_mgr.set_sd_size(static_cast<uint64_t>(mb) << MB_TO_BYTES_SHIFT);
     m_config->set_sd_log_size(static_cast<uint32_t>(mb));
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -147,7 +147,7 @@ size_t LogController::get_sd_size() const {
 int LogController::set_log_overwrite(bool enable) {
     m_stor_mgr.set_overwrite(enable);
     m_config->set_log_overwrite(enable);
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config file failed");
     }
     return 0;
@@ -238,7 +238,7 @@ int LogController::reload_kest_conf() {
         }
         m_config->set_stream(entry->type, entry->enable);
     }
-    if (m_config->dirty() && m_config->save() < 0) {
+    if (m_config->save_changes() < 0) {
         err_log("save config failed");
     }
     return 0;
