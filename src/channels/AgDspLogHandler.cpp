@@ -6,6 +6,7 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
@@ -17,9 +18,8 @@ namespace {
 constexpr unsigned long CMD_DUMP_COMPLETE = 0x40045806;
 
 void complete_dump(int fd) {
-    const int saved_errno = errno;
+    const SavedErrno dump_errno;
     ioctl(fd, CMD_DUMP_COMPLETE, 0);
-    errno = saved_errno;
 }
 
 // How long the driver may take for the next part of a dump, and a step of that time.

@@ -13,6 +13,7 @@
 #include "channels/TransClient.h"
 #include "control/LogController.h"
 #include "core/Multiplexer.h"
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "storage/CpStorage.h"
 #include "storage/log_name.h"
@@ -55,9 +56,10 @@ void LogPipeHandler::process_assert(bool save_md) {
         if (start_dump(t) == 0) {
             return;
         }
-        const int start_errno = errno;
-        notify_cp_dump(CDE_END);
-        errno = start_errno;
+        {
+            const SavedErrno start_errno;
+            notify_cp_dump(CDE_END);
+        }
         err_log("Start dump transaction error");
     }
     close_on_assert();
@@ -131,13 +133,12 @@ int LogPipeHandler::run_transaction(DiagDeviceHandler* diag, DataConsumer* consu
         start_transaction(diag, consumer, state);
         return 0;
     }
-    const int start_errno = errno;
+    const SavedErrno start_errno;
     delete consumer;
     delete diag;
     if (m_log_diag_same) {
         poll_dev();
     }
-    errno = start_errno;
     return -1;
 }
 

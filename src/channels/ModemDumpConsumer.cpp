@@ -1,11 +1,11 @@
 #include "channels/ModemDumpConsumer.h"
 
-#include <errno.h>
 #include <poll.h>
 #include <string.h>
 #include <unistd.h>
 
 #include "core/Multiplexer.h"
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "storage/CpStorage.h"
 
@@ -81,10 +81,11 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         }
         return true;
     }
-    const int write_errno = errno;
-    discard_dump_file();
-    m_read_timer.stop();
-    errno = write_errno;
+    {
+        const SavedErrno write_errno;
+        discard_dump_file();
+        m_read_timer.stop();
+    }
     err_log("need to write %lu, write returns %d", static_cast<unsigned long>(len),
             static_cast<int>(written));
     notify_result(save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);

@@ -8,6 +8,7 @@
 
 #include "client/ClientHandler.h"
 #include "core/Multiplexer.h"
+#include "core/SavedErrno.h"
 #include "core/log.h"
 
 namespace {
@@ -36,10 +37,9 @@ int ClientManager::init(const char* name) {
         return -1;
     }
     if (set_nonblock(m_fd) < 0) {
-        const int saved_errno = errno;
-        close();
-        errno = saved_errno;
         err_log("set server socket non-block error");
+        const SavedErrno nonblock_errno;
+        close();
         return -1;
     }
     resume_listening();

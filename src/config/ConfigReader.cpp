@@ -1,8 +1,8 @@
 #include "config/ConfigReader.h"
 
-#include <errno.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/open_file.h"
 
 ConfigReader::~ConfigReader() {
@@ -18,9 +18,8 @@ int ConfigReader::open(const char* path) {
     }
     m_file = fdopen(fd, "r");
     if (!m_file) {
-        const int error = errno;
+        const SavedErrno fdopen_errno;
         close(fd);
-        errno = error;
         return -1;
     }
     return 0;

@@ -7,6 +7,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/open_file.h"
 #include "storage/copy_file.h"
@@ -71,11 +72,10 @@ int replace_content(int fd, const String8& text) {
         append_blank_lines(room, text.length() - old_len);
     }
     if (write_at(fd, room, st.st_size) < 0 || write_at(fd, content, 0) < 0) {
-        const int error = errno;
+        const SavedErrno write_errno;
         if (old_len < text.length() && ftruncate(fd, st.st_size) < 0) {
             // Blank lines stay.
         }
-        errno = error;
         return -1;
     }
     return ftruncate(fd, static_cast<off_t>(text.length()));
@@ -122,13 +122,12 @@ int put_settings(const char* path, const String8& text) {
     if (fd < 0) {
         return -1;
     }
-    const int result = replace_content(fd, text);
-    const int error = errno;
-    if (close(fd) < 0 && result == 0) {
+    if (replace_content(fd, text) < 0) {
+        const SavedErrno replace_errno;
+        close(fd);
         return -1;
     }
-    errno = error;
-    return result;
+    return close(fd);
 }
 
 bool is_unfinished_copy(const char* path, const char* default_path) {

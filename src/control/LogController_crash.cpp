@@ -1,12 +1,23 @@
 // The part of LogController that saves what tells of a crash: the mini dump of the CP and
 // the records of the inter-processor communication driver.
-#include <errno.h>
-
 #include "control/LogController.h"
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
+
+namespace {
+
+// The result of the copy, with its errno.
+int copy_and_close(LogFile* file, const char* source) {
+    const int result = file->copy(system_path(source).string());
+    const SavedErrno copy_errno;
+    file->close();
+    return result;
+}
+
+}  // namespace
 
 int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType type) {
     const android::String8 name =
@@ -21,11 +32,8 @@ int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType typ
         err_log("create mini dump file %s failed", name.string());
         return -1;
     }
-    const int result = file->copy(system_path(cp_mini_dump_path(type)).string());
-    const int copy_errno = errno;
-    file->close();
+    const int result = copy_and_close(file, cp_mini_dump_path(type));
     if (result < 0) {
-        errno = copy_errno;
         err_log("save mini dump error");
         file->dir()->remove_file(file);
     }
@@ -47,11 +55,7 @@ int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
         if (!file) {
             continue;
         }
-        const bool copied = file->copy(system_path(source.path).string()) == 0;
-        const int copy_errno = errno;
-        file->close();
-        if (!copied) {
-            errno = copy_errno;
+        if (copy_and_close(file, source.path) != 0) {
             err_log("kestcp: save DIPX %s info failed", source.record);
             file->dir()->remove_file(file);
             result = -1;

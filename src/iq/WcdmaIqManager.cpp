@@ -1,6 +1,5 @@
 #include "iq/WcdmaIqManager.h"
 
-#include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/ioctl.h>
@@ -9,6 +8,7 @@
 #include <unistd.h>
 
 #include "core/Multiplexer.h"
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "iq/IqStorRespHandler.h"
@@ -51,18 +51,16 @@ int WcdmaIqManager::prepare_iq_mem_map() {
         return -1;
     }
     if (ioctl(m_fd, CMD_SET_IQ_CH_TYPE, 1) < 0) {
-        const int ioctl_errno = errno;
-        close();
-        errno = ioctl_errno;
         err_log("ioctl CMD_SET_IQ_CH_TYPE error");
+        const SavedErrno ioctl_errno;
+        close();
         return -1;
     }
     void* base = mmap(nullptr, IQ_MEM_SIZE, PROT_READ | PROT_WRITE, MAP_PRIVATE, m_fd, 0);
     if (base == MAP_FAILED) {
-        const int mmap_errno = errno;
-        close();
-        errno = mmap_errno;
         err_log("mmap error");
+        const SavedErrno mmap_errno;
+        close();
         return -1;
     }
     m_mem_base = static_cast<uint8_t*>(base);

@@ -5,6 +5,7 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "iq/IqStorRespHandler.h"
 #include "iq/WcdmaIqManager.h"
@@ -100,13 +101,14 @@ bool WcdmaIqManager::process_save() {
             position += n;
         }
         if (n != static_cast<ssize_t>(chunk)) {
-            const int write_errno = errno;
-            // A part of the chunk may have reached the file before the failure.
-            const off_t reached = lseek(m_save_file->fd(), 0, SEEK_CUR);
-            if (reached >= 0 && reached <= static_cast<off_t>(info.len)) {
-                remaining = info.len - static_cast<uint32_t>(reached);
+            {
+                const SavedErrno write_errno;
+                // A part of the chunk may have reached the file before the failure.
+                const off_t reached = lseek(m_save_file->fd(), 0, SEEK_CUR);
+                if (reached >= 0 && reached <= static_cast<off_t>(info.len)) {
+                    remaining = info.len - static_cast<uint32_t>(reached);
+                }
             }
-            errno = write_errno;
             err_log("save WCDMA I/Q error, %u bytes not saved", remaining);
             break;
         }
