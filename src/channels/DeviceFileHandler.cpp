@@ -50,7 +50,7 @@ void DeviceFileHandler::process(int events) {
     }
     for (int reads = 0; reads < MAX_READS; ++reads) {
         const size_t used = m_buf.data_start + m_buf.data_len;
-        const ssize_t n = read(m_fd, m_buf.buffer + used, m_buf.capacity - used);
+        const ssize_t n = read(m_fd, m_buf.buffer.get() + used, m_buf.capacity - used);
         if (n <= 0) {
             if (n == 0 && is_news(READ_NOTHING, 0)) {
                 err_log("read %s return 0", m_path.string());

@@ -9,6 +9,8 @@
 #include <stdint.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "core/FdHandler.h"
 
 class DeviceFileHandler : public FdHandler {
@@ -20,15 +22,12 @@ public:
     struct DataBuffer {
         explicit DataBuffer(size_t size)
             : buffer(new uint8_t[size]), capacity(size), data_start(0), data_len(0) {}
-        ~DataBuffer() { delete[] buffer; }
-        DataBuffer(const DataBuffer&) = delete;
-        DataBuffer& operator=(const DataBuffer&) = delete;
 
         // The unconsumed bytes: data_len of them at data().
-        const uint8_t* data() const { return buffer + data_start; }
+        const uint8_t* data() const { return buffer.get() + data_start; }
         void consume_all() { data_start = data_len = 0; }
 
-        uint8_t* buffer;
+        const std::unique_ptr<uint8_t[]> buffer;
         size_t capacity;
         size_t data_start;
         size_t data_len;

@@ -3,6 +3,8 @@
 #include <string.h>
 #include <unistd.h>
 
+#include <memory>
+
 #include "core/Multiplexer.h"
 #include "core/log.h"
 #include "storage/CpDirectory.h"
@@ -49,9 +51,8 @@ bool DiagReplyConsumer::send_request() {
     uint8_t* request;
     size_t len;
     DiagFrameParser::frame(m_exchange.diag_type, 0, nullptr, 0, request, len);
-    const ssize_t n = write(m_handler->fd(), request, len);
-    delete[] request;
-    return n == static_cast<ssize_t>(len);
+    const std::unique_ptr<uint8_t[]> owner(request);
+    return write(m_handler->fd(), request, len) == static_cast<ssize_t>(len);
 }
 
 int DiagReplyConsumer::start_exchange(LogFile* file) {

@@ -17,9 +17,10 @@ int ExtWcnLogHandler::stop() {
 }
 
 int ExtWcnLogHandler::start_dump(const struct tm& t) {
-    ExtWcnDumpConsumer* consumer = new ExtWcnDumpConsumer(name().string(), storage(), t);
+    auto consumer = std::make_unique<ExtWcnDumpConsumer>(name().string(), storage(), t);
     consumer->set_callback(this, diag_transaction_notify);
-    return run_transaction(create_diag_device(consumer), consumer, CWS_DUMP);
+    std::unique_ptr<DiagDeviceHandler> diag = create_diag_device(consumer.get());
+    return run_transaction(std::move(diag), std::move(consumer), CWS_DUMP);
 }
 
 void ExtWcnLogHandler::diag_transaction_notify(void* client, DataConsumer::LogProcResult result) {

@@ -5,6 +5,7 @@
 #include <poll.h>
 #include <unistd.h>
 
+#include "channels/DiagDeviceHandler.h"
 #include "config/property_names.h"
 #include "control/LogController.h"
 #include "core/Multiplexer.h"

@@ -14,6 +14,8 @@
 #include <time.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "channels/ChannelResult.h"
 #include "channels/CpDumpEvent.h"
 #include "channels/DataConsumer.h"
@@ -121,14 +123,16 @@ protected:
     void dev_read_failed();
 
     // The diag device of a transaction, opened or borrowed; null on failure.
-    DiagDeviceHandler* create_diag_device(DataConsumer* consumer);
-    void start_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
+    std::unique_ptr<DiagDeviceHandler> create_diag_device(DataConsumer* consumer);
+    void start_transaction(std::unique_ptr<DiagDeviceHandler> diag,
+                           std::unique_ptr<DataConsumer> consumer, CpWorkState state);
     void stop_transaction(CpWorkState new_state);
     // Registers the diag handler, in place of the log device when both are one, binds it and
-    // starts the consumer as a transaction. Takes both over; on failure (-1) they are
-    // destroyed. A handler that the loop has no room for is polled once there is some: until
-    // then the exchange's time-out counts.
-    int run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer, CpWorkState state);
+    // starts the consumer as a transaction. 0, or -1 without a diag handler and when the
+    // consumer can not start. A handler that the loop has no room for is polled once there is
+    // some: until then the exchange's time-out counts.
+    int run_transaction(std::unique_ptr<DiagDeviceHandler> diag,
+                        std::unique_ptr<DataConsumer> consumer, CpWorkState state);
     // Ends a transaction that a client waits for; the client gets the result.
     void end_client_transaction(int result);
     // Ends a dump: the CP counts as not working until it is alive again.
@@ -137,7 +141,8 @@ protected:
 
 private:
     int check_client_transaction() const;
-    int begin_client_transaction(DataConsumer* consumer, CpWorkState state, TransClient* client);
+    int begin_client_transaction(std::unique_ptr<DataConsumer> consumer, CpWorkState state,
+                                 TransClient* client);
     bool client_transaction_runs() const {
         return m_state == CWS_SAVE_SLEEP_LOG || m_state == CWS_SAVE_RINGBUF;
     }
@@ -165,8 +170,8 @@ private:
     android::String8 m_diag_dev_path;
     const char* m_reset_prop;
     CpWorkState m_state = CWS_WORKING;
-    DiagDeviceHandler* m_diag_handler = nullptr;
-    DataConsumer* m_consumer = nullptr;
+    std::unique_ptr<DiagDeviceHandler> m_diag_handler;
+    std::unique_ptr<DataConsumer> m_consumer;
     ObjectRef<TransClient> m_trans_client;
     StorageManager* m_stor_mgr;
     CpStorage* m_storage = nullptr;

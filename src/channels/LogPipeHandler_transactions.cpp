@@ -100,26 +100,24 @@ void LogPipeHandler::notify_cp_dump(CpDumpEvent event) {
 
 // ---- Transactions over the diag device
 
-DiagDeviceHandler* LogPipeHandler::create_diag_device(DataConsumer* consumer) {
+std::unique_ptr<DiagDeviceHandler> LogPipeHandler::create_diag_device(DataConsumer* consumer) {
     if (m_log_diag_same) {
         if (m_fd < 0) {
             return nullptr;
         }
-        return new DiagDeviceHandler(m_fd, consumer, m_log_ctrl, m_multiplexer);
+        return std::make_unique<DiagDeviceHandler>(m_fd, consumer, m_log_ctrl, m_multiplexer);
     }
-    DiagDeviceHandler* diag =
-        new DiagDeviceHandler(m_diag_dev_path, consumer, m_log_ctrl, m_multiplexer);
+    auto diag =
+        std::make_unique<DiagDeviceHandler>(m_diag_dev_path, consumer, m_log_ctrl, m_multiplexer);
     if (diag->open() < 0) {
-        delete diag;
         return nullptr;
     }
     return diag;
 }
 
-int LogPipeHandler::run_transaction(DiagDeviceHandler* diag, DataConsumer* consumer,
-                                    CpWorkState state) {
+int LogPipeHandler::run_transaction(std::unique_ptr<DiagDeviceHandler> diag,
+                                    std::unique_ptr<DataConsumer> consumer, CpWorkState state) {
     if (!diag) {
-        delete consumer;
         return -1;
     }
     if (m_log_diag_same) {
@@ -128,32 +126,31 @@ int LogPipeHandler::run_transaction(DiagDeviceHandler* diag, DataConsumer* consu
         del_events(POLLIN);
     }
     diag->poll_when_room(POLLIN, (m_log_diag_same ? m_log_dev_path : m_diag_dev_path).string());
-    consumer->bind(diag);
+    consumer->bind(diag.get());
     if (consumer->start() == 0) {
-        start_transaction(diag, consumer, state);
+        start_transaction(std::move(diag), std::move(consumer), state);
         return 0;
     }
+    // Both go before the log device takes its place in the loop again.
     const SavedErrno start_errno;
-    delete consumer;
-    delete diag;
+    consumer.reset();
+    diag.reset();
     if (m_log_diag_same) {
         poll_dev();
     }
     return -1;
 }
 
-void LogPipeHandler::start_transaction(DiagDeviceHandler* diag, DataConsumer* consumer,
-                                       CpWorkState state) {
-    m_diag_handler = diag;
-    m_consumer = consumer;
+void LogPipeHandler::start_transaction(std::unique_ptr<DiagDeviceHandler> diag,
+                                       std::unique_ptr<DataConsumer> consumer, CpWorkState state) {
+    m_diag_handler = std::move(diag);
+    m_consumer = std::move(consumer);
     m_state = state;
 }
 
 void LogPipeHandler::stop_transaction(CpWorkState new_state) {
-    delete m_consumer;
-    m_consumer = nullptr;
-    delete m_diag_handler;
-    m_diag_handler = nullptr;
+    m_consumer.reset();
+    m_diag_handler.reset();
     m_state = new_state;
     if (m_log_diag_same && m_fd >= 0) {
         poll_dev();
@@ -178,10 +175,11 @@ int LogPipeHandler::check_client_transaction() const {
     return m_state == CWS_WORKING ? CR_OK : CR_BUSY;
 }
 
-int LogPipeHandler::begin_client_transaction(DataConsumer* consumer, CpWorkState state,
-                                             TransClient* client) {
+int LogPipeHandler::begin_client_transaction(std::unique_ptr<DataConsumer> consumer,
+                                             CpWorkState state, TransClient* client) {
     consumer->set_callback(this, diag_transaction_notify);
-    if (run_transaction(create_diag_device(consumer), consumer, state) < 0) {
+    std::unique_ptr<DiagDeviceHandler> diag = create_diag_device(consumer.get());
+    if (run_transaction(std::move(diag), std::move(consumer), state) < 0) {
         return CR_FAILED;
     }
     m_trans_client = client;
@@ -196,8 +194,9 @@ int LogPipeHandler::save_sleep_log(TransClient* client) {
     if (!m_storage && create_storage() < 0) {
         return CR_FAILED;
     }
-    return begin_client_transaction(new CpSleepLogConsumer(m_name.string(), m_storage),
-                                    CWS_SAVE_SLEEP_LOG, client);
+    return begin_client_transaction(
+        std::make_unique<CpSleepLogConsumer>(m_name.string(), m_storage), CWS_SAVE_SLEEP_LOG,
+        client);
 }
 
 int LogPipeHandler::save_ringbuf(TransClient* client) {
@@ -208,7 +207,7 @@ int LogPipeHandler::save_ringbuf(TransClient* client) {
     if (!m_storage && create_storage() < 0) {
         return CR_FAILED;
     }
-    return begin_client_transaction(new CpRingBufConsumer(m_name.string(), m_storage),
+    return begin_client_transaction(std::make_unique<CpRingBufConsumer>(m_name.string(), m_storage),
                                     CWS_SAVE_RINGBUF, client);
 }
 

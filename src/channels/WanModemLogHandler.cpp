@@ -41,10 +41,11 @@ void WanModemLogHandler::unsubscribe() {
 }
 
 int WanModemLogHandler::start_dump(const struct tm& t) {
-    ModemDumpConsumer* consumer =
-        new ModemDumpConsumer(name().string(), storage(), t, m_mem_path.string());
+    auto consumer =
+        std::make_unique<ModemDumpConsumer>(name().string(), storage(), t, m_mem_path.string());
     consumer->set_callback(this, diag_transaction_notify);
-    return run_transaction(create_diag_device(consumer), consumer, CWS_DUMP);
+    std::unique_ptr<DiagDeviceHandler> diag = create_diag_device(consumer.get());
+    return run_transaction(std::move(diag), std::move(consumer), CWS_DUMP);
 }
 
 void WanModemLogHandler::diag_transaction_notify(void* client, DataConsumer::LogProcResult result) {

@@ -6,13 +6,11 @@
 BufferedFdHandler::BufferedFdHandler(int fd, LogController* ctrl, Multiplexer* mux, size_t capacity)
     : FdHandler(fd, ctrl, mux), m_capacity(capacity), m_buffer(new uint8_t[capacity]) {}
 
-BufferedFdHandler::~BufferedFdHandler() {
-    delete[] m_buffer;
-}
+BufferedFdHandler::~BufferedFdHandler() = default;
 
 void BufferedFdHandler::process(int /*events*/) {
     // Into a full buffer this reads nothing and returns 0, as at the end of the stream.
-    const ssize_t n = read(m_fd, m_buffer + m_data_len, m_capacity - m_data_len);
+    const ssize_t n = read(m_fd, m_buffer.get() + m_data_len, m_capacity - m_data_len);
     if (n == 0) {
         process_conn_closed();
     } else if (n > 0) {

@@ -7,6 +7,8 @@
 #include <stddef.h>
 #include <stdint.h>
 
+#include <memory>
+
 #include "core/FdHandler.h"
 
 class BufferedFdHandler : public FdHandler {
@@ -29,7 +31,7 @@ public:
 
 protected:
     const size_t m_capacity;
-    uint8_t* const m_buffer;
+    const std::unique_ptr<uint8_t[]> m_buffer;
     size_t m_data_len = 0;  // bytes held, from the buffer's start
 };
 

@@ -35,17 +35,18 @@ ClientHandler::~ClientHandler() {
 
 int ClientHandler::process_data() {
     note_alive();
-    const uint8_t* const end = m_buffer + m_data_len;
-    const uint8_t* req = m_buffer;
-    for (const uint8_t* p = m_buffer; p < end; ++p) {
+    uint8_t* const begin = m_buffer.get();
+    const uint8_t* const end = begin + m_data_len;
+    const uint8_t* req = begin;
+    for (const uint8_t* p = begin; p < end; ++p) {
         if (*p == '\n' || *p == '\0') {
             process_req(req, static_cast<size_t>(p - req));
             req = p + 1;
         }
     }
     m_data_len = static_cast<size_t>(end - req);
-    if (req != m_buffer) {
-        memmove(m_buffer, req, m_data_len);
+    if (req != begin) {
+        memmove(begin, req, m_data_len);
     }
     return 0;
 }

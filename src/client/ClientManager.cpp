@@ -6,6 +6,8 @@
 #include <poll.h>
 #include <sys/socket.h>
 
+#include <memory>
+
 #include "client/ClientHandler.h"
 #include "core/Multiplexer.h"
 #include "core/SavedErrno.h"
@@ -55,16 +57,15 @@ void ClientManager::process(int /*events*/) {
     if (set_nonblock(fd) < 0) {
         err_log("set accepted socket to O_NONBLOCK error");
     }
-    ClientHandler* client = new ClientHandler(fd, m_log_ctrl, m_multiplexer, this);
+    auto client = std::make_unique<ClientHandler>(fd, m_log_ctrl, m_multiplexer, this);
     if (client->add_events(POLLIN) < 0) {
         errno = ENOBUFS;
         err_log("no room to poll a new client, closing it");
         note_idle("server socket");
-        delete client;
         return;
     }
     note_alive();
-    m_clients.push_back(client);
+    m_clients.push_back(client.release());
     info_log("new client accepted");
     if (full()) {
         del_events(POLLIN);

@@ -24,8 +24,6 @@ LogController::~LogController() {
     for (LogPipeHandler* pipe : m_log_pipes) {
         delete pipe;
     }
-    m_log_pipes.clear();
-    delete m_cli_mgr;
 }
 
 int LogController::init(LogConfig* config) {
@@ -47,10 +45,9 @@ int LogController::init(LogConfig* config) {
     for (const LogConfig::ConfigEntry* entry : config->stream_entries()) {
         m_log_pipes.push_back(create_handler(entry));
     }
-    m_cli_mgr = new ClientManager(this, &m_multiplexer, MAX_CLIENTS);
+    m_cli_mgr = std::make_unique<ClientManager>(this, &m_multiplexer, MAX_CLIENTS);
     if (m_cli_mgr->init(SOCKET_CONTROL) < 0) {
-        delete m_cli_mgr;
-        m_cli_mgr = nullptr;
+        m_cli_mgr.reset();
     }
     init_state_handler(m_modem_state, SOCKET_MODEM_SUPERVISOR);
     init_wcn_state_handler(m_wcn_state, SOCKET_WCN_SUPERVISOR);
@@ -62,23 +59,21 @@ void LogController::run() {
 }
 
 void LogController::init_state_handler(ModemStateHandler*& handler, const char* name) {
-    ModemStateHandler* state = new ModemStateHandler(this, &m_multiplexer, name);
+    auto state = std::make_unique<ModemStateHandler>(this, &m_multiplexer, name);
     if (state->init() < 0) {
-        delete state;
         err_log("kestcp: connect to %s error", name);
         return;
     }
-    handler = state;
+    handler = state.release();
 }
 
 void LogController::init_wcn_state_handler(ExtWcnStateHandler*& handler, const char* name) {
-    ExtWcnStateHandler* state = new ExtWcnStateHandler(this, &m_multiplexer, name);
+    auto state = std::make_unique<ExtWcnStateHandler>(this, &m_multiplexer, name);
     if (state->init() < 0) {
-        delete state;
         err_log("connect to %s error", name);
         return;
     }
-    handler = state;
+    handler = state.release();
 }
 
 LogPipeHandler* LogController::create_handler(const LogConfig::ConfigEntry* entry) {

@@ -10,6 +10,8 @@
 #include <time.h>
 #include <utils/List.h>
 
+#include <memory>
+
 #include "channels/CpDumpEvent.h"
 #include "config/CpType.h"
 #include "config/LogConfig.h"
@@ -109,7 +111,7 @@ private:
     LogConfig* m_config = nullptr;
     bool m_save_md = false;
     Multiplexer m_multiplexer;
-    ClientManager* m_cli_mgr = nullptr;
+    std::unique_ptr<ClientManager> m_cli_mgr;
     android::List<LogPipeHandler*> m_log_pipes;
     ModemStateHandler* m_modem_state = nullptr;
     ExtWcnStateHandler* m_wcn_state = nullptr;

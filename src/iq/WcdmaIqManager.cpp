@@ -81,11 +81,10 @@ int WcdmaIqManager::start_save_thread() {
     if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, pair) < 0) {
         return -1;
     }
-    m_resp_handler = new IqStorRespHandler(pair[0], m_log_ctrl, m_multiplexer, this);
+    m_resp_handler = std::make_unique<IqStorRespHandler>(pair[0], m_log_ctrl, m_multiplexer, this);
     m_thread_sock = pair[1];
     if (pthread_create(&m_thread, nullptr, save_thread, this) != 0) {
-        delete m_resp_handler;
-        m_resp_handler = nullptr;
+        m_resp_handler.reset();
         ::close(m_thread_sock);
         m_thread_sock = -1;
         return -1;
@@ -101,8 +100,7 @@ void WcdmaIqManager::stop_save_thread() {
     m_resp_handler->end_thread();
     pthread_join(m_thread, nullptr);
     m_thread = 0;
-    delete m_resp_handler;
-    m_resp_handler = nullptr;
+    m_resp_handler.reset();
     ::close(m_thread_sock);
     m_thread_sock = -1;
 }

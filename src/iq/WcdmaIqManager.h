@@ -18,6 +18,8 @@
 #include <utils/List.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "core/FdHandler.h"
 #include "core/ObjectRef.h"
 #include "storage/LogFile.h"
@@ -102,7 +104,7 @@ private:
     android::List<FileRef> m_files;  // oldest first
     uint8_t* m_mem_base = nullptr;
     FileRef m_cur_file;
-    IqStorRespHandler* m_resp_handler = nullptr;  // null: no thread
+    std::unique_ptr<IqStorRespHandler> m_resp_handler;  // null: no thread
     pthread_t m_thread = 0;
     int m_thread_sock = -1;
     LogFile* m_save_file = nullptr;  // m_cur_file as the saving thread sees it

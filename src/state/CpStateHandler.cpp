@@ -65,10 +65,10 @@ void CpStateHandler::reconnect(void* handler) {
 
 int CpStateHandler::process_data() {
     char text[4 * BUFFER_SIZE + 1];
-    make_line(m_buffer, m_data_len, text);
+    make_line(m_buffer.get(), m_data_len, text);
     info_log("%u bytes: %s", static_cast<unsigned int>(m_data_len), text);
     CpType type = CT_UNKNOWN;
-    const CpEvent event = parse_notify(m_buffer, m_data_len, type);
+    const CpEvent event = parse_notify(m_buffer.get(), m_data_len, type);
     if (event != CE_NONE) {
         // A supervisor that says no more than some bytes before it closes is of no use.
         m_used = true;
