@@ -57,13 +57,13 @@ void ClientHandler::process_req(const uint8_t* req, size_t len) {
     if (!keyword) {
         return;
     }
-    const Request* request = find_request(keyword, keyword_len);
-    if (!request) {
+    const RequestHandler handler = find_handler(keyword, keyword_len);
+    if (!handler) {
         err_log("unknown request");
         return reply(RC_UNKNOWN_REQUEST);
     }
     const uint8_t* params = keyword + keyword_len;
-    (this->*request->handler)(params, static_cast<size_t>(req + len - params));
+    (this->*handler)(params, static_cast<size_t>(req + len - params));
 }
 
 void ClientHandler::process_conn_closed() {

@@ -14,6 +14,7 @@
 #include "channels/CpDumpEvent.h"
 #include "channels/TransClient.h"
 #include "client/BufferedFdHandler.h"
+#include "client/RequestTable.h"
 #include "config/CpType.h"
 #include "core/ObjectRef.h"
 
@@ -25,19 +26,8 @@ public:
     enum ClientTransType : int { CTT_NONE = 0, CTT_SLEEP_LOG = 1, CTT_RINGBUF = 2 };
     enum ClientTransState : int { CTS_IDLE = 0, CTS_EXECUTING = 1 };
 
-    // One kind of request: a row of the request table in ClientHandler_table.cpp.
-    struct Request {
-        const char* keyword;
-        // Gets the text after the keyword, which is not NUL-terminated.
-        void (ClientHandler::*handler)(const uint8_t* params, size_t len);
-        const char* params;  // what follows the keyword
-        const char* help;    // one line
-    };
-    static constexpr size_t REQUEST_NUM = 25;
-    static const Request REQUESTS[REQUEST_NUM];
-
     // A request with its terminator has to fit.
-    static constexpr size_t MAX_REQUEST = 256;
+    static constexpr size_t MAX_REQUEST = MAX_REQUEST_LEN + 1;
 
     // Takes over fd; manager is not owned.
     ClientHandler(int fd, LogController* ctrl, Multiplexer* mux, ClientManager* manager);
@@ -82,8 +72,11 @@ private:
         RC_UNKNOWN_CP = 9
     };
 
-    // The row of a keyword, or null.
-    static const Request* find_request(const uint8_t* keyword, size_t len);
+    // Carries out one kind of request. Gets the text after the keyword, which is not
+    // NUL-terminated.
+    typedef void (ClientHandler::*RequestHandler)(const uint8_t* params, size_t len);
+    // The handler of a keyword, or null.
+    static RequestHandler find_handler(const uint8_t* keyword, size_t len);
 
     void proc_flush(const uint8_t* params, size_t len);
     void proc_kestctl(const uint8_t* params, size_t len);

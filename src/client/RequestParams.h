@@ -8,19 +8,20 @@
 #include <stddef.h>
 #include <stdint.h>
 
+#include "client/RequestTable.h"
 #include "config/CpType.h"
 
 enum ParamError {
     PE_NONE = 0,
     PE_MISSING,  // no token is left
-    PE_INVALID,  // the token has not the form wanted
+    PE_INVALID,  // the token is malformed
     PE_EXTRA     // a token is left where none may be
 };
 
 class RequestParams {
 public:
     // The most CPs that one request may list.
-    static constexpr size_t MAX_CPS = 5;
+    static constexpr size_t MAX_CPS = MAX_REQUEST_CPS;
 
     RequestParams(const uint8_t* text, size_t len) : m_pos(text), m_end(text + len) {}
 

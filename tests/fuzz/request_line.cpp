@@ -34,9 +34,10 @@ struct Root : TestRoot {
 bool is_reply(const std::string& line, const std::string& keyword) {
     static const std::regex PLAIN("OK|ERROR \\d");
     static const std::regex VALUE("OK (\\d+|ON|OFF|(EN|DIS)ABLE|(IN|EX)TERNAL)|ERROR \\d");
-    for (const ClientHandler::Request& request : ClientHandler::REQUESTS) {
-        if (keyword == request.keyword) {
-            return std::regex_match(line, keyword.compare(0, 4, "GET_") == 0 ? VALUE : PLAIN);
+    for (const ControlRequest& request : CONTROL_REQUESTS) {
+        if (keyword == request.keyword()) {
+            const bool value = request.reply == RK_NUMBER || request.reply == RK_WORD;
+            return std::regex_match(line, value ? VALUE : PLAIN);
         }
     }
     return line == "ERROR 1";

@@ -1,95 +1,98 @@
 #include "kestctl/Commands.h"
 
+#include <ctype.h>
 #include <strings.h>
 
 #include <algorithm>
+#include <string_view>
 
 #include "config/CpType.h"
-#include "kestctl/ControlConnection.h"
 #include "kestctl/Reply.h"
 #include "kestctl/handlers.h"
 
 namespace {
 
-const int TIMEOUT = 10;
+constexpr int TIMEOUT = 10;
 // The service replies when the CP has delivered the data.
-const int SAVE_TIMEOUT = 60;
+constexpr int SAVE_TIMEOUT = 60;
 
 // clang-format off
-const ParamForm P_NONE = {"",                    0, 0, {PK_CP, PK_CP},     nullptr};
-const ParamForm P_CP   = {"CP",                  1, 1, {PK_CP, PK_CP},     nullptr};
-const ParamForm P_CPS  = {"CP...",               1, 5, {PK_CP, PK_CP},     nullptr};
-const ParamForm P_ANY  = {"[CP...]",             0, CP_TYPE_NUM, {PK_CP, PK_CP}, nullptr};
-const ParamForm P_IQ   = {"CP [WCDMA]",          1, 2, {PK_CP, PK_IQ},     "WCDMA"};
-const ParamForm P_MB   = {"MB",                  1, 1, {PK_MB, PK_MB},     nullptr};
-const ParamForm P_POS  = {"INTERNAL|EXTERNAL",   1, 1, {PK_POS, PK_POS},   nullptr};
-const ParamForm P_LINE = {"'LINE'",              1, 1, {PK_LINE, PK_LINE}, nullptr};
+constexpr ParamForm FORMS[] = {
+    // the request's       the command's
+    {"",                  "",                  0, 0, {PK_CP, PK_CP},       nullptr},
+    {"CP",                "CP",                1, 1, {PK_CP, PK_CP},       nullptr},
+    {"CP...",             "CP...",             1, MAX_REQUEST_CPS, {PK_CP, PK_CP}, nullptr},
+    {"CP WCDMA",          "CP [WCDMA]",        1, 2, {PK_CP, PK_IQ},       "WCDMA"},
+    {"CP [WCDMA]",        "CP [WCDMA]",        1, 2, {PK_CP, PK_IQ},       "WCDMA"},
+    {"CP DUMP",           "[CP...]",           0, CP_TYPE_NUM, {PK_CP, PK_CP}, nullptr},
+    {"MB",                "MB",                1, 1, {PK_MB, PK_MB},       nullptr},
+    {"INTERNAL|EXTERNAL", "INTERNAL|EXTERNAL", 1, 1, {PK_PLACE, PK_PLACE}, nullptr},
+};
 // clang-format on
+constexpr ParamForm RAW_FORM = {nullptr, "'LINE'", 1, 1, {PK_LINE, PK_LINE}, nullptr};
+
+// The form of a request's parameters, or null.
+constexpr const ParamForm* find_form(std::string_view params) {
+    for (const ParamForm& form : FORMS) {
+        if (params == form.params) {
+            return &form;
+        }
+    }
+    return nullptr;
+}
+
+constexpr bool all_forms_known() {
+    for (const ControlRequest& request : CONTROL_REQUESTS) {
+        if (!find_form(request.params)) {
+            return false;
+        }
+    }
+    return true;
+}
+static_assert(all_forms_known(), "a request has parameters that kestctl does not know");
+
+// Of no use on a connection that ends with the reply: watch sends them.
+bool is_subscription(const ControlRequest& request) {
+    return find_form(request.params) == find_form("CP DUMP");
+}
+
+// "get-log-state" for GET_LOG_STATE, "reload" for kestctl reload.
+std::string command_name(const std::string& words) {
+    std::string name = words.substr(words.find(' ') + 1);
+    for (char& c : name) {
+        c = c == '_' ? '-' : static_cast<char>(tolower(c));
+    }
+    return name;
+}
+
+std::vector<Command> make_commands() {
+    std::vector<Command> all = {
+        {"status", "", find_form(""), RK_OK, run_status,
+         "print every setting and the log state of every CP"},
+        {"watch", "SUBSCRIBE", find_form("CP DUMP"), RK_OK, run_watch,
+         "print when memory dumps of these CPs (or any) start and end, until Ctrl-C"},
+    };
+    for (const ControlRequest& request : CONTROL_REQUESTS) {
+        if (!is_subscription(request)) {
+            const bool checks = request.keyword() == "ENABLE_LOG";
+            all.push_back({command_name(request.words), request.words, find_form(request.params),
+                           request.reply, checks ? run_enable_log : run_request, request.help});
+        }
+    }
+    all.push_back({"raw", "", &RAW_FORM, RK_WORD, run_raw,
+                   "send the line unchanged and print the line that answers it"});
+    return all;
+}
 
 }  // namespace
 
-// clang-format off
-const Command COMMANDS[COMMAND_NUM] = {
-    // name                  request                  params   reply      time-out
-    {"status",                nullptr,                &P_NONE, RK_NONE,   TIMEOUT,      run_status,
-     "show every setting and the log state of every CP"},
-    {"watch",                 "SUBSCRIBE",            &P_ANY,  RK_NONE,   TIMEOUT,      run_watch,
-     "tell when memory dumps start and end, of these CPs or all, until Ctrl-C"},
-    {"enable-log",            "ENABLE_LOG",           &P_CPS,  RK_NONE,   TIMEOUT,      run_enable_log,
-     "log these CPs, five at most, and say which are off all the same"},
-    {"disable-log",           "DISABLE_LOG",          &P_CPS,  RK_NONE,   TIMEOUT,      run_request,
-     "stop logging these CPs, five at most"},
-    {"get-log-state",         "GET_LOG_STATE",        &P_CP,   RK_WORD,   TIMEOUT,      run_request,
-     "is the CP logged: ON or OFF"},
-    {"save-ringbuf",          "SAVE_RINGBUF",         &P_CP,   RK_NONE,   SAVE_TIMEOUT, run_request,
-     "fetch the CP's ring buffer and save it"},
-    {"save-sleep-log",        "SAVE_SLEEP_LOG",       &P_CP,   RK_NONE,   SAVE_TIMEOUT, run_request,
-     "fetch the CP's sleep log and save it"},
-    {"flush",                 "FLUSH",                &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "write out the log data that is still buffered"},
-    {"reload",                "kestctl reload",       &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "switch the CPs' logs as the general logger's configuration says"},
-    {"clear",                 "kestctl clear",        &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "delete all CP logs on all media"},
-    {"get-log-file-size",     "GET_LOG_FILE_SIZE",    &P_NONE, RK_NUMBER, TIMEOUT,      run_request,
-     "limit of one log file in MB"},
-    {"set-log-file-size",     "SET_LOG_FILE_SIZE",    &P_MB,   RK_NONE,   TIMEOUT,      run_request,
-     "set the limit of one log file"},
-    {"get-data-max-size",     "GET_DATA_MAX_SIZE",    &P_NONE, RK_NUMBER, TIMEOUT,      run_request,
-     "limit of the logs on the internal medium in MB"},
-    {"set-data-max-size",     "SET_DATA_MAX_SIZE",    &P_MB,   RK_NONE,   TIMEOUT,      run_request,
-     "set the limit of the logs on the internal medium"},
-    {"get-sd-max-size",       "GET_SD_MAX_SIZE",      &P_NONE, RK_NUMBER, TIMEOUT,      run_request,
-     "limit of the logs on the SD card in MB"},
-    {"set-sd-max-size",       "SET_SD_MAX_SIZE",      &P_MB,   RK_NONE,   TIMEOUT,      run_request,
-     "set the limit of the logs on the SD card"},
-    {"get-log-overwrite",     "GET_LOG_OVERWRITE",    &P_NONE, RK_WORD,   TIMEOUT,      run_request,
-     "do new logs replace the oldest at the limit: ENABLE or DISABLE"},
-    {"enable-log-overwrite",  "ENABLE_LOG_OVERWRITE", &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "at the limit, delete the oldest logs"},
-    {"disable-log-overwrite", "DISABLE_LOG_OVERWRITE", &P_NONE, RK_NONE,  TIMEOUT,      run_request,
-     "at the limit, log no more"},
-    {"get-md-stor-pos",       "GET_MD_STOR_POS",      &P_NONE, RK_WORD,   TIMEOUT,      run_request,
-     "medium of mini dumps: INTERNAL, or EXTERNAL for the one in use"},
-    {"set-md-stor-pos",       "SET_MD_STOR_POS",      &P_POS,  RK_NONE,   TIMEOUT,      run_request,
-     "put mini dumps on the internal medium or the one in use"},
-    {"enable-md",             "ENABLE_MD",            &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "save a mini dump when a CP crashes"},
-    {"disable-md",            "DISABLE_MD",           &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "save no mini dumps"},
-    {"mini-dump",             "MINI_DUMP",            &P_NONE, RK_NONE,   TIMEOUT,      run_request,
-     "save a mini dump now, if the service can"},
-    {"enable-iq",             "ENABLE_IQ",            &P_IQ,   RK_NONE,   TIMEOUT,      run_request,
-     "capture the CP's I/Q samples"},
-    {"disable-iq",            "DISABLE_IQ",           &P_IQ,   RK_NONE,   TIMEOUT,      run_request,
-     "end the capture of the CP's I/Q samples"},
-    {"raw",                   nullptr,                &P_LINE, RK_WORD,   TIMEOUT,      run_raw,
-     "send the line as it is and print the line that answers it"},
-};
-// clang-format on
+const std::vector<Command>& commands() {
+    static const std::vector<Command> all = make_commands();
+    return all;
+}
 
 const Command* find_command(const std::string& name) {
-    for (const Command& command : COMMANDS) {
+    for (const Command& command : commands()) {
         if (name == command.name) {
             return &command;
         }
@@ -97,27 +100,24 @@ const Command* find_command(const std::string& name) {
     return nullptr;
 }
 
-const Command* find_request(const std::string& line) {
-    const size_t start = line.find_first_not_of(" \t\r");
-    const std::string rest = start == std::string::npos ? "" : line.substr(start);
-    for (const Command& command : COMMANDS) {
-        if (command.request && rest.find(command.request) == 0) {
-            const char after = rest.c_str()[std::string(command.request).size()];
-            if (after == '\0' || after == ' ' || after == '\t' || after == '\r') {
-                return &command;
-            }
+int default_timeout(const std::string& line) {
+    const std::string word = line.substr(std::min(line.find_first_not_of(" \t\r"), line.size()));
+    for (const ControlRequest& request : CONTROL_REQUESTS) {
+        if (request.reply == RK_LATER &&
+            request.keyword() == word.substr(0, word.find_first_of(" \t\r"))) {
+            return SAVE_TIMEOUT;
         }
     }
-    return nullptr;
+    return TIMEOUT;
 }
 
 const char* param_word(ParamKind kind, size_t i) {
-    static const char* const POSITIONS[] = {"INTERNAL", "EXTERNAL"};
+    static const char* const PLACES[] = {"INTERNAL", "EXTERNAL"};
     switch (kind) {
         case PK_CP:
             return i < CP_TYPE_NUM ? cp_type_to_request_name(static_cast<CpType>(i)) : nullptr;
-        case PK_POS:
-            return i < 2 ? POSITIONS[i] : nullptr;
+        case PK_PLACE:
+            return i < 2 ? PLACES[i] : nullptr;
         case PK_IQ:
             return i < 1 ? "WCDMA" : nullptr;
         default:
@@ -134,10 +134,9 @@ bool check_arg(ParamKind kind, std::string* arg, std::string* reason) {
         return is_number(*arg);
     }
     if (kind == PK_LINE) {
-        *reason = "a request is one line of at most " +
-                  std::to_string(ControlConnection::MAX_REQUEST) + " bytes and not blank";
-        return arg->find('\n') == std::string::npos &&
-               arg->size() <= ControlConnection::MAX_REQUEST &&
+        *reason = "a request is one line of at most " + std::to_string(MAX_REQUEST_LEN) +
+                  " bytes and not blank";
+        return arg->find('\n') == std::string::npos && arg->size() <= MAX_REQUEST_LEN &&
                arg->find_first_not_of(" \t\r") != std::string::npos;
     }
     *reason = "'" + *arg + "' is none of";

@@ -14,8 +14,6 @@
 
 class ControlConnection {
 public:
-    // The longest request, without its line feed, that the service takes.
-    static constexpr size_t MAX_REQUEST = 255;
     // The longest line that is accepted from the service, well above what it sends.
     static constexpr size_t MAX_LINE = 256;
 

@@ -50,7 +50,7 @@ void print_completions(std::vector<std::string> words) {
         return;
     }
     if (args.empty()) {
-        for (const Command& command : COMMANDS) {
+        for (const Command& command : commands()) {
             offer(command.name, typed);
         }
         return;

@@ -17,12 +17,12 @@ const char UNKNOWN[] = "UNKNOWN";
 
 bool fits(ReplyKind kind, const std::string& value) {
     switch (kind) {
-        case RK_NONE:
-            return value.empty();
         case RK_NUMBER:
             return is_number(value);
-        default:
+        case RK_WORD:
             return !value.empty();
+        default:
+            return value.empty();
     }
 }
 
@@ -59,7 +59,7 @@ int run_request(const Command& command, const Args& args, ControlConnection& con
     std::string value;
     const int status = ask(command, args, connection, output, &value);
     if (status == ES_OK) {
-        command.reply == RK_NONE ? output.ok() : output.value(value);
+        value.empty() ? output.ok() : output.value(value);
     }
     return status;
 }
@@ -90,8 +90,8 @@ int run_enable_log(const Command& command, const Args& args, ControlConnection& 
 int run_status(const Command&, const Args&, ControlConnection& connection, const Output& output) {
     Output::Table settings, logs, iqs;
     std::string value;
-    for (const Command& getter : COMMANDS) {
-        if (getter.reply == RK_NONE || getter.run != run_request) {
+    for (const Command& getter : commands()) {
+        if ((getter.reply != RK_NUMBER && getter.reply != RK_WORD) || getter.run != run_request) {
             continue;
         }
         if (getter.params->max == 0) {
@@ -99,7 +99,7 @@ int run_status(const Command&, const Args&, ControlConnection& connection, const
             if (status != ES_OK) {
                 return status;
             }
-            settings.emplace_back(getter.name + strlen("get-"), value);
+            settings.emplace_back(getter.name.substr(strlen("get-")), value);
             continue;
         }
         for (size_t i = 0; const char* cp = param_word(PK_CP, i); ++i) {

@@ -31,9 +31,8 @@ void print_help() {
         printf("  --%-31s %s\n", usage.c_str(), option.help);
     }
     printf("\nCommands:\n");
-    for (const Command& command : COMMANDS) {
-        const std::string usage = std::string(command.name) + " " + command.params->usage;
-        printf("  %-33s %s\n", usage.c_str(), command.help);
+    for (const Command& command : commands()) {
+        printf("  %-33s %s\n", command.usage().c_str(), command.help);
     }
     printf("\nNames of CPs, in any case:");
     for (size_t i = 0; param_word(PK_CP, i); ++i) {
@@ -56,7 +55,7 @@ int usage_error(const Command* command, const std::string& reason) {
         fprintf(stderr, "kestctl: %s\n", reason.c_str());
     }
     if (command) {
-        fprintf(stderr, "usage: kestctl %s %s\n", command->name, command->params->usage);
+        fprintf(stderr, "usage: kestctl %s\n", command->usage().c_str());
     } else {
         fprintf(stderr, "usage: kestctl [options] command [parameters]; see kestctl --help\n");
     }
@@ -112,9 +111,9 @@ int run(int argc, char** argv) {
         return usage_error(command, reason);
     }
     if (timeout < 0) {
-        const Command* same =
-            command->request ? command : find_request(args.empty() ? "" : args[0]);
-        timeout = (same ? same : command)->timeout;
+        // The line of raw is a request, too.
+        const bool is_raw = command->request.empty() && !args.empty();
+        timeout = default_timeout(is_raw ? args[0] : command->request);
     }
 
     const Output output(json);
