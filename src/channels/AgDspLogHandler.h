@@ -11,7 +11,11 @@
 
 class AgDspLogHandler : public LogPipeHandler {
 public:
-    enum DspLogType : uint8_t { DLT_LOG = 0, DLT_DUMP = 2, DLT_PCM = 3 };
+    enum DspLogType : uint8_t {
+        DLT_LOG = DSP_CHUNK_LOG,
+        DLT_DUMP = DSP_CHUNK_DUMP,
+        DLT_PCM = DSP_CHUNK_PCM
+    };
 
     AgDspLogHandler(LogController* ctrl, Multiplexer* mux, const LogConfig::ConfigEntry* entry,
                     StorageManager* stor_mgr);

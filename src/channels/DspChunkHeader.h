@@ -11,6 +11,11 @@ constexpr uint8_t DSP_CHUNK_FLAG = 0x7E;  // each of the header's first four byt
 constexpr uint8_t DSP_CHUNK_TYPE = 0x9D;
 constexpr uint8_t DSP_CHUNK_SUB_TYPE = 0x40;  // ORed to the kind
 
+// Kinds of chunks. Nothing has kind 1.
+constexpr uint8_t DSP_CHUNK_LOG = 0;
+constexpr uint8_t DSP_CHUNK_DUMP = 2;
+constexpr uint8_t DSP_CHUNK_PCM = 3;
+
 struct DspChunkHeader {
     uint8_t flags[4];   // DSP_CHUNK_FLAG
     uint16_t len;       // data length + 16

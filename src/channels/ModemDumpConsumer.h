@@ -7,11 +7,8 @@
 
 #include "channels/CpDumpConsumer.h"
 #include "channels/DiagFrameParser.h"
+#include "channels/modem_dump_end.h"
 #include "core/OneShotTimer.h"
-
-// The payload of the frame that ends a dump.
-constexpr char MODEM_DUMP_END[] = "\nmodem_memdump_finish";
-constexpr size_t MODEM_DUMP_END_LEN = sizeof(MODEM_DUMP_END) - 1;
 
 class ModemDumpConsumer : public CpDumpConsumer {
 public:

@@ -8,8 +8,8 @@
 
 #include <algorithm>
 
-#include "channels/AgDspLogHandler.h"
 #include "channels/DiagFrameParser.h"
+#include "channels/DspChunkHeader.h"
 #include "channels/TimeSyncRecord.h"
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
@@ -64,9 +64,8 @@ std::string altered(std::string text, size_t pos, char byte) {
 
 const std::string DUMP_END = frame("\nmodem_memdump_finish", 1, 2);
 const std::string LOG_DATA = pattern_bytes(1000, 1);
-const std::string THREE_CHUNKS = chunk("log~~~~", AgDspLogHandler::DLT_LOG, 7) +
-                                 chunk("", AgDspLogHandler::DLT_PCM, 8) +
-                                 chunk(LOG_DATA, AgDspLogHandler::DLT_DUMP, 9);
+const std::string THREE_CHUNKS = chunk("log~~~~", DSP_CHUNK_LOG, 7) + chunk("", DSP_CHUNK_PCM, 8) +
+                                 chunk(LOG_DATA, DSP_CHUNK_DUMP, 9);
 
 class KestlogTest : public ::testing::Test {
 protected:
@@ -245,8 +244,7 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
 }
 
 TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
-    static const uint8_t KINDS[] = {AgDspLogHandler::DLT_LOG, AgDspLogHandler::DLT_PCM,
-                                    AgDspLogHandler::DLT_DUMP};
+    static const uint8_t KINDS[] = {DSP_CHUNK_LOG, DSP_CHUNK_PCM, DSP_CHUNK_DUMP};
     std::string text, want[3];
     for (uint32_t seq = 0; seq < 60; ++seq) {
         const std::string data = pattern_bytes(seq * 500, seq) + "~~~~";

@@ -5,10 +5,10 @@
 
 #include <algorithm>
 
-#include "channels/AgDspLogHandler.h"
 #include "channels/DiagFrameParser.h"
-#include "channels/ModemDumpConsumer.h"
+#include "channels/DspChunkHeader.h"
 #include "channels/ModemImage.h"
+#include "channels/modem_dump_end.h"
 #include "core/text.h"
 
 const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
@@ -24,8 +24,7 @@ bool begins_with_magic(const uint8_t* data, size_t len) {
 }
 
 int chunk_kind(const DspChunkHeader& header) {
-    static const uint8_t TYPES[CK_NUM] = {AgDspLogHandler::DLT_LOG, AgDspLogHandler::DLT_PCM,
-                                          AgDspLogHandler::DLT_DUMP};
+    static const uint8_t TYPES[CK_NUM] = {DSP_CHUNK_LOG, DSP_CHUNK_PCM, DSP_CHUNK_DUMP};
     for (int i = 0; i < CK_NUM; ++i) {
         if (header.sub_type == (TYPES[i] | DSP_CHUNK_SUB_TYPE)) {
             return i;
