@@ -33,11 +33,12 @@ def cmake_library(top):
     return files
 
 
-def cmake_programs(top):
-    """{program: set of its sources} of tools/CMakeLists.txt."""
+def cmake_tools(top):
+    """{module name: set of its sources} of tools/CMakeLists.txt."""
     with open(os.path.join(top, "tools/CMakeLists.txt")) as f:
-        found = re.findall(r"add_executable\((\w+)\s+(.*?)\)", f.read(), re.S)
-    return {name: {"tools/" + src for src in srcs.split()} for name, srcs in found}
+        found = re.findall(r"add_(\w+)\((\w+)(?: STATIC)?\s+(.*?)\)", f.read(), re.S)
+    return {("lib" if kind == "library" else "") + name: {"tools/" + src for src in srcs.split()}
+            for kind, name, srcs in found}
 
 
 def differ(what, bp, cmake):
@@ -57,7 +58,7 @@ def main():
     bad = differ("libkest", modules["libkest"], {f for f in library if not f.startswith(HOST_ONLY)})
     bad |= differ("src", library | {"src/core/main.cpp"}, there)
     bad |= differ("kestmodem", modules["kestmodem"], {"src/core/main.cpp"})
-    for name, srcs in cmake_programs(top).items():
+    for name, srcs in cmake_tools(top).items():
         bad |= differ(name, modules.get(name, set()), srcs)
     return 1 if bad else 0
 

@@ -11,12 +11,6 @@
 
 #include "kestctl/Reply.h"
 
-// Escaped for a terminal: \xNN, and \\ for the backslash.
-std::string escape_text(const std::string& text);
-
-// A JSON string with its quotes. Bytes above 126 become the code point of that number.
-std::string json_string(const std::string& text);
-
 class Output {
 public:
     explicit Output(bool json) : m_json(json) {}

@@ -4,7 +4,7 @@
 #include <stdio.h>
 #include <string.h>
 
-#include "kestctl/Output.h"
+#include "common/text.h"
 #include "kestlog/ExitStatus.h"
 
 Json& Json::raw(const char* key, const std::string& json) {

@@ -1,7 +1,7 @@
 // kestlog info and kestlog frames.
 #include <stdio.h>
 
-#include "kestctl/Output.h"
+#include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"

@@ -3,7 +3,7 @@
 
 #include <algorithm>
 
-#include "kestctl/Output.h"
+#include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/LogTree.h"

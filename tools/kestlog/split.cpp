@@ -5,7 +5,7 @@
 #include <string.h>
 #include <unistd.h>
 
-#include "kestctl/Output.h"
+#include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"

@@ -1,0 +1,15 @@
+// Text that came from elsewhere, a service or a medium that anyone may have written to,
+// made harmless for what reads it.
+#ifndef COMMON_TEXT_H_
+#define COMMON_TEXT_H_
+
+#include <string>
+
+// For a terminal: every byte that is not printable ASCII as \xNN, and \\ for the backslash.
+std::string escape_text(const std::string& text);
+
+// A JSON string with its quotes. A byte that is not printable ASCII becomes the code point
+// of that number, \u00NN.
+std::string json_string(const std::string& text);
+
+#endif  // COMMON_TEXT_H_
