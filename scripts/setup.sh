@@ -8,11 +8,17 @@ kest_has() {
     case "$1" in
         g++) command -v c++ >/dev/null ;;
         clang) command -v clang++ >/dev/null ;;
-        libgtest-dev) echo '#include <gtest/gtest.h>' | c++ -E -x c++ - >/dev/null 2>&1 ;;
+        libgtest-dev) kest_includes gtest/gtest.h ;;
+        nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;
         sanitizers) kest_links c++ address,undefined main && kest_links c++ thread main ;;
         *) command -v "$1" >/dev/null ;;
     esac
+}
+
+# kest_includes HEADER: whether the compiler finds it.
+kest_includes() {
+    echo "#include <$1>" | c++ -E -x c++ - >/dev/null 2>&1
 }
 
 # kest_links COMPILER SANITIZERS FUNCTION: whether a program of that one function links.

@@ -138,7 +138,7 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         {WCN + "01-cp_wcn-2016-02-01_00-00-00.log", "x", "name", true, -1},
         {WCN + "1-cp_gnss-2016-02-01_00-00-00.log", "x", "name", true, -1},
         {WCN + "1-cp_wcn-2016-02-01_24-00-00.log", "x", "name", true, -1},
-        {WCN + "x\x1b[2J\"", "x", "name", true, -1},
+        {WCN + "x\x1b[2J\"\xff", "x", "name", true, -1},
         {WCN + "0-cp_wcn-" + STAMP + ".log.bak", "x", "name", true, -1},
         {WCN + "0-cp_wcn-" + STAMP + "-01.log", "x", "name", true, -1},
         {WCN + "0-cp_wcn-" + STAMP + "-1.log", "x", "double", false, -1},

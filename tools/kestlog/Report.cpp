@@ -4,43 +4,34 @@
 #include <stdio.h>
 #include <string.h>
 
+#include <nlohmann/json.hpp>
+
 #include "common/text.h"
 #include "kestlog/ExitStatus.h"
 
-Json& Json::raw(const char* key, const std::string& json) {
-    m_text += (m_text.size() > 1 ? "," : "") + json_string(key) + ":" + json;
-    return *this;
-}
-
-Json& Json::add(const char* key, const std::string& text) {
-    return raw(key, json_string(text));
-}
-
-Json& Json::add(const char* key, uint64_t number) {
-    return raw(key, std::to_string(number));
-}
-
-Json& Json::add(const char* key, bool value) {
-    return raw(key, value ? "true" : "false");
-}
-
-void Json::print() const {
-    printf("%s\n", str().c_str());
-}
-
-std::string json_array(const std::vector<std::string>& elements) {
-    std::string text;
-    for (const std::string& element : elements) {
-        text += (text.empty() ? "[" : ",") + element;
+std::string json_text(const std::string& text) {
+    std::string utf8;
+    for (const char c : text) {
+        const unsigned int code = static_cast<uint8_t>(c);
+        if (code < 0x80) {
+            utf8 += c;
+        } else {
+            utf8 += static_cast<char>(0xc0 | (code >> 6));
+            utf8 += static_cast<char>(0x80 | (code & 0x3f));
+        }
     }
-    return text.empty() ? "[]" : text + "]";
+    return utf8;
+}
+
+void print_json(const Json& json) {
+    printf("%s\n", json.dump(-1, ' ', true).c_str());
 }
 
 Json finding_json(const Finding& finding) {
-    Json json;
-    json.add("damage", finding.damage).add("code", finding.code).add("meaning", finding.words);
+    Json json = {
+        {"damage", finding.damage}, {"code", finding.code}, {"meaning", json_text(finding.words)}};
     if (finding.offset >= 0) {
-        json.add("offset", static_cast<uint64_t>(finding.offset));
+        json["offset"] = finding.offset;
     }
     return json;
 }

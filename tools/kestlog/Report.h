@@ -3,28 +3,20 @@
 #ifndef KESTLOG_REPORT_H_
 #define KESTLOG_REPORT_H_
 
+#include <nlohmann/json_fwd.hpp>
 #include <string>
 
 #include "kestlog/FileScan.h"
 #include "kestlog/LogReader.h"
 
-// One JSON object, built in order.
-class Json {
-public:
-    Json& add(const char* key, const std::string& text);
-    Json& add(const char* key, const char* text) { return add(key, std::string(text)); }
-    Json& add(const char* key, uint64_t number);
-    Json& add(const char* key, bool value);
-    Json& raw(const char* key, const std::string& json);
-    std::string str() const { return m_text + "}"; }
-    void print() const;
+// Keeps the order in which its members are set.
+typedef nlohmann::ordered_json Json;
 
-private:
-    std::string m_text = "{";
-};
+// Text from a medium as JSON can hold it: each byte is the code point of that number.
+std::string json_text(const std::string& text);
 
-// An array of objects or numbers that are JSON already.
-std::string json_array(const std::vector<std::string>& elements);
+// Prints it in one line of ASCII.
+void print_json(const Json& json);
 
 Json finding_json(const Finding& finding);
 

@@ -1,6 +1,9 @@
 // kestlog info and kestlog frames.
 #include <stdio.h>
 
+#include <algorithm>
+#include <nlohmann/json.hpp>
+
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
@@ -13,26 +16,22 @@ class Facts {
 public:
     explicit Facts(bool json) : m_json(json) {}
 
-    template <typename T>
-    void add(const char* key, const T& value) {
-        if (m_json) {
-            std::string name = key;
-            for (char& c : name) {
-                c = c == ' ' ? '_' : c;
-            }
-            m_object.add(name.c_str(), value);
-        } else {
-            line(key, value);
-        }
+    void add(const std::string& key, const std::string& value) {
+        add(key, json_text(value), value);
     }
+    void add(const std::string& key, uint64_t value) { add(key, value, std::to_string(value)); }
+    void add(const std::string& key, bool value) { add(key, value, value ? "yes" : "no"); }
     Json& object() { return m_object; }
 
 private:
-    static void line(const char* key, const std::string& value) {
-        printf("%-15s %s\n", key, escape_text(value).c_str());
+    void add(std::string key, const Json& value, const std::string& words) {
+        if (!m_json) {
+            printf("%-15s %s\n", key.c_str(), escape_text(words).c_str());
+            return;
+        }
+        std::replace(key.begin(), key.end(), ' ', '_');
+        m_object[key] = value;
     }
-    static void line(const char* key, uint64_t value) { line(key, std::to_string(value)); }
-    static void line(const char* key, bool value) { line(key, std::string(value ? "yes" : "no")); }
 
     bool m_json;
     Json m_object;
@@ -63,8 +62,8 @@ void add_content(Facts* facts, const FileName& name, const FileReport& report) {
     if (report.chunked) {
         for (int i = 0; i < CK_NUM; ++i) {
             const std::string kind = CHUNK_KINDS[i];
-            facts->add((kind + " chunks").c_str(), report.chunks[i].count);
-            facts->add((kind + " bytes").c_str(), report.chunks[i].bytes);
+            facts->add(kind + " chunks", report.chunks[i].count);
+            facts->add(kind + " bytes", report.chunks[i].bytes);
         }
         facts->add("sequence gaps", report.sequence_gaps);
     } else {
@@ -79,16 +78,16 @@ void add_content(Facts* facts, const FileName& name, const FileReport& report) {
 }
 
 void add_findings(Facts* facts, bool json, const FileReport& report) {
-    std::vector<std::string> objects;
+    Json objects = Json::array();
     for (const Finding& finding : report.findings) {
         if (json) {
-            objects.push_back(finding_json(finding).str());
+            objects.push_back(finding_json(finding));
         } else {
             printf("%s\n", finding_text(finding).c_str());
         }
     }
     if (json) {
-        facts->object().raw("findings", json_array(objects));
+        facts->object()["findings"] = objects;
     }
     if (report.more_findings) {
         facts->add("more findings", report.more_findings);
@@ -112,7 +111,7 @@ int run_info(const std::string& path, const Settings& settings) {
         facts.add("cp", name.cp);
     }
     if (name.is_log()) {
-        facts.add("number", static_cast<uint64_t>(name.number));
+        facts.add("number", uint64_t{name.number});
     }
     if (has_time(name.time)) {
         facts.add("started", time_text(name.time));
@@ -122,7 +121,7 @@ int run_info(const std::string& path, const Settings& settings) {
     facts.add("damaged", report.damaged);
     add_findings(&facts, settings.json, report);
     if (settings.json) {
-        facts.object().print();
+        print_json(facts.object());
     }
     return scan_status(in, path, report);
 }
@@ -142,16 +141,14 @@ int run_frames(const std::string& path, const Settings& settings) {
                    piece.kind ? piece.kind : "", piece.intact ? "" : "  wrong length");
             return ferror(stdout) == 0;
         }
-        Json object;
-        object.add("offset", piece.offset).add("seq", static_cast<uint64_t>(piece.seq_num));
-        object.add("type", static_cast<uint64_t>(piece.type));
-        object.add("sub_type", static_cast<uint64_t>(piece.sub_type));
-        object.add("len", static_cast<uint64_t>(piece.len_field));
-        object.add("payload", static_cast<uint64_t>(piece.data_len)).add("intact", piece.intact);
+        Json object = {{"offset", piece.offset}, {"seq", piece.seq_num},
+                       {"type", piece.type},     {"sub_type", piece.sub_type},
+                       {"len", piece.len_field}, {"payload", piece.data_len},
+                       {"intact", piece.intact}};
         if (piece.kind) {
-            object.add("kind", piece.kind);
+            object["kind"] = piece.kind;
         }
-        object.print();
+        print_json(object);
         return ferror(stdout) == 0;
     };
     scan_file(in, FileName(file_part(path)), print, &report);

@@ -2,6 +2,7 @@
 #include <stdio.h>
 
 #include <algorithm>
+#include <nlohmann/json.hpp>
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
@@ -30,15 +31,17 @@ struct Sum {
 void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* cp,
                const Sum& sum) {
     if (json) {
-        Json object;
-        object.add("set", set.name);
+        Json object = {{"set", json_text(set.name)}};
         if (cp) {
-            object.add("cp", cp->name);
+            object["cp"] = json_text(cp->name);
         } else {
-            object.add("cps", static_cast<uint64_t>(set.cps.size()));
+            object["cps"] = set.cps.size();
         }
-        object.add("files", sum.files).add("size", sum.size);
-        object.add("from", time_text(sum.first)).add("to", time_text(sum.last)).print();
+        object["files"] = sum.files;
+        object["size"] = sum.size;
+        object["from"] = time_text(sum.first);
+        object["to"] = time_text(sum.last);
+        print_json(object);
         return;
     }
     const std::string name = cp ? cp->name : set.name.empty() ? set.path : set.name;
@@ -52,13 +55,16 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
     if (json) {
         Json object;
         if (set) {
-            object.add("set", set->name).add("cp", cp->name);
+            object = {{"set", json_text(set->name)}, {"cp", json_text(cp->name)}};
         }
-        object.add("file", file.name.text).add("kind", file.name.kind);
+        object["file"] = json_text(file.name.text);
+        object["kind"] = file.name.kind;
         if (file.name.is_log()) {
-            object.add("number", static_cast<uint64_t>(file.name.number));
+            object["number"] = file.name.number;
         }
-        object.add("size", file.size).add("time", time_text(file.name.time)).print();
+        object["size"] = file.size;
+        object["time"] = time_text(file.name.time);
+        print_json(object);
         return;
     }
     printf("%s%12llu  %-16s %s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),

@@ -5,6 +5,8 @@
 #include <string.h>
 #include <unistd.h>
 
+#include <nlohmann/json.hpp>
+
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
@@ -54,15 +56,12 @@ int kind_index(const char* kind) {
 
 void print_result(bool json, const std::string& path, const Part (&parts)[CK_NUM],
                   const FileReport& report) {
-    Json object;
-    object.add("file", path);
+    Json object = {{"file", json_text(path)}};
     for (int i = 0; i < CK_NUM; ++i) {
         if (json) {
-            object.raw(CHUNK_KINDS[i], Json()
-                                           .add("path", parts[i].path)
-                                           .add("chunks", report.chunks[i].count)
-                                           .add("bytes", report.chunks[i].bytes)
-                                           .str());
+            object[CHUNK_KINDS[i]] = {{"path", json_text(parts[i].path)},
+                                      {"chunks", report.chunks[i].count},
+                                      {"bytes", report.chunks[i].bytes}};
         } else {
             printf("%s: %llu chunks, %llu bytes\n", escape_text(parts[i].path).c_str(),
                    static_cast<unsigned long long>(report.chunks[i].count),
@@ -70,8 +69,10 @@ void print_result(bool json, const std::string& path, const Part (&parts)[CK_NUM
         }
     }
     if (json) {
-        object.add("sequence_gaps", report.sequence_gaps).add("other_bytes", report.other);
-        object.add("damaged", report.damaged).print();
+        object["sequence_gaps"] = report.sequence_gaps;
+        object["other_bytes"] = report.other;
+        object["damaged"] = report.damaged;
+        print_json(object);
     } else {
         printf("%llu sequence gaps, %llu other bytes\n",
                static_cast<unsigned long long>(report.sequence_gaps),

@@ -4,6 +4,7 @@
 #include <string.h>
 
 #include <algorithm>
+#include <nlohmann/json.hpp>
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
@@ -44,13 +45,11 @@ public:
 
     int finish() const {
         if (m_json) {
-            Json()
-                .add("ok", m_damages == 0 && !m_unreadable)
-                .add("files", m_files)
-                .add("damages", m_damages)
-                .add("notes", m_notes)
-                .add("unreadable", m_unreadable)
-                .print();
+            print_json({{"ok", m_damages == 0 && m_unreadable == 0},
+                        {"files", m_files},
+                        {"damages", m_damages},
+                        {"notes", m_notes},
+                        {"unreadable", m_unreadable}});
         } else {
             printf("%llu files checked, %llu damages, %llu notes\n",
                    static_cast<unsigned long long>(m_files),
@@ -64,7 +63,9 @@ private:
     void find(const std::string& path, const Finding& finding) {
         ++(finding.damage ? m_damages : m_notes);
         if (m_json) {
-            finding_json(finding).add("path", path).print();
+            Json object = finding_json(finding);
+            object["path"] = json_text(path);
+            print_json(object);
         } else {
             printf("%s: %s\n", escape_text(path).c_str(), finding_text(finding).c_str());
         }
