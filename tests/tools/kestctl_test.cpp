@@ -313,6 +313,18 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
         EXPECT_EQ(out(), "");
         EXPECT_NE(err().find("usage: kestctl "), std::string::npos) << err();
     }
+    static const struct {
+        const char *args, *said;
+    } WORDS[] = {
+        {"fluhs", "unknown command 'fluhs'; see kestctl --help (did you mean 'flush'?)\n"},
+        {"ENABLE_LOG",
+         "unknown command 'ENABLE_LOG'; see kestctl --help (did you mean 'enable-log'?)\n"},
+        {"fly", "unknown command 'fly'; see kestctl --help\n"},
+    };
+    for (const auto& c : WORDS) {
+        EXPECT_EQ(run({c.args}), 1);
+        EXPECT_EQ(err().find(std::string("kestctl: ") + c.said), 0u) << err();
+    }
     struct pollfd pfd = {m_listen, POLLIN, 0};
     EXPECT_EQ(poll(&pfd, 1, 0), 0);  // none of them has even connected
     EXPECT_EQ(exchange("raw " + std::string(255, 'A'), {"ERROR 1\n"}), 11);

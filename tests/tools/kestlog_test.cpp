@@ -306,9 +306,14 @@ TEST_F(KestlogTest, WrongUsageAndHelp) {
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
     }
     EXPECT_EQ(run("--help"), 0);
-    for (const char* command : {"ls", "info", "verify", "frames", "split"}) {
-        EXPECT_TRUE(said(std::string("\n  ") + command + " ")) << command;
+    for (const char* line :
+         {"\n  ls ROOT ", "\n  info FILE ", "\n  split FILE ", "split: replace"}) {
+        EXPECT_TRUE(said(line)) << line;
     }
+    EXPECT_EQ(run("vrify ."), 1);
+    EXPECT_NE(m_err.find("(did you mean 'verify'?)"), std::string::npos) << m_err;
+    EXPECT_EQ(run("--complete --json info --"), 0);
+    EXPECT_EQ(m_out, "--help\n--json\n--version\n");
 }
 
 }  // namespace

@@ -125,6 +125,25 @@ const char* param_word(ParamKind kind, size_t i) {
     }
 }
 
+Args next_words(const std::string& name, const Args& args) {
+    const Command* const command = find_command(name);
+    Args words;
+    if (!command || args.size() >= command->params->max) {
+        return words;
+    }
+    const ParamKind kind = command->params->kinds[!args.empty()];
+    for (size_t i = 0; const char* word = param_word(kind, i); ++i) {
+        // No name may be given twice, unless it is one of another kind.
+        const bool given = std::any_of(args.begin(), args.end(), [word](const std::string& arg) {
+            return strcasecmp(arg.c_str(), word) == 0;
+        });
+        if (kind != command->params->kinds[0] || !given) {
+            words.push_back(word);
+        }
+    }
+    return words;
+}
+
 namespace {
 
 // Checks one parameter and gives it the spelling of the service.

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "client/RequestTable.h"
+#include "common/CommandLine.h"
 
 class ControlConnection;
 class Output;
@@ -30,8 +31,6 @@ struct ParamForm {
     ParamKind kinds[2];  // of the first, of all others
     const char* fill;    // stands for the last one if it is left out, or null
 };
-
-typedef std::vector<std::string> Args;
 
 struct Command {
     std::string name;
@@ -57,6 +56,9 @@ int default_timeout(const std::string& line);
 
 // Word i that a parameter of that kind may be, as it is sent; null when there is none.
 const char* param_word(ParamKind kind, size_t i);
+
+// The words that the next parameter of the command may be.
+Args next_words(const std::string& command, const Args& args);
 
 // Checks the parameters and turns them into what is sent. False with the reason in words.
 bool check_args(const Command& command, Args* args, std::string* reason);

@@ -1,138 +1,92 @@
 // kestctl: the command-line client of the service's control socket.
-#include <getopt.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 
+#include "common/CommandLine.h"
 #include "kestctl/Commands.h"
 #include "kestctl/ControlConnection.h"
 #include "kestctl/ExitStatus.h"
 #include "kestctl/Output.h"
-#include "kestctl/completion.h"
-#include "kestctl/options.h"
 
 namespace {
 
 // A number of seconds: 0 for no limit, a day at most.
-bool parse_timeout(const char* text, double* timeout) {
+bool parse_timeout(const std::string& text, double* timeout) {
     char* end;
-    *timeout = strtod(text, &end);
-    return *text && strspn(text, "0123456789.") == strlen(text) && *end == '\0' &&
-           *timeout <= 86400;
+    *timeout = strtod(text.c_str(), &end);
+    return !text.empty() && text.find_first_not_of("0123456789.") == std::string::npos &&
+           *end == '\0' && *timeout <= 86400;
 }
 
-void print_help() {
-    printf(
-        "usage: kestctl [options] command [parameters]\n"
-        "Controls the running service kestmodem.\n\nOptions:\n");
-    for (const Option& option : OPTIONS) {
-        const std::string usage =
-            std::string(option.name) + (option.param ? std::string(" ") + option.param : "");
-        printf("  --%-31s %s\n", usage.c_str(), option.help);
-    }
-    printf("\nCommands:\n");
-    for (const Command& command : commands()) {
-        printf("  %-33s %s\n", command.usage().c_str(), command.help);
-    }
-    printf("\nNames of CPs, in any case:");
+std::string help_notes() {
+    std::string notes = "Names of CPs, in any case:";
     for (size_t i = 0; param_word(PK_CP, i); ++i) {
-        printf(" %s", param_word(PK_CP, i));
+        notes += std::string(" ") + param_word(PK_CP, i);
     }
-    printf(
-        "\n\nExit status:\n"
-        "  %2d  done\n  %2d  wrong usage, nothing was sent\n  %2d  no connection\n"
-        "  %2d  no reply in time\n  %2d  unexpected reply, or the connection was closed\n"
-        "  %2d  the result could not be written\n  %2d  enable-log: a CP is not logged all the "
-        "same\n",
-        ES_OK, ES_USAGE, ES_NO_CONNECTION, ES_TIMEOUT, ES_BAD_REPLY, ES_OUTPUT, ES_STILL_OFF);
+    notes += "\n\nExit status:\n";
+    const auto add = [&notes](int status, const std::string& meaning) {
+        notes += (status < 10 ? "   " : "  ") + std::to_string(status) + "  " + meaning + "\n";
+    };
+    add(ES_OK, "done");
+    add(ES_USAGE, "wrong usage; nothing was sent");
+    add(ES_NO_CONNECTION, "no connection");
+    add(ES_TIMEOUT, "no reply in time");
+    add(ES_BAD_REPLY, "unexpected reply, or the connection was closed");
+    add(ES_OUTPUT, "the result could not be written");
+    add(ES_STILL_OFF, "enable-log: a CP is still not logged");
     for (int code = 1; code <= MAX_ERROR_CODE; ++code) {
-        printf("  %2d  error %d: %s\n", ES_SERVICE_ERROR + code, code, error_meaning(code));
+        add(ES_SERVICE_ERROR + code, "error " + std::to_string(code) + ": " + error_meaning(code));
     }
+    return notes;
 }
 
-int usage_error(const Command* command, const std::string& reason) {
-    if (!reason.empty()) {
-        fprintf(stderr, "kestctl: %s\n", reason.c_str());
+Syntax make_syntax() {
+    Syntax syntax = {
+        "kestctl",
+        "command [parameters]",
+        "Controls the running service kestmodem.",
+        {{"json", nullptr, nullptr, "print results and errors as JSON, one object per line"},
+         {"timeout", "SECONDS", nullptr, "wait that long (default 10, save-* 60; 0: no limit)"}},
+        {},
+        help_notes(),
+        next_words,
+    };
+    for (const Command& command : commands()) {
+        syntax.commands.push_back({command.name, command.usage(), command.help});
     }
-    if (command) {
-        fprintf(stderr, "usage: kestctl %s\n", command->usage().c_str());
-    } else {
-        fprintf(stderr, "usage: kestctl [options] command [parameters]; see kestctl --help\n");
-    }
-    return ES_USAGE;
+    return syntax;
 }
 
-int run(int argc, char** argv) {
-    std::vector<struct option> long_options;
-    for (const Option& option : OPTIONS) {
-        long_options.push_back(
-            {option.name, option.param ? required_argument : no_argument, nullptr, option.id});
-    }
-    long_options.push_back({nullptr, 0, nullptr, 0});
-
-    double timeout = -1;
-    bool json = false;
-    bool help = false;
-    for (int opt; (opt = getopt_long(argc, argv, "h", long_options.data(), nullptr)) != -1;) {
-        switch (opt) {
-            case OPT_JSON:
-                json = true;
-                break;
-            case OPT_TIMEOUT:
-                if (!parse_timeout(optarg, &timeout)) {
-                    return usage_error(nullptr, std::string("'") + optarg +
-                                                    "' is no number of seconds up to 86400");
-                }
-                break;
-            case OPT_VERSION:
-                printf("kestctl %s\n", KEST_VERSION);
-                return ES_OK;
-            case OPT_HELP:
-                help = true;
-                break;
-            default:
-                return usage_error(nullptr, "");  // getopt_long has said why
-        }
-    }
-    if (help) {
-        print_help();
-        return ES_OK;
-    }
-    if (optind == argc) {
-        return usage_error(nullptr, "no command given");
-    }
-    const Command* command = find_command(argv[optind]);
-    if (!command) {
-        return usage_error(nullptr, std::string("no command '") + argv[optind] + "'");
-    }
-    Args args(argv + optind + 1, argv + argc);
+int run(const CommandLine& line) {
+    const Command& command = *find_command(line.command());
+    Args args = line.params();
     std::string reason;
-    if (!check_args(*command, &args, &reason)) {
-        return usage_error(command, reason);
+    if (!check_args(command, &args, &reason)) {
+        return line.usage_error(reason);
     }
-    if (timeout < 0) {
-        // The line of raw is a request, too.
-        const bool is_raw = command->request.empty() && !args.empty();
-        timeout = default_timeout(is_raw ? args[0] : command->request);
+    // The line of raw is a request, too.
+    const bool is_raw = command.request.empty() && !args.empty();
+    double timeout = default_timeout(is_raw ? args[0] : command.request);
+    const std::string seconds = line.value("timeout", "");
+    if (line.has("timeout") && !parse_timeout(seconds, &timeout)) {
+        return line.usage_error("'" + seconds + "' is not a number of seconds up to 86400");
     }
-
-    const Output output(json);
+    const Output output(line.has("json"));
     ControlConnection connection;
     const int status = connection.open(timeout);
     if (status != ES_OK) {
         return output.failure(status, connection.failure());
     }
-    return command->run(*command, args, connection, output);
+    return command.run(command, args, connection, output);
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    if (argc > 1 && strcmp(argv[1], COMPLETE_OPTION) == 0) {
-        print_completions(std::vector<std::string>(argv + 2, argv + argc));
-        return ES_OK;
-    }
-    const int status = run(argc, argv);
+    const Syntax syntax = make_syntax();
+    CommandLine line(syntax);
+    const int status = line.parse(argc, argv) ? run(line) : line.status();
     if ((fflush(stdout) != 0 || ferror(stdout)) && status == ES_OK) {
         perror("kestctl: standard output");
         return ES_OUTPUT;

@@ -1,0 +1,221 @@
+#include "common/CommandLine.h"
+
+#include <ctype.h>
+#include <getopt.h>
+#include <stdio.h>
+#include <string.h>
+#include <strings.h>
+
+#include <algorithm>
+
+#include "common/text.h"
+
+namespace {
+
+// As the first argument it asks for what the last of the words that follow may become. For
+// the shells' scripts only, hence not in --help.
+constexpr char COMPLETE_OPTION[] = "--complete";
+
+constexpr Option HELP = {"help", nullptr, nullptr, "print this text"};
+constexpr Option VERSION = {"version", nullptr, nullptr, "print the version"};
+
+std::vector<Option> all_options(const Syntax& syntax) {
+    std::vector<Option> options = {HELP};
+    options.insert(options.end(), syntax.options.begin(), syntax.options.end());
+    options.push_back(VERSION);
+    return options;
+}
+
+std::string option_usage(const Option& option) {
+    return std::string("--") + option.name + (option.param ? std::string(" ") + option.param : "");
+}
+
+// The number of letters to insert, remove or replace to make one word of the other.
+size_t distance(const std::string& a, const std::string& b) {
+    std::vector<size_t> row(b.size() + 1);
+    for (size_t j = 0; j <= b.size(); ++j) {
+        row[j] = j;
+    }
+    for (size_t i = 1; i <= a.size(); ++i) {
+        size_t diagonal = row[0];
+        row[0] = i;
+        for (size_t j = 1; j <= b.size(); ++j) {
+            const size_t replaced = diagonal + (a[i - 1] == b[j - 1] ? 0 : 1);
+            diagonal = row[j];
+            row[j] = std::min({replaced, row[j] + 1, row[j - 1] + 1});
+        }
+    }
+    return row[b.size()];
+}
+
+}  // namespace
+
+bool CommandLine::parse(int argc, char** argv) {
+    if (argc > 1 && strcmp(argv[1], COMPLETE_OPTION) == 0) {
+        print_completions(Args(argv + 2, argv + argc));
+        return end(0);
+    }
+    if (!read_options(argc, argv)) {
+        return false;
+    }
+    if (optind == argc) {
+        return end(usage_error("no command given"));
+    }
+    const std::string name = argv[optind];
+    if (!find_command(name)) {
+        const std::string nearest = nearest_command(name);
+        return end(complain("unknown command '" + name + "'",
+                            nearest.empty() ? "" : " (did you mean '" + nearest + "'?)"));
+    }
+    m_command = name;
+    m_params.assign(argv + optind + 1, argv + argc);
+    for (const Option& option : m_syntax.options) {
+        if (option.command && has(option.name) && name != option.command) {
+            return end(usage_error(std::string("--") + option.name + " is for " + option.command +
+                                   " only"));
+        }
+    }
+    return true;
+}
+
+bool CommandLine::read_options(int argc, char** argv) {
+    const std::vector<Option> options = all_options(m_syntax);
+    std::vector<struct option> known;
+    for (const Option& option : options) {
+        known.push_back({option.name, option.param ? required_argument : no_argument, nullptr, 0});
+    }
+    known.push_back({nullptr, 0, nullptr, 0});
+    int index = 0;
+    for (int opt; (opt = getopt_long(argc, argv, "h", known.data(), &index)) != -1;) {
+        if (opt == '?') {
+            return end(usage_error(""));  // getopt_long has said why
+        }
+        const std::string name = opt == 'h' ? HELP.name : options[static_cast<size_t>(index)].name;
+        if (name == HELP.name) {
+            print_help();
+            return end(0);
+        }
+        if (name == VERSION.name) {
+            printf("%s %s\n", m_syntax.program.c_str(), KEST_VERSION);
+            return end(0);
+        }
+        m_options[name] = optarg ? optarg : "";
+    }
+    return true;
+}
+
+bool CommandLine::end(int status) {
+    m_status = status;
+    return false;
+}
+
+std::string CommandLine::value(const std::string& option, const std::string& otherwise) const {
+    const auto it = m_options.find(option);
+    return it == m_options.end() ? otherwise : it->second;
+}
+
+int CommandLine::complain(const std::string& reason, const std::string& hint) const {
+    const char* const program = m_syntax.program.c_str();
+    if (const Syntax::Command* command = find_command(m_command)) {
+        fprintf(stderr, "%s: %s\nusage: %s %s\n", program, escape_text(reason).c_str(), program,
+                command->usage.c_str());
+        return WRONG_USAGE;
+    }
+    if (!reason.empty()) {
+        fprintf(stderr, "%s: %s; see %s --help%s\n", program, escape_text(reason).c_str(), program,
+                hint.c_str());
+    }
+    fprintf(stderr, "usage: %s [options] %s\n", program, m_syntax.operands.c_str());
+    return WRONG_USAGE;
+}
+
+const Syntax::Command* CommandLine::find_command(const std::string& name) const {
+    for (const Syntax::Command& command : m_syntax.commands) {
+        if (command.name == name) {
+            return &command;
+        }
+    }
+    return nullptr;
+}
+
+// Empty when none is near. ENABLE_LOG, as the service calls it, is near to enable-log.
+std::string CommandLine::nearest_command(const std::string& name) const {
+    std::string typed;
+    for (const char c : name) {
+        typed += c == '_' ? '-' : static_cast<char>(tolower(static_cast<unsigned char>(c)));
+    }
+    std::string nearest;
+    size_t best = (typed.size() + 2) / 3 + 1;
+    for (const Syntax::Command& command : m_syntax.commands) {
+        const size_t letters = distance(typed, command.name);
+        if (letters < best) {
+            best = letters;
+            nearest = command.name;
+        }
+    }
+    return nearest;
+}
+
+void CommandLine::print_help() const {
+    const std::vector<Option> options = all_options(m_syntax);
+    size_t longest = 0;
+    for (const Option& option : options) {
+        longest = std::max(longest, option_usage(option).size());
+    }
+    for (const Syntax::Command& command : m_syntax.commands) {
+        longest = std::max(longest, command.usage.size());
+    }
+    const int width = static_cast<int>(longest);
+    printf("usage: %s [options] %s\n%s\n\nOptions:\n", m_syntax.program.c_str(),
+           m_syntax.operands.c_str(), m_syntax.purpose.c_str());
+    for (const Option& option : options) {
+        printf("  %-*s %s%s%s\n", width, option_usage(option).c_str(),
+               option.command ? option.command : "", option.command ? ": " : "", option.help);
+    }
+    printf("\nCommands:\n");
+    for (const Syntax::Command& command : m_syntax.commands) {
+        printf("  %-*s %s\n", width, command.usage.c_str(), command.help.c_str());
+    }
+    printf("\n%s", m_syntax.notes.c_str());
+}
+
+// The words are those after the program's name; the last is being typed, often empty.
+void CommandLine::print_completions(const Args& words) const {
+    const std::string typed = words.empty() ? "" : words.back();
+    // Case does not matter: neither does it to the names of CPs on a command line.
+    const auto offer = [&typed](const std::string& word) {
+        if (strncasecmp(word.c_str(), typed.c_str(), typed.size()) == 0) {
+            printf("%s\n", word.c_str());
+        }
+    };
+    const std::vector<Option> options = all_options(m_syntax);
+    Args args;  // the command and its parameters, without options
+    for (size_t i = 0; i + 1 < words.size(); ++i) {
+        const bool takes_param = std::any_of(options.begin(), options.end(), [&](const Option& o) {
+            return o.param && words[i] == std::string("--") + o.name;
+        });
+        if (takes_param && ++i + 1 == words.size()) {
+            return;  // the option's parameter is being typed
+        }
+        if (!takes_param && words[i].compare(0, 1, "-") != 0) {
+            args.push_back(words[i]);
+        }
+    }
+    if (typed.compare(0, 1, "-") == 0) {
+        for (const Option& option : options) {
+            if (!option.command || args.empty() || args[0] == option.command) {
+                offer(std::string("--") + option.name);
+            }
+        }
+    } else if (args.empty()) {
+        for (const Syntax::Command& command : m_syntax.commands) {
+            offer(command.name);
+        }
+    } else if (m_syntax.next_words) {
+        const std::string command = args[0];
+        args.erase(args.begin());
+        for (const std::string& word : m_syntax.next_words(command, args)) {
+            offer(word);
+        }
+    }
+}
