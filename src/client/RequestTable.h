@@ -1,5 +1,5 @@
-// The requests of the control socket, one row each. Plain data without the handlers:
-// ClientHandler has to have a handler for each row, kestctl makes its commands, help and
+// The requests of the control socket, one per row. Plain data, without the handlers:
+// ClientHandler must have a handler for each row, kestctl derives its commands, help and
 // completion from the rows, and tests compare the documents with them.
 #ifndef CLIENT_REQUESTTABLE_H_
 #define CLIENT_REQUESTTABLE_H_

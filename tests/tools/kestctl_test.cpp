@@ -320,9 +320,11 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
         {"ENABLE_LOG",
          "unknown command 'ENABLE_LOG'; see kestctl --help (did you mean 'enable-log'?)\n"},
         {"fly", "unknown command 'fly'; see kestctl --help\n"},
+        {"set-sd-max-size 10MB", "'10MB' is not a whole number of megabytes\n"},
+        {"get-log-state WC", "unknown co-processor 'WC'; expected one of: WCDMA, TD, TDD-LTE, "},
     };
     for (const auto& c : WORDS) {
-        EXPECT_EQ(run({c.args}), 1);
+        EXPECT_EQ(run(split(c.args, ' ')), 1);
         EXPECT_EQ(err().find(std::string("kestctl: ") + c.said), 0u) << err();
     }
     struct pollfd pfd = {m_listen, POLLIN, 0};

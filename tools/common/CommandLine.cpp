@@ -12,8 +12,8 @@
 
 namespace {
 
-// As the first argument it asks for what the last of the words that follow may become. For
-// the shells' scripts only, hence not in --help.
+// As the first argument: print the completions of the last word that follows. Used by the
+// completion scripts only, so --help does not list it.
 constexpr char COMPLETE_OPTION[] = "--complete";
 
 constexpr Option HELP = {"help", nullptr, nullptr, "print this text"};
@@ -30,7 +30,7 @@ std::string option_usage(const Option& option) {
     return std::string("--") + option.name + (option.param ? std::string(" ") + option.param : "");
 }
 
-// The number of letters to insert, remove or replace to make one word of the other.
+// The number of letters to insert, remove or replace to turn one word into the other.
 size_t distance(const std::string& a, const std::string& b) {
     std::vector<size_t> row(b.size() + 1);
     for (size_t j = 0; j <= b.size(); ++j) {
@@ -88,7 +88,7 @@ bool CommandLine::read_options(int argc, char** argv) {
     int index = 0;
     for (int opt; (opt = getopt_long(argc, argv, "h", known.data(), &index)) != -1;) {
         if (opt == '?') {
-            return end(usage_error(""));  // getopt_long has said why
+            return end(usage_error(""));  // getopt_long has printed why
         }
         const std::string name = opt == 'h' ? HELP.name : options[static_cast<size_t>(index)].name;
         if (name == HELP.name) {
@@ -138,7 +138,7 @@ const Syntax::Command* CommandLine::find_command(const std::string& name) const 
     return nullptr;
 }
 
-// Empty when none is near. ENABLE_LOG, as the service calls it, is near to enable-log.
+// Empty when none is similar. The service's spelling, ENABLE_LOG, finds enable-log.
 std::string CommandLine::nearest_command(const std::string& name) const {
     std::string typed;
     for (const char c : name) {
@@ -179,10 +179,10 @@ void CommandLine::print_help() const {
     printf("\n%s", m_syntax.notes.c_str());
 }
 
-// The words are those after the program's name; the last is being typed, often empty.
+// words: what follows the program's name; the last one is being typed and may be empty.
 void CommandLine::print_completions(const Args& words) const {
     const std::string typed = words.empty() ? "" : words.back();
-    // Case does not matter: neither does it to the names of CPs on a command line.
+    // Case is ignored, as it is for the names of CPs on a command line.
     const auto offer = [&typed](const std::string& word) {
         if (strncasecmp(word.c_str(), typed.c_str(), typed.size()) == 0) {
             printf("%s\n", word.c_str());

@@ -1,5 +1,5 @@
-// The command line of a tool: options, a command and the command's parameters. What it may
-// hold is described once; --help, completion and the checks come from the description.
+// The command line of a tool: options, a command and its parameters. The tool describes
+// its syntax once; parsing, --help, completion and usage errors follow from that.
 #ifndef COMMON_COMMANDLINE_H_
 #define COMMON_COMMANDLINE_H_
 
@@ -27,35 +27,35 @@ struct Syntax {
     std::string program;
     std::string operands;         // what follows the options
     std::string purpose;          // one line
-    std::vector<Option> options;  // besides --help and --version
+    std::vector<Option> options;  // without --help and --version
     std::vector<Command> commands;
     std::string notes;  // the end of --help
-    // The words that the next parameter may be, after the command and these parameters;
-    // none leave completion to the shell.
+    // The words that may follow the command and these parameters. Null, or no words: the shell
+    // completes file names.
     std::function<Args(const std::string& command, const Args& params)> next_words;
 };
 
 class CommandLine {
 public:
-    // The exit status after wrong usage, that of every tool.
+    // The exit status of every tool after wrong usage.
     static constexpr int WRONG_USAGE = 1;
 
     // The syntax has to outlive the object.
     explicit CommandLine(const Syntax& syntax) : m_syntax(syntax) {}
 
-    // Reads the command line. False when the program ends now with status(): help, version or
-    // completions were asked for and printed, or the usage is wrong.
+    // Reads the command line. False when the program must exit with status(): it has printed
+    // the help, the version or completions, or a usage error.
     bool parse(int argc, char** argv);
     int status() const { return m_status; }
 
     const std::string& command() const { return m_command; }
     const Args& params() const { return m_params; }
-    // Whether the option is there, and its parameter.
+    // Whether the option was given, and its parameter.
     bool has(const std::string& option) const { return m_options.count(option) > 0; }
     std::string value(const std::string& option, const std::string& otherwise) const;
 
-    // Says on standard error what is wrong and how it is right; WRONG_USAGE. An empty reason
-    // has been told already.
+    // Prints the reason and the usage on standard error; returns WRONG_USAGE. An empty reason
+    // has already been printed.
     int usage_error(const std::string& reason) const { return complain(reason, ""); }
 
 private:

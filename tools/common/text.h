@@ -1,5 +1,5 @@
-// Text that came from elsewhere, a service or a medium that anyone may have written to,
-// made harmless for what reads it.
+// Escapes text from an untrusted source (the service, a medium that anyone may have written
+// to) for a terminal or a JSON reader.
 #ifndef COMMON_TEXT_H_
 #define COMMON_TEXT_H_
 

@@ -13,7 +13,7 @@
 namespace {
 
 constexpr int TIMEOUT = 10;
-// The service replies when the CP has delivered the data.
+// For RK_LATER: the CP has to deliver the data first.
 constexpr int SAVE_TIMEOUT = 60;
 
 // clang-format off
@@ -31,7 +31,7 @@ constexpr ParamForm FORMS[] = {
 // clang-format on
 constexpr ParamForm RAW_FORM = {nullptr, "'LINE'", 1, 1, {PK_LINE, PK_LINE}, nullptr};
 
-// The form of a request's parameters, or null.
+// The row for the parameters of a request, or null.
 constexpr const ParamForm* find_form(std::string_view params) {
     for (const ParamForm& form : FORMS) {
         if (params == form.params) {
@@ -51,7 +51,7 @@ constexpr bool all_forms_known() {
 }
 static_assert(all_forms_known(), "a request has parameters that kestctl does not know");
 
-// Of no use on a connection that ends with the reply: watch sends them.
+// Has no command: a subscription ends with the connection. watch sends SUBSCRIBE.
 bool is_subscription(const ControlRequest& request) {
     return find_form(request.params) == find_form("CP DUMP");
 }
@@ -133,7 +133,7 @@ Args next_words(const std::string& name, const Args& args) {
     }
     const ParamKind kind = command->params->kinds[!args.empty()];
     for (size_t i = 0; const char* word = param_word(kind, i); ++i) {
-        // No name may be given twice, unless it is one of another kind.
+        // A name may not be given twice; the I/Q type WCDMA may follow the CP WCDMA.
         const bool given = std::any_of(args.begin(), args.end(), [word](const std::string& arg) {
             return strcasecmp(arg.c_str(), word) == 0;
         });
@@ -146,25 +146,28 @@ Args next_words(const std::string& name, const Args& args) {
 
 namespace {
 
+// Of the kinds that have words.
+constexpr const char* KIND_NAMES[] = {"co-processor", "I/Q type", "medium"};
+
 // Checks one parameter and gives it the spelling of the service.
 bool check_arg(ParamKind kind, std::string* arg, std::string* reason) {
     if (kind == PK_MB) {
-        *reason = "'" + *arg + "' is no number of megabytes";
+        *reason = "'" + *arg + "' is not a whole number of megabytes";
         return is_number(*arg);
     }
     if (kind == PK_LINE) {
-        *reason = "a request is one line of at most " + std::to_string(MAX_REQUEST_LEN) +
-                  " bytes and not blank";
+        *reason = "a request is one non-blank line of at most " + std::to_string(MAX_REQUEST_LEN) +
+                  " bytes";
         return arg->find('\n') == std::string::npos && arg->size() <= MAX_REQUEST_LEN &&
                arg->find_first_not_of(" \t\r") != std::string::npos;
     }
-    *reason = "'" + *arg + "' is none of";
+    *reason = "unknown " + std::string(KIND_NAMES[kind]) + " '" + *arg + "'; expected one of:";
     for (size_t i = 0; const char* word = param_word(kind, i); ++i) {
         if (strcasecmp(word, arg->c_str()) == 0) {
             *arg = word;
             return true;
         }
-        *reason += std::string(" ") + word;
+        *reason += std::string(i == 0 ? " " : ", ") + word;
     }
     return false;
 }
@@ -174,7 +177,7 @@ bool check_arg(ParamKind kind, std::string* arg, std::string* reason) {
 bool check_args(const Command& command, Args* args, std::string* reason) {
     const ParamForm& form = *command.params;
     if (args->size() < form.min || args->size() > form.max) {
-        *reason = args->size() < form.min ? "parameter missing" : "too many parameters";
+        *reason = args->size() < form.min ? "a parameter is missing" : "too many parameters";
         return false;
     }
     for (size_t i = 0; i < args->size(); ++i) {

@@ -1,5 +1,5 @@
-// The commands of kestctl: one for each request of the service's table and a few of its
-// own. Dispatch, --help, completion and the checks of the parameters all come from here.
+// The commands of kestctl: one for each request of the service's table, and status, watch
+// and raw. Dispatch, --help, completion and the parameter checks all use this list.
 #ifndef KESTCTL_COMMANDS_H_
 #define KESTCTL_COMMANDS_H_
 
@@ -17,28 +17,28 @@ class Output;
 // What one parameter may be.
 enum ParamKind : int {
     PK_CP,     // name of a CP
-    PK_IQ,     // name of an I/Q type
-    PK_PLACE,  // place of the mini dumps
+    PK_IQ,     // I/Q type
+    PK_PLACE,  // medium of the mini dumps
     PK_MB,     // number of megabytes
-    PK_LINE,   // a request as it is sent
+    PK_LINE,   // a whole request line
 };
 
 // The parameters of a command.
 struct ParamForm {
-    const char* params;  // of the request, as its table has them; null for kestctl's own
+    const char* params;  // of the request, as in its table; null for raw
     const char* usage;   // on the command line
     size_t min, max;
     ParamKind kinds[2];  // of the first, of all others
-    const char* fill;    // stands for the last one if it is left out, or null
+    const char* fill;    // replaces the last one when it is left out, or null
 };
 
 struct Command {
     std::string name;
-    std::string request;  // what is sent before the parameters; empty when run knows it
+    std::string request;  // what is sent before the parameters; empty for status and raw
     const ParamForm* params;
     ReplyKind reply;
-    // Gets the open connection and the parameters as the service wants them. Returns the
-    // exit status, having printed everything.
+    // Gets the open connection and the parameters in the service's spelling. Prints the
+    // result or what failed, and returns the exit status.
     int (*run)(const Command&, const Args&, ControlConnection&, const Output&);
     const char* help;  // one line
 
@@ -51,16 +51,18 @@ const std::vector<Command>& commands();
 // The command of that name, or null.
 const Command* find_command(const std::string& name);
 
-// How many seconds the line's reply may take by default.
+// The default time-out, in seconds, for the reply to a request line.
 int default_timeout(const std::string& line);
 
-// Word i that a parameter of that kind may be, as it is sent; null when there is none.
+// The i-th word that a parameter of that kind may be, in the service's spelling; null after the
+// last, and for kinds that are not words.
 const char* param_word(ParamKind kind, size_t i);
 
-// The words that the next parameter of the command may be.
+// The words that may follow the command and these parameters.
 Args next_words(const std::string& command, const Args& args);
 
-// Checks the parameters and turns them into what is sent. False with the reason in words.
+// Checks the parameters and gives them the service's spelling. False, with a reason for the
+// user, when one is wrong.
 bool check_args(const Command& command, Args* args, std::string* reason);
 
 #endif  // KESTCTL_COMMANDS_H_

@@ -16,10 +16,10 @@
 
 namespace {
 
-// How often a connection is tried again while the service's queue is full.
+// The time between attempts to connect while the service's queue is full.
 const int CONNECT_RETRY_MS = 50;
 
-// As it is addressed: on a host the root is a part of it.
+// The full name of the socket: on a host the root is part of it.
 std::string socket_name() {
     const std::string root = system_path("").string();
     return root.empty() ? SOCKET_CONTROL : SOCKET_CONTROL "@" + root;
@@ -48,7 +48,7 @@ int ControlConnection::open(double timeout) {
                                               socket_name() + " (" + strerror(errno) +
                                               "): is the service running?");
         }
-        // The queue of waiting clients is full, which poll cannot wait for.
+        // The queue of waiting clients is full; poll cannot wait for room in it.
         const int status = wait_for(-1, 0, CONNECT_RETRY_MS);
         if (status != ES_OK) {
             return status;
@@ -137,7 +137,7 @@ int ControlConnection::wait_for(int fd, short events, int max_ms) {
         if (left_ms <= 0) {
             return timed_out();
         }
-        // One more, so that the deadline is over when poll says so.
+        // Rounded up, so that the deadline has passed when poll times out.
         wait_ms = std::min(max_ms, static_cast<int>(std::min(left_ms, INT_MAX / 2.0)) + 1);
     }
     struct pollfd pfd = {fd, events, 0};
@@ -145,7 +145,7 @@ int ControlConnection::wait_for(int fd, short events, int max_ms) {
     if (n < 0 && errno != EINTR) {
         return fail(ES_NO_CONNECTION, std::string("poll: ") + strerror(errno));
     }
-    // What happened, or did not, the caller finds out when it tries again.
+    // Whether it is ready now the caller finds out by trying again.
     return ES_OK;
 }
 
@@ -163,7 +163,7 @@ int ControlConnection::closed() {
 int ControlConnection::timed_out() {
     char words[160];
     snprintf(words, sizeof(words), "no reply within %g s%s", m_timeout,
-             m_waits_in_queue ? ": the service is busy, or it serves three clients already, "
+             m_waits_in_queue ? ": the service is busy, or it already serves three clients, "
                                 "which is its limit, and this one has to wait"
                               : "");
     return fail(ES_TIMEOUT, words);

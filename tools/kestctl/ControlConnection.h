@@ -1,7 +1,7 @@
-// One connection to the service's control socket: sends request lines and separates the
-// reply of each from the notifications that may arrive at any time. All waiting ends at a
-// common deadline. Operations return an ExitStatus; after one that is not ES_OK,
-// failure() says in words what happened and the connection is of no further use.
+// A connection to the service's control socket: sends request lines and separates their
+// replies from the notifications, which may arrive at any time. One deadline limits all
+// waiting. Operations return an ExitStatus; after one that is not ES_OK, failure()
+// describes the error and the connection must not be used any more.
 #ifndef KESTCTL_CONTROLCONNECTION_H_
 #define KESTCTL_CONTROLCONNECTION_H_
 
@@ -14,7 +14,7 @@
 
 class ControlConnection {
 public:
-    // The longest line that is accepted from the service, well above what it sends.
+    // The longest line accepted from the service; it sends much shorter ones.
     static constexpr size_t MAX_LINE = 256;
 
     typedef std::function<void(const Notification&)> NotificationFn;
@@ -24,29 +24,29 @@ public:
     ControlConnection(const ControlConnection&) = delete;
     ControlConnection& operator=(const ControlConnection&) = delete;
 
-    // Gets the notifications; without one they are dropped.
+    // Receives the notifications. Without a listener they are dropped.
     void set_listener(NotificationFn listener) { m_listener = std::move(listener); }
 
-    // Connects. The time-out in seconds, 0 for none, starts here and counts for everything.
+    // Connects. The time-out, in seconds and 0 for none, starts here and covers all operations.
     int open(double timeout);
 
-    // From now on there is no deadline.
+    // Removes the deadline.
     void wait_without_limit() { m_timeout = 0; }
 
-    // Sends the request and stores the line that answers it, without its line feed.
+    // Sends the request and stores the reply line without its line feed.
     int request(const std::string& line, std::string* reply);
 
-    // Waits for notifications until the connection ends; only then it returns.
+    // Waits for notifications; returns only when the connection ends.
     int listen();
 
     const std::string& failure() const { return m_failure; }
 
 private:
     int send_line(const std::string& line);
-    // The next line that is no notification; these go to the listener.
+    // The next line that is not a notification. Notifications go to the listener.
     int read_reply(std::string* line);
     int read_line(std::string* line);
-    // Waits for the poll events, on no descriptor just for the given time.
+    // Waits for the poll events; without a descriptor (-1), for the given time.
     int wait_for(int fd, short events, int max_ms);
     int fail(int status, const std::string& words);
     int closed();

@@ -14,24 +14,24 @@ const char ERROR[] = "ERROR ";
 const char DUMP_START[] = "CP_DUMP_START ";
 const char DUMP_END[] = "CP_DUMP_END ";
 
-// Codes above leave no room among the exit statuses that shells use themselves.
+// With a larger one the exit status could be one that shells use themselves.
 const long MAX_CODE = 99;
 
 // Indexed by the code.
 const char* const MEANINGS[MAX_ERROR_CODE + 1] = {
     "OK",
     "the service does not know the request",
-    "a parameter is missing, wrong or too much, or the CP has no log channel",
+    "a parameter is missing, malformed, unknown or unexpected, or the CP has no log channel",
     "the operation failed",
     "the service is busy: a dump or another request is running",
     "logging of that CP is disabled",
     "the CP does not support sleep log retrieval",
     "the CP does not support ring buffer retrieval",
     "the CP is not working",
-    "the service does not know a CP of that name",
+    "not the name of a CP",
 };
 
-// Stores what follows the prefix; false without the prefix or with nothing behind it.
+// Stores what follows the prefix; false when the prefix or the text after it is missing.
 bool after(const std::string& line, const char* prefix, std::string* rest) {
     const size_t len = strlen(prefix);
     if (line.size() <= len || line.compare(0, len, prefix) != 0) {

@@ -1,5 +1,5 @@
-// The lines that the service sends, taken apart. They are not trusted: whatever does not
-// look exactly like a reply or a notification is neither.
+// Parsers for the lines that the service sends. The service is not trusted: a line that is
+// not exactly a reply or a notification is rejected.
 #ifndef KESTCTL_REPLY_H_
 #define KESTCTL_REPLY_H_
 
@@ -7,13 +7,13 @@
 
 struct Reply {
     int code = 0;       // 0: OK, otherwise the code of an error reply
-    std::string value;  // what follows OK; empty without a value
+    std::string value;  // what follows OK, or empty
 };
 
 // "OK", "OK <value>" or "ERROR <code>", without the line feed. False for anything else.
 bool parse_reply(const std::string& line, Reply* reply);
 
-// A line on the start or the end of a CP's memory dump.
+// A line that says that the memory dump of a CP has started or ended.
 struct Notification {
     bool start = false;
     std::string cp;

@@ -54,7 +54,7 @@ void FileSettings::take_iq(const char* rest) {
     while (next_token(token.end(), token)) {
         const int type = LogConfig::iq_type_from_name(token.text, token.len);
         if (type < 0) {
-            return;  // one wrong word spoils the line
+            return;  // one unknown word makes the whole line invalid
         }
         (type == LogConfig::IQ_GSM ? gsm : wcdma) = true;
     }

@@ -1,6 +1,6 @@
-// The settings that no request tells, from the settings file of the service. The file is
-// only read: it is never made, copied or mended, and what the service would complain of
-// is passed over without a word.
+// The settings that no request returns, read from the settings file of the service. The
+// file is never created, copied or repaired, and lines that the service would report are
+// ignored silently.
 #ifndef KESTCTL_SETTINGSFILE_H_
 #define KESTCTL_SETTINGSFILE_H_
 
@@ -10,11 +10,11 @@
 
 struct FileSettings {
     bool md = false;              // a mini dump is saved when a CP crashes
-    std::string iq[CP_TYPE_NUM];  // I/Q types of each CP, "GSM WCDMA"; empty without any
+    std::string iq[CP_TYPE_NUM];  // I/Q types of each CP, "GSM WCDMA"; empty when there are none
 
-    // Reads the file in the service's place, below KESTMODEM_ROOT. A line counts as it
-    // does for the service, a setting without one has its default. False, with the reason
-    // in words, when the file cannot be read to its end; the settings are unknown then.
+    // Reads the service's file below KESTMODEM_ROOT, by the service's rules: a setting
+    // without a line has its default. False, with a reason for the user, when the file
+    // cannot be read to its end; the settings are unknown then.
     bool read(std::string* reason);
 
 private:

@@ -12,7 +12,7 @@
 
 namespace {
 
-// What a setting is shown as that could not be found out.
+// Shown for a setting that could not be read.
 const char UNKNOWN[] = "UNKNOWN";
 
 bool fits(ReplyKind kind, const std::string& value) {
@@ -46,8 +46,8 @@ int ask(const Command& command, const Args& args, ControlConnection& connection,
     return reply.code == 0 ? static_cast<int>(ES_OK) : output.error_reply(reply.code);
 }
 
-// Whatever is printed is flushed at once, so nothing is lost. A result that nobody can
-// read any more must not keep the program either.
+// Every line is flushed when it is printed, so nothing is lost. Not exit(): it would flush
+// once more, and block when nobody reads the output.
 extern "C" void end_watch(int) {
     _exit(ES_OK);
 }
@@ -80,8 +80,8 @@ int run_enable_log(const Command& command, const Args& args, ControlConnection& 
     }
     if (!off.empty()) {
         return output.failure(ES_STILL_OFF, "still off:" + off +
-                                                " (no device of it is known, or no stream line of "
-                                                "it was in the settings when the service started)");
+                                                " (the device is unknown, or the settings had no "
+                                                "stream line for it when the service started)");
     }
     output.ok();
     return ES_OK;

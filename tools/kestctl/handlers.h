@@ -1,4 +1,4 @@
-// What the commands do once the connection is open: the functions of the command table.
+// What the commands do once the connection is open: Command::run.
 #ifndef KESTCTL_HANDLERS_H_
 #define KESTCTL_HANDLERS_H_
 
@@ -8,13 +8,13 @@
 int run_request(const Command& command, const Args& args, ControlConnection& connection,
                 const Output& output);
 
-// As run_request, and asks afterwards whether the CPs are logged now: the service answers
-// OK also for one that it cannot log.
+// As run_request, then asks whether the CPs are logged now: the service also answers OK for
+// a CP that it cannot log.
 int run_enable_log(const Command& command, const Args& args, ControlConnection& connection,
                    const Output& output);
 
-// Asks every parameterless getter of the table and the log state of every CP. What no
-// request tells comes from the settings file; UNKNOWN when that cannot be read.
+// Asks for every setting and for the log state of every CP. What no request returns is
+// read from the settings file, and shown as UNKNOWN when that cannot be read.
 int run_status(const Command& command, const Args& args, ControlConnection& connection,
                const Output& output);
 
@@ -22,7 +22,7 @@ int run_status(const Command& command, const Args& args, ControlConnection& conn
 int run_watch(const Command& command, const Args& args, ControlConnection& connection,
               const Output& output);
 
-// Sends the line and prints what comes back as it is.
+// Sends the line unchanged and prints the reply unchanged.
 int run_raw(const Command& command, const Args& args, ControlConnection& connection,
             const Output& output);
 

@@ -11,7 +11,7 @@
 
 namespace {
 
-// A number of seconds: 0 for no limit, a day at most.
+// A number of seconds, at most a day; 0 means no limit.
 bool parse_timeout(const std::string& text, double* timeout) {
     char* end;
     *timeout = strtod(text.c_str(), &end);
@@ -65,7 +65,7 @@ int run(const CommandLine& line) {
     if (!check_args(command, &args, &reason)) {
         return line.usage_error(reason);
     }
-    // The line of raw is a request, too.
+    // The parameter of raw is a request, too.
     const bool is_raw = command.request.empty() && !args.empty();
     double timeout = default_timeout(is_raw ? args[0] : command.request);
     const std::string seconds = line.value("timeout", "");

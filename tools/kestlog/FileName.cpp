@@ -14,7 +14,7 @@ struct Form {
     LogType type;
     const char* kind;
     const char* head;  // before the time
-    const char* tail;  // behind it
+    const char* tail;  // after it
     bool cp;           // the CP's name stands before the head
     bool stamp;
 };
@@ -40,7 +40,7 @@ bool in_calendar(const LogTime& t) {
            t.minute <= 59 && t.second <= 60;
 }
 
-// A time in the form of file names, read by the parser of log names.
+// Parses a time as it stands in file names.
 bool parse_stamp(const std::string& text, LogTime* time) {
     const std::string name = "0-" + text;
     return parse_log_name(name.data(), name.size(), *time) == LT_LOG;
@@ -55,7 +55,7 @@ bool cut_tail(std::string* text, const std::string& tail) {
     return true;
 }
 
-// Takes the rotation number off the front.
+// Removes the rotation number from the start.
 bool cut_number(std::string* text, uint32_t* number) {
     size_t digits;
     if (parse_log_number(android::String8(text->c_str()), *number, digits) < 0) {
@@ -66,7 +66,7 @@ bool cut_number(std::string* text, uint32_t* number) {
     return exact;
 }
 
-// Takes the time off the end.
+// Removes the time from the end.
 bool cut_stamp(std::string* text, LogTime* time) {
     const std::string last = text->substr(text->size() - std::min(text->size(), STAMP_LEN));
     if (!parse_stamp(last, time) || !in_calendar(*time) || time->file_stamp() != last.c_str()) {
@@ -76,7 +76,7 @@ bool cut_stamp(std::string* text, LogTime* time) {
     return true;
 }
 
-// Takes the "-N" off the end: of a file that was set aside for a younger namesake.
+// Removes the "-N" of a file that was set aside for a newer namesake from the end.
 bool cut_aside(std::string* text) {
     const size_t dash = text->find_last_not_of("0123456789");
     if (dash == std::string::npos || (*text)[dash] != '-' || dash + 1 == text->size() ||

@@ -1,6 +1,6 @@
-// What the name of a file of the log tree tells. The service's own parsers take a name
-// for what it may be, here it has to be exactly one that the service gives: any other
-// name tells nothing.
+// What the name of a file in the log tree says about the file. The service's own parsers
+// are lenient; here a name must be exactly one that the service creates, and any other
+// name says nothing.
 #ifndef KESTLOG_FILENAME_H_
 #define KESTLOG_FILENAME_H_
 
@@ -15,16 +15,16 @@ constexpr char DIGEST_NAME[] = "sha1.txt";
 struct FileName {
     explicit FileName(const std::string& name);
 
-    // A modem's log files begin with a time record, its dump consists of frames.
+    // A modem's log files begin with a time record, and its dump consists of frames.
     bool of_modem() const { return cp_type >= CT_WCDMA && cp_type <= CT_5MODE; }
     bool is_log() const { return type == LT_LOG; }
 
     std::string text;
-    bool exact = false;  // the name is one that the service gives
-    bool aside = false;  // with the "-N" of one that was set aside for a namesake
+    bool exact = false;  // the name is one that the service creates
+    bool aside = false;  // has the "-N" of a file that was set aside for a namesake
     LogType type = LT_UNKNOWN;
     const char* kind = "unknown";  // in words; a memory dump and its substitute differ
-    bool framed_dump = false;      // a memory dump as it came over the diag device
+    bool framed_dump = false;      // a memory dump as received over the diag device
     std::string cp;                // name in it, or ""
     CpType cp_type = CT_UNKNOWN;
     uint32_t number = 0;  // of a log file
@@ -35,10 +35,10 @@ bool has_time(const LogTime& time);
 // "2016-03-01 09:15:00", or "-" without a time.
 std::string time_text(const LogTime& time);
 
-// What a PC leaves on every card, files and directories.
+// Whether it is a file or directory that a PC leaves on every card.
 bool is_foreign_name(const std::string& name);
 
-// Is the name that of a set directory? Stores its time.
+// Whether it is the name of a set directory; stores its time.
 bool parse_set_name(const std::string& name, LogTime* time);
 
 CpType cp_type_of(const std::string& cp);

@@ -15,7 +15,7 @@ const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
 
 namespace {
 
-// A dump that was written to so short a time ago may still be coming in.
+// A dump whose last write is more recent than this may still be in progress.
 constexpr time_t DUMP_IDLE_SECONDS = 10;
 
 bool begins_with_magic(const uint8_t* data, size_t len) {
@@ -33,7 +33,7 @@ int chunk_kind(const DspChunkHeader& header) {
     return -1;
 }
 
-// What is wrong with a chunk's header, or null; stores the length of the chunk's data.
+// The wrong field of a chunk's header, or null; stores the length of the chunk's data.
 const char* chunk_fault(const DspChunkHeader& header, size_t* data_len) {
     const uint16_t least = make_dsp_chunk_header(0, 0, 0).len;
     *data_len = header.len >= least ? static_cast<size_t>(header.len - least) : 0;
@@ -93,7 +93,7 @@ private:
 
     void check_version() {
         if (m_in.size() >= PROPERTY_VALUE_MAX) {
-            m_report.add(true, "version", "a version record is not that long");
+            m_report.add(true, "version", "the version record is too long");
         }
     }
 
@@ -108,7 +108,7 @@ private:
         }
     }
 
-    // Any log may begin with a time record, a modem's should.
+    // Any log may begin with a time record; a modem's log should.
     void take_record() {
         size_t got;
         const uint8_t* data = m_in.peek(sizeof(TimeSyncRecord), got);
@@ -152,7 +152,7 @@ private:
                 m_report.other -= std::min(m_report.other, size);
             } else {
                 first_broken = m_report.broken++ ? first_broken : end - size;
-                // The flag that ended what is no frame may well begin one.
+                // The flag that ended these bytes may begin a frame.
                 m_parser.init();
                 --used;
             }
@@ -171,7 +171,8 @@ private:
         }
         if (!m_report.end_marker) {
             const bool recent = time(nullptr) - m_in.modified() < DUMP_IDLE_SECONDS;
-            m_report.add(!recent, "end", recent ? "the dump is going on" : "the dump has no end");
+            m_report.add(!recent, "end",
+                         recent ? "dump still in progress" : "the dump has no end marker");
         }
     }
 
@@ -216,15 +217,14 @@ private:
                 if (memcmp(data, header.flags, std::min(got, sizeof(header.flags))) == 0) {
                     cut_off(got);
                 } else {
-                    m_report.add(true, "chunk", "what follows is no chunk", here());
+                    m_report.add(true, "chunk", "data after the last chunk is not a chunk", here());
                     m_report.other += got;
                 }
                 return;
             }
             memcpy(&header, data, sizeof(header));
             if (const char* fault = chunk_fault(header, &len)) {
-                m_report.add(true, "chunk", std::string("chunk header with a wrong ") + fault,
-                             here());
+                m_report.add(true, "chunk", std::string("wrong chunk header: ") + fault, here());
                 find_chunk();
                 continue;
             }
@@ -235,8 +235,8 @@ private:
             if (follows && header.seq_num != next_seq) {
                 ++m_report.sequence_gaps;
                 m_report.add(false, "sequence",
-                             "chunk " + std::to_string(header.seq_num) + " follows where " +
-                                 std::to_string(next_seq) + " should",
+                             "chunk " + std::to_string(header.seq_num) + " where " +
+                                 std::to_string(next_seq) + " was expected",
                              here());
             }
             follows = true;
@@ -255,7 +255,7 @@ private:
                                       header.sub_type, data, len, true, CHUNK_KINDS[kind]});
     }
 
-    // The newest file of a CP may be one that is being written.
+    // The newest file of a CP may still be written to.
     void cut_off(size_t left) {
         const bool newest = m_name.is_log() && m_name.number == 0;
         m_report.add(!newest, "cut",
@@ -263,7 +263,7 @@ private:
         m_report.other += left;
     }
 
-    // Goes on to the next good header, or to the end.
+    // Skips to the next valid header, or to the end.
     void find_chunk() {
         DspChunkHeader header;
         size_t len;

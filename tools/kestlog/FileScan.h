@@ -1,6 +1,6 @@
-// The content of one file: its time record, its frames or its audio DSP chunks, and what
-// is wrong with it. A CP's log may hold anything, so bytes that are no frame are counted
-// but no damage; an audio DSP log is chunks and nothing else.
+// The content of one file: its time record, its frames or audio DSP chunks, and its damage.
+// A CP's log may hold anything, so bytes outside frames are counted but are not damage. An
+// audio DSP log must consist of chunks only.
 #ifndef KESTLOG_FILESCAN_H_
 #define KESTLOG_FILESCAN_H_
 
@@ -13,7 +13,7 @@
 #include "kestlog/LogReader.h"
 
 struct Finding {
-    bool damage;  // or only a note
+    bool damage;  // false: only a note
     const char* code;
     std::string words;
     int64_t offset;  // in the file; -1 without one
@@ -23,12 +23,12 @@ struct Finding {
 struct Piece {
     uint64_t offset;
     uint32_t seq_num;
-    size_t len_field;  // what the header says of the header and data
+    size_t len_field;  // the length in the header
     uint8_t type;
     uint8_t sub_type;
     const uint8_t* data;  // behind the header
     size_t data_len;
-    bool intact;       // the header's length is the right one
+    bool intact;       // that length is right
     const char* kind;  // of a chunk, else null
 };
 
@@ -41,9 +41,9 @@ struct FileReport {
     bool has_record = false;
     TimeSyncRecord record{};
     uint64_t frames = 0;   // intact
-    uint64_t broken = 0;   // bytes between flags whose length is another
+    uint64_t broken = 0;   // bytes between flags with another length in their header
     uint64_t payload = 0;  // of intact frames or chunks, without headers
-    uint64_t other = 0;    // bytes that belong to no intact frame or chunk
+    uint64_t other = 0;    // bytes outside intact frames and chunks
     bool end_marker = false;
     struct {
         uint64_t count = 0;
@@ -58,13 +58,14 @@ struct FileReport {
     void add(bool damage, const char* code, const std::string& words, int64_t offset = -1);
 };
 
-// Is the content chunks? By the file's name; under a foreign one, by the first header.
+// Whether the content is chunks: decided by the file's name or, if that says nothing, by the
+// first header.
 bool is_chunked(LogReader& in, const FileName& name);
 
-// Sees every piece in order; false ends the scan. May be null.
+// Called for every piece in order; returns false to end the scan. May be null.
 typedef std::function<bool(const Piece&)> PieceVisitor;
 
-// Reads the open file as far as its content has a form; in.error() tells a read error.
+// Scans the open file. in.error() is set after a read error.
 void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report);
 
 #endif  // KESTLOG_FILESCAN_H_

@@ -15,7 +15,7 @@ LogReader::~LogReader() {
 }
 
 bool LogReader::open(const std::string& path, bool follow) {
-    // Non-blocking: to open a FIFO must not wait for its writer.
+    // Non-blocking: opening a FIFO must not wait for a writer.
     m_fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (follow ? 0 : O_NOFOLLOW));
     struct stat st;
     if (m_fd < 0 || fstat(m_fd, &st) < 0) {

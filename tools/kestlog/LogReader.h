@@ -1,6 +1,5 @@
-// Reads a file front to back through a window of fixed size, however large the file is.
-// What the file held when it was opened is all that is read, so that one that is being
-// written comes to an end.
+// Reads a file of any size from start to end through a window of fixed size. Reads no further
+// than the size at opening, so that it also ends on a file that is being written.
 #ifndef KESTLOG_LOGREADER_H_
 #define KESTLOG_LOGREADER_H_
 
@@ -13,7 +12,7 @@
 
 class LogReader {
 public:
-    // More than any frame or chunk takes.
+    // Larger than any frame or chunk.
     static constexpr size_t WINDOW = 256 * 1024;
 
     LogReader() = default;
@@ -21,7 +20,7 @@ public:
     LogReader(const LogReader&) = delete;
     LogReader& operator=(const LogReader&) = delete;
 
-    // Opens a regular file; a link only with follow. False with errno.
+    // Opens a regular file. Follows a link only when follow is true. False, with errno, on failure.
     bool open(const std::string& path, bool follow);
 
     uint64_t size() const { return m_size; }
@@ -29,10 +28,10 @@ public:
     uint64_t offset() const { return m_offset; }  // of the next byte
     int error() const { return m_error; }         // errno of a failed read, else 0
 
-    // All bytes in the window, at least want of them unless the file ends before; want
-    // is at most WINDOW. Valid until the next call.
+    // All bytes in the window: at least want (at most WINDOW), unless the file ends before.
+    // Valid until the next call.
     const uint8_t* peek(size_t want, size_t& got);
-    // Passes over n bytes of the window.
+    // Skips n bytes of the window.
     void skip(size_t n);
 
 private:

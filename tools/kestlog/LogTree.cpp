@@ -75,7 +75,7 @@ bool LogTree::read(const std::string& path) {
         return true;
     }
     foreign.clear();  // the directory is read again below
-    // The directory's own name tells what it is; of a copy, that of what lies in it.
+    // The directory's own name shows what it is or, in a renamed copy, the names inside it.
     const std::string name = base_name(path);
     LogTime time;
     const auto any = [&entries](bool (*test)(const Entry&)) {

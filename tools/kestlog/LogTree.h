@@ -1,5 +1,5 @@
-// The directories of a log tree: log roots with their sets, these with their CP
-// directories, these with their files. Links are listed as strays, never followed.
+// The directories of a log tree: log roots contain sets, sets contain CP directories, and
+// those contain files. Links are listed as strays and never followed.
 #ifndef KESTLOG_LOGTREE_H_
 #define KESTLOG_LOGTREE_H_
 
@@ -27,13 +27,13 @@ struct TreeSet {
 };
 
 struct LogTree {
-    // Reads what is found at path: a medium's top directory, a log root, a set or a CP
-    // directory. False when it is none of them; what could not be read is in failures.
+    // Reads the directory at path: a medium's top directory, a log root, a set or a CP
+    // directory. False when it is not one of them. What cannot be read goes to failures.
     bool read(const std::string& path);
 
     std::vector<TreeFile> root_files;  // in the log roots themselves
     std::vector<TreeSet> sets;         // oldest first
-    std::vector<std::string> strays;   // paths of what does not belong where it is
+    std::vector<std::string> strays;   // paths of what does not belong there
     std::vector<std::string> foreign;  // paths of what a PC left there
     std::vector<std::string> failures;
 
@@ -45,8 +45,8 @@ private:
         uint64_t size;
     };
 
-    // The entries of a directory by name, without foreign ones. False, with a failure, when
-    // it cannot be read.
+    // Lists a directory by name, without foreign entries. False, with an entry in failures,
+    // when it cannot be read.
     bool list_dir(const std::string& path, std::vector<Entry>* entries);
     void read_root(const std::string& path);
     void read_set(const std::string& path, const std::string& name);

@@ -1,5 +1,5 @@
-// What kestlog prints: lines for people and objects for --json. Names and contents come
-// from a medium that anyone may have written to: they are escaped in both.
+// The output of kestlog: text, or objects with --json. Names and contents come from a medium
+// that anyone may have written to, so both are escaped.
 #ifndef KESTLOG_REPORT_H_
 #define KESTLOG_REPORT_H_
 
@@ -23,16 +23,16 @@ Json finding_json(const Finding& finding);
 // "damage: words (at byte 12)".
 std::string finding_text(const Finding& finding);
 
-// Says on standard error what failed; returns the status.
+// Prints on standard error what failed; returns the status.
 int failure(int status, const std::string& words);
 
-// Opens the file that a command is about. 0 or the exit status, having said why.
+// Opens the input file of a command. 0, or the exit status after printing the reason.
 int open_input(LogReader& in, const std::string& path);
 
-// Says on standard error what damage there is.
+// Prints the damage on standard error.
 void tell_damage(const std::string& path, const FileReport& report);
 
-// The exit status after the scan, having said whether the file could not be read.
+// The exit status after the scan; prints a read error.
 int scan_status(const LogReader& in, const std::string& path, const FileReport& report);
 
 std::string file_part(const std::string& path);  // what follows the last "/"

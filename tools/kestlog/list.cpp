@@ -76,7 +76,7 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
 int run_ls(const std::string& path, const Settings& settings) {
     LogTree tree;
     if (!tree.read(path)) {
-        return failure(ES_UNREADABLE, path + ": no log tree");
+        return failure(ES_UNREADABLE, path + ": not a log tree");
     }
     for (const TreeFile& file : tree.root_files) {
         print_file(settings.json, nullptr, nullptr, file);

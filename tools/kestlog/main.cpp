@@ -42,7 +42,7 @@ Syntax make_syntax() {
         "  1  wrong usage\n"
         "  2  something could not be read\n"
         "  3  damage found\n"
-        "  4  the output could not be written, or it exists\n",
+        "  4  the output could not be written, or already exists\n",
         nullptr,
     };
     for (const Command& command : COMMANDS) {

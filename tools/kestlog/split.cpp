@@ -20,7 +20,7 @@ struct Part {
     FILE* file = nullptr;
 
     bool open(bool force) {
-        // Replaced, not written into: an old file may be a link to anything.
+        // Deleted first, not overwritten: an old file may be a link to anything.
         if (force && unlink(path.c_str()) < 0 && errno != ENOENT) {
             return false;
         }
@@ -43,7 +43,7 @@ int give_up(Part (&parts)[CK_NUM], const Part& failed, int error) {
         }
     }
     return failure(ES_OUTPUT, failed.path + ": " + strerror(error) +
-                                  (error == EEXIST ? "; --force replaces it" : ""));
+                                  (error == EEXIST ? "; use --force to replace it" : ""));
 }
 
 int kind_index(const char* kind) {
@@ -93,7 +93,7 @@ int run_split(const std::string& path, const Settings& settings) {
         stem.resize(stem.size() - 4);
     }
     if (!is_chunked(in, name)) {
-        return failure(ES_UNREADABLE, path + ": no log of the audio DSP");
+        return failure(ES_UNREADABLE, path + ": not a log of the audio DSP");
     }
     Part parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {

@@ -76,7 +76,7 @@ private:
         failure(ES_UNREADABLE, words);
     }
 
-    // In each log root, the database and its digest come together.
+    // In each log root the database and its digest must both be there, or neither.
     void parsing_database(const std::vector<TreeFile>& files) {
         for (const TreeFile& file : files) {
             const std::string dir = file.path.substr(0, file.path.rfind('/') + 1);
@@ -94,14 +94,14 @@ private:
         for (const TreeFile& file : cp.files) {
             const FileName& name = file.name;
             if (name.type == LT_UNKNOWN) {
-                find(file.path, {true, "name", "no name that the service gives", -1});
+                find(file.path, {true, "name", "not a file name the service creates", -1});
             } else if (type != CT_UNKNOWN && name.cp_type != CT_UNKNOWN && name.cp_type != type) {
-                find(file.path, {true, "name", "the name of another CP", -1});
+                find(file.path, {true, "name", "the name belongs to another CP", -1});
             }
         }
     }
 
-    // The newest log file is number 0, every older one has the next number.
+    // The newest log file has number 0, and each older one the next number.
     void numbers(const TreeCp& cp) {
         std::vector<const TreeFile*> logs;
         for (const TreeFile& file : cp.files) {
@@ -121,11 +121,11 @@ private:
                 const bool damage = !log->name.aside && !newer->name.aside;
                 find(log->path, {damage, "double", "two log files with this number", -1});
             } else if (number != due) {
-                // Trimming may take the file that has just been closed.
+                // Trimming may delete the file that has just been closed.
                 find(log->path, {false, "gap", missing(due, number - 1), -1});
             }
             if (newer && newer->name.number < number && newer->name.time < log->name.time) {
-                find(log->path, {false, "order", "newer than a log file of a lower number", -1});
+                find(log->path, {false, "order", "newer than a log file with a lower number", -1});
             }
             due = static_cast<uint64_t>(number) + 1;
             newer = log;
@@ -143,7 +143,7 @@ private:
         LogReader in;
         if (!in.open(file.path, false)) {
             if (errno == ENOENT) {
-                // The service goes on renaming and trimming meanwhile.
+                // The service may rename and trim files while they are checked.
                 find(file.path,
                      {false, "gone", "gone or renamed since the directory was read", -1});
             } else {
@@ -177,7 +177,7 @@ private:
 int run_verify(const std::string& path, const Settings& settings) {
     LogTree tree;
     if (!tree.read(path)) {
-        return failure(ES_UNREADABLE, path + ": no log tree");
+        return failure(ES_UNREADABLE, path + ": not a log tree");
     }
     Verifier verifier(settings.json);
     verifier.tree(tree);
