@@ -21,9 +21,24 @@ namespace {
 constexpr char DB_FILE_NAME[] = "/modem_db.gz";
 constexpr char SHA1_FILE_NAME[] = "/sha1.txt";
 constexpr size_t IMAGE_PATH_SIZE = 128;
-// An image has a handful of entries; a table that goes on for longer is garbage.
-constexpr int MAX_ENTRIES = 1024;
 constexpr size_t COPY_SIZE = 32768;
+
+// What is said of a fault; the formats take its two numbers. Nothing is said of an image
+// that merely has no database.
+struct FaultMessage {
+    ModemImageFault::Kind kind;
+    const char* format;
+};
+constexpr FaultMessage FAULT_MESSAGES[] = {
+    {ModemImageFault::TOO_SHORT, "MODEM image length less than two headers"},
+    {ModemImageFault::WRONG_MAGIC, "MODEM image not VHX1 format"},
+    {ModemImageFault::TOO_MANY_ENTRIES, "MODEM image has more than %lld headers"},
+    {ModemImageFault::ENTRY_CUT, "can not read more headers %lld"},
+    {ModemImageFault::NO_SHA1, "MODEM image has no SHA-1 checksum"},
+    {ModemImageFault::SEEK_FAILED, "lseek MODEM image error"},
+    {ModemImageFault::SHA1_CUT, "read SHA-1 error %lld"},
+    {ModemImageFault::OUTSIDE, "MODEM image entry at %lld size %lld is not within the image"},
+};
 
 // 0 when nothing has the name any more. A directory stays and is a failure.
 int remove_file(const char* path) {
@@ -99,64 +114,24 @@ int WanModemLogHandler::open_modem_img() {
 }
 
 int WanModemLogHandler::get_modem_img(int fd, uint8_t* sha1_hex, size_t& offset, size_t& size) {
-    struct {
-        ModemImageHeader header;
-        ModemImageEntry entry;
-    } head;
-    static_assert(sizeof(head) == sizeof(ModemImageHeader) + sizeof(ModemImageEntry), "packed");
-    // A block device has a length too, but only lseek tells it.
-    const off_t image_len = lseek(fd, 0, SEEK_END);
-    lseek(fd, 0, SEEK_SET);
-    if (read(fd, &head, sizeof(head)) != static_cast<ssize_t>(sizeof(head))) {
-        err_log("MODEM image length less than two headers");
-        return -1;
-    }
-    if (memcmp(head.header.magic, MODEM_IMAGE_MAGIC, sizeof(head.header.magic)) != 0) {
-        err_log("MODEM image not VHX1 format");
-        return -1;
-    }
-    ModemImageEntry& entry = head.entry;
-    for (int num = 1; entry.type != MODEM_IMAGE_PARSING_DB; ++num) {
-        if (entry.flags & MODEM_IMAGE_LAST_ENTRY) {
-            return -1;
+    ModemImageDb db;
+    const ModemImageFault fault = find_modem_image_db(fd, db);
+    if (fault.kind != ModemImageFault::NONE) {
+        for (const FaultMessage& message : FAULT_MESSAGES) {
+            if (message.kind == fault.kind) {
+                char text[96];
+                snprintf(text, sizeof(text), message.format, fault.number, fault.size);
+                err_log("%s", text);
+            }
         }
-        if (num == MAX_ENTRIES) {
-            err_log("MODEM image has more than %d headers", MAX_ENTRIES);
-            return -1;
-        }
-        const ssize_t n = read(fd, &entry, sizeof(entry));
-        if (n != static_cast<ssize_t>(sizeof(entry))) {
-            err_log("can not read more headers %d", static_cast<int>(n));
-            return -1;
-        }
-    }
-    if (!(entry.flags & MODEM_IMAGE_HAS_SHA1)) {
-        err_log("MODEM image has no SHA-1 checksum");
         return -1;
     }
-    if (lseek(fd, static_cast<off_t>(entry.offset), SEEK_SET) != static_cast<off_t>(entry.offset)) {
-        err_log("lseek MODEM image error");
-        return -1;
-    }
-    uint8_t sha1[SHA1_LEN];
-    const ssize_t n = read(fd, sha1, sizeof(sha1));
-    if (n != static_cast<ssize_t>(sizeof(sha1))) {
-        err_log("read SHA-1 error %d", static_cast<int>(n));
-        return -1;
-    }
-    const uint64_t end = static_cast<uint64_t>(entry.offset) + entry.size;
-    if (entry.size < SHA1_LEN || image_len < 0 || end > static_cast<uint64_t>(image_len) ||
-        end > SIZE_MAX) {
-        err_log("MODEM image entry at %u size %u is not within the image", entry.offset,
-                entry.size);
-        return -1;
-    }
-    offset = static_cast<size_t>(entry.offset) + SHA1_LEN;
-    size = entry.size - SHA1_LEN;
+    offset = db.offset;
+    size = db.size;
     static const char DIGITS[] = "0123456789ABCDEF";
     for (size_t i = 0; i < SHA1_LEN; ++i) {
-        sha1_hex[2 * i] = static_cast<uint8_t>(DIGITS[sha1[i] >> 4]);
-        sha1_hex[2 * i + 1] = static_cast<uint8_t>(DIGITS[sha1[i] & 0x0F]);
+        sha1_hex[2 * i] = static_cast<uint8_t>(DIGITS[db.sha1[i] >> 4]);
+        sha1_hex[2 * i + 1] = static_cast<uint8_t>(DIGITS[db.sha1[i] & 0x0F]);
     }
     return 0;
 }

@@ -96,7 +96,7 @@ TEST_F(ParsingLibTest, TrustsNothingInAnImage) {
     ASSERT_TRUE(write_log());
     const std::string get = "get_modem_img(int, uint8_t*, size_t&, size_t&): ";
     const std::string payload = DIGEST + "database";
-    const std::string outside = "is not within the image";
+    const std::string outside = get + "MODEM image entry at 1000 size ";
     std::string endless = HEADER;
     for (int i = 0; i < 5000; ++i) {
         endless += entry(1, 0, 0, 0);
@@ -111,9 +111,10 @@ TEST_F(ParsingLibTest, TrustsNothingInAnImage) {
         {HEADER + entry(1, 0, 0, 0) + "12345", get + "can not read more headers 5 ["},
         {endless, get + "MODEM image has more than 1024 headers ["},
         {image(entry(2, LAST, 1000, 28), payload), get + "MODEM image has no SHA-1 checksum ["},
-        {image(entry(2, HASHED, 1000, 19), payload), outside},
-        {image(entry(2, HASHED, 1000, 29), payload), outside},
-        {image(entry(2, HASHED, 1000, 0xffffffff - 999), payload), outside},
+        {image(entry(2, HASHED, 1000, 19), payload), outside + "19 is not within the image ["},
+        {image(entry(2, HASHED, 1000, 29), payload), outside + "29 is not within the image ["},
+        {image(entry(2, HASHED, 1000, 0xffffffff - 999), payload),
+         outside + "4294966296 is not within the image ["},
         {image(entry(2, HASHED, end - 19, 20), payload), get + "read SHA-1 error 19 ["},
         {image(entry(2, HASHED, 0xffffffff - 19, 40), payload), get + "read SHA-1 error 0 ["},
     };
@@ -129,6 +130,17 @@ TEST_F(ParsingLibTest, TrustsNothingInAnImage) {
                   1u);
         EXPECT_GE(modem()->fd(), 0) << "logging goes on";
     }
+    // Neither is what can be read, but not from the place wanted.
+    const std::string bytes = good("x");
+    int fds[2];
+    ASSERT_EQ(pipe2(fds, O_CLOEXEC), 0);
+    ASSERT_EQ(write(fds[1], bytes.data(), bytes.size()), static_cast<ssize_t>(bytes.size()));
+    uint8_t hex[SHA1_HEX_LEN];
+    size_t offset, size;
+    EXPECT_EQ(WanModemLogHandler::get_modem_img(fds[0], hex, offset, size), -1);
+    EXPECT_TRUE(log.has(get + "lseek MODEM image error [29(")) << log.text();
+    close(fds[0]);
+    close(fds[1]);
 }
 
 TEST_F(ParsingLibTest, AFailureLeavesNoHalfWrittenFile) {
