@@ -8,13 +8,13 @@
 #include <time.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
-#include <vector>
+#include <utility>
 
+#include "platform/PropertyTable.h"
 #include "platform/env_root.h"
 
 namespace {
@@ -78,24 +78,16 @@ public:
     bool find(const char* root, const char* key, std::string_view& value);
 
 private:
-    struct Entry {
-        std::string_view key;
-        std::string_view value;
-    };
-
     bool refresh();
     bool load();
-    bool read_content(int fd);
-    void parse();
-    void parse_line(std::string_view line);
+    static bool read_content(int fd, std::string& content);
 
     std::string m_root;
     std::string m_path;
     Stamp m_stamp;
     bool m_settled = false;               // m_stamp was old enough when the content was read
     std::optional<int64_t> m_first_seen;  // monotonic time of the first load with m_stamp
-    std::string m_content;                // what the entries point into
-    std::vector<Entry> m_table;           // sorted by key, each key once
+    PropertyTable m_table;
 };
 
 bool PropertyFile::find(const char* root, const char* key, std::string_view& value) {
@@ -104,18 +96,7 @@ bool PropertyFile::find(const char* root, const char* key, std::string_view& val
         m_path = m_root + FILE_NAME;
         m_settled = false;
     }
-    if (!refresh()) {
-        return false;
-    }
-    const std::string_view wanted(key);
-    const auto it =
-        std::lower_bound(m_table.begin(), m_table.end(), wanted,
-                         [](const Entry& entry, std::string_view k) { return entry.key < k; });
-    if (it == m_table.end() || it->key != wanted) {
-        return false;
-    }
-    value = it->value;
-    return true;
+    return refresh() && m_table.find(key, value);
 }
 
 // Makes the table that of the file as it is now; false when there is no usable file.
@@ -139,13 +120,14 @@ bool PropertyFile::load() {
     const std::optional<int64_t> monotonic = now(CLOCK_MONOTONIC);
     const std::optional<int64_t> realtime = now(CLOCK_REALTIME);
     struct stat st;
-    const bool usable = fstat(fd, &st) == 0 && acceptable(st) && read_content(fd);
+    std::string content;
+    const bool usable = fstat(fd, &st) == 0 && acceptable(st) && read_content(fd, content);
     close(fd);
     if (!usable) {
         m_stamp = Stamp();
         return false;
     }
-    parse();
+    m_table.parse(std::move(content));
     const Stamp stamp(st);
     if (!(stamp == m_stamp)) {
         m_stamp = stamp;
@@ -157,8 +139,7 @@ bool PropertyFile::load() {
     return true;
 }
 
-bool PropertyFile::read_content(int fd) {
-    m_content.clear();
+bool PropertyFile::read_content(int fd, std::string& content) {
     char buf[4096];
     for (;;) {
         const ssize_t n = read(fd, buf, sizeof(buf));
@@ -171,40 +152,11 @@ bool PropertyFile::read_content(int fd) {
             }
             return false;
         }
-        m_content.append(buf, static_cast<size_t>(n));
-        if (m_content.size() > static_cast<size_t>(MAX_FILE_SIZE)) {
+        content.append(buf, static_cast<size_t>(n));
+        if (content.size() > static_cast<size_t>(MAX_FILE_SIZE)) {
             return false;
         }
     }
-}
-
-void PropertyFile::parse() {
-    m_table.clear();
-    std::string_view rest(m_content);
-    while (!rest.empty()) {
-        const size_t end = std::min(rest.find('\n'), rest.size());
-        parse_line(rest.substr(0, end));
-        rest.remove_prefix(std::min(end + 1, rest.size()));
-    }
-    // Of equal keys the last line counts: reversed, it comes first and unique keeps it.
-    std::reverse(m_table.begin(), m_table.end());
-    std::stable_sort(m_table.begin(), m_table.end(),
-                     [](const Entry& a, const Entry& b) { return a.key < b.key; });
-    m_table.erase(std::unique(m_table.begin(), m_table.end(),
-                              [](const Entry& a, const Entry& b) { return a.key == b.key; }),
-                  m_table.end());
-}
-
-void PropertyFile::parse_line(std::string_view line) {
-    if (!line.empty() && line.back() == '\r') {
-        line.remove_suffix(1);
-    }
-    const size_t equals = line.find('=');
-    if (equals == 0 || equals == std::string_view::npos || line[0] == '#' ||
-        line.find('\0') != std::string_view::npos) {
-        return;
-    }
-    m_table.push_back(Entry{line.substr(0, equals), line.substr(equals + 1)});
 }
 
 // Stores text, which must fit, as the NUL-terminated result.
