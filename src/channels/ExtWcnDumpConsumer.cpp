@@ -23,6 +23,10 @@ ExtWcnDumpConsumer::~ExtWcnDumpConsumer() {
     m_storage->unsubscribe_ext_stor_umount_evt(this);
 }
 
+bool ExtWcnDumpConsumer::ends_dump(const uint8_t* chunk, size_t len) {
+    return len < MARKER_CHUNK_LIMIT && find_bytes(chunk, len, END_MARKER, END_MARKER_LEN);
+}
+
 int ExtWcnDumpConsumer::start() {
     if (!open_dump_file()) {
         err_log("open dump file failed!");
@@ -33,8 +37,7 @@ int ExtWcnDumpConsumer::start() {
 }
 
 bool ExtWcnDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
-    if (buf.data_len < MARKER_CHUNK_LIMIT &&
-        find_bytes(buf.data(), buf.data_len, END_MARKER, END_MARKER_LEN)) {
+    if (ends_dump(buf.data(), buf.data_len)) {
         m_handler->del_events(POLLIN);
         buf.consume_all();
         const bool complete = write_out_dump_file() == 0;

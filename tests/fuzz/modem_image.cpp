@@ -1,10 +1,8 @@
-// The modem's firmware image: what is found is what the format says, each fault is the first
-// one in the image, and what is copied is the database and nothing else.
+// The modem's firmware image: what is found is what the format says, and each fault is the
+// first one in the image.
 #include "channels/ModemImage.h"
 
-#include "channels/WanModemLogHandler.h"
 #include "fuzz/fuzz.h"
-#include "support/TestRoot.h"
 
 namespace {
 
@@ -61,38 +59,10 @@ Found look_up(const std::string& image) {
     return {Fault::TOO_MANY_ENTRIES, "", ""};
 }
 
-std::string hex(const std::string& bytes) {
-    std::string text;
-    for (char byte : bytes) {
-        char digits[3];
-        snprintf(digits, sizeof(digits), "%02X", static_cast<unsigned int>(byte) & 0xff);
-        text += digits;
-    }
-    return text;
-}
-
-void check_copy(const TestRoot& root, int fd, const uint8_t* digits, const ModemImageDb& db,
-                const Found& expected) {
-    FUZZ_CHECK(WanModemLogHandler::save_log_lib(root.path("db").c_str(), root.path("sha1").c_str(),
-                                                fd, db.offset, db.size, digits) == 0);
-    FUZZ_CHECK(root.read_file("db") == expected.database);
-    FUZZ_CHECK(root.read_file("sha1") == hex(expected.digest));
-}
-
-// A fault gives one line, an image that merely has no database none.
-void check_message(const std::string& log, Fault::Kind fault) {
-    const bool silent = fault == Fault::NONE || fault == Fault::NO_DATABASE;
-    FUZZ_CHECK(log.empty() == silent);
-    FUZZ_CHECK(silent ||
-               (log.find("get_modem_img(int, uint8_t*, size_t&, size_t&): ") < log.find('\n') &&
-                log.find('\n') == log.size() - 1));
-}
-
 }  // namespace
 
 // A first byte from 0x80 on tells how often, in sixteens, the first entry is repeated.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    static const TestRoot root;
     static const FuzzFile file;
     if (size < 1) {
         return 0;
@@ -112,18 +82,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     FUZZ_CHECK(find_modem_image_db(fd, db).kind == expected.fault);
     const bool found = expected.fault == Fault::NONE;
     FUZZ_CHECK(!found || image.compare(db.offset, db.size, expected.database) == 0);
-
-    LogCapture log;
-    uint8_t digits[SHA1_HEX_LEN];
-    size_t offset = 0;
-    size_t len = 0;
-    const int result = WanModemLogHandler::get_modem_img(fd, digits, offset, len);
-    FUZZ_CHECK(result == (found ? 0 : -1));
-    check_message(log.text(), expected.fault);
-    if (found) {
-        FUZZ_CHECK(offset == db.offset && len == db.size);
-        check_copy(root, fd, digits, db, expected);
-    }
     close(fd);
     return 0;
 }
