@@ -57,6 +57,7 @@ CpDirectory::FileIter CpDirectory::drop(FileIter it) {
 LogFile* CpDirectory::create_log_file() {
     struct tm t;
     if (get_local_time(t) < 0) {
+        errno = 0;  // nothing is wrong with the medium
         return nullptr;
     }
     const android::String8 name = free_name(android::String8::format(

@@ -65,6 +65,7 @@ void CpDirectory::rotate_logs() {
     // The oldest first: it makes room for the next one.
     for (size_t i = logs.size(); i-- > 0;) {
         const Numbered& log = logs[i];
+        errno = 0;  // not every failure sets it
         const bool next = log.target == uint64_t{log.number} + 1 || log.target > UINT32_MAX;
         const int result = next ? log.file->rotate(m_path)
                                 : log.file->change_name_num(static_cast<uint32_t>(log.target));

@@ -38,8 +38,13 @@ int CpStorage::write(const void* data, size_t len) {
     const int n = static_cast<int>(m_cur_file->write(data, len));
     if (n <= 0) {
         if (n == LogFile::FULL && media->free_space() != 0) {
+            if (media->make_room_with_new_set()) {
+                media->free_space();
+            }
             m_quota_pending = true;
             flush();
+        } else if (n < 0 && n != LogFile::FULL) {
+            m_manager->write_failed(media, errno);
         }
         return n;
     }

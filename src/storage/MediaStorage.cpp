@@ -122,6 +122,7 @@ CpSetDirectory* MediaStorage::find_set(const android::String8& path) const {
 CpSetDirectory* MediaStorage::create_cp_set() {
     struct tm t;
     if (get_local_time(t) < 0) {
+        errno = 0;  // nothing is wrong with the medium
         return nullptr;
     }
     android::String8 path(m_log_root);
@@ -148,6 +149,7 @@ CpSetDirectory* MediaStorage::create_cp_set() {
 int MediaStorage::remake_log_root() {
     m_manager->media_vanished(this);
     forget_sets();
+    m_rescan = true;  // should it have been there all the time
     return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root);
 }
 
@@ -204,14 +206,18 @@ CpDirectory* MediaStorage::get_cp_dir(const android::String8& cp_name) const {
 }
 
 bool MediaStorage::can_make_files() const {
+    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0) {
+        return false;
+    }
     const JoinedPath probe(m_log_root, android::String8(".write_test"));
     unlink(probe.string());
     const int fd = open(probe.string(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644);
     if (fd < 0) {
         return false;
     }
+    const bool written = write(fd, "", 1) == 1;
     close(fd);
-    return unlink(probe.string()) == 0;
+    return unlink(probe.string()) == 0 && written;
 }
 
 void MediaStorage::clear() {

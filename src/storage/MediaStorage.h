@@ -64,7 +64,7 @@ public:
     // The CP's directory in the working set, or null.
     CpDirectory* get_cp_dir(const android::String8& cp_name) const;
 
-    // True when a file can be made in the log root now: makes one and deletes it.
+    // True when a file can be made in the log root and written now: makes one and deletes it.
     bool can_make_files() const;
 
     void add_size(uint64_t num) { m_size += num; }

@@ -4,6 +4,8 @@
 #include <errno.h>
 #include <string.h>
 
+#include <algorithm>
+
 #include "config/property_names.h"
 #include "core/Multiplexer.h"
 #include "core/log.h"
@@ -120,6 +122,7 @@ void StorageManager::card_removed() {
         m_external.clear();
     }
     m_card_suspect = false;
+    m_card_rest_ms = CARD_REST_MS;
     m_card_rest_timer.stop();
 }
 
@@ -136,12 +139,19 @@ bool StorageManager::creation_failed(MediaStorage* media, int error) {
     if (error == ENOSPC) {
         return media->free_space() == 0;
     }
-    return media == &m_external && m_media_type == MT_EXTERNAL && card_failed(error);
+    return card_failed(media, error);
 }
 
-// How a dying card fails: its file system becomes read-only, or its driver gives up.
-bool StorageManager::card_failed(int error) {
-    if (error != EROFS && error != EIO && error != ENODEV && error != ENOTCONN) {
+void StorageManager::write_failed(MediaStorage* media, int error) {
+    card_failed(media, error);
+}
+
+// A dying card's file system becomes read-only, its driver gives up, or it is gone while it
+// still counts as mounted. A want of the service's own is no fault of the card.
+bool StorageManager::card_failed(MediaStorage* media, int error) {
+    const bool own_want =
+        error == 0 || error == EMFILE || error == ENFILE || error == ENOMEM || error == EINTR;
+    if (media != &m_external || m_media_type != MT_EXTERNAL || own_want) {
         return false;
     }
     errno = error;
@@ -150,7 +160,8 @@ bool StorageManager::card_failed(int error) {
     m_media_type = MT_NONE;
     if (m_card_suspect) {
         // It was tried again, seemed to work, and failed: not from block to block.
-        m_card_rest_timer.start(CARD_REST_MS);
+        m_card_rest_timer.start(m_card_rest_ms);
+        m_card_rest_ms = std::min(2 * m_card_rest_ms, MAX_CARD_REST_MS);
     }
     m_card_suspect = true;
     return true;

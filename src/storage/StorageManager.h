@@ -67,11 +67,13 @@ public:
     void stop_all_storages();
     // Called by a medium whose log root or working set vanished.
     void media_vanished(MediaStorage* media);
-    // A file or directory could not be made on the medium, for the reason errno gives. A
+    // A file or directory could not be made on the medium, for the reason error gives. A
     // full medium frees space, once. An SD card in use that cannot be written any more is
     // not in use from now on: the next check for a change falls back to the internal medium
     // and tries the card again. True when another try may succeed.
     bool creation_failed(MediaStorage* media, int error);
+    // The same for a write that failed for another reason than a full medium.
+    void write_failed(MediaStorage* media, int error);
     // Deletes every set on both media; the next write chooses the medium afresh.
     void clear_all();
 
@@ -83,10 +85,12 @@ public:
     void unsubscribe_ext_stor_umount_evt(void* client);
 
 private:
-    // How long an SD card that failed again and again is left alone.
+    // How long an SD card that failed again and again is left alone, at first and at most:
+    // each time twice as long.
     static constexpr unsigned int CARD_REST_MS = 3000;
+    static constexpr unsigned int MAX_CARD_REST_MS = 600000;
 
-    bool card_failed(int error);
+    bool card_failed(MediaStorage* media, int error);
     void card_removed();
     bool use_external();
     bool use_internal();
@@ -101,7 +105,8 @@ private:
     SubscriberList<media_change_callback> m_media_change_clients;
     SubscriberList<ext_umount_callback> m_ext_umount_clients;
     bool m_kest_layout = false;
-    bool m_card_suspect = false;     // it failed in use since it was mounted
+    bool m_card_suspect = false;  // it failed in use since it was mounted
+    unsigned int m_card_rest_ms = CARD_REST_MS;
     OneShotTimer m_card_rest_timer;  // pending: it is left alone
 };
 

@@ -1,0 +1,103 @@
+// What is written while a medium fails: the logs of one channel, block by block, a second
+// apart.
+#include <errno.h>
+
+#include "channels/GnssCpLogHandler.h"
+#include "control/LogController.h"
+#include "storage/CpStorage.h"
+#include "storage/StorageFixture.h"
+#include "storage/paths.h"
+
+namespace {
+
+class FailingMediumTest : public StorageTest {
+protected:
+    FailingMediumTest()
+        : m_entry{"cp_gnss", CT_GNSS, true, 0, 0},
+          m_channel(&m_ctrl, &m_ctrl.multiplexer(), &m_entry, &m_mgr) {
+        EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &m_ctrl.multiplexer()), 0);
+        m_store = m_mgr.create_storage(&m_channel);
+    }
+    int write_later(const std::string& data) {
+        faults::set_time(++m_now);
+        return m_store->write(data.data(), data.size());
+    }
+    // How many of that many blocks are lost.
+    int lost_of(int blocks, const std::string& block) {
+        int lost = 0;
+        for (int i = 0; i < blocks; ++i) {
+            lost += write_later(block) != static_cast<int>(block.size());
+        }
+        return lost;
+    }
+
+    LogController m_ctrl;  // never started
+    LogConfig::ConfigEntry m_entry;
+    GnssCpLogHandler m_channel;
+    CpStorage* m_store;
+    time_t m_now = NOW;
+};
+
+// Files can be made on the card, but nothing can be written to them.
+TEST_F(FailingMediumTest, CardTakesNoData) {
+    const std::string block(70000, 'x');  // more than is staged
+    plug_card();
+    EXPECT_EQ(lost_of(3, block), 0);
+    faults::fail(faults::WRITE, 1, EIO, 2);  // a block's and that of the probe
+    EXPECT_EQ(lost_of(1, block), 1);
+    EXPECT_EQ(lost_of(1, block), 0);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    EXPECT_EQ(lost_of(1, block), 0);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+}
+
+// The place of a card in use is empty, though it counts as mounted; then it is back.
+TEST_F(FailingMediumTest, CardIsGoneWhileItCountsAsMounted) {
+    plug_card();
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    ASSERT_EQ(rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()), 0);
+    EXPECT_EQ(lost_of(20, "x"), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    ASSERT_EQ(rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()), 0);
+    remove_tree(m_root.path("sd/modem_log").c_str());
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+}
+
+// What the service itself runs short of is no fault of the card.
+TEST_F(FailingMediumTest, WantOfDescriptorsKeepsTheCard) {
+    plug_card();
+    faults::fail(faults::OPEN, 1, EMFILE, 2);
+    EXPECT_EQ(lost_of(5, "x"), 2);
+    faults::set_time(-1);
+    m_store->stop();
+    EXPECT_EQ(m_store->write("x", 1), -1);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+}
+
+// Only files that trimming spares are left on a full medium.
+TEST_F(FailingMediumTest, FullMediumOfSparedFiles) {
+    const std::string block(70000, 'x');
+    m_mgr.set_file_size(100000);
+    EXPECT_EQ(lost_of(1, block), 0);
+    faults::fail(faults::WRITE, 1, ENOSPC);
+    EXPECT_EQ(lost_of(1, block), 1);
+    EXPECT_EQ(internal().sets().size(), 1u);  // the old one is trimmed, nothing else was there
+    EXPECT_EQ(internal().size(), 0u);
+    EXPECT_EQ(lost_of(3, block), 0);
+}
+
+// A number beyond 32 bits cannot be raised; an errno from before made that look like a file
+// that is gone, and it was deleted.
+TEST_F(FailingMediumTest, NumberTooLargeIsNoReasonToDelete) {
+    const std::string name = "42949672950-cp_gnss-2016-03-01_00-00-00.log";
+    const std::string dir = "data/modem_log/2016-03-01-09-15-01/cp_gnss/";
+    m_root.write_file(dir + name, "12345");
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    m_store->stop();
+    errno = ENOENT;
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_EQ(m_root.read_file(dir + name), "12345");
+}
+
+}  // namespace
