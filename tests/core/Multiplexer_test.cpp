@@ -44,14 +44,14 @@ public:
     Probe(Multiplexer* mux, int events) : FdHandler(-1, nullptr, mux) {
         open();
         if (events) {
-            EXPECT_EQ(0, add_events(events));
+            EXPECT_EQ(add_events(events), 0);
         }
     }
     ~Probe() override { ::close(m_peer); }
 
     void open() {
         int fds[2];
-        ASSERT_EQ(0, socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, fds));
+        EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, fds), 0);
         m_fd = fds[0];
         m_peer = fds[1];
     }
@@ -60,7 +60,7 @@ public:
         hang_up();
         open();
     }
-    void make_ready() const { ASSERT_EQ(1, write(m_peer, "x", 1)); }
+    void make_ready() const { EXPECT_EQ(write(m_peer, "x", 1), 1); }
     void hang_up() {
         ::close(m_peer);
         m_peer = -1;
@@ -111,82 +111,56 @@ TEST_F(MultiplexerTest, ErrorEventsAreDispatched) {
     Probe invalid(&mux, POLLIN);
     ::close(invalid.fd());
     mux.run_once();
-    EXPECT_EQ(std::vector<int>(1, POLLIN | POLLHUP), hung.calls);
-    EXPECT_EQ(std::vector<int>(1, POLLNVAL), invalid.calls);
-    EXPECT_EQ(-1, invalid.close());
-    EXPECT_EQ(EBADF, errno);
-    EXPECT_EQ(-1, invalid.fd());
+    EXPECT_EQ(hung.calls, std::vector<int>(1, POLLIN | POLLHUP));
+    EXPECT_EQ(invalid.calls, std::vector<int>(1, POLLNVAL));
+    EXPECT_EQ(invalid.close(), -1);
+    EXPECT_EQ(errno, EBADF);
+    EXPECT_EQ(invalid.fd(), -1);
 }
 
 TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
+    boot_clock::freeze();
     std::unique_ptr<Probe> probe = ready_probe();
     mux.run_once();  // leaves returned events in the poll array
-    EXPECT_EQ(-1, g_timeout);
+    EXPECT_EQ(g_timeout, -1);
     int fired = 0;
     mux.timer_mgr().add_timer(
-        0, [](void* n) { ++*static_cast<int*>(n); }, &fired);
+        30, [](void* n) { ++*static_cast<int*>(n); }, &fired);
     g_poll_error = EINTR;
     LogCapture log;
     mux.run_once();
-    EXPECT_EQ(1, fired);
-    EXPECT_EQ(ONE_INPUT, probe->calls);
-    EXPECT_EQ("", log.text());
-}
-
-TEST_F(MultiplexerTest, WaitsForTheEarliestTimerOrWithoutLimit) {
-    boot_clock::freeze();
-    int fired = 0;
-    const auto count = [](void* n) { ++*static_cast<int*>(n); };
-    mux.timer_mgr().add_timer(60000, count, &fired);
-    mux.timer_mgr().add_timer(30, count, &fired);
-    mux.run_once();
-    EXPECT_EQ(30, g_timeout);
+    EXPECT_EQ(g_timeout, 30);
+    EXPECT_EQ(fired, 0);
     boot_clock::advance(30);
     mux.run_once();
-    EXPECT_EQ(0, g_timeout);
-    EXPECT_EQ(1, fired);
-    Multiplexer empty;
-    g_poll_error = EINTR;  // it would wait for ever
-    empty.run_once();
-    EXPECT_EQ(-1, g_timeout);
+    EXPECT_EQ(g_timeout, 0);
+    EXPECT_EQ(fired, 1);
+    EXPECT_EQ(probe->calls, ONE_INPUT);
+    EXPECT_EQ(log.text(), "");
 }
 
-TEST_F(MultiplexerTest, TimersRunBeforeHandlersAndMayDestroyThem) {
-    std::vector<std::unique_ptr<Probe>> probes;
-    probes.push_back(ready_probe());
-    probes.push_back(ready_probe());
-    mux.timer_mgr().add_timer(
-        0,
-        [](void* data) {
-            auto& list = *static_cast<std::vector<std::unique_ptr<Probe>>*>(data);
-            EXPECT_TRUE(list[1]->calls.empty());
-            list.erase(list.begin());
-        },
-        &probes);
-    mux.run_once();
-    EXPECT_EQ(2u, g_polled.size());
-    ASSERT_EQ(1u, probes.size());
-    EXPECT_EQ(ONE_INPUT, probes[0]->calls);
-}
-
-TEST_F(MultiplexerTest, HandlerMayDestroyItselfAndOthers) {
+TEST_F(MultiplexerTest, TimersAndThenHandlersMayDestroyHandlers) {
     const size_t descriptors = open_descriptors();
+    std::unique_ptr<Probe> of_timer = ready_probe();
     Probe* self = ready_probe().release();
     std::unique_ptr<Probe> victim = ready_probe();
     std::unique_ptr<Probe> last = ready_probe();
+    mux.timer_mgr().add_timer(
+        0, [](void* probe) { static_cast<std::unique_ptr<Probe>*>(probe)->reset(); }, &of_timer);
     self->action = [&] {
+        EXPECT_FALSE(of_timer);
         delete self;
         victim.reset();
         // A new handler, likely at an address just freed, waits for the next pass.
         victim = ready_probe();
     };
     mux.run_once();
-    EXPECT_EQ(3u, g_polled.size());
+    EXPECT_EQ(g_polled.size(), 4u);
     EXPECT_TRUE(victim->calls.empty());
-    EXPECT_EQ(ONE_INPUT, last->calls);
+    EXPECT_EQ(last->calls, ONE_INPUT);
     mux.run_once();
-    EXPECT_EQ(2u, g_polled.size());
-    EXPECT_EQ(ONE_INPUT, victim->calls);
+    EXPECT_EQ(g_polled.size(), 2u);
+    EXPECT_EQ(victim->calls, ONE_INPUT);
     // Whatever the events, and also when the descriptor is closed already.
     victim->close();
     last->add_events(POLLOUT);
@@ -194,7 +168,7 @@ TEST_F(MultiplexerTest, HandlerMayDestroyItselfAndOthers) {
     last.reset();
     pass();
     EXPECT_TRUE(g_polled.empty());
-    EXPECT_EQ(descriptors, open_descriptors());
+    EXPECT_EQ(open_descriptors(), descriptors);
 }
 
 TEST_F(MultiplexerTest, RegistrationChangedWhileDispatchingCountsFromTheNextPass) {
@@ -209,21 +183,21 @@ TEST_F(MultiplexerTest, RegistrationChangedWhileDispatchingCountsFromTheNextPass
         removed->del_events(POLLIN);
         reopened->del_events(POLLIN);
         reopened->reopen();
-        EXPECT_EQ(0, reopened->add_events(POLLIN));
+        EXPECT_EQ(reopened->add_events(POLLIN), 0);
         reopened->make_ready();
         narrowed->del_events(POLLOUT);
-        EXPECT_EQ(0, added.add_events(POLLIN));
+        EXPECT_EQ(added.add_events(POLLIN), 0);
     };
     mux.run_once();
     EXPECT_TRUE(removed->calls.empty());
     EXPECT_TRUE(reopened->calls.empty());
     EXPECT_TRUE(added.calls.empty());
-    EXPECT_EQ(std::vector<int>(1, POLLOUT), narrowed->calls);  // still registered: as polled
+    EXPECT_EQ(narrowed->calls, std::vector<int>(1, POLLOUT));  // still registered: as polled
     mux.run_once();
     EXPECT_TRUE(removed->calls.empty());
-    EXPECT_EQ(ONE_INPUT, reopened->calls);
-    EXPECT_EQ(ONE_INPUT, added.calls);
-    EXPECT_EQ(1u, narrowed->calls.size());
+    EXPECT_EQ(reopened->calls, ONE_INPUT);
+    EXPECT_EQ(added.calls, ONE_INPUT);
+    EXPECT_EQ(narrowed->calls.size(), 1u);
 }
 
 // A descriptor that hung up is ready for ever: it took a whole core.
@@ -237,27 +211,28 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
     for (int i = 0; i < 30; ++i) {
         mux.run_once();
     }
-    EXPECT_EQ(10u, hung.calls.size());
-    EXPECT_EQ(30u, other.calls.size());
-    EXPECT_EQ(1u, log.count("void FdHandler::note_idle(const char*): hung device gave nothing 10 "
-                            "times in a row, left alone for 3000 ms at a time\n"));
+    EXPECT_EQ(hung.calls.size(), 10u);
+    EXPECT_EQ(other.calls.size(), 30u);
+    EXPECT_EQ(log.count("void FdHandler::note_idle(const char*): hung device gave nothing 10 "
+                        "times in a row, left alone for 3000 ms at a time\n"),
+              1u);
 
     // One try after each rest, even if the descriptor was closed and opened meanwhile.
     hung.del_events(POLLIN);
     hung.reopen();
-    EXPECT_EQ(0, hung.add_events(POLLIN));
+    EXPECT_EQ(hung.add_events(POLLIN), 0);
     hung.hang_up();
     boot_clock::advance(2999);
     mux.run_once();
-    EXPECT_EQ(10u, hung.calls.size());
+    EXPECT_EQ(hung.calls.size(), 10u);
     for (int i = 0; i < 3; ++i) {
         boot_clock::advance(3000);
         for (int j = 0; j < 5; ++j) {
             mux.run_once();
         }
     }
-    EXPECT_EQ(13u, hung.calls.size());
-    EXPECT_EQ(1u, log.count("left alone"));
+    EXPECT_EQ(hung.calls.size(), 13u);
+    EXPECT_EQ(log.count("left alone"), 1u);
 
     // Data counts afresh and ends the rest.
     EXPECT_TRUE(hung.resting());
@@ -265,8 +240,8 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
     for (int i = 0; i < 30; ++i) {
         mux.run_once();
     }
-    EXPECT_EQ(23u, hung.calls.size());
-    EXPECT_EQ(2u, log.count("left alone"));
+    EXPECT_EQ(hung.calls.size(), 23u);
+    EXPECT_EQ(log.count("left alone"), 2u);
 
     // Without a clock nothing would end a rest.
     hung.note_alive();
@@ -274,7 +249,7 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
     for (int i = 0; i < 30; ++i) {
         mux.run_once();
     }
-    EXPECT_EQ(53u, hung.calls.size());
+    EXPECT_EQ(hung.calls.size(), 53u);
 }
 
 // One that finds the table full is refused, or waits for room: it stayed unpolled for good.
@@ -286,29 +261,29 @@ TEST_F(MultiplexerTest, TableTakesTwentyHandlers) {
     }
     Probe first(&mux, 0), withdrawn(&mux, 0), last(&mux, 0);
     std::unique_ptr<Probe> destroyed(new Probe(&mux, 0));
-    EXPECT_EQ(-1, last.add_events(POLLIN));
-    EXPECT_EQ(0, probes[19]->add_events(POLLOUT));
+    EXPECT_EQ(last.add_events(POLLIN), -1);
+    EXPECT_EQ(probes[19]->add_events(POLLOUT), 0);
     for (Probe* probe : {&first, &withdrawn, destroyed.get(), &last}) {
         probe->make_ready();
         probe->poll_when_room(POLLIN, "some device");
     }
-    EXPECT_EQ(4u,
-              log.count("void FdHandler::poll_when_room(int, const char*): no room to poll some "
-                        "device, waiting for it [105(No buffer space available)]\n"));
+    EXPECT_EQ(log.count("void FdHandler::poll_when_room(int, const char*): no room to poll some "
+                        "device, waiting for it [105(No buffer space available)]\n"),
+              4u);
     withdrawn.del_events(POLLIN);
     destroyed.reset();
     mux.run_once();
-    EXPECT_EQ(20u, g_polled.size());
-    EXPECT_EQ(ONE_INPUT, probes[0]->calls);
-    EXPECT_EQ(std::vector<int>(1, POLLIN | POLLOUT), probes[19]->calls);
+    EXPECT_EQ(g_polled.size(), 20u);
+    EXPECT_EQ(probes[0]->calls, ONE_INPUT);
+    EXPECT_EQ(probes[19]->calls, std::vector<int>(1, POLLIN | POLLOUT));
     EXPECT_TRUE(first.calls.empty());
     probes.erase(probes.begin());
     mux.run_once();
-    EXPECT_EQ(ONE_INPUT, first.calls);
-    EXPECT_EQ(first.fd(), g_polled[19].fd);
+    EXPECT_EQ(first.calls, ONE_INPUT);
+    EXPECT_EQ(g_polled[19].fd, first.fd());
     EXPECT_TRUE(last.calls.empty());
     probes.clear();
     mux.run_once();
-    EXPECT_EQ(ONE_INPUT, last.calls);
+    EXPECT_EQ(last.calls, ONE_INPUT);
     EXPECT_TRUE(withdrawn.calls.empty());
 }
