@@ -43,8 +43,10 @@ TEST_F(Log, OneWriteAndOneLineFeedAMessage) {
         const char* text;
         const char* line;
     } cases[] = {
-        {"plain", "plain\n"}, {"many\n\n\n", "many\n"},       {"", "\n"},
-        {"\n\n", "\n"},       {"100% %s %n", "100% %s %n\n"},
+        {"plain", "plain\n"},
+        {"many\n\n\n", "many\n"},
+        {"\n\n", "\n"},
+        {"100% %s %n", "100% %s %n\n"},
     };
     for (const auto& c : cases) {
         const int result = __android_log_print(ANDROID_LOG_ERROR, "KESTCP", "%s", c.text);
