@@ -35,13 +35,11 @@ protected:
 TEST_F(LogConfigTest, LineGrammar) {
     static const char INVALID[] = "invalid line: 1\n [";
     static const char STREAM[] = "stream\tcp_wcdma\ton\t100\t3";
-    static const char BIG[] = "log_file_size 4294967295";
     static const struct {
         std::string line;
         const char* message;  // "": nothing may be logged
         const char* changes;
     } CASES[] = {
-        {"stream cp_wcdma on 100 3\n", "", STREAM},
         {"  stream cp_wcdma on 100 3\n", "", STREAM},
         {"stream cp_wcdma on 0x64 03 more\r\n", "", STREAM},
         {std::string("stream cp_wcdma on 100 3\0x\n", 27), "", STREAM},
@@ -49,11 +47,8 @@ TEST_F(LogConfigTest, LineGrammar) {
         {"stream cp_wcdma ON 100 3\n", "", "stream\tcp_wcdma\toff\t100\t3"},
         {"stream agdsp on -1 -0x1\n", "", "stream\tagdsp\ton\t4294967295\t4294967295"},
         {"stream cp_wcdma on 100x 3\n", INVALID, ""},
-        {"stream cp_wcdma on 100\v3 3\n", INVALID, ""},
-        {"stream cp_wcdma on 4294967296 3\n", INVALID, ""},
         {"stream\n", INVALID, ""},
         {"stream cp_tdd-lte on 100 3\n", "", ""},
-        {"iq cp_wcdma GSM WCDMA\n", "", "iq cp_wcdma GSM WCDMA"},
         {"iq cp_wcdma WCDMA GSM GSM\n", "", "iq cp_wcdma GSM WCDMA"},
         {"iq cp_wcdma \n", ": no I/Q type [", ""},
         {"iq cp_wcdma WCDMA LTE\n", ": invalid I/Q type [", ""},
@@ -61,23 +56,18 @@ TEST_F(LogConfigTest, LineGrammar) {
         {"minidump enable internal\n", "", "minidump enable\tinternal"},
         {"minidump enable\n", INVALID, "minidump enable\texternal"},
         {"log_file_size 0x20\n", "", "log_file_size 32"},
-        {"log_file_size 010\v\n", "", "log_file_size 8"},
         {"log_file_size", INVALID, ""},
-        {std::string("log_file_size 7\0\n", 17), INVALID, ""},
         {"log_file_size 7M\n", INVALID, ""},
         {"log_file_size abc\n", "0: every write starts a new log file\n", "log_file_size 0"},
         {"log_file_size 0x1000\n", " 4096: every write starts", "log_file_size 4096"},
         {"data_log_size 0\n", "0: the internal medium has no quota\n", "data_log_size 0"},
         {"sd_log_size\n", "0: the SD card has no quota\n", "sd_log_size 0"},
-        {"log_file_size 4294967295\n", "", BIG},
-        {"log_file_size -1\n", "", BIG},
+        {"log_file_size -1\n", "", "log_file_size 4294967295"},
+        {"log_file_size 4294967295\n", "", "log_file_size 4294967295"},
         {"log_file_size 4294967296\n", INVALID, ""},
-        {"log_file_size 18446744073709551615\n", INVALID, ""},
-        {"sd_log_size\t251\r\n", "", "sd_log_size 251"},
         {"log_overwrite yes\n", "", "log_overwrite disable"},
         {"Stream cp_wcdma on 100 3\n", INVALID, ""},
         {"#stream cp_wcdma on 100 3\n", "", ""},
-        {"", "", ""},
     };
     for (const auto& c : CASES) {
         SCOPED_TRACE(testing::PrintToString(c.line));
@@ -88,25 +78,6 @@ TEST_F(LogConfigTest, LineGrammar) {
         EXPECT_TRUE(c.message[0] ? log.has(c.message) : log.text().empty()) << log.text();
         EXPECT_EQ(changes(config), c.changes);
     }
-}
-
-TEST_F(LogConfigTest, WritesTheExactFileAndReadsItBack) {
-    const std::string text =
-        "minidump enable\tinternal\nlog_file_size 6\ndata_log_size 26\nsd_log_size 251\n"
-        "log_overwrite disable\n\niq cp_wcdma WCDMA\niq cp_td-scdma GSM \n\n"
-        "#Type\tName\tState\tSize\tLevel\n"
-        "stream\tcp_wcdma\ton\t100\t3\nstream\tcp_wcn\toff\t50\t1\n";
-    root.write_file("kest_modem.conf", text);
-    LogConfig config(file.c_str());
-    ASSERT_EQ(read(config), 0);
-    EXPECT_FALSE(config.dirty());
-    EXPECT_TRUE(config.save_md() && config.md_int_stor() && !config.log_overwrite());
-    EXPECT_EQ(config.sd_root(), "/storage/sdcard0");
-    EXPECT_FALSE(config.wcdma_iq_enabled(CT_TD));
-    EXPECT_EQ(log.text(), "");
-
-    ASSERT_EQ(config.save(), 0);
-    EXPECT_EQ(root.read_file("kest_modem.conf"), text);
 }
 
 TEST_F(LogConfigTest, DuplicatesKeepTheFirstPlaceAndInvalidLinesTheirNumber) {
@@ -142,9 +113,10 @@ TEST_F(LogConfigTest, Options) {
         int result;
         bool kest_dir;
     } CASES[] = {
-        {{}, 0, false},           {{"-s"}, 0, true},
-        {{"-sxs"}, -1, true},     {{"word", "-s"}, 0, true},
-        {{"--", "-x"}, 0, false}, {{"-x"}, -1, false},
+        {{}, 0, false},
+        {{"word", "-s"}, 0, true},
+        {{"-sx"}, -1, true},
+        {{"-x"}, -1, false},
     };
     for (const auto& c : CASES) {
         SCOPED_TRACE(testing::PrintToString(c.args));
@@ -152,6 +124,7 @@ TEST_F(LogConfigTest, Options) {
         LogConfig config(file.c_str());
         EXPECT_EQ(read(config, c.args), c.result);
         EXPECT_EQ(config.kest_dir(), c.kest_dir);
+        EXPECT_EQ(config.sd_root(), c.result < 0 ? "" : "/storage/sdcard0");
         EXPECT_EQ(log.count("option:-s Modem log will be saved in kest directory!\n"),
                   c.kest_dir ? 1u : 0u);
         EXPECT_EQ(log.count("parameters passed to kestmodem are unrecognised! ["),
@@ -168,10 +141,11 @@ TEST_F(LogConfigTest, CapturesAreSwitchedOneByOne) {
         int type;
         const char* line;
     } CASES[] = {
-        {&LogConfig::enable_iq, LogConfig::IQ_WCDMA, "iq cp_td-scdma WCDMA"},
-        {&LogConfig::enable_iq, LogConfig::IQ_GSM, "iq cp_td-scdma GSM WCDMA"},
+        {&LogConfig::enable_iq, LogConfig::IQ_GSM, "iq cp_td-scdma GSM "},
+        {&LogConfig::enable_iq, LogConfig::IQ_WCDMA, "iq cp_td-scdma GSM WCDMA"},
         {&LogConfig::disable_iq, LogConfig::IQ_WCDMA, "iq cp_td-scdma GSM "},
         {&LogConfig::disable_iq, LogConfig::IQ_GSM, "iq cp_td-scdma "},
+        {&LogConfig::enable_iq, LogConfig::IQ_WCDMA, "iq cp_td-scdma WCDMA"},
     };
     for (const auto& c : CASES) {
         (config.*c.change)(CT_TD, c.type);
