@@ -181,7 +181,7 @@ TEST_F(AgDspTest, DevicesThatGiveNothingAreLeftAlone) {
     for (const auto& c : cases) {
         log.clear();
         c.device.script_reads(FakeDevice::Steps(40, {"", c.error}));
-        for (size_t left : {30, 29}) {
+        for (size_t left : {30u, 29u}) {
             for (int i = 0; i < 15; ++i) {
                 pump_once(mux());
             }

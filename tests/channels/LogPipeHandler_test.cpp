@@ -117,7 +117,7 @@ TEST_F(LogPipeHandlerTest, DeviceThatGivesNothingIsLeftAlone) {
         ASSERT_EQ(symlink(c.device, name.c_str()), 0);
         ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
         gnss = ctrl->get_cp(CT_GNSS);
-        for (size_t wakeups : {10, 11}) {
+        for (size_t wakeups : {10u, 11u}) {
             pass(15);
             EXPECT_EQ(log.count("read returns 0"), wakeups * c.lines);
             boot_clock::advance(3000);
