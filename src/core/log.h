@@ -12,22 +12,22 @@
 #define KEST_LOG_TAG "KESTCP"
 
 // An event that is worth a line: info_log("CP %s dev %s", name, path).
-#define info_log(fmt, ...)                                                      \
-    do {                                                                        \
-        const int kest_saved_errno_ = errno;                                    \
-        __android_log_print(ANDROID_LOG_ERROR, KEST_LOG_TAG, "%s: " fmt "\n",   \
-                            __PRETTY_FUNCTION__, ##__VA_ARGS__);                \
-        errno = kest_saved_errno_;                                              \
+#define info_log(fmt, ...)                                                                         \
+    do {                                                                                           \
+        const int kest_saved_errno_ = errno;                                                       \
+        __android_log_print(ANDROID_LOG_ERROR, KEST_LOG_TAG, "%s: " fmt "\n", __PRETTY_FUNCTION__, \
+                            ##__VA_ARGS__);                                                        \
+        errno = kest_saved_errno_;                                                                 \
     } while (0)
 
 // A failure: as info_log, with " [errno(text)]" at the end.
-#define err_log(fmt, ...)                                                                   \
-    do {                                                                                    \
-        const int kest_saved_errno_ = errno;                                                \
-        __android_log_print(ANDROID_LOG_ERROR, KEST_LOG_TAG, "%s: " fmt " [%d(%s)]\n",      \
-                            __PRETTY_FUNCTION__, ##__VA_ARGS__, kest_saved_errno_,          \
-                            strerror(kest_saved_errno_));                                   \
-        errno = kest_saved_errno_;                                                          \
+#define err_log(fmt, ...)                                                              \
+    do {                                                                               \
+        const int kest_saved_errno_ = errno;                                           \
+        __android_log_print(ANDROID_LOG_ERROR, KEST_LOG_TAG, "%s: " fmt " [%d(%s)]\n", \
+                            __PRETTY_FUNCTION__, ##__VA_ARGS__, kest_saved_errno_,     \
+                            strerror(kest_saved_errno_));                              \
+        errno = kest_saved_errno_;                                                     \
     } while (0)
 
 #endif  // CORE_LOG_H_

@@ -18,8 +18,7 @@ const uint8_t* get_token(const uint8_t* text, size_t len, size_t& token_len);
 bool token_equals(const uint8_t* token, size_t len, const char* word);
 
 // First position where the pattern occurs, or null. An empty pattern is never found.
-const uint8_t* find_bytes(const uint8_t* text, size_t len, const void* pattern,
-                          size_t pattern_len);
+const uint8_t* find_bytes(const uint8_t* text, size_t len, const void* pattern, size_t pattern_len);
 
 // Whole-field decimal number: every byte must be a digit; an empty field gives 0.
 // The value is kept in 32 bits and wraps; the parse fails (-1) on a byte that is no

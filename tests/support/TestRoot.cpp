@@ -113,8 +113,7 @@ void TestRoot::set_prop(const std::string& key, const std::string& value) {
 }
 
 LogCapture::LogCapture()
-    : m_saved(fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 3)),
-      m_file(memfd_create("log", MFD_CLOEXEC)) {
+    : m_saved(fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 3)), m_file(memfd_create("log", MFD_CLOEXEC)) {
     if (m_saved < 0 || m_file < 0 || dup2(m_file, STDERR_FILENO) < 0) {
         die("LogCapture");
     }

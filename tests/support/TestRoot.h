@@ -22,7 +22,7 @@ public:
     const std::string& root() const { return m_root; }
     std::string path(const std::string& rel) const { return m_root + "/" + rel; }
 
-    void make_dir(const std::string& rel) const;  // with its parents
+    void make_dir(const std::string& rel) const;                                // with its parents
     void write_file(const std::string& rel, const std::string& content) const;  // parents too
     std::string read_file(const std::string& rel) const;
     bool exists(const std::string& rel) const;
