@@ -81,6 +81,7 @@ bool CommandLine::parse(int argc, char** argv) {
 bool CommandLine::read_options(int argc, char** argv) {
     const std::vector<Option> options = all_options(m_syntax);
     std::vector<struct option> known;
+    known.reserve(options.size() + 1);
     for (const Option& option : options) {
         known.push_back({option.name, option.param ? required_argument : no_argument, nullptr, 0});
     }
