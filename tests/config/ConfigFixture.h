@@ -12,6 +12,11 @@
 #include "config/LogConfig.h"
 #include "support/TestRoot.h"
 
+// The file that is saved when nothing is set.
+const std::string DEFAULTS =
+    "minidump disable\texternal\nlog_file_size 5\ndata_log_size 25\nsd_log_size 250\n"
+    "log_overwrite enable\n\n\n#Type\tName\tState\tSize\tLevel\n";
+
 class ConfigFixture : public testing::Test {
 protected:
     ConfigFixture() {

@@ -20,7 +20,6 @@ TEST(CpTypeTest, VocabulariesAreSeparateAndExact) {
         {"cp_5mode", CT_5MODE, CT_UNKNOWN, CT_UNKNOWN},
         {"cp_td-lte", CT_UNKNOWN, CT_5MODE, CT_UNKNOWN},
         {"5MODE", CT_UNKNOWN, CT_UNKNOWN, CT_5MODE},
-        {"CP_WCN", CT_UNKNOWN, CT_UNKNOWN, CT_UNKNOWN},
         {"cp_wcn2", CT_UNKNOWN, CT_UNKNOWN, CT_UNKNOWN},
         {"", CT_UNKNOWN, CT_UNKNOWN, CT_UNKNOWN},
     };

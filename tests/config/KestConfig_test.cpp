@@ -18,8 +18,6 @@ TEST(KestConfigTest, ReadsStreamsAndTheGlobalSwitch) {
         {"enable\nstream cp_wcn on 1 1\nstream cp_gnss off 1 1\n", "cp_wcn on, cp_gnss off, ", 0},
         {"enabled\nstream cp_wcn on 1 1\n", "cp_wcn off, ", 0},
         {"stream cp_tdd-lte on 1 1\nenable now please\n", "cp_3mode on, ", 0},
-        {"enable\nstream cp_fdd-lte on 1 1\nstream cp_td-lte ON 1 1\n",
-         "cp_4mode on, cp_5mode off, ", 0},
         {"enable\nstream cp_3mode on 1 1\nstream agdsp on 1 1\nstream nobody\n", "", 0},
         {"enable\nstream cp_wcn on 1 1\nstream cp_wcn off 1 1", "cp_wcn on, cp_wcn off, ", 0},
         {"enable\nvar x\n\n  stream\tcp_td-scdma\ton\t0x1\t2 more\r\n", "cp_td-scdma on, ", 0},

@@ -51,10 +51,7 @@ int __wrap_close(int fd) {
 
 namespace {
 
-const std::string HEAD =
-    "minidump disable\texternal\nlog_file_size 5\ndata_log_size 25\nsd_log_size 250\n"
-    "log_overwrite enable\n\n\n#Type\tName\tState\tSize\tLevel\n";
-const std::string ON = HEAD + "stream\tcp_wcn\ton\t1\t1\n";
+const std::string ON = DEFAULTS + "stream\tcp_wcn\ton\t1\t1\n";
 
 class SettingsFileTest : public ConfigFixture {
 protected:
@@ -78,7 +75,7 @@ TEST_F(SettingsFileTest, KillsAndFaultsLeaveTheOldSettingsOrTheNew) {
     while (commented.size() < 10000) {
         commented += "\n# settings\n";
     }
-    for (const std::string& old : {HEAD + line + "    \n", commented, line}) {
+    for (const std::string& old : {DEFAULTS + line + "    \n", commented, line}) {
         for (int failing = 1; failing < 8; ++failing) {
             SCOPED_TRACE(std::to_string(old.size()) + ", fault " + std::to_string(failing));
             root.write_file("kest_modem.conf", old);
@@ -118,7 +115,7 @@ TEST_F(SettingsFileTest, AFullMediumLeavesTheFileAsItWas) {
         EXPECT_TRUE(config.dirty()) << "pending, though nothing was changed";
         s_room = SIZE_MAX;
         EXPECT_EQ(config.save(), 0);
-        EXPECT_EQ(root.read_file("kest_modem.conf"), old.empty() ? HEAD : ON);
+        EXPECT_EQ(root.read_file("kest_modem.conf"), old.empty() ? DEFAULTS : ON);
     }
     umask(mask);
     struct stat st;

@@ -26,7 +26,7 @@ protected:
     }
 
     void boot_supervised(const std::string& settings = "") {
-        boot_modem(false, settings);
+        ASSERT_NO_FATAL_FAILURE(boot_modem(false, settings));
         modemd = std::make_unique<Client>(accept4(m_modemd, nullptr, nullptr, SOCK_CLOEXEC));
         wcnd = std::make_unique<Client>(accept4(m_wcnd, nullptr, nullptr, SOCK_CLOEXEC));
     }
@@ -62,7 +62,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
         SCOPED_TRACE(std::string(c.message) + ", " + c.settings);
         root.set_prop("persist.sys.vexa.modemreset", c.reset);
         root.set_prop("init.svc.fuse_sdcard0", c.card);
-        boot_supervised(c.settings);
+        ASSERT_NO_FATAL_FAILURE(boot_supervised(c.settings));
         ASSERT_TRUE(both_log("<before>"));
         Client subscribers[2];
         Client other;
@@ -107,7 +107,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
 
 TEST_F(CpEventsTest, WcnHasItsOwnSupervisorAndReset) {
     root.set_prop("persist.sys.vexa.modemreset", "1");
-    boot_supervised("stream cp_wcn off 5 3\n");
+    ASSERT_NO_FATAL_FAILURE(boot_supervised("stream cp_wcn off 5 3\n"));
     LogPipeHandler* wcn = ctrl->get_cp(CT_WCN);
     Files expected = records();
     for (bool mini_dump : {false, true}) {
@@ -127,7 +127,7 @@ TEST_F(CpEventsTest, WcnHasItsOwnSupervisorAndReset) {
 }
 
 TEST_F(CpEventsTest, RecordsFailOneByOne) {
-    boot_supervised();
+    ASSERT_NO_FATAL_FAILURE(boot_supervised());
     struct tm t;
     localtime_r(&NOON, &t);
     for (const std::string record : {"smsg", "sbuf", "sblock"}) {
@@ -145,7 +145,7 @@ TEST_F(CpEventsTest, RecordsFailOneByOne) {
 }
 
 TEST_F(CpEventsTest, EventsForNobody) {
-    boot_supervised();
+    ASSERT_NO_FATAL_FAILURE(boot_supervised());
     ctrl->process_cp_evt(CT_TD, CpStateHandler::CE_ASSERT);
     EXPECT_TRUE(log.has("CpEvent): kestcp: unknown MODEM type 1 asserts ["));
     ctrl->process_cp_evt(CT_WANMODEM, static_cast<CpStateHandler::CpEvent>(4));
@@ -155,7 +155,7 @@ TEST_F(CpEventsTest, EventsForNobody) {
 TEST_F(CpEventsTest, NoControlServer) {
     const int taken =
         socket_local_server("kestmodem", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
-    boot_supervised();
+    ASSERT_NO_FATAL_FAILURE(boot_supervised());
     ASSERT_TRUE(modemd->say("Modem Assert"));
     ASSERT_TRUE(pump([&] { return diag_dev.received() == "3\n"; }));
     ASSERT_TRUE(supply(diag_dev, end_marker()));

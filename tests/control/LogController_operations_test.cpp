@@ -24,7 +24,7 @@ protected:
     void start() { ASSERT_EQ(boot(TYPED), 0); }
     std::string file() const { return root.read_file("kest_modem.conf"); }
     void block_file() const {
-        ASSERT_EQ(unlink(root.path("kest_modem.conf").c_str()), 0);
+        EXPECT_EQ(unlink(root.path("kest_modem.conf").c_str()), 0);
         root.make_dir("kest_modem.conf");
     }
     template <typename... Types>
@@ -106,7 +106,7 @@ TEST_F(ControlOperationsTest, ActOnTheRunningObjectsAndTheFile) {
         for (bool saves : {true, false}) {  // what cannot be saved is saved later
             SCOPED_TRACE(std::string(test.file.to) + (saves ? "" : ", not saved"));
             log.clear();
-            start();
+            ASSERT_NO_FATAL_FAILURE(start());
             c = ctrl.get();
             if (!saves) {
                 block_file();
@@ -125,7 +125,7 @@ TEST_F(ControlOperationsTest, ActOnTheRunningObjectsAndTheFile) {
 }
 
 TEST_F(ControlOperationsTest, WhatChangesNothingLeavesTheFile) {
-    start();
+    ASSERT_NO_FATAL_FAILURE(start());
     LogController* c = ctrl.get();
     const struct {
         const char* operation;
@@ -152,7 +152,7 @@ TEST_F(ControlOperationsTest, WhatChangesNothingLeavesTheFile) {
     EXPECT_EQ(c->enable_wcdma_iq(CT_WCN), 0);
     EXPECT_EQ(c->disable_wcdma_iq(CT_WCN), -1) << "of a CP that is off";
     EXPECT_EQ(file(), changed(SAVED, "\n\n\n", "\n\niq cp_wcn WCDMA\n\n"));
-    start();
+    ASSERT_NO_FATAL_FAILURE(start());
     root.set_prop("ro.modem.wcn.diag", "");
     EXPECT_EQ(turn(true, CT_WCN), 0);
     EXPECT_TRUE(
@@ -178,7 +178,7 @@ TEST_F(ControlOperationsTest, ReloadAppliesTheOtherLoggersStreams) {
     for (const auto& c : cases) {
         SCOPED_TRACE(c.text);
         log.clear();
-        start();
+        ASSERT_NO_FATAL_FAILURE(start());
         root.write_file(path, c.text);
         EXPECT_EQ(ctrl->reload_kest_conf(), 0);
         EXPECT_EQ(enabled(), c.enabled);
@@ -189,7 +189,7 @@ TEST_F(ControlOperationsTest, ReloadAppliesTheOtherLoggersStreams) {
     EXPECT_TRUE(log.has(begin + "enable CP cp_wcn\n"));
     // Missing devices do not keep the stream from being marked enabled. What was logged
     // before a CP is switched off is in its file.
-    start();
+    ASSERT_NO_FATAL_FAILURE(start());
     root.set_prop("ro.modem.wcn.diag", "");
     root.write_file(path, "enable\nstream cp_wcn on 5 3\nstream cp_wcdma off 5 3\n");
     ASSERT_TRUE(supply(*log_dev, "last words"));
@@ -209,7 +209,7 @@ TEST_F(ControlOperationsTest, ReloadAppliesTheOtherLoggersStreams) {
 }
 
 TEST_F(ControlOperationsTest, FlushAndClear) {
-    start();
+    ASSERT_NO_FATAL_FAILURE(start());
     ASSERT_TRUE(supply(*log_dev, "<staged>"));
     EXPECT_EQ(logged("cp_wcdma", "<staged>"), 0u);
     EXPECT_EQ(ctrl->flush(), 0);

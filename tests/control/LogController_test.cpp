@@ -28,7 +28,7 @@ TEST_F(LogControllerTest, MakesTheChannelOfEachType) {
     EXPECT_TRUE(log.has(where + "CP cp_wcdma dev " + root.path("log_w") + " " +
                         root.path("diag_w") + "\n"));
     EXPECT_TRUE(log.has(where + "CP cp_gnss dev " + root.path("gnss") + "\n"));
-    EXPECT_EQ(log.count(where), 2u);
+    EXPECT_EQ(log.count(where), 2u) << "nothing else";
 }
 
 TEST_F(LogControllerTest, ChannelWithoutDevicesWaitsToBeStarted) {

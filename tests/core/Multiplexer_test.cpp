@@ -87,12 +87,6 @@ protected:
         g_poll_error = 0;
         boot_clock::real();
     }
-    // A pass that does not wait, whatever is ready.
-    void pass() {
-        mux.timer_mgr().add_timer(
-            0, [](void*) {}, nullptr);
-        mux.run_once();
-    }
     std::unique_ptr<Probe> ready_probe() {
         std::unique_ptr<Probe> probe(new Probe(&mux, POLLIN));
         probe->make_ready();
@@ -166,7 +160,8 @@ TEST_F(MultiplexerTest, TimersAndThenHandlersMayDestroyHandlers) {
     last->add_events(POLLOUT);
     victim.reset();
     last.reset();
-    pass();
+    g_poll_error = EINTR;  // it would wait for ever
+    mux.run_once();
     EXPECT_TRUE(g_polled.empty());
     EXPECT_EQ(open_descriptors(), descriptors);
 }
@@ -213,9 +208,10 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
     }
     EXPECT_EQ(hung.calls.size(), 10u);
     EXPECT_EQ(other.calls.size(), 30u);
-    EXPECT_EQ(log.count("void FdHandler::note_idle(const char*): hung device gave nothing 10 "
-                        "times in a row, left alone for 3000 ms at a time\n"),
-              1u);
+    const std::string left_alone =
+        "void FdHandler::note_idle(const char*): hung device gave nothing 10 times in a row, "
+        "left alone for 3000 ms at a time\n";
+    EXPECT_EQ(log.count(left_alone), 1u);
 
     // One try after each rest, even if the descriptor was closed and opened meanwhile.
     hung.del_events(POLLIN);
@@ -232,7 +228,7 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
         }
     }
     EXPECT_EQ(hung.calls.size(), 13u);
-    EXPECT_EQ(log.count("left alone"), 1u);
+    EXPECT_EQ(log.count(left_alone), 1u);
 
     // Data counts afresh and ends the rest.
     EXPECT_TRUE(hung.resting());
@@ -241,7 +237,7 @@ TEST_F(MultiplexerTest, HandlerThatGetsNothingDoneIsLeftAloneForAWhile) {
         mux.run_once();
     }
     EXPECT_EQ(hung.calls.size(), 23u);
-    EXPECT_EQ(log.count("left alone"), 2u);
+    EXPECT_EQ(log.count(left_alone), 2u);
 
     // Without a clock nothing would end a rest.
     hung.note_alive();

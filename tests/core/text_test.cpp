@@ -4,7 +4,6 @@
 
 #include <memory>
 #include <string>
-#include <vector>
 
 namespace {
 
@@ -22,36 +21,7 @@ private:
     std::unique_ptr<uint8_t[]> m_data;
 };
 
-std::vector<std::string> tokens(const std::string& text) {
-    const Bytes bytes(text);
-    const uint8_t* const end = bytes.data() + bytes.size();
-    std::vector<std::string> result;
-    size_t len = 0;
-    for (const uint8_t* at = bytes.data(); (at = get_token(at, static_cast<size_t>(end - at), len));
-         at += len) {
-        result.emplace_back(reinterpret_cast<const char*>(at), len);
-    }
-    return result;
-}
-
 }  // namespace
-
-TEST(Text, Tokens) {
-    typedef std::vector<std::string> List;
-    const std::string nul("a\0b c", 5);
-    const struct {
-        std::string text;
-        List expected;
-    } table[] = {
-        {" \t\r\n", {}},
-        {"\t one\rtwo\nthree  four\t", {"one", "two", "three", "four"}},
-        {nul, {nul.substr(0, 3), "c"}},
-        {"a\vb\fc \xff", {"a\vb\fc", "\xff"}},  // only four separators
-    };
-    for (const auto& row : table) {
-        EXPECT_EQ(tokens(row.text), row.expected) << row.text;
-    }
-}
 
 TEST(Text, FindBytes) {
     const struct {
@@ -59,7 +29,6 @@ TEST(Text, FindBytes) {
         int at;
     } table[] = {
         {"Modem Assert", "Assert", 6},
-        {"As", "Assert", -1},
         {"", "A", -1},
         {"abc", "", -1},
         {std::string("a\0b\0c", 5), std::string("\0c", 2), 3},

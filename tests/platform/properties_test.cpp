@@ -112,7 +112,6 @@ TEST_F(Properties, FileGrammar) {
         std::string file;
         std::string expected;  // of the property "k"
     } cases[] = {
-        {"", "DEFAULT"},
         {"k=v\r\n", "v"},
         {"k=\n", ""},
         {"k=old\na=1\nk=new\n", "new"},

@@ -59,46 +59,25 @@ protected:
     size_t m_descriptors;
 };
 
-TEST_F(Sockets, NameIsThatOfTheRoot) {
-    const struct {
-        const char* root;
-        std::string expected;
-    } cases[] = {
-        {nullptr, m_name},
-        {"rel/../h1//", m_name + "@rel/../h1//"},
-    };
-    for (const auto& c : cases) {
-        if (c.root) {
-            setenv("KESTMODEM_ROOT", c.root, 1);
-        }
-        const int fd = server(m_name);
-        ASSERT_GE(fd, 0);
-        EXPECT_EQ(bound_name(fd), c.expected);
-        EXPECT_TRUE(fcntl(fd, F_GETFD) & FD_CLOEXEC);
-        EXPECT_FALSE(fcntl(fd, F_GETFL) & O_NONBLOCK);
-        close(fd);
-    }
-}
-
-TEST_F(Sockets, LongestName) {
+TEST_F(Sockets, NameIsThatOfTheRootUpToTheLongest) {
     const size_t longest = sizeof(sockaddr_un::sun_path) - 1;
-    for (const size_t root_len : {size_t(0), size_t(50)}) {
-        setenv("KESTMODEM_ROOT", std::string(root_len, 'r').c_str(), 1);
+    for (const std::string root : {"", "rel/../h1//"}) {
+        setenv("KESTMODEM_ROOT", root.c_str(), 1);
+        const std::string suffix = root.empty() ? "" : "@" + root;
         std::string name = m_name;
-        name.resize(longest - (root_len ? root_len + 1 : 0), 'n');
+        name.resize(longest - suffix.size(), 'n');
         const int listening = server(name);
         const int connected = client(name);
-        EXPECT_EQ(bound_name(listening).size(), longest);
-        EXPECT_GE(connected, 0);
-        EXPECT_TRUE(fcntl(connected, F_GETFD) & FD_CLOEXEC);
-        close(listening);
-        close(connected);
+        EXPECT_EQ(bound_name(listening), name + suffix);
+        for (int fd : {listening, connected}) {
+            EXPECT_EQ(fcntl(fd, F_GETFD), FD_CLOEXEC);
+            EXPECT_FALSE(fcntl(fd, F_GETFL) & O_NONBLOCK);
+            close(fd);
+        }
         name += 'n';
         EXPECT_TRUE(server(name) == -1 && errno == ENAMETOOLONG);
         EXPECT_TRUE(client(name) == -1 && errno == ENAMETOOLONG);
     }
-    setenv("KESTMODEM_ROOT", std::string(5000, 'r').c_str(), 1);
-    EXPECT_TRUE(server(m_name) == -1 && errno == ENAMETOOLONG);
 }
 
 TEST_F(Sockets, FailuresTellTheReason) {
@@ -107,7 +86,6 @@ TEST_F(Sockets, FailuresTellTheReason) {
     ASSERT_GE(fd, 0);
     EXPECT_TRUE(server(m_name) == -1 && errno == EADDRINUSE);
     close(fd);
-    EXPECT_TRUE(client(m_name) == -1 && errno == ECONNREFUSED);
     EXPECT_TRUE(server("") == -1 && errno == EINVAL);
     for (int name_space :
          {ANDROID_SOCKET_NAMESPACE_RESERVED, ANDROID_SOCKET_NAMESPACE_FILESYSTEM}) {

@@ -15,7 +15,8 @@ protected:
     FailingMediumTest()
         : m_entry{"cp_gnss", CT_GNSS, true, 0, 0},
           m_channel(&m_ctrl, &m_ctrl.multiplexer(), &m_entry, &m_mgr) {
-        EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &m_ctrl.multiplexer()), 0);
+        static Multiplexer mux;  // outlives the manager
+        EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &mux), 0);
         m_store = m_mgr.create_storage(&m_channel);
     }
     int write_later(const std::string& data) {

@@ -2,6 +2,8 @@
 
 #include <errno.h>
 
+#include <algorithm>
+
 #include "storage/StorageFixture.h"
 
 namespace {
@@ -11,7 +13,7 @@ const std::string STAMP = "-cp_wcn-2016-03-01_09-15-00.log";
 
 class LogFileTest : public StorageTest {
 protected:
-    LogFileTest() { start(); }
+    void SetUp() override { start(); }
     ~LogFileTest() override { check_sums(internal()); }
 
     LogFile* make(const std::string& name = "f") {
@@ -20,61 +22,48 @@ protected:
     std::string content() const { return m_root.read_file(REL + "f"); }
 };
 
-TEST_F(LogFileTest, StagingBoundary) {
+// 65,536 bytes leave the stage with one call. Whatever a short or failing one leaves, the file
+// in the end holds exactly the bytes taken, and the next write works.
+TEST_F(LogFileTest, StagedShortAndFailingWrites) {
+    constexpr size_t ALL = SIZE_MAX;
     const struct {
         size_t staged;
         size_t len;
-        int write_calls;
-        int writev_calls;
-    } cases[] = {{0, 65535, 0, 0},   {0, 65536, 1, 0}, {1, 65534, 0, 0},     {1, 65535, 0, 1},
-                 {65000, 536, 0, 1}, {65535, 0, 0, 0}, {65535, 70000, 0, 1}, {0, 0, 0, 0}};
+        faults::Call call;  // NUM_CALLS: none
+        int error;
+        size_t moved;  // bytes that the call transfers
+        ssize_t result;
+    } cases[] = {
+        {0, 65535, faults::NUM_CALLS, 0, 0, 65535}, {1, 65534, faults::NUM_CALLS, 0, 0, 65534},
+        {65535, 0, faults::NUM_CALLS, 0, 0, 0},     {0, 65536, faults::WRITE, 0, ALL, 65536},
+        {1, 65535, faults::WRITEV, 0, ALL, 65535},  {65000, 1000, faults::WRITEV, 0, 64999, 0},
+        {65000, 1000, faults::WRITEV, 0, 65000, 0}, {65000, 1000, faults::WRITEV, 0, 65001, 1},
+        {0, 70000, faults::WRITE, ENOSPC, 0, -2},   {10, 70000, faults::WRITEV, EIO, 0, -1}};
     for (const auto& c : cases) {
         SCOPED_TRACE(std::to_string(c.staged) + "+" + std::to_string(c.len));
-        const std::string data = pattern_bytes(c.staged + c.len, 1);
-        LogFile* file = make();
-        EXPECT_EQ(static_cast<ssize_t>(c.staged), file->write(data.data(), c.staged));
-        faults::reset();
-        EXPECT_EQ(static_cast<ssize_t>(c.len), file->write(data.data() + c.staged, c.len));
-        EXPECT_EQ(c.write_calls, faults::calls(faults::WRITE));
-        EXPECT_EQ(c.writev_calls, faults::calls(faults::WRITEV));
-        EXPECT_EQ(data.size(), file->size());
-        check_sums(internal());
-        EXPECT_EQ(0, file->close());
-        EXPECT_EQ(0, file->close());
-        EXPECT_EQ(data, content());
-        m_dir->remove_file(file);
-    }
-}
-
-// Whatever a short or failing write leaves, the file in the end holds exactly the bytes
-// taken, and the next write works.
-TEST_F(LogFileTest, ShortAndFailingWrites) {
-    const struct {
-        size_t staged;
-        size_t len;
-        int error;
-        size_t moved;  // without an error
-        ssize_t result;
-    } cases[] = {{65000, 1000, 0, 1, 0},     {65000, 1000, 0, 64999, 0}, {65000, 1000, 0, 65000, 0},
-                 {65000, 1000, 0, 65001, 1}, {0, 70000, ENOSPC, 0, -2},  {10, 70000, ENOSPC, 0, -2},
-                 {10, 70000, EIO, 0, -1}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(std::to_string(c.error) + " " + std::to_string(c.moved));
         LogCapture log;
         const std::string data = pattern_bytes(c.staged + c.len, 2);
         LogFile* file = make();
-        file->write(data.data(), c.staged);
-        const faults::Call call = c.staged ? faults::WRITEV : faults::WRITE;
-        c.error ? faults::fail(call, 1, c.error) : faults::shorten(call, c.moved);
-        EXPECT_EQ(c.result, file->write(data.data() + c.staged, c.len));
-        EXPECT_EQ(c.error ? 1u : 0u, log.count("write(const void*, size_t): write file failed [" +
-                                               std::to_string(c.error) + "("));
+        EXPECT_EQ(file->write(data.data(), c.staged), static_cast<ssize_t>(c.staged));
+        faults::reset();
+        if (c.error) {
+            faults::fail(c.call, 1, c.error);
+        } else if (c.call != faults::NUM_CALLS) {
+            faults::shorten(c.call, c.moved);
+        }
+        EXPECT_EQ(file->write(data.data() + c.staged, c.len), c.result);
+        EXPECT_EQ(faults::calls(faults::WRITE), c.call == faults::WRITE ? 1 : 0);
+        EXPECT_EQ(faults::calls(faults::WRITEV), c.call == faults::WRITEV ? 1 : 0);
+        EXPECT_EQ(log.count("write(const void*, size_t): write file failed [" +
+                            std::to_string(c.error) + "("),
+                  c.error ? 1u : 0u);
         const size_t taken = c.staged + (c.error ? 0 : static_cast<size_t>(c.result));
-        EXPECT_EQ(taken, file->size());
-        EXPECT_EQ(c.moved, content().size());
-        EXPECT_EQ(4, file->write("next", 4));
-        file->close();
-        EXPECT_EQ(data.substr(0, taken) + "next", content());
+        EXPECT_EQ(file->size(), taken);
+        EXPECT_EQ(content().size(), std::min(c.moved, data.size()));
+        EXPECT_EQ(file->write("next", 4), 4);
+        EXPECT_EQ(file->close(), 0);
+        EXPECT_EQ(file->close(), 0);
+        EXPECT_EQ(content(), data.substr(0, taken) + "next");
         m_dir->remove_file(file);
     }
 }
@@ -83,91 +72,90 @@ TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
     LogFile* file = make();
     const std::string data = pattern_bytes(1000, 5);
     faults::shorten(faults::WRITE, 300);
-    EXPECT_EQ(1000, file->write_data(data.data(), data.size()));  // goes on after a short write
-    EXPECT_EQ(1000, file->write_raw(data.data(), data.size()));
+    EXPECT_EQ(file->write_data(data.data(), data.size()), 1000);  // goes on after a short write
+    EXPECT_EQ(file->write_raw(data.data(), data.size()), 1000);
     faults::fail(faults::WRITE, 1, ENOSPC, 2);
-    EXPECT_EQ(-1, file->write_data("x", 1));
-    EXPECT_EQ(-2, file->write_raw("x", 1));
+    EXPECT_EQ(file->write_data("x", 1), -1);
+    EXPECT_EQ(file->write_raw("x", 1), -2);
     faults::fail(faults::WRITE, 1, EIO);
-    EXPECT_EQ(-1, file->write_raw("x", 1));
+    EXPECT_EQ(file->write_raw("x", 1), -1);
     faults::shorten(faults::WRITE, 0);
-    EXPECT_EQ(-1, file->write_raw("x", 1));  // no endless loop
-    EXPECT_EQ(0u, file->size());
+    EXPECT_EQ(file->write_raw("x", 1), -1);  // no endless loop
+    EXPECT_EQ(file->size(), 0u);
     // A failed flush drops what was staged, and the sizes with it.
     file->write("lost", 4);
     faults::shorten(faults::WRITE, 1);
     faults::fail(faults::WRITE, 2, ENOSPC);
     file->flush();
-    EXPECT_EQ(1u, file->size());
+    EXPECT_EQ(file->size(), 1u);
     check_sums(internal());
     file->write("kept", 4);
     file->flush();
-    EXPECT_EQ(data + data + "lkept", content());
-    EXPECT_EQ(5u, file->size());
+    EXPECT_EQ(content(), data + data + "lkept");
+    EXPECT_EQ(file->size(), 5u);
 }
 
 TEST_F(LogFileTest, OpenAndClosed) {
     const size_t before = open_descriptors();
     LogFile* file = make();
-    EXPECT_EQ(0644u, mode_of(m_root.path(REL + "f")));
-    EXPECT_EQ(FD_CLOEXEC, fcntl(file->fd(), F_GETFD));
-    EXPECT_EQ(-1, file->open());
-    EXPECT_EQ(before + 1, open_descriptors());
+    EXPECT_EQ(fcntl(file->fd(), F_GETFD), FD_CLOEXEC);
+    EXPECT_EQ(file->open(), -1);
+    EXPECT_EQ(open_descriptors(), before + 1);
     file->write("0123456789", 10);
     file->close();
     file->flush();
     EXPECT_TRUE(file->write("x", 1) == -1 && file->write_data("x", 1) == -1);
-    EXPECT_EQ(-1, file->copy("/dev/null"));
+    EXPECT_EQ(file->copy("/dev/null"), -1);
     faults::fail(faults::OPEN, 1, ENOSPC);
-    EXPECT_EQ(-1, file->open());
+    EXPECT_EQ(file->open(), -1);
     // A link, which a card may hold, does not lead out of the log tree.
     const std::string path = m_root.path(REL + "f"), away = m_root.path("away");
-    ASSERT_EQ(0, rename(path.c_str(), away.c_str()) + symlink(away.c_str(), path.c_str()));
-    EXPECT_EQ(-1, file->open());
-    ASSERT_EQ(0, unlink(path.c_str()) + rename(away.c_str(), path.c_str()));
+    ASSERT_EQ(rename(path.c_str(), away.c_str()) + symlink(away.c_str(), path.c_str()), 0);
+    EXPECT_EQ(file->open(), -1);
+    ASSERT_EQ(unlink(path.c_str()) + rename(away.c_str(), path.c_str()), 0);
     // An existing file is written from its start, not cut; the destructor writes out.
-    EXPECT_EQ(0, file->open());
+    EXPECT_EQ(file->open(), 0);
     file->write("ab", 2);
     ObjectRef<LogFile> ref(file);
     internal().clear();
     EXPECT_FALSE(ref);
-    EXPECT_EQ("ab23456789", content());
-    EXPECT_EQ(before, open_descriptors());
+    EXPECT_EQ(content(), "ab23456789");
+    EXPECT_EQ(open_descriptors(), before);
 }
 
 TEST_F(LogFileTest, RotateRenumberRemove) {
-    const std::pair<std::string, std::string> cases[] = {
-        {"0", "1"}, {"9", "10"}, {"007", "8"},       {"4294967295", ""},
-        {"", ""},   {"x", ""},   {"42949672950", ""}};
+    const struct {
+        std::string number, next;
+    } cases[] = {{"007", "8"}, {"4294967295", ""}, {"x", ""}, {"42949672950", ""}};
     LogCapture log;
     for (const auto& c : cases) {
-        LogFile* file = make(c.first + STAMP);
-        EXPECT_EQ(c.second.empty() ? -1 : 0, file->rotate(m_dir->path()));
-        const std::string expected = (c.second.empty() ? c.first : c.second) + STAMP;
-        EXPECT_EQ(expected, file->name().string());
-        EXPECT_EQ(Names{expected}, m_root.list(REL));
+        LogFile* file = make(c.number + STAMP);
+        EXPECT_EQ(file->rotate(m_dir->path()), c.next.empty() ? -1 : 0);
+        const std::string expected = (c.next.empty() ? c.number : c.next) + STAMP;
+        EXPECT_EQ(file->name().string(), expected);
+        EXPECT_EQ(m_root.list(REL), Names{expected});
         m_dir->remove_file(file);
     }
     // A refused rename leaves the old name, in the object and on the medium.
     LogFile* file = make("5" + STAMP);
     faults::fail(faults::RENAME, 1, ENOSPC, 2);
-    EXPECT_EQ(-1, file->rotate(m_dir->path()));
-    EXPECT_EQ(-1, file->change_name_num(77));
+    EXPECT_EQ(file->rotate(m_dir->path()), -1);
+    EXPECT_EQ(file->change_name_num(77), -1);
     EXPECT_TRUE(log.has("rotate(const android::String8&): rename 5" + STAMP + " failed [28("));
     EXPECT_TRUE(log.has("rename number in 5" + STAMP + " failed [28("));
-    EXPECT_EQ(Names{"5" + STAMP}, m_root.list(REL));
-    EXPECT_EQ("5" + STAMP, file->name().string());
+    EXPECT_EQ(m_root.list(REL), Names{"5" + STAMP});
+    EXPECT_EQ(file->name().string(), "5" + STAMP);
     // So does a name that a file has, also one that nobody listed.
     m_root.write_file(REL + "6" + STAMP, "stranger");
-    EXPECT_EQ(-1, file->rotate(m_dir->path()));
+    EXPECT_EQ(file->rotate(m_dir->path()), -1);
     EXPECT_TRUE(log.has("rename 5" + STAMP + " failed [17(File exists)]"));
-    EXPECT_EQ("stranger", m_root.read_file(REL + "6" + STAMP));
-    EXPECT_EQ(0, unlink(m_root.path(REL + "6" + STAMP).c_str()));
-    EXPECT_EQ(0, file->change_name_num(77));
-    EXPECT_EQ(Names{"77" + STAMP}, m_root.list(REL));
-    EXPECT_EQ(0, file->remove(m_dir->path()));
+    EXPECT_EQ(m_root.read_file(REL + "6" + STAMP), "stranger");
+    EXPECT_EQ(unlink(m_root.path(REL + "6" + STAMP).c_str()), 0);
+    EXPECT_EQ(file->change_name_num(77), 0);
+    EXPECT_EQ(m_root.list(REL), Names{"77" + STAMP});
+    EXPECT_EQ(file->remove(m_dir->path()), 0);
     EXPECT_FALSE(file->exists());
-    EXPECT_EQ(0, file->remove(m_dir->path()));
+    EXPECT_EQ(file->remove(m_dir->path()), 0);
 }
 
 }  // namespace

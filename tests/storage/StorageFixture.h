@@ -64,14 +64,14 @@ protected:
         umask(m_umask);
     }
 
-    void init() { ASSERT_EQ(0, m_mgr.init(m_root.path("sd").c_str(), nullptr, nullptr)); }
+    void init() { EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, nullptr), 0); }
     // The set of now and in it the directory of cp_wcn, with what is found there.
     void start() {
         init();
         bool new_dir = false;
         m_set = internal().create_cp_set();
         m_dir = m_set->prepare_cp_dir("cp_wcn", new_dir);
-        ASSERT_NE(nullptr, m_dir);
+        ASSERT_NE(m_dir, nullptr);
     }
     void plug_card() { m_root.set_prop("init.svc.fuse_sdcard0", "running"); }
     void pull_card() { m_root.set_prop("init.svc.fuse_sdcard0", "stopped"); }
@@ -79,9 +79,9 @@ protected:
     MediaStorage& external() { return *m_mgr.get_media(MT_EXTERNAL); }
 
     // Makes a file of a size that takes no space.
-    void put(const std::string& rel, off_t size) {
+    void put(const std::string& rel, uint64_t size) {
         m_root.write_file(rel, "");
-        ASSERT_EQ(0, truncate(m_root.path(rel).c_str(), size));
+        EXPECT_EQ(truncate(m_root.path(rel).c_str(), static_cast<off_t>(size)), 0);
     }
 
     // Every size is the sum of the sizes below. extra: bytes known to be left in the totals
@@ -96,13 +96,13 @@ protected:
                 for (const LogFile* file : dir->files()) {
                     files += file->counted();
                 }
-                EXPECT_EQ(files, dir->size()) << dir->path().string();
+                EXPECT_EQ(dir->size(), files) << dir->path().string();
                 dirs += dir->size();
             }
-            EXPECT_EQ(dirs + set_extra, set->size()) << set->path().string();
+            EXPECT_EQ(set->size(), dirs + set_extra) << set->path().string();
             sets += set->size();
         }
-        EXPECT_EQ(sets + media_extra, media.size());
+        EXPECT_EQ(media.size(), sets + media_extra);
     }
 
     TestRoot m_root;
