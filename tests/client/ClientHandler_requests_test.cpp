@@ -1,6 +1,4 @@
 // Every request in every form, by what the client reads and what is logged.
-#include <gtest/gtest.h>
-
 #include <map>
 #include <regex>
 #include <sstream>
@@ -9,7 +7,7 @@
 
 namespace {
 
-class ClientRequestsTest : public ClientFixture {
+class ClientRequestsTest : public ControlFixture {
 protected:
     // What request handlers have logged, without their names; "[E]" for errno.
     std::string logged() {
@@ -35,11 +33,9 @@ protected:
 const struct {
     const char *request, *reply, *log;
 } CASES[] = {
-    {"GET_LOG_STATE WCDMA", "OK OFF", ""},
     {"GET_LOG_STATE", "ERROR 2", "GET_LOG_STATE no param [E]"},
     {"GET_LOG_STATE cp_wcdma", "ERROR 9", "GET_LOG_STATE invalid CP type [E]"},
     {"DISABLE_IQ", "ERROR 2", "DISABLE_IQ no param [E]"},
-    {"DISABLE_IQ WCDMA GSM", "ERROR 2", "DISABLE_IQ unknown I/Q type [E]"},
     {"DISABLE_IQ GNSS", "ERROR 3", "disable_iq error -7 [E]"},
     {"DISABLE_IQ WCDMA", "OK", ""},
     {"ENABLE_IQ", "ERROR 2", "ENABLE_IQ no param [E]"},
@@ -53,13 +49,11 @@ const struct {
     {"SAVE_SLEEP_LOG AG-DSP", "ERROR 2", "SAVE_SLEEP_LOG|SAVE_SLEEP_LOG unknown CP [E]"},
     {"SAVE_SLEEP_LOG WCDMA\r", "ERROR 5", "SAVE_SLEEP_LOG|Save sleep log error -3 [E]"},
     {"SAVE_RINGBUF", "ERROR 2", "SAVE_RINGBUF|SAVE_RINGBUF no param [E]"},
-    {"SAVE_RINGBUF WCN WCN", "ERROR 2", "SAVE_RINGBUF|SAVE_RINGBUF extra parameter [E]"},
     {"SAVE_RINGBUF WCN", "ERROR 5", "SAVE_RINGBUF|Save ringbuf error -3 [E]"},
     {"ENABLE_LOG", "ERROR 2", "ENABLE_LOG "},
     {"ENABLE_LOG WCDMA X", "ERROR 2", "ENABLE_LOG  WCDMA X"},
     {"ENABLE_LOG WCDMA TD TDD-LTE FDD-LTE 5MODE WCN", "ERROR 2",
      "ENABLE_LOG  WCDMA TD TDD-LTE FDD-LTE 5MODE WCN"},
-    {"GET_LOG_STATE WCDMA", "OK OFF", ""},
     {"ENABLE_LOG \t GNSS TD\tTDD-LTE AG-DSP WCDMA\r", "OK",
      "ENABLE_LOG  \t GNSS TD\tTDD-LTE AG-DSP WCDMA\r"},
     {"DISABLE_LOG", "ERROR 2", "DISABLE_LOG "},
@@ -69,7 +63,6 @@ const struct {
     {"FLUSH now", "ERROR 1", ""},
     {"DISABLE_LOG WCDMA", "OK", "DISABLE_LOG  WCDMA"},
     {"GET_LOG_STATE WCDMA", "OK OFF", ""},
-    {"kestctl", "ERROR 1", ""},
     {"kestctl again clear", "ERROR 1", ""},
     {"kestctl reload more", "ERROR 3", "reload kest.conf"},  // there is no file
     {"kestctl clear more", "OK", "remove CP log"},
@@ -78,22 +71,19 @@ const struct {
     {"SET_LOG_FILE_SIZE 18446744073709551617", "ERROR 2", "SET_LOG_FILE_SIZE invalid size [E]"},
     {"SET_LOG_FILE_SIZE 7 8", "ERROR 2", "SET_LOG_FILE_SIZE 7"},
     {"SET_LOG_FILE_SIZE 0", "OK", "SET_LOG_FILE_SIZE 0"},
-    {"GET_LOG_FILE_SIZE", "OK 0", "GET_LOG_FILE_SIZE 0"},
     {"SET_LOG_FILE_SIZE 4294967295\r", "OK", "SET_LOG_FILE_SIZE 4294967295"},
     {"GET_LOG_FILE_SIZE", "OK 4294967295", "GET_LOG_FILE_SIZE 4294967295"},
     {"GET_LOG_FILE_SIZE x", "ERROR 2", "GET_LOG_FILE_SIZE invalid param [E]"},
     {"SET_DATA_MAX_SIZE", "ERROR 2", "SET_DATA_MAX_SIZE no param [E]"},
     {"SET_DATA_MAX_SIZE -1", "ERROR 2", "SET_DATA_MAX_SIZE invalid param [E]"},
-    {"GET_DATA_MAX_SIZE", "OK 25", "GET_DATA_MAX_SIZE 25"},
     {"SET_DATA_MAX_SIZE 000000000000000000000000000012", "OK", "SET_DATA_MAX_SIZE 12"},
     {"GET_DATA_MAX_SIZE", "OK 12", "GET_DATA_MAX_SIZE 12"},
     {"GET_DATA_MAX_SIZE 12", "ERROR 2", "GET_DATA_MAX_SIZE invalid param [E]"},
     {"SET_SD_MAX_SIZE \r", "ERROR 2", "SET_SD_MAX_SIZE no param [E]"},
     {"SET_SD_MAX_SIZE +1", "ERROR 2", "SET_SD_MAX_SIZE invalid size [E]"},
-    {"GET_SD_MAX_SIZE", "OK 250", "GET_SD_MAX_SIZE 250"},
     {"SET_SD_MAX_SIZE 300", "OK", "SET_SD_MAX_SIZE 300"},
     {"GET_SD_MAX_SIZE", "OK 300", "GET_SD_MAX_SIZE 300"},
-    {"GET_LOG_OVERWRITE", "OK ENABLE", "GET_LOG_OVERWRITE ENABLE"},
+    {"GET_SD_MAX_SIZE x", "ERROR 2", "GET_SD_MAX_SIZE invalid param [E]"},
     {"DISABLE_LOG_OVERWRITE 1", "ERROR 2", "DISABLE_LOG_OVERWRITE invalid param [E]"},
     {"DISABLE_LOG_OVERWRITE", "OK", "DISABLE_LOG_OVERWRITE"},
     {"GET_LOG_OVERWRITE", "OK DISABLE", "GET_LOG_OVERWRITE DISABLE"},
@@ -119,8 +109,6 @@ const struct {
     {"SUBSCRIBE WCN DUMP 1", "ERROR 2", "SUBSCRIBE more params than expected [E]"},
     {"SUBSCRIBE WCN DUMP\r", "OK", ""},
     {"UNSUBSCRIBE", "ERROR 2", "UNSUBSCRIBE no param [E]"},
-    {"UNSUBSCRIBE WCN", "ERROR 2", "UNSUBSCRIBE no <event> [E]"},
-    {"UNSUBSCRIBE WCN DUMP x", "ERROR 2", "UNSUBSCRIBE more params than expected [E]"},
     {"UNSUBSCRIBE WCN DUMP", "OK", ""},
     {"flush", "ERROR 1", "unknown request [E]"},
     {"FLUSHH", "ERROR 1", "unknown request [E]"},
@@ -162,7 +150,7 @@ TEST_F(ClientRequestsTest, TheTableOfRequestsTellsTheTruth) {
     Client client(TEST_SERVER);
     const auto reply_to = [&](const std::string& line) {
         EXPECT_TRUE(client.say(line + "\n"));
-        pump_until(mux(), [&] { return !client.heard().empty(); });
+        pump([&] { return !client.heard().empty(); });
         const std::string reply = client.heard();
         client.forget();
         return reply;
