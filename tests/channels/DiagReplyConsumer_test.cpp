@@ -10,24 +10,44 @@ const struct Kind {
     std::string file;
     int type;
     const char* not_served;
-    const char* open_failure;
     const char* timeout;
 } KINDS[] = {
     {"SAVE_RINGBUF WCDMA\n", "data:cp_wcdma_ringbuf", 0x3A, "ERROR 7\n",
-     "): LogFile* CpRingBufConsumer::open_file(): open ring buffer file ",
      "static void CpRingBufConsumer::ring_buffer_read_timeout(void*): read ring buffer timeout ["},
     {"SAVE_SLEEP_LOG WCDMA\n", "data:cp_wcdma_sleeplog", 0x3B, "ERROR 6\n",
-     "): LogFile* CpSleepLogConsumer::open_file(): open sleep log file ",
      "static void CpSleepLogConsumer::sleep_log_read_timeout(void*): read sleep log timeout ["},
 };
 
+const std::string NONE = "(none)";
+
 class DiagReplyTest : public FaultFixture {
 protected:
-    bool request(const Kind& kind, Client& client) {
+    // Starts the service with logs and a client that has its place in the loop.
+    void begin(bool one_device) {
+        boot_modem(one_device);
+        ASSERT_TRUE(both_log("<start>"));
+        client = std::make_unique<Client>();
+        ASSERT_EQ(ask(*client, "FLUSH\n", "OK\n"), "OK\n");
+    }
+    bool request(const Kind& kind) {
         diag_dev.forget();
-        return client.say(kind.request) &&
+        return client->say(kind.request) &&
                pump([&] { return diag_dev.received() == frame(kind.type, 0); });
     }
+    // The CP's log goes on over the diag device, once a second.
+    void log_for(int seconds) {
+        for (int i = 0; i < seconds; ++i) {
+            EXPECT_TRUE(supply(diag_dev, frame(0x98, 'd', "log")));
+            run_clock(1000);
+        }
+    }
+    std::string result_file(const Kind& kind) const {
+        const Files left = files();
+        const auto file = left.find(kind.file + STAMP + ".log");
+        return file == left.end() ? NONE : file->second;
+    }
+
+    std::unique_ptr<Client> client;
 };
 
 TEST_F(DiagReplyTest, EveryAnswerOfTheCp) {
@@ -39,165 +59,129 @@ TEST_F(DiagReplyTest, EveryAnswerOfTheCp) {
         const std::string other = frame(kind.type ^ 1, 1) + frame(kind.type ^ 1, 'd', "no") +
                                   frame(0x98, 0x64, "log") + raw_frame("short") + "noise";
         const struct {
+            const char* what;
             std::string bytes;
             std::string result;
-            std::string file;  // "-": none
+            std::string file;
         } cases[] = {
-            {reply('d', data) + reply('d') + reply('d', data) + reply(1), "OK\n", data + data},
-            {reply(1), "OK\n", ""},
-            {reply('d', "x") + reply(1, "ignored") + reply('d', "late"), "OK\n", "x"},
-            {other + reply('d', "a") + other + reply('d', "b") + other + reply(1), "OK\n", "ab"},
-            {reply(0), kind.not_served, "-"},
-            {reply('d', "a") + reply(0, "why"), kind.not_served, "-"},
-            {reply('d', "a") + reply(2), "ERROR 3\n", "-"},
-            {reply('e', "a"), "ERROR 3\n", "-"},
+            {"data", reply('d', data) + reply('d') + reply('d', data) + reply(1), "OK\n",
+             data + data},
+            {"nothing", reply(1), "OK\n", ""},
+            {"too much", reply('d', "x") + reply(1, "ignored") + reply('d', "late"), "OK\n", "x"},
+            {"others between", other + reply('d', "a") + other + reply('d', "b") + other + reply(1),
+             "OK\n", "ab"},
+            {"not served", reply('d', "a") + reply(0, "why"), kind.not_served, NONE},
+            {"unknown", reply('d', "a") + reply(2), "ERROR 3\n", NONE},
         };
-        for (bool one_device : {false, true}) {
-            boot_modem(one_device);
-            ASSERT_TRUE(both_log("<start>"));
-            Client client;
-            Client other_client;
-            ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
-            ASSERT_EQ(ask(other_client, "FLUSH\n", "OK\n"), "OK\n");
-            const auto before = resources();
-            for (const auto& c : cases) {
-                SCOPED_TRACE(kind.request + std::to_string(&c - cases));
-                ASSERT_TRUE(request(kind, client));
-                EXPECT_NE(modem()->state(), CWS_WORKING);
-                EXPECT_EQ(ask(other_client, kind.request, "ERROR 4\n"), "ERROR 4\n");
-                ASSERT_TRUE(supply(diag_dev, c.bytes));
-                EXPECT_EQ(hear(client, c.result), c.result);
-                EXPECT_EQ(modem()->state(), CWS_WORKING);
-                const Files left = files();
-                const auto file = left.find(kind.file + STAMP + ".log");
-                EXPECT_TRUE((file == left.end() ? "-" : file->second) == c.file);
-            }
-            EXPECT_EQ(resources(), before);
-            EXPECT_TRUE(both_log("<end>"));
-            end_service();
+        ASSERT_NO_FATAL_FAILURE(begin(kind.type == 0x3A));
+        Client other_client;
+        ASSERT_EQ(ask(other_client, "FLUSH\n", "OK\n"), "OK\n");
+        const auto before = resources();
+        for (const auto& c : cases) {
+            SCOPED_TRACE(kind.request + c.what);
+            ASSERT_TRUE(request(kind));
+            EXPECT_EQ(ask(other_client, kind.request, "ERROR 4\n"), "ERROR 4\n");
+            ASSERT_TRUE(supply(diag_dev, c.bytes));
+            EXPECT_EQ(hear(*client, c.result), c.result);
+            EXPECT_EQ(modem()->state(), CWS_WORKING);
+            EXPECT_TRUE(result_file(kind) == c.file);
         }
+        EXPECT_EQ(resources(), before);
+        EXPECT_TRUE(both_log("<end>"));
+        end_service();
     }
 }
 
-TEST_F(DiagReplyTest, FaultsOfTheStorageAndTheDevice) {
-    const std::string set = "data/modem_log/";
+TEST_F(DiagReplyTest, AResultThatCannotBeStored) {
+    const Kind& kind = KINDS[0];
+    const std::string block = frame(kind.type, 'd', std::string(32000, 'x'));
+    const std::string end = frame(kind.type, 1);
     const struct {
         const char* what;
-        bool at_start;
         std::function<void()> arrange;
+        std::string then;  // comes from the CP
         const char* message;
     } cases[] = {
-        {"no diag device", true,
-         [&] { modem()->set_dev_paths(own_log_dev.path().c_str(), "/nowhere"); }, ""},
-        {"no file", true, [] { faults::fail(faults::OPEN, 1, EROFS); }, ".log failed [30("},
-        {"no request", true, [] { faults::fail(faults::WRITE, 1, EAGAIN); }, ""},
-        {"request cut", true, [] { faults::shorten(faults::WRITE, 9); }, ""},
-        {"full", false, [] { faults::fail(faults::WRITEV, 1, ENOSPC); }, ""},
-        {"cut", false, [] { faults::shorten(faults::WRITEV, 64001); }, ""},
-        {"full at the end", false, [] { faults::fail(faults::WRITE, 1, ENOSPC); },
+        {"cut", [] { faults::shorten(faults::WRITEV, 64001); }, block, ""},
+        {"full at the end", [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end,
          ": result file of cp_wcdma is not complete [28("},
-        {"deleted", false,
+        {"deleted",
          [&] {
-             const std::string dir = set + root.list(set)[0] + "/cp_wcdma/";
+             const std::string dir =
+                 "data/modem_log/" + root.list("data/modem_log")[0] + "/cp_wcdma/";
              remove_tree(dir + root.list(dir).back());
          },
-         "is gone ["},
-        {"gone", false, [&] { remove_tree(set + root.list(set)[0] + "/cp_wcdma"); }, "is gone ["},
-        {"set gone", false, [&] { remove_tree(set + root.list(set)[0]); }, "is gone ["},
-        {"card pulled", false,
+         block, "is gone ["},
+        {"card pulled",
          [&] {
              set_card(false);
              remove_tree("sd");
              EXPECT_TRUE(feed(gnss_dev, "notices it"));
          },
-         "is gone ["},
+         block, "is gone ["},
     };
-    for (const Kind& kind : KINDS) {
-        for (const auto& c : cases) {
-            SCOPED_TRACE(kind.request + c.what);
-            root.make_dir("sd");
-            set_card(c.what == std::string("card pulled"));
-            boot_modem(false);
-            ASSERT_TRUE(both_log("<start>"));
-            Client client;
-            ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
-            const auto before = resources();
-            const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
-            if (c.at_start) {
-                c.arrange();
-                ASSERT_EQ(ask(client, kind.request, "ERROR 3\n"), "ERROR 3\n");
-                EXPECT_EQ(log.has(kind.open_failure), *c.message != '\0');
-            } else {
-                const bool end = c.what == std::string("full at the end");
-                ASSERT_TRUE(request(kind, client));
-                ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', std::string(32000, 'x')) +
-                                                 frame(kind.type, 'd', std::string(32000, 'x'))));
-                c.arrange();
-                const std::string more = frame(kind.type, 'd', std::string(3000, 'x'));
-                ASSERT_TRUE(supply(diag_dev, end ? frame(kind.type, 1) : more));
-                ASSERT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
-            }
-            EXPECT_TRUE(log.has(c.message)) << log.text();
-            repair();
-            EXPECT_EQ(files(), Files{});
-            if (logged("cp_wcdma", "<start>")) {
-                EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size);
-            }
-            EXPECT_EQ(modem()->state(), CWS_WORKING);
-            EXPECT_TRUE(both_log("<again>"));
-            EXPECT_EQ(resources(), before);
-            end_service();
-        }
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
+        const bool card = c.what == std::string("card pulled");
+        root.make_dir("sd");
+        set_card(card);
+        ASSERT_NO_FATAL_FAILURE(begin(false));
+        const auto before = resources();
+        const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
+        ASSERT_TRUE(request(kind));
+        ASSERT_TRUE(supply(diag_dev, block + block));
+        c.arrange();
+        ASSERT_TRUE(supply(diag_dev, c.then));
+        EXPECT_EQ(hear(*client, "ERROR 3\n"), "ERROR 3\n");
+        EXPECT_TRUE(log.has(c.message)) << log.text();
+        repair();
+        EXPECT_EQ(files(), Files{});
+        EXPECT_TRUE(card || ctrl->stor_mgr().get_media_stor()->size() == size);
+        EXPECT_TRUE(both_log("<again>"));
+        EXPECT_EQ(resources(), before);
+        end_service();
     }
 }
 
-TEST_F(DiagReplyTest, ACpThatIsSilentOrOnlyLogsFailsAndLeavesWhatItSent) {
-    boot_modem(true);
-    Client client;
-    const auto log_for = [&](int seconds) {
-        for (int i = 0; i < seconds; ++i) {
-            EXPECT_TRUE(supply(diag_dev, frame(0x98, 'd', "log")));
-            run_clock(1000);
-        }
-    };
-    for (int i = 0; i < 4; ++i) {
-        const Kind& kind = KINDS[i / 2];
-        const bool logs = i % 2;
-        ASSERT_TRUE(request(kind, client));
-        log_for(logs ? 29 : 0);
-        ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', "part")));
-        log_for(logs ? 29 : 0);
-        // A time-out that comes late, with more data waiting, is none.
-        ASSERT_TRUE(logs || diag_dev.put(frame(kind.type, 'd', "s") + "\x7e half a frame"));
-        run_clock(logs ? 999 : 3100);
-        EXPECT_EQ(diag_dev.unread(), 0u);
-        run_clock(logs ? 0 : 2900);
-        EXPECT_NE(modem()->state(), CWS_WORKING);
-        EXPECT_FALSE(log.has("timeout"));
-        run_clock(logs ? 1 : 150);
-        ASSERT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
-        EXPECT_EQ(files()[kind.file + STAMP + ".log"], logs ? "part" : "parts");
-        EXPECT_TRUE(log.has(kind.timeout));
+TEST_F(DiagReplyTest, ACpThatIsSilentFailsAndLeavesWhatItSent) {
+    ASSERT_NO_FATAL_FAILURE(begin(true));
+    for (const Kind& kind : KINDS) {
         log.clear();
+        ASSERT_TRUE(request(kind));
+        ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', "part")));
+        // A time-out that comes late, with more data waiting, is none.
+        ASSERT_TRUE(diag_dev.put(frame(kind.type, 'd', "s") + "\x7e half a frame"));
+        run_clock(3100);
+        EXPECT_EQ(diag_dev.unread(), 0u);
+        run_clock(2900);
+        EXPECT_NE(modem()->state(), CWS_WORKING);
+        run_clock(150);
+        EXPECT_EQ(hear(*client, "ERROR 3\n"), "ERROR 3\n");
+        EXPECT_EQ(result_file(kind), "parts");
+        EXPECT_EQ(log.count(kind.timeout), 1u);
     }
-    // Without a clock nothing would end an exchange that begins, or whose end is put off.
-    diag_dev.forget();
-    const size_t left = files().size();
-    boot_clock::fail();
-    EXPECT_EQ(modem()->save_ringbuf(nullptr), -1);
-    repair();
-    EXPECT_EQ(diag_dev.received(), "");
-    EXPECT_EQ(files().size(), left);
-    ASSERT_TRUE(request(KINDS[0], client));
+    // Without a clock nothing would end an exchange whose end is put off.
+    ASSERT_TRUE(request(KINDS[0]));
     ASSERT_TRUE(diag_dev.put("data"));
     mux().timer_mgr().add_timer(
         2999, [](void*) { boot_clock::fail(); }, nullptr);
     run_clock(3000);
     EXPECT_EQ(modem()->state(), CWS_WORKING);
-    repair();
-    EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
-    diag_dev.forget();
-    EXPECT_TRUE(both_log("<again>"));
+}
+
+TEST_F(DiagReplyTest, ACpThatOnlyLogsFailsThirtySecondsAfterItsLastAnswer) {
+    const Kind& kind = KINDS[1];
+    ASSERT_NO_FATAL_FAILURE(begin(true));
+    ASSERT_TRUE(request(kind));
+    log_for(29);
+    ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', "part")));
+    log_for(29);
+    run_clock(999);
+    EXPECT_EQ(modem()->state(), CWS_SAVE_SLEEP_LOG);
+    run_clock(1);
+    EXPECT_EQ(hear(*client, "ERROR 3\n"), "ERROR 3\n");
+    EXPECT_EQ(result_file(kind), "part");
+    EXPECT_EQ(log.count(kind.timeout), 1u);
 }
 
 }  // namespace

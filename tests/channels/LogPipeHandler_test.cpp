@@ -1,20 +1,16 @@
 #include "channels/LogPipeHandler.h"
 
-#include "channels/ChannelFixture.h"
-#include "storage/CpStorage.h"
+#include "channels/CrashFixture.h"
 #include "support/boot_clock.h"
 
 namespace {
 
-const char ALL_ON[] = "stream cp_wcdma on 5 3\nstream cp_wcn on 5 3\nstream cp_gnss on 5 3\n";
-const char ALL_OFF[] = "stream cp_wcdma off 5 3\nstream cp_wcn off 5 3\nstream cp_gnss off 5 3\n";
-const char REPLY[] = "\x40\x42\x0f\0cp-time!";  // 1000000 s
-
-class LogPipeHandlerTest : public ChannelFixture {
+class LogPipeHandlerTest : public CrashFixture {
 protected:
     LogPipeHandlerTest() {
         setenv("TZ", "UTC0", 1);
         tzset();
+        remove_tree("gnss");  // each test has a device of its own there, or none
     }
     ~LogPipeHandlerTest() override { boot_clock::real(); }
 
@@ -23,21 +19,7 @@ protected:
             pump_once(mux());
         }
     }
-    std::string cp_dir(const std::string& cp) const {
-        const std::vector<std::string> sets = root.list("data/modem_log");
-        return sets.empty() ? "none" : "data/modem_log/" + sets.back() + "/" + cp;
-    }
-    // The content of the CP's file whose name starts so, in the newest set.
-    std::string cp_file(const std::string& cp, const std::string& start) const {
-        for (const std::string& name : root.list(cp_dir(cp))) {
-            if (name.compare(0, start.size(), start) == 0) {
-                return root.read_file(cp_dir(cp) + "/" + name);
-            }
-        }
-        return "(none)";
-    }
 
-    const std::string record = std::string("\x78\x56\x34\x12") + std::string(REPLY, 12);
     LogPipeHandler* gnss = nullptr;
 };
 
@@ -154,57 +136,48 @@ TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
 
 // ---- CP events
 
+// The receiver has no dump; the rest is that of every CP.
 TEST_F(LogPipeHandlerTest, AssertSavesWhatIsWantedAndAliveRecovers) {
+    root.write_file("proc/cptl/mini_dump", "MINI");
     const struct {
-        CpType type;
-        const char *cp, *device, *reset_prop, *mini_dump;
-    } cps[] = {
-        {CT_WCDMA, "cp_wcdma", "log_w", "persist.sys.vexa.modemreset", "proc/cpw/mini_dump"},
-        {CT_WCN, "cp_wcn", "wcn", "persist.sys.vexa.wcnreset", "proc/cptl/mini_dump"},
-        {CT_GNSS, "cp_gnss", "gnss", "persist.sys.vexa.modemreset", "proc/cptl/mini_dump"},
+        const char *settings, *reset;
+        bool mini_dump;
+        std::vector<std::string> saved;
+        bool stays_open, tries_to_dump;
+    } cases[] = {
+        {"stream cp_gnss on 5 3\n", "1", false, {}, true, false},
+        {"stream cp_gnss on 5 3\n", "0x1", true, {"mini_dump"}, true, false},
+        {"stream cp_gnss on 5 3\n", "", true, {"mini_dump", "sblock", "sbuf", "smsg"}, false, true},
+        {"stream cp_gnss off 5 3\n", "2", false, {"sblock", "sbuf", "smsg"}, false, false},
     };
-    root.write_file("proc/cpw/mini_dump", pattern_bytes(70000, 1));
-    root.write_file("proc/cptl/mini_dump", pattern_bytes(300, 2));
     for (const char* name : {"smsg", "sbuf", "sblock"}) {
         root.write_file(std::string("d/dipx/") + name, name);
     }
-    for (const auto& cp : cps) {
-        // Bit 0: with a mini dump, bit 1: logging is on. "" counts as 0, "0x1" as 1.
-        for (const char* reset : {"1", "0x1", "", "2"}) {
-            for (int i = 0; i < 4; ++i) {
-                const bool mini_dump = i & 1;
-                const bool enabled = i & 2;
-                if (cp.type == CT_WCN && enabled) {
-                    continue;  // it would begin a dump
-                }
-                SCOPED_TRACE(std::string(cp.cp) + " reset=" + reset + " " + std::to_string(i));
-                root.set_prop(cp.reset_prop, reset);
-                const bool resets = strtoul(reset, nullptr, 0) == 1;
-                const Fifo fifo(root.path(cp.device));
-                ASSERT_EQ(boot(enabled ? ALL_ON : ALL_OFF), 0);
-                LogPipeHandler* channel = ctrl->get_cp(cp.type);
-                const size_t slots = polled();
-                log.clear();
-                channel->process_assert(mini_dump);
-                channel->process_assert(mini_dump);  // ignored
-                EXPECT_EQ(channel->state(), CWS_NOT_WORKING);
-                EXPECT_EQ(channel->fd() >= 0, enabled && resets);
-                EXPECT_EQ(log.has("Start dump transaction error"), enabled && !resets);
-                for (const std::string name : {"smsg", "sbuf", "sblock"}) {
-                    EXPECT_EQ(cp_file(cp.cp, name + "_2"), resets ? "(none)" : name);
-                }
-                EXPECT_TRUE(cp_file(cp.cp, "mini_dump_2") ==
-                            (mini_dump ? root.read_file(cp.mini_dump) : "(none)"));
-                EXPECT_EQ(root.list(cp_dir(cp.cp)).size(), (resets ? 0u : 3u) + mini_dump);
-                for (int alive = 0; alive < 2; ++alive) {
-                    channel->process_alive();
-                    EXPECT_EQ(channel->state(), CWS_WORKING);
-                    EXPECT_EQ(channel->fd() >= 0, enabled);
-                    EXPECT_EQ(polled(), slots);
-                }
-                end_service();
-            }
+    const Fifo fifo(root.path("gnss"));
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::string(c.settings) + "reset=" + c.reset);
+        root.set_prop("persist.sys.vexa.modemreset", c.reset);
+        ASSERT_EQ(boot(c.settings), 0);
+        gnss = ctrl->get_cp(CT_GNSS);
+        const size_t slots = polled();
+        gnss->process_assert(c.mini_dump);
+        gnss->process_assert(c.mini_dump);  // ignored
+        EXPECT_EQ(gnss->state(), CWS_NOT_WORKING);
+        EXPECT_EQ(gnss->fd() >= 0, c.stays_open);
+        EXPECT_EQ(log.count("Start dump transaction error"), c.tries_to_dump ? 1u : 0u);
+        std::vector<std::string> saved;
+        for (const auto& file : files("cp_gnss")) {
+            saved.push_back(
+                file.first.substr(5, file.first.find("_2") - 5));  // "data:name_2016..."
         }
+        EXPECT_EQ(saved, c.saved);
+        for (int alive = 0; alive < 2; ++alive) {
+            gnss->process_alive();
+            EXPECT_EQ(gnss->state(), CWS_WORKING);
+            EXPECT_EQ(gnss->fd() >= 0, gnss->enabled());
+            EXPECT_EQ(polled(), slots);
+        }
+        end_service();
     }
 }
 
@@ -213,32 +186,27 @@ TEST_F(LogPipeHandlerTest, AssertSavesWhatIsWantedAndAliveRecovers) {
 // version file.
 TEST_F(LogPipeHandlerTest, WhatHeadsALogFileAndItsDirectory) {
     root.set_prop("gsm.version.baseband", "MODEM_1.2|w=3");
-    const TimeServer time_service(std::string(REPLY, 12));
-    {
-        const Fifo modem(root.path("log_w")), gnss_dev(root.path("gnss"));
-        ASSERT_EQ(boot(ALL_ON), 0);
-        ASSERT_TRUE(feed(modem, "data") && feed(gnss_dev, "data"));
-        ctrl->flush();
-        EXPECT_EQ(content("cp_wcdma", record) + content("cp_gnss"), "datadata");
-        EXPECT_EQ(cp_file("cp_wcdma", "cp_wcdma.version"), "MODEM_1.2|w=3");
-        EXPECT_EQ(root.list(cp_dir("cp_gnss")).size(), 1u);
-        end_service();
-    }
-    for (CpType type : {CT_GNSS, CT_WCDMA}) {
-        const std::string device = root.path(type == CT_GNSS ? "gnss" : "log_w");
-        const Fifo fifo(device);
-        ASSERT_EQ(boot(ALL_OFF), 0);
-        LogPipeHandler* channel = ctrl->get_cp(type);
-        channel->set_log_diag_dev_path(device.c_str());
-        channel->process_assert(false);
-        EXPECT_EQ(channel->start(), 0);
-        channel->process_alive();
-        ASSERT_TRUE(feed(fifo, "data"));
-        channel->stop();
-        EXPECT_EQ(content(channel->name().string(), record), "data");
-        EXPECT_EQ(root.list(cp_dir(channel->name().string())).size(), 1u);
-        end_service();
-    }
+    const std::string record = "\x78\x56\x34\x12tttttttttttt";
+    const Fifo modem_dev(root.path("log_w")), fifo(root.path("gnss"));
+    ASSERT_EQ(boot("stream cp_wcdma on 5 3\nstream cp_gnss on 5 3\n"), 0);
+    ASSERT_TRUE(feed(modem_dev, "modem") && feed(fifo, "gnss"));
+    ctrl->flush();
+    EXPECT_EQ(content("cp_wcdma", record), "modem");
+    EXPECT_EQ(content("cp_gnss"), "gnss");
+    EXPECT_EQ(files("cp_wcdma"), (Files{{"data:cp_wcdma.version", "MODEM_1.2|w=3"}}));
+    EXPECT_EQ(files("cp_gnss"), Files{});
+    end_service();
+
+    ASSERT_EQ(boot("stream cp_gnss off 5 3\n"), 0);
+    gnss = ctrl->get_cp(CT_GNSS);
+    gnss->set_log_diag_dev_path(root.path("gnss").c_str());
+    gnss->process_assert(false);
+    EXPECT_EQ(gnss->start(), 0);
+    gnss->process_alive();
+    ASSERT_TRUE(feed(fifo, "data"));
+    gnss->flush();
+    EXPECT_EQ(content("cp_gnss", record), "data");
+    EXPECT_EQ(files("cp_gnss"), Files{});
 }
 
 TEST_F(LogPipeHandlerTest, EventsNeitherLeakNorOpenTwice) {
@@ -246,24 +214,17 @@ TEST_F(LogPipeHandlerTest, EventsNeitherLeakNorOpenTwice) {
     ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
     gnss = ctrl->get_cp(CT_GNSS);
     const size_t before = open_descriptors();
-    for (int i = 0; i < 200; ++i) {
-        root.set_prop("persist.sys.vexa.modemreset", i % 50 ? "1" : "0");
-        gnss->process_assert(false);
-        if (i % 3 == 0) {
-            gnss->stop();
-            ASSERT_EQ(polled(), 0u);
-            gnss->start();
-            ASSERT_EQ(gnss->fd(), -1) << "not before it is alive";
-        }
-        gnss->process_alive();
-        gnss->start();  // it is
-        ASSERT_EQ(polled(), 1u);
-        ASSERT_TRUE(i % 3 || open_descriptors() == before) << i;
-        ASSERT_TRUE(i % 50 || feed(fifo, "x"));
-    }
-    root.set_prop("persist.sys.vexa.modemreset", "0");
     gnss->process_assert(false);
-    EXPECT_EQ(content("cp_gnss"), "xxxx") << "nothing stays staged while the CP is down";
+    gnss->stop();
+    gnss->start();
+    EXPECT_EQ(gnss->fd(), -1) << "not before it is alive";
+    gnss->process_alive();
+    gnss->process_alive();
+    gnss->start();
+    EXPECT_EQ(open_descriptors(), before);
+    ASSERT_TRUE(feed(fifo, "x"));
+    gnss->process_assert(false);
+    EXPECT_EQ(content("cp_gnss"), "x") << "nothing stays staged while the CP is down";
 }
 
 }  // namespace

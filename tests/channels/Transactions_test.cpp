@@ -3,8 +3,21 @@
 
 namespace {
 
-enum Transaction { DUMP, RINGBUF, SLEEP_LOG };
-const char* const REQUESTS[] = {"dump", "SAVE_RINGBUF WCDMA\n", "SAVE_SLEEP_LOG WCDMA\n"};
+struct Transaction {
+    bool dump;
+    std::string request;  // of a client, for all but a dump
+    int diag_type;
+    const char* file;
+    const char* no_file;  // message
+};
+const Transaction DUMP = {true, "", 0, "_memory_",
+                          "open_dump_file(): open dump file cp_wcdma_memory"};
+const Transaction RINGBUF = {
+    false, "SAVE_RINGBUF WCDMA\n", 0x3A, "_ringbuf_",
+    "LogFile* CpRingBufConsumer::open_file(): open ring buffer file cp_wcdma_ringbuf"};
+const Transaction SLEEP_LOG = {
+    false, "SAVE_SLEEP_LOG WCDMA\n", 0x3B, "_sleeplog_",
+    "LogFile* CpSleepLogConsumer::open_file(): open sleep log file cp_wcdma_sleeplog"};
 const std::string START = "CP_DUMP_START WCDMA\n";
 const std::string END = "CP_DUMP_END WCDMA\n";
 
@@ -12,13 +25,13 @@ class TransactionsTest : public FaultFixture {
 protected:
     TransactionsTest() { faults::set_time(0); }
 
-    bool begin(Transaction transaction, Client& client) {
-        if (transaction == DUMP) {
+    bool begin(const Transaction& transaction, Client& client) {
+        if (transaction.dump) {
             return begin_dump();
         }
         diag_dev.forget();
-        return client.say(REQUESTS[transaction]) &&
-               pump([&] { return diag_dev.received().size() == 10; });
+        return client.say(transaction.request) &&
+               pump([&] { return diag_dev.received() == frame(transaction.diag_type, 0); });
     }
     size_t count_files(const std::string& part) const {
         size_t n = 0;
@@ -29,6 +42,48 @@ protected:
     }
 };
 
+TEST_F(TransactionsTest, OneThatCannotStartLeavesNothingBehind) {
+    const struct {
+        const char* what;
+        std::function<void()> arrange;
+        bool no_file, unheard;  // the CP hears nothing
+    } cases[] = {
+        {"no diag device", [&] { modem()->set_dev_paths(own_log_dev.path().c_str(), "/nowhere"); },
+         false, true},
+        {"no file", [] { faults::fail(faults::OPEN, 1, EROFS); }, true, false},
+        {"request cut", [] { faults::shorten(faults::WRITE, 1); }, false, false},
+        {"no clock", [] { boot_clock::fail(); }, false, true},
+    };
+    for (const Transaction& transaction : {DUMP, RINGBUF, SLEEP_LOG}) {
+        for (const auto& c : cases) {
+            SCOPED_TRACE(std::string(c.what) + " for " + transaction.file);
+            boot_modem(false);
+            ASSERT_TRUE(both_log("<start>"));
+            Client client;
+            ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
+            const auto before = resources();
+            faults::only_on(transaction.file);
+            c.arrange();
+            if (transaction.dump) {
+                modem()->process_assert(false);
+                EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+                EXPECT_TRUE(log.has("process_assert(bool): Start dump transaction error ["));
+            } else {
+                EXPECT_EQ(ask(client, transaction.request, "ERROR 3\n"), "ERROR 3\n");
+                EXPECT_EQ(modem()->state(), CWS_WORKING);
+            }
+            repair();
+            EXPECT_EQ(log.has(transaction.no_file), c.no_file);
+            EXPECT_EQ(files(), Files{}) << "no copy of the memory either";
+            modem()->process_alive();
+            EXPECT_TRUE(both_log("<again>"));
+            EXPECT_TRUE(!c.unheard || diag_dev.received().empty());
+            EXPECT_EQ(resources(), before);
+            end_service();
+        }
+    }
+}
+
 TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogsAgain) {
     const auto reset = [&](const char* value) {
         root.set_prop("persist.sys.vexa.modemreset", value);
@@ -36,37 +91,23 @@ TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogs
     const struct {
         const char* what;
         std::function<void()> interrupt;
-        CpWorkState dump_state;    // afterwards, when a dump runs
-        CpWorkState client_state;  // when a client's transaction runs
-        const char* dump_lines;    // what the subscriber hears then in all
-        const char* client_lines;
+        const Transaction& transaction;
+        CpWorkState state;  // afterwards
+        std::string lines;  // that the subscriber has heard then
     } cases[] = {
-        {"stop", [&] { modem()->stop(); }, CWS_NOT_WORKING, CWS_WORKING, "SE", ""},
-        {"assert", [&] { modem()->process_assert(false); }, CWS_DUMP, CWS_DUMP, "S", "S"},
+        {"stop", [&] { modem()->stop(); }, DUMP, CWS_NOT_WORKING, START + END},
+        {"stop", [&] { modem()->stop(); }, RINGBUF, CWS_WORKING, ""},
+        {"assert", [&] { modem()->process_assert(false); }, DUMP, CWS_DUMP, START},
+        {"assert", [&] { modem()->process_assert(false); }, RINGBUF, CWS_DUMP, START},
         {"assert of a CP that is reset",
-         [&] { reset("1"), modem()->process_assert(false), reset(""); }, CWS_DUMP, CWS_NOT_WORKING,
-         "S", ""},
-        {"alive", [&] { modem()->process_alive(); }, CWS_WORKING, CWS_WORKING, "SE", ""},
-        {"alive without a device",
-         [&] {
-             modem()->set_dev_paths("/nowhere", diag_dev.path().c_str());
-             modem()->process_alive();
-             modem()->set_dev_paths(log_dev->path().c_str(), diag_dev.path().c_str());
-         },
-         CWS_WORKING, CWS_WORKING, "SE", ""},
-        {"assert and alive", [&] { modem()->process_assert(false), modem()->process_alive(); },
-         CWS_WORKING, CWS_WORKING, "SE", "SE"},
-        {"stop and start", [&] { modem()->stop(), modem()->start(); }, CWS_NOT_WORKING, CWS_WORKING,
-         "SE", ""},
+         [&] { reset("1"), modem()->process_assert(false), reset(""); }, SLEEP_LOG, CWS_NOT_WORKING,
+         ""},
+        {"alive", [&] { modem()->process_alive(); }, DUMP, CWS_WORKING, START + END},
+        {"alive", [&] { modem()->process_alive(); }, SLEEP_LOG, CWS_WORKING, ""},
     };
-    for (int i = 0; i < 6; ++i) {
-        const bool one_device = i >= 3;
-        const Transaction transaction = static_cast<Transaction>(i % 3);
+    for (const bool one_device : {false, true}) {
         for (const auto& c : cases) {
-            if (one_device && std::string(c.what) == "alive without a device") {
-                continue;
-            }
-            SCOPED_TRACE(std::string(c.what) + " " + REQUESTS[transaction]);
+            SCOPED_TRACE(std::string(c.what) + " while " + c.transaction.file);
             boot_modem(one_device);
             ASSERT_TRUE(both_log("<start>"));
             Client client;
@@ -74,37 +115,28 @@ TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogs
             ASSERT_EQ(ask(subscriber, "SUBSCRIBE WCDMA DUMP\n", "OK\n"), "OK\n");
             ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
             const auto before = resources();
-            ASSERT_TRUE(begin(transaction, client));
+            ASSERT_TRUE(begin(c.transaction, client));
             c.interrupt();
-            EXPECT_EQ(modem()->state(), transaction == DUMP ? c.dump_state : c.client_state);
-            std::string lines;
-            for (const char* l = transaction == DUMP ? c.dump_lines : c.client_lines; *l; ++l) {
-                lines += *l == 'S' ? START : END;
-            }
-            EXPECT_EQ(hear(subscriber, lines), lines);
-            if (transaction != DUMP) {
+            EXPECT_EQ(modem()->state(), c.state);
+            EXPECT_EQ(hear(subscriber, c.lines), c.lines);
+            if (!c.transaction.dump) {
                 EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
             }
-            EXPECT_EQ(count_files("_memory_"), lines.empty() ? 0u : 1u);
+            EXPECT_EQ(count_files("_memory_"), c.lines.empty() ? 0u : 1u);
 
             // And back to normal, from whatever state.
             if (!modem()->enabled()) {
                 modem()->start();
             }
-            diag_dev.forget();
             modem()->process_alive();
             EXPECT_TRUE(both_log("<again>"));
-            const std::string end = lines == START ? END : "";
+            const std::string end = c.lines == START ? END : "";
             EXPECT_EQ(hear(subscriber, end), end);
             EXPECT_EQ(resources(), before);
-            // The next ones work and only they are answered.
+            // The next one works and only it is answered.
             ASSERT_TRUE(begin(RINGBUF, client));
             ASSERT_TRUE(supply(diag_dev, frame(0x3A, 1)));
             EXPECT_EQ(hear(client, "OK\n"), "OK\n");
-            ASSERT_TRUE(begin(DUMP, client));
-            ASSERT_TRUE(supply(diag_dev, end_marker()));
-            EXPECT_EQ(hear(subscriber, START + END), START + END);
-            pump_once(mux());
             EXPECT_EQ(client.heard() + subscriber.heard(), "");
             end_service();
         }
@@ -112,8 +144,9 @@ TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogs
 }
 
 TEST_F(TransactionsTest, TheClientMayLeaveOrTheServiceEnd) {
-    for (Transaction transaction : {RINGBUF, SLEEP_LOG}) {
-        boot_modem(transaction == RINGBUF);
+    for (const Transaction& transaction : {RINGBUF, SLEEP_LOG}) {
+        const bool one_device = transaction.diag_type == RINGBUF.diag_type;
+        boot_modem(one_device);
         auto client = std::make_unique<Client>();
         ASSERT_TRUE(begin(transaction, *client));
         client.reset();
@@ -121,16 +154,17 @@ TEST_F(TransactionsTest, TheClientMayLeaveOrTheServiceEnd) {
         pump_once(mux());
         // Its transaction goes on without it; nobody else is told.
         Client other;
-        EXPECT_EQ(ask(other, REQUESTS[transaction], "ERROR 4\n"), "ERROR 4\n");
-        ASSERT_TRUE(supply(diag_dev, frame(transaction == RINGBUF ? 0x3A : 0x3B, 1)));
+        EXPECT_EQ(ask(other, transaction.request, "ERROR 4\n"), "ERROR 4\n");
+        ASSERT_TRUE(supply(diag_dev, frame(transaction.diag_type, 1)));
         EXPECT_EQ(modem()->state(), CWS_WORKING);
         EXPECT_EQ(ask(other, "FLUSH\n", "OK\n"), "OK\n");
-        EXPECT_EQ(count_files(transaction == RINGBUF ? "_ringbuf_" : "_sleeplog_"), 1u);
+        EXPECT_EQ(count_files(transaction.file), 1u);
+        // The service ends with one running, a client's or a dump.
         const size_t descriptors = lasting_descriptors();
         ASSERT_TRUE(begin(transaction, other));
         ctrl.reset();
         EXPECT_LT(lasting_descriptors(), descriptors);
-        boot_modem(transaction == RINGBUF);
+        boot_modem(one_device);
         ASSERT_TRUE(begin(DUMP, other));
         end_service();
     }
@@ -171,7 +205,7 @@ TEST_F(TransactionsTest, ALoopWithoutRoomServesTransactions) {
         EXPECT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
         auto fillers = Filler::fill(mux());
         faults::fail(faults::WRITE, 1, EIO);
-        EXPECT_EQ(ask(client, REQUESTS[RINGBUF], "ERROR 3\n"), "ERROR 3\n");
+        EXPECT_EQ(ask(client, RINGBUF.request, "ERROR 3\n"), "ERROR 3\n");
         EXPECT_TRUE(both_log("<again>"));
         ASSERT_TRUE(begin_dump());
         ASSERT_TRUE(diag_dev.put(end_marker()));
