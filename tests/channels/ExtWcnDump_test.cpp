@@ -78,28 +78,32 @@ TEST_F(ExtWcnDumpTest, TheMarkerEndsTheDumpInAShortChunkOnly) {
 TEST_F(ExtWcnDumpTest, ADumpThatCannotBeStored) {
     boot_wcn();
     const size_t before = lasting_descriptors();
-    const std::function<void()> faults[] = {
-        [] { faults::fail(faults::WRITEV, 1, ENOSPC); },
-        [] { faults::shorten(faults::WRITEV, 60001); },
-        [&] { remove_tree("data/modem_log/" + root.list("data/modem_log").back() + "/cp_wcn"); },
+    const auto remove = [&] {
+        remove_tree("data/modem_log/" + root.list("data/modem_log").back() + "/cp_wcn");
     };
-    for (const auto& fault : faults) {
+    const std::string not_complete = ": dump of cp_wcn is not complete ";
+    const struct {
+        const char* what;
+        std::function<void()> arrange;
+        std::string then;  // comes from the chip
+        std::string message;
+    } cases[] = {
+        {"cut", [] { faults::shorten(faults::WRITEV, 60001); }, memory(30000), ""},
+        {"removed", remove, memory(30000), ""},
+        {"removed before the end", remove, MARKER, not_complete + "[2("},
+        // What is still staged then; the first write is that of this test.
+        {"full at the end", [] { faults::fail(faults::WRITE, 2, ENOSPC); }, MARKER,
+         not_complete + "[28("},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
         begin();
         ASSERT_TRUE(feed(wcn_dev, memory(30000)));
         ASSERT_TRUE(feed(wcn_dev, memory(30000)));
-        fault();
-        ASSERT_TRUE(feed(wcn_dev, memory(30000)));
-        EXPECT_EQ(files("cp_wcn"), Files{});
-        expect_over();
-    }
-    // The end of the dump is still staged, or has no file any more.
-    for (bool gone : {false, true}) {
-        begin();
-        ASSERT_TRUE(feed(wcn_dev, memory(30000)));
-        gone ? faults[2]() : faults::fail(faults::WRITE, 2, ENOSPC);  // after that of this test
-        ASSERT_TRUE(feed(wcn_dev, MARKER));
-        EXPECT_TRUE(
-            log.has(std::string(": dump of cp_wcn is not complete ") + (gone ? "[2(" : "[28(")));
+        c.arrange();
+        ASSERT_TRUE(feed(wcn_dev, c.then));
+        EXPECT_TRUE(log.has(c.message)) << log.text();
+        EXPECT_TRUE(c.then == MARKER || files("cp_wcn").empty());
         expect_over();
     }
     EXPECT_EQ(lasting_descriptors(), before + 1) << "the log file";

@@ -204,7 +204,7 @@ TEST_F(LogPipeHandlerTest, WhatHeadsALogFileAndItsDirectory) {
     EXPECT_EQ(gnss->start(), 0);
     gnss->process_alive();
     ASSERT_TRUE(feed(fifo, "data"));
-    gnss->flush();
+    gnss->stop();
     EXPECT_EQ(content("cp_gnss", record), "data");
     EXPECT_EQ(files("cp_gnss"), Files{});
 }

@@ -29,8 +29,8 @@ TEST_F(ClientHandlerTest, Framing) {
     Client client(TEST_SERVER);
     for (const auto& c : CASES) {
         talk_to_end(client, c.sent, c.replies);
-        // Split before its end.
-        ASSERT_TRUE(client.say("GET_LOG_FI"));
+        // Split before its end, after another one.
+        ASSERT_TRUE(client.say("\nGET_LOG_FI"));
         settle();
         ASSERT_EQ(client.heard(), "");
         talk(client, "LE_SIZE\n", "OK 5\n");

@@ -220,73 +220,63 @@ TEST_F(WcdmaIqManagerTest, AFailedStartUndoesEverything) {
     const size_t slots = Filler::free_slots(mux());
     const std::string path = root.path("dev/iq_mem"), away = path + "_";
     const struct {
-        std::function<void(bool)> set_broken;
-        size_t ioctls;
+        std::function<void()> break_it, mend_it;
         const char* message;
     } cases[] = {
-        {[&](bool on) { rename((on ? path : away).c_str(), (on ? away : path).c_str()); }, 0,
+        {[&] { rename(path.c_str(), away.c_str()); }, [&] { rename(away.c_str(), path.c_str()); },
          "prepare_iq_mem_map(): can not open /dev/iq_mem [2("},
-        {[&](bool on) { device.fail_ioctl(CMD_SET_IQ_CH_TYPE, on ? EBUSY : 0); }, 1,
+        {[&] { device.fail_ioctl(CMD_SET_IQ_CH_TYPE, EBUSY); },
+         [&] { device.fail_ioctl(CMD_SET_IQ_CH_TYPE, 0); },
          "prepare_iq_mem_map(): ioctl CMD_SET_IQ_CH_TYPE error [16("},
-        {[&](bool on) { device.fail_mmap(on ? ENOMEM : 0); }, 1,
+        {[&] { device.fail_mmap(ENOMEM); }, [&] { device.fail_mmap(0); },
          "prepare_iq_mem_map(): mmap error [12("},
-        {[&](bool on) { script.no_threads = on; }, 2, "mapped to 0x"},
-        {nullptr, 2, "mapped to 0x"},  // and one that does not fail
+        {[&] { script.no_threads = true; }, [&] { script.no_threads = false; }, "mapped to 0x"},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(&c - cases);
-        log.clear();
-        const size_t calls = device.count(CMD_SET_IQ_CH_TYPE);
-        if (c.set_broken) {
-            c.set_broken(true);
-            EXPECT_EQ(start(), -1);
-            c.set_broken(false);
-        } else {
-            EXPECT_EQ(start(), 0);
-            EXPECT_EQ(start(), -1) << "runs already";
-            EXPECT_TRUE(save("samples"));
-            EXPECT_EQ(iq->stop(), 0);
-        }
+        SCOPED_TRACE(c.message);
+        c.break_it();
+        EXPECT_EQ(start(), -1);
+        c.mend_it();
         EXPECT_TRUE(log.has(c.message)) << log.text();
         EXPECT_EQ(iq->state(), WcdmaIqManager::IQS_IDLE);
-        EXPECT_EQ(device.count(CMD_SET_IQ_CH_TYPE) - calls, c.ioctls);
-        EXPECT_TRUE(c.ioctls != 2 || device.ioctls(CMD_SET_IQ_CH_TYPE).back() == 0);
         EXPECT_EQ(device.maps(), 0u);
         EXPECT_EQ(open_descriptors(), descriptors);
         EXPECT_EQ(Filler::free_slots(mux()), slots);
     }
+    // Refused, switched on by the two after it, and off again by the one whose thread failed.
+    EXPECT_EQ(device.ioctls(CMD_SET_IQ_CH_TYPE), (std::vector<long>{1, 1, 1, 0}));
+    EXPECT_EQ(start(), 0);
+    EXPECT_EQ(start(), -1) << "runs already";
+    EXPECT_EQ(iq->stop(), 0);
+    EXPECT_EQ(device.ioctls(CMD_SET_IQ_CH_TYPE), (std::vector<long>{1, 1, 1, 0, 1, 0}));
+    EXPECT_EQ(Filler::free_slots(mux()), slots);
 }
 
 TEST_F(WcdmaIqManagerTest, SavesWhatIsWithinTheMappingAndFitsTheMedium) {
-    const uint32_t size = IQ_MEM_SIZE;
+    const uint32_t end = IQ_MEM_SIZE;
     const char *const outside = "is outside the mapping", *const full = "save WCDMA I/Q error";
     const struct {
+        const char* what;
         uint32_t offset, len, kept;
-        size_t half_at, fail_at;
+        size_t half_at, fail_at;  // as in the script
         const char* message;
     } cases[] = {
-        {7, 25 * MB, 25 * MB, 0, 0, ""},
-        {0, 10 * MB, 10 * MB, 0, 0, ""},
-        {0, 0, 0, 0, 0, ""},
-        {size - 1, 1, 1, 0, 0, ""},
-        {size, 0, 0, 0, 0, ""},
-        {size + 1, 0, 0, 0, 0, outside},
-        {size, 1, 0, 0, 0, outside},
-        {0, size + 1, 0, 0, 0, outside},
-        {1, size, 0, 0, 0, outside},
-        {UINT32_MAX, 1, 0, 0, 0, outside},
-        {1, UINT32_MAX, 0, 0, 0, outside},
-        {0, 25 * MB, 0, 0, 1, full},
-        {0, 25 * MB, 10 * MB, 0, 2, full},
-        {0, 25 * MB, 1000, 1, 2, full},
-        {0, 25 * MB, 10 * MB + 1000, 2, 3, full},
-        {0, 25 * MB, 25 * MB, 3, 0, ""},
+        {"three chunks", 7, 25 * MB, 25 * MB, 0, 0, ""},
+        {"the last byte", end - 1, 1, 1, 0, 0, ""},
+        {"nothing, at the end", end, 0, 0, 0, 0, ""},
+        {"nothing, behind the end", end + 1, 0, 0, 0, 0, outside},
+        {"one byte too many", 1, end, 0, 0, 0, outside},
+        {"offset of 32 bits", UINT32_MAX, 1, 0, 0, 0, outside},
+        {"length of 32 bits", 1, UINT32_MAX, 0, 0, 0, outside},
+        {"full", 0, 25 * MB, 0, 0, 1, full},
+        {"full in a chunk", 0, 25 * MB, 10 * MB + 1000, 2, 3, full},
+        {"taken in parts", 0, 25 * MB, 25 * MB, 3, 0, ""},
     };
     ASSERT_EQ(start(), 0);
     script.tick = 0;
     size_t num = 0;
     for (const auto& c : cases) {
-        SCOPED_TRACE(&c - cases);
+        SCOPED_TRACE(c.what);
         script.half_at = c.half_at;
         script.fail_at = c.fail_at;
         script.writes.clear();
@@ -305,7 +295,6 @@ TEST_F(WcdmaIqManagerTest, SavesWhatIsWithinTheMappingAndFitsTheMedium) {
               "data/modem_log/2016-03-01-09-15-00/cp_gnss/cp_gnss_wiq_2016-03-01_09-15-00.bin");
     device.fail_ioctl(CMD_GET_IQ_BUF_INFO, EIO);
     ASSERT_TRUE(save("never told"));
-    device.fail_ioctl(CMD_GET_IQ_BUF_INFO, 0);
     EXPECT_TRUE(log.has("process_save(): ioctl CMD_GET_IQ_BUF_INFO error [5("));
     EXPECT_EQ(newest(), "");
 }
@@ -402,11 +391,7 @@ TEST_F(WcdmaIqManagerTest, AThreadThatCannotPollNeitherSpinsNorIsStuck) {
 }
 
 TEST_F(WcdmaIqManagerTest, AFullTableOnlyDelaysTheCapture) {
-    std::vector<std::unique_ptr<Filler>> fillers;
-    while (Filler::free_slots(mux()) > 0) {
-        fillers.push_back(std::make_unique<Filler>(&mux()));
-        fillers.back()->add_events(POLLIN);
-    }
+    auto fillers = Filler::fill(mux());
     ASSERT_EQ(start(), 0);
     EXPECT_TRUE(log.has("no room to poll the I/Q saving thread, waiting for it ["));
     EXPECT_TRUE(log.has("no room to poll the I/Q memory device, waiting for it ["));
@@ -506,80 +491,97 @@ TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
 
 // ---- Every moment of a save, every way to disturb it
 
-enum Moment { BEFORE, IN_FIRST_CHUNK, BETWEEN_CHUNKS, AT_THE_END, ANSWERED, NUM_MOMENTS };
-enum Action { PAUSE, STOP, UNMOUNT, SET_GONE, CP_DIR_GONE, CLEAR, CLEAR_UNPAUSED, NUM_ACTIONS };
+// In steps of the script, for a save of two chunks.
+enum Moment : size_t {
+    BEFORE = 0,
+    IN_FIRST_CHUNK = 1,
+    BETWEEN_CHUNKS = 2,
+    AT_THE_END = 4,
+    ANSWERED = SIZE_MAX
+};
 
-class SaveMomentTest : public WcdmaIqManagerTest,
-                       public testing::WithParamInterface<std::tuple<int, int>> {};
+class SaveMomentTest : public WcdmaIqManagerTest, public testing::WithParamInterface<Moment> {
+protected:
+    // One save is done, another one is at that moment.
+    void begin() {
+        ASSERT_EQ(start(), 0);
+        ASSERT_TRUE(save("earlier"));
+        ASSERT_TRUE(begin_save(samples(11 * MB), GetParam()));
+        ASSERT_TRUE(GetParam() != ANSWERED || wait_until([&] {
+                        return script.saved_sent.load(std::memory_order_relaxed) == 2;
+                    }));
+        ASSERT_EQ(iq_files().size(), 2u);
+    }
+    // The thread has noticed after the chunk it was at.
+    void expect_written(size_t files) {
+        const bool whole = GetParam() >= AT_THE_END;
+        EXPECT_EQ(script.writes.size(), whole ? 2u : 1u);
+        ASSERT_EQ(iq_files().size(), files);
+        EXPECT_TRUE(files == 0 || newest() == samples((whole ? 11 : 10) * MB));
+    }
+    void expect_goes_on() {
+        ASSERT_TRUE(saved(2)) << "or again, when it was stopped";
+        ASSERT_TRUE(save("later"));
+        EXPECT_FALSE(log.has("received in state"));
+    }
+};
 
-TEST_P(SaveMomentTest, IsDisturbed) {
-    const int moment = std::get<0>(GetParam()), action = std::get<1>(GetParam());
+TEST_P(SaveMomentTest, Pause) {
+    ASSERT_NO_FATAL_FAILURE(begin());
+    EXPECT_EQ(iq->pause(), 0);
+    EXPECT_EQ(released(), 1u);
+    ASSERT_NO_FATAL_FAILURE(expect_written(2));
+    EXPECT_EQ(iq->num_files(), 2u);
+    EXPECT_EQ(iq->resume(), 0);
+    ASSERT_NO_FATAL_FAILURE(expect_goes_on());
+    EXPECT_EQ(newest(), "later");
+    expect_accounted();
+}
+
+TEST_P(SaveMomentTest, Stop) {
     const size_t descriptors = open_descriptors();
-    set_card(action == UNMOUNT ? "running" : "");
+    ASSERT_NO_FATAL_FAILURE(begin());
+    EXPECT_EQ(iq->stop(), 0);
+    EXPECT_EQ(open_descriptors(), descriptors);
+    EXPECT_EQ(device.maps(), 0u);
+    ASSERT_NO_FATAL_FAILURE(expect_written(2));
+    EXPECT_EQ(iq->resume(), -1);
     ASSERT_EQ(start(), 0);
-    ASSERT_TRUE(save("earlier"));
+    ASSERT_NO_FATAL_FAILURE(expect_goes_on());
+    expect_accounted();
+}
 
-    const size_t gates[NUM_MOMENTS] = {0, 1, 2, 4, SIZE_MAX};
-    ASSERT_TRUE(begin_save(samples(11 * MB), gates[moment]));
-    if (moment == ANSWERED) {
-        ASSERT_TRUE(
-            wait_until([&] { return script.saved_sent.load(std::memory_order_relaxed) == 2; }));
-    }
-    const auto files = iq_files();
-    ASSERT_EQ(files.size(), 2u);
-    const std::string set = files[0].substr(0, files[0].find("/cp_gnss"));
-
+TEST_P(SaveMomentTest, TheCardGoes) {
+    set_card("running");
+    ASSERT_NO_FATAL_FAILURE(begin());
     set_card("");
-    if (action == SET_GONE || action == CP_DIR_GONE) {
-        remove(action == SET_GONE ? set : set + "/cp_gnss");
-    }
-    if (action == PAUSE || action == CLEAR) {
-        EXPECT_EQ(iq->pause(), 0);
-        EXPECT_EQ(released(), 1u);
-    }
-    if (action == STOP) {
-        EXPECT_EQ(iq->stop(), 0);
-        EXPECT_EQ(open_descriptors(), descriptors);
-        EXPECT_EQ(device.maps(), 0u);
-    } else if (action == CLEAR || action == CLEAR_UNPAUSED) {
-        EXPECT_EQ(ctrl->clear_log(), 0);
-    } else if (action != PAUSE) {
-        log_data(action == CP_DIR_GONE ? CT_GNSS : CT_WCN);
-    }
-    const bool kept = action == PAUSE || action == STOP;
-    EXPECT_EQ(iq->num_files(), kept ? 2u : 0u);
-    EXPECT_EQ(log.has("WCDMA I/Q file is gone, its save ends"),
-              action == SET_GONE || action == CP_DIR_GONE || action == CLEAR_UNPAUSED);
-    // Where the thread notices: after the chunk it is at.
-    const bool whole = moment == AT_THE_END || moment == ANSWERED;
-    EXPECT_EQ(script.writes.size(), whole ? 2u : 1u);
-    if (kept || action == UNMOUNT) {
-        EXPECT_TRUE(root.read_file(files[1]) == samples((whole ? 11 : 10) * MB));
-    } else {
-        EXPECT_EQ(iq_files().size(), 0u);
-    }
+    log_data(CT_WCN);
+    EXPECT_EQ(iq->num_files(), 0u);
+    ASSERT_NO_FATAL_FAILURE(expect_written(2));
+    ASSERT_NO_FATAL_FAILURE(expect_goes_on());
+    EXPECT_EQ(root.read_file(iq_files()[0]), "later") << "on the internal medium";
+}
 
-    EXPECT_EQ(iq->resume(), action == STOP ? -1 : 0);
-    ASSERT_EQ(start(), action == STOP ? 0 : -1);
-    ASSERT_TRUE(saved(2)) << "or again, when it was stopped";
-    ASSERT_TRUE(save("later"));
-    EXPECT_EQ(root.read_file(iq_files()[action == UNMOUNT ? 0 : iq_files().size() - 1]), "later");
-    EXPECT_FALSE(log.has("received in state"));
-    // A directory that vanished by itself stays in the medium's total until the next scan.
-    if (action != UNMOUNT && action != CP_DIR_GONE) {
-        expect_accounted();
-    }
+TEST_P(SaveMomentTest, TheSetGoes) {
+    ASSERT_NO_FATAL_FAILURE(begin());
+    remove("data/modem_log/" + root.list("data/modem_log")[0]);
+    log_data(CT_WCN);
+    EXPECT_EQ(iq->num_files(), 0u);
+    EXPECT_TRUE(log.has("WCDMA I/Q file is gone, its save ends"));
+    ASSERT_NO_FATAL_FAILURE(expect_written(0));
+    ASSERT_NO_FATAL_FAILURE(expect_goes_on());
+    EXPECT_EQ(newest(), "later");
+    expect_accounted();
 }
 
 INSTANTIATE_TEST_SUITE_P(All, SaveMomentTest,
-                         testing::Combine(testing::Range<int>(0, NUM_MOMENTS),
-                                          testing::Range<int>(0, NUM_ACTIONS)));
+                         testing::Values(BEFORE, IN_FIRST_CHUNK, BETWEEN_CHUNKS, AT_THE_END,
+                                         ANSWERED));
 
 // ---- Driven by the channel
 
 TEST_F(WcdmaIqManagerTest, TheChannelDrivesItsCapture) {
     iq.reset();
-    const size_t before = open_descriptors();
     ASSERT_EQ(boot("iq cp_gnss WCDMA\nstream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
     const auto captured = [&](const std::string& content) {
         const size_t num = released();
@@ -595,7 +597,8 @@ TEST_F(WcdmaIqManagerTest, TheChannelDrivesItsCapture) {
     EXPECT_EQ(iq_files().size(), 0u);
     ASSERT_TRUE(captured("two"));
     EXPECT_EQ(iq_files().size(), 1u);
-    EXPECT_EQ(ctrl->disable_wcdma_iq(CT_GNSS) + ctrl->enable_wcdma_iq(CT_GNSS), 0);
+    EXPECT_EQ(ctrl->disable_wcdma_iq(CT_GNSS), 0);
+    EXPECT_EQ(ctrl->enable_wcdma_iq(CT_GNSS), 0);
     EXPECT_EQ(device.maps(), 0u) << "not before the next start";
     LogPipeHandler* gnss = ctrl->get_cp(CT_GNSS);
     gnss->stop();
@@ -605,8 +608,6 @@ TEST_F(WcdmaIqManagerTest, TheChannelDrivesItsCapture) {
     device.fail_mmap(ENOMEM);
     EXPECT_EQ(gnss->start(), 0);
     EXPECT_TRUE(log.has("start_logging(): start saving WCDMA I/Q error ["));
-    ctrl.reset();
-    EXPECT_LE(open_descriptors(), before);
 }
 
 }  // namespace

@@ -93,6 +93,10 @@ TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
 
     ExtWcnStateHandler wcn(ctrl.get(), &loop, SUPERVISOR);
     connect(wcn);
+    CpType type = CT_GNSS;
+    EXPECT_EQ(wcn.parse_notify(reinterpret_cast<const uint8_t*>("x"), 1, type),
+              CpStateHandler::CE_NONE);
+    EXPECT_EQ(type, CT_GNSS);
     say("Modem Assert WCN-EXTERNAL-DUMP", "30 bytes: Modem Assert WCN-EXTERNAL-DUMP");
     EXPECT_EQ(state(CT_WCN), CWS_NOT_WORKING);
     say("WCN-EXTERNAL-DUMP WCN-EXTERNAL-ALIVE", "36 bytes: WCN-EXTERNAL-DUMP WCN-EXTERNAL-ALIVE");
