@@ -524,6 +524,8 @@ protected:
         ASSERT_TRUE(save("later"));
         EXPECT_FALSE(log.has("received in state"));
     }
+
+    const char* const file_gone = "WCDMA I/Q file is gone, its save ends";
 };
 
 TEST_P(SaveMomentTest, Pause) {
@@ -556,6 +558,7 @@ TEST_P(SaveMomentTest, TheCardGoes) {
     ASSERT_NO_FATAL_FAILURE(begin());
     set_card("");
     log_data(CT_WCN);
+    EXPECT_FALSE(log.has(file_gone)) << "let go of before";
     EXPECT_EQ(iq->num_files(), 0u);
     ASSERT_NO_FATAL_FAILURE(expect_written(2));
     ASSERT_NO_FATAL_FAILURE(expect_goes_on());
@@ -567,7 +570,7 @@ TEST_P(SaveMomentTest, TheSetGoes) {
     remove("data/modem_log/" + root.list("data/modem_log")[0]);
     log_data(CT_WCN);
     EXPECT_EQ(iq->num_files(), 0u);
-    EXPECT_TRUE(log.has("WCDMA I/Q file is gone, its save ends"));
+    EXPECT_TRUE(log.has(file_gone));
     ASSERT_NO_FATAL_FAILURE(expect_written(0));
     ASSERT_NO_FATAL_FAILURE(expect_goes_on());
     EXPECT_EQ(newest(), "later");
