@@ -117,7 +117,7 @@ private:
     CpSetDirectory* m_working_set = nullptr;
     uint64_t m_size = 0;
     bool m_uncertain = false;         // something vanished since the last recount
-    unsigned int m_refusals = 0;      // checks that failed since the last recount
+    unsigned int m_refusals = 0;      // checks that failed in a row
     uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; at first enough
 };
 

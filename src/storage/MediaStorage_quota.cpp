@@ -48,6 +48,7 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
 
 int MediaStorage::check_quota() {
     if (m_quota == 0 || m_size <= m_quota) {
+        m_refusals = 0;
         return 0;
     }
     if (m_uncertain) {
@@ -96,9 +97,9 @@ bool MediaStorage::make_room_with_new_set() {
     if (!m_overwrite || !m_working_set || m_arrived < m_file_size) {
         return false;
     }
-    const CpSetDirectory* old = m_working_set;
+    const android::String8 old = m_working_set->path();  // the set itself may go
     const CpSetDirectory* set = create_cp_set();
-    if (!set || set == old) {
+    if (!set || set->path() == old) {
         return false;  // set names have one-second resolution: later
     }
     m_arrived = 0;

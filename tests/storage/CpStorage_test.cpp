@@ -160,6 +160,13 @@ TEST_F(CpStorageTest, QuotaWithoutOverwrite) {
     EXPECT_EQ(write("!"), 1);
     EXPECT_EQ(write("lost"), -1);
     EXPECT_EQ(content(log_name(0, 0)), "0123456789abcdekept!");
+    // What somebody deleted is let go of at the first refusal after a success.
+    m_mgr.set_data_part_size(100);
+    EXPECT_EQ(m_store->check_quota(MT_NONE), 0);
+    m_store->stop();
+    remove_tree(m_root.path(INT + SET + "cp_gnss/" + log_name(0, 0)).c_str());
+    m_mgr.set_data_part_size(1);
+    EXPECT_EQ(m_store->check_quota(MT_NONE), 0);
 }
 
 TEST_F(CpStorageTest, QuotaTrimsTheOldest) {
