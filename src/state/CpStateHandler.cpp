@@ -35,7 +35,8 @@ void make_line(const uint8_t* bytes, size_t len, char* text) {
 CpStateHandler::CpStateHandler(LogController* ctrl, Multiplexer* mux, const char* serv_name)
     : BufferedFdHandler(-1, ctrl, mux, BUFFER_SIZE),
       m_serv_name(serv_name),
-      m_reconnect_timer(&mux->timer_mgr(), reconnect, this) {}
+      m_reconnect_timer(&mux->timer_mgr(), reconnect, this),
+      m_young_timer(&mux->timer_mgr(), connection_lasts, this) {}
 
 CpStateHandler::~CpStateHandler() = default;
 
@@ -54,13 +55,17 @@ bool CpStateHandler::connect() {
     if (m_fd < 0) {
         return false;
     }
-    m_used = false;
+    m_young_timer.start(LASTING_MS);  // without a clock every connection counts as lasting
     poll_when_room(POLLIN, m_serv_name.string());
     return true;
 }
 
 void CpStateHandler::reconnect(void* handler) {
     static_cast<CpStateHandler*>(handler)->init();
+}
+
+void CpStateHandler::connection_lasts(void* handler) {
+    static_cast<CpStateHandler*>(handler)->note_alive();
 }
 
 int CpStateHandler::process_data() {
@@ -70,9 +75,6 @@ int CpStateHandler::process_data() {
     CpType type = CT_UNKNOWN;
     const CpEvent event = parse_notify(m_buffer.get(), m_data_len, type);
     if (event != CE_NONE) {
-        // A supervisor that says no more than some bytes before it closes is of no use.
-        m_used = true;
-        note_alive();
         m_log_ctrl->process_cp_evt(type, event);
     }
     m_data_len = 0;
@@ -80,7 +82,8 @@ int CpStateHandler::process_data() {
 }
 
 void CpStateHandler::process_conn_closed() {
-    if (!m_used) {
+    if (m_young_timer.pending()) {
+        m_young_timer.stop();
         note_idle(m_serv_name.string());
     }
     del_events(POLLIN);

@@ -1,8 +1,8 @@
 // Connection to a supervisor, a process that watches a CP and announces what happens to
 // it in short texts. Connects and reconnects for ever, hands what it reads to the
 // subclass to recognise, and passes events on to the LogController. A connection that
-// ends before it gave anything is an idle wake-up, so that a supervisor which accepts and
-// closes at once is not reconnected without end.
+// ends within LASTING_MS is an idle wake-up, whatever it told, so that a supervisor
+// which accepts and closes at once is not reconnected without end.
 //
 // Owned by the LogController. The supervisor's bytes are not trusted. Loop thread only.
 #ifndef STATE_CPSTATEHANDLER_H_
@@ -49,15 +49,18 @@ protected:
 
 private:
     static constexpr size_t BUFFER_SIZE = 256;
+    // A rest included: only after it is the end of a connection seen.
+    static constexpr unsigned int LASTING_MS = REST_MS + RECONNECT_MS;
 
     static CpEvent find_event(const uint8_t* buf, size_t len, const Pattern* patterns,
                               size_t pattern_num);
     static void reconnect(void* handler);
+    static void connection_lasts(void* handler);
     bool connect();
 
     const android::String8 m_serv_name;
-    bool m_used = false;  // the connection has told of an event
     OneShotTimer m_reconnect_timer;
+    OneShotTimer m_young_timer;  // the connection has not lasted yet
 };
 
 #endif  // STATE_CPSTATEHANDLER_H_
