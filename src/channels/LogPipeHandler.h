@@ -127,6 +127,7 @@ protected:
     void start_transaction(std::unique_ptr<DiagDeviceHandler> diag,
                            std::unique_ptr<DataConsumer> consumer, CpWorkState state);
     void stop_transaction(CpWorkState new_state);
+    void take_place_back(DiagDeviceHandler* diag);
     // Registers the diag handler, in place of the log device when both are one, binds it and
     // starts the consumer as a transaction. 0, or -1 without a diag handler and when the
     // consumer can not start. A handler that the loop has no room for is polled once there is

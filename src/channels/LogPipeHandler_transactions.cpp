@@ -123,7 +123,7 @@ int LogPipeHandler::run_transaction(std::unique_ptr<DiagDeviceHandler> diag,
     if (m_log_diag_same) {
         // Only the diag handler reads the device now. It takes this one's place in the loop,
         // which may have no other left.
-        del_events(POLLIN);
+        m_multiplexer->hand_over(this, diag.get());
     }
     diag->poll_when_room(POLLIN, (m_log_diag_same ? m_log_dev_path : m_diag_dev_path).string());
     consumer->bind(diag.get());
@@ -131,14 +131,17 @@ int LogPipeHandler::run_transaction(std::unique_ptr<DiagDeviceHandler> diag,
         start_transaction(std::move(diag), std::move(consumer), state);
         return 0;
     }
-    // Both go before the log device takes its place in the loop again.
     const SavedErrno start_errno;
-    consumer.reset();
-    diag.reset();
-    if (m_log_diag_same) {
+    take_place_back(diag.get());
+    return -1;
+}
+
+// The log device is polled again where the diag handler was polled for it.
+void LogPipeHandler::take_place_back(DiagDeviceHandler* diag) {
+    if (m_log_diag_same && m_fd >= 0) {
+        m_multiplexer->hand_over(diag, this);
         poll_dev();
     }
-    return -1;
 }
 
 void LogPipeHandler::start_transaction(std::unique_ptr<DiagDeviceHandler> diag,
@@ -149,12 +152,10 @@ void LogPipeHandler::start_transaction(std::unique_ptr<DiagDeviceHandler> diag,
 }
 
 void LogPipeHandler::stop_transaction(CpWorkState new_state) {
+    take_place_back(m_diag_handler.get());
     m_consumer.reset();
     m_diag_handler.reset();
     m_state = new_state;
-    if (m_log_diag_same && m_fd >= 0) {
-        poll_dev();
-    }
 }
 
 void LogPipeHandler::end_dump() {

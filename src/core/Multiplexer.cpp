@@ -68,6 +68,20 @@ void Multiplexer::forget(FdHandler* h) {
     }
 }
 
+void Multiplexer::hand_over(FdHandler* from, FdHandler* to) {
+    const size_t i = find(m_entries, from);
+    if (i < m_entries.size()) {
+        leave_pass(from);
+        m_entries.editItemAt(i).handler = to;
+        m_changed = true;
+        return;
+    }
+    const size_t waiting = find(m_waiting, from);
+    if (waiting < m_waiting.size()) {
+        m_waiting.editItemAt(waiting).handler = to;
+    }
+}
+
 void Multiplexer::remove_waiting(FdHandler* h, int events) {
     const size_t i = find(m_waiting, h);
     if (i < m_waiting.size()) {
@@ -79,13 +93,17 @@ void Multiplexer::remove_waiting(FdHandler* h, int events) {
     }
 }
 
-void Multiplexer::remove_entry(size_t index) {
-    // The current pass may still have to visit the handler's slot.
+// The current pass may still have to visit the handler's slot.
+void Multiplexer::leave_pass(const FdHandler* h) {
     for (size_t i = 0; i < m_poll_num; ++i) {
-        if (m_handlers[i] == m_entries[index].handler) {
+        if (m_handlers[i] == h) {
             m_handlers[i] = nullptr;
         }
     }
+}
+
+void Multiplexer::remove_entry(size_t index) {
+    leave_pass(m_entries[index].handler);
     m_entries.removeAt(index);
     if (!m_waiting.isEmpty()) {
         m_entries.push(m_waiting[0]);

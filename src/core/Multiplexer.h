@@ -37,6 +37,11 @@ public:
     // registered for are ignored.
     void unregister_fd(FdHandler* h, int events);
 
+    // Gives the place of from, or its turn for one, to a handler that is to be polled in its
+    // stead for the same events; others that wait do not come between. Nothing happens when
+    // from has neither.
+    void hand_over(FdHandler* from, FdHandler* to);
+
     // Removes h with all its events, for a handler that is being destroyed.
     void forget(FdHandler* h);
 
@@ -62,6 +67,7 @@ private:
 
     // Index of h's entry, or the number of entries when it has none.
     static size_t find(const android::Vector<PollEntry>& entries, const FdHandler* h);
+    void leave_pass(const FdHandler* h);
     void remove_entry(size_t index);
     void remove_waiting(FdHandler* h, int events);
     void build_poll_set();
