@@ -39,7 +39,9 @@ LogFile* CpDumpConsumer::open_dump_mem_file() {
 }
 
 void CpDumpConsumer::close_dump_file() {
-    if (m_dump_file) {
+    if (m_dump_file && !m_dump_file->exists()) {
+        discard_dump_file();
+    } else if (m_dump_file) {
         m_dump_file->close();
         m_dump_file = nullptr;
     }

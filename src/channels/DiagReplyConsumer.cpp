@@ -73,7 +73,9 @@ int DiagReplyConsumer::start_exchange(LogFile* file) {
 }
 
 void DiagReplyConsumer::close_file() {
-    if (m_file) {
+    if (m_file && !m_file->exists()) {
+        discard_file();
+    } else if (m_file) {
         m_file->close();
         m_file = nullptr;
     }

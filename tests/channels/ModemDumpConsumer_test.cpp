@@ -100,6 +100,17 @@ TEST_F(ModemDumpTest, SilentModemsAreCopiedFromTheKernel) {
     EXPECT_TRUE(log.has(where + root.path("proc/cpt/mem") + " failed. [2("));
 }
 
+TEST_F(ModemDumpTest, AFileThatWentUnderTheDumpDoesNotCount) {
+    boot_modem(false);
+    ASSERT_TRUE(both_log("<start>"));
+    ASSERT_TRUE(begin_dump());
+    const uint64_t size = ctrl->stor_mgr().get_media_stor()->size();
+    ASSERT_TRUE(supply(diag_dev, std::string(64000, 'x')));
+    remove_tree(dump_path());
+    modem()->process_alive();
+    EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size);
+}
+
 // The medium refuses the dump or the file goes away under it.
 TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
     const Files on_card{{"sd:" + DUMP_NAME + ".dmp", std::string(64000, 'x')}};
