@@ -118,9 +118,9 @@ void AgDspLogHandler::notify_pcm(FileNotifier* notifier, void* client) {
 void AgDspLogHandler::save_audio_log(FileNotifier* notifier, DspLogType type) {
     const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
     if (n < 0) {
-        if (errno == EAGAIN) {
+        if (errno == EAGAIN || errno == EINTR) {
             notifier->note_read(false);
-        } else if (errno != EINTR) {
+        } else {
             err_log("read PCM device error");
             notifier->close();
         }
@@ -153,10 +153,7 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
     int waited_ms = 0;  // since the last data
     for (;;) {
         const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
-        if (n < 0 && errno == EINTR) {
-            continue;
-        }
-        if (n < 0 && errno == EAGAIN) {
+        if (n < 0 && (errno == EAGAIN || errno == EINTR)) {
             if (!stored) {
                 // The dump has not begun: the loop tells when there is something to read.
                 notifier->note_read(false);

@@ -161,10 +161,7 @@ void LogPipeHandler::dev_gave_nothing() {
 }
 
 void LogPipeHandler::dev_read_failed() {
-    if (errno == EINTR) {
-        return;
-    }
-    if (errno != EAGAIN) {
+    if (errno != EAGAIN && errno != EINTR) {
         close_dev();
         if (open_dev() == 0) {
             poll_dev();
