@@ -69,6 +69,7 @@ int WcdmaIqManager::prepare_iq_mem_map() {
 }
 
 void WcdmaIqManager::release_iq_mem_map() {
+    const SavedErrno reason;
     ioctl(m_fd, CMD_SET_IQ_CH_TYPE, 0);
     munmap(m_mem_base, IQ_MEM_SIZE);
     m_mem_base = nullptr;
@@ -83,10 +84,12 @@ int WcdmaIqManager::start_save_thread() {
     }
     m_resp_handler = std::make_unique<IqStorRespHandler>(pair[0], m_log_ctrl, m_multiplexer, this);
     m_thread_sock = pair[1];
-    if (pthread_create(&m_thread, nullptr, save_thread, this) != 0) {
+    const int error = pthread_create(&m_thread, nullptr, save_thread, this);
+    if (error != 0) {
         m_resp_handler.reset();
         ::close(m_thread_sock);
         m_thread_sock = -1;
+        errno = error;
         return -1;
     }
     m_resp_handler->poll_when_room(POLLIN, "the I/Q saving thread");
@@ -155,6 +158,7 @@ void WcdmaIqManager::poll_device() {
 }
 
 void WcdmaIqManager::release_buffer() {
+    const SavedErrno reason;
     ioctl(m_fd, CMD_RELEASE_IQ_BUF);
 }
 

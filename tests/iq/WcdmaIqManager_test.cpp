@@ -472,7 +472,7 @@ TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
     remove("data/modem_log");
     root.write_file("data/modem_log", "");
     ASSERT_TRUE(save("lost"));
-    EXPECT_EQ(log.count("process(int): create WCDMA I/Q file error ["), 1u);
+    EXPECT_EQ(log.count("process(int): create WCDMA I/Q file error [20("), 1u);
     remove("data/modem_log");
     script.refused_cmd = IQST_SAVE;
     ASSERT_TRUE(save("lost too"));
@@ -487,6 +487,13 @@ TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
     script.refused_cmd = IQST_QUIT;
     EXPECT_EQ(iq->stop(), 0);
     expect_accounted();
+    // The reason that is told is not that of the release, which fails as well.
+    ASSERT_EQ(start(), 0);
+    device.fail_ioctl(CMD_RELEASE_IQ_BUF, EBADMSG);
+    script.no_threads = true;
+    disconnect();
+    fill("lost");
+    EXPECT_TRUE(pump([&] { return log.has("process(int): no thread to save WCDMA I/Q [11("); }));
 }
 
 // ---- Every moment of a save, every way to disturb it
