@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Measures the log path: the same bytes go through a FIFO to the service, to cat and to
 // split -b 5M in turn, and the CPU time of each, start and end included, is compared.
 //

@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: Apache-2.0
 # shellcheck shell=bash
 # Sourced by the other scripts, with the checkout as the current directory: what they need,
 # and builds that show their progress in one line.

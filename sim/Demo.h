@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The demo: one run of the service on a simulated handset with three CPs, with scenes of
 // what can happen to it, shown while it goes on and checked at the end.
 #ifndef SIM_DEMO_H_

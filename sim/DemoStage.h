@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Where the scenes of the demo are played: the handset with its CPs, supervisors and diag
 // sides, the service, and a client of the service. Whoever waits here keeps the handset
 // going meanwhile: the CPs are fed, the logs looked at and the progress shown.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The frames of the diag devices, as a CP writes and reads them: a flag byte, the escaped
 // body (an 8-byte header and the payload) and a flag byte.
 #ifndef SIM_DIAGFRAME_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Reads an audio DSP's log files and takes the chunks apart: the headers are checked, the
 // data of each source is put together again.
 #ifndef SIM_DSPLOGCHECK_H_

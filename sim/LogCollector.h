@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Watches the logs that the service writes for a simulated handset and checks them in the
 // end. Each scan opens every log file it has not seen before and keeps it open, so that a
 // file that the quota deletes later can still be read: every byte is checked, also those

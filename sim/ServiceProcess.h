@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // One run of the service against a simulated handset: started with the handset's root and
 // SD card in its environment, what it prints and logs in the file "kestmodem.log" of the
 // root, in a process group of its own so that Ctrl-C reaches only the simulator. It never

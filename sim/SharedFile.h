@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A file of fixed size that is mapped for as long as the object lives; sparse, so that it
 // takes the room of what was written to it only.
 #ifndef SIM_SHAREDFILE_H_

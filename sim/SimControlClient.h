@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A client of the service's control socket: sends requests, one a line, and tells the
 // replies apart from the dump notifications that come in between. Lines wait in the two
 // queues until they are asked for.

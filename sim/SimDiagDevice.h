@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A CP's diag device: a pseudo-terminal in raw mode. The service opens the path (a link
 // to the slave side), sends requests and reads replies; the simulator plays the CP on the
 // master side. The link is removed at the end.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A CP's side of the diag exchanges, on a thread of its own: waits at the diag device for
 // the service's requests (memory dump, ring buffer, sleep log) and plays the answer that
 // was planned for each of them, well, slowly, wrongly or never. An external chip's memory

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The audio DSP's devices: its log, its PCM capture and its memory dump, which becomes
 // readable when the DSP asserts and waits for the service to confirm that it has taken it.
 // The dump device needs the library kestsim_devices preloaded into the service, which is

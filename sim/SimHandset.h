@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The handset around the service: a root directory with the properties file, a default
 // configuration, the CPs' devices, the time service and an SD card that comes and goes.
 // Owns the devices and the time service and takes them away at its end; the root stays

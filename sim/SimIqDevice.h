@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The modem's I/Q memory device: 128 MiB of samples, a part of which is announced to the
 // service as a filled buffer and stays until the service releases it. Needs the library
 // kestsim_devices preloaded into the service, which is the device's driver. Everything is

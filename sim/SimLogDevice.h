@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A CP's log device: a FIFO that the service opens by its path, or a pseudo-terminal when
 // the service has to be able to send requests through it as well. The simulator keeps it
 // open on both sides, so neither side ever sees the other hang up and what was fed waits

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The modem's firmware image, as far as others read it: a header, entries, and among them
 // the database that the modem's logs are decoded with, behind its SHA-1 digest.
 #ifndef SIM_SIMMODEMIMAGE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The endless log stream of one simulated CP. Every byte is a pure function of the CP,
 // a seed and the byte's position, so nothing that was fed has to be remembered to be
 // checked. The stream consists of 32-byte blocks that carry their own number: a piece of

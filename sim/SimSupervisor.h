@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A supervisor of CPs: listens on its local socket ("modemd" or "external_wcn_kest", with
 // "@" and the root behind it) and announces what becomes of its CP. The service connects,
 // and connects again whenever it lost the connection. Needs no thread: connections wait

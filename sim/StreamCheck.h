@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Checks one CP's log against the stream that was fed. The contents of its files are
 // added in any order; every file says by its content which part of the stream it holds.
 // The result tells apart what the quota trimmed (deleted files that were still read),

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The handset's time service: the local socket "cp_time_sync_server" (with "@" and the
 // root behind it), answered on a thread of its own with 12 bytes for each connection:
 // seconds since 1970 (32 bits) and a running number (64 bits), both little-endian.

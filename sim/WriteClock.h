@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Notes when files in some directories are written to, on a thread of its own, so that
 // the gaps between the writes can be told. Files are told apart by directory only.
 #ifndef SIM_WRITECLOCK_H_

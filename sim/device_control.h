@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the simulator and the drivers that are preloaded into the service's process share:
 // for each device a small control file and a file with its memory, beside the device's
 // node, mapped on both sides. The node itself is a FIFO: a byte in it makes the device

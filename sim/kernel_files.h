@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The kernel's files that the service copies when a CP crashes: the CPs' memory and mini
 // dumps and the debug records of the inter-processor communication driver. Contents are
 // made from the file's name alone, so a copy can be checked without the original.

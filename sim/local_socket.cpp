@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "sim/local_socket.h"
 
 #include <errno.h>

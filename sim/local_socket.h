@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The handset's local sockets: stream sockets in the abstract namespace whose names carry
 // "@" and the handset's root behind them, so that several handsets run side by side.
 #ifndef SIM_LOCAL_SOCKET_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestsim: shows the service at work on a simulated handset and checks what it saves.
 #include <getopt.h>
 #include <signal.h>

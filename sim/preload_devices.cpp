@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The drivers of the I/Q memory device and of the audio DSP's dump device, preloaded into
 // the service's process: the C library's ioctl, mmap and read, for descriptors of these two
 // nodes in the handset's root. Every other descriptor's calls go on to the C library. The

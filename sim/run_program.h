@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Runs another program to its end.
 #ifndef SIM_RUN_PROGRAM_H_
 #define SIM_RUN_PROGRAM_H_

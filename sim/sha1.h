@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The SHA-1 digest: 20 bytes.
 #ifndef SIM_SHA1_H_
 #define SIM_SHA1_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A client asks for settings and changes one.
 #include <fstream>
 #include <iterator>

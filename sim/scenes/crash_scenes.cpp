@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A CP asserts: its memory and the crash records are saved, subscribers are told, and the
 // log goes on when the CP is alive again.
 #include "sim/DemoStage.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The audio DSP logs, delivers PCM data and asserts; all of it goes into one log.
 #include <algorithm>
 #include <filesystem>

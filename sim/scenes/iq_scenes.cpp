@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Buffers of I/Q samples are captured while the logs go on.
 #include <algorithm>
 #include <filesystem>

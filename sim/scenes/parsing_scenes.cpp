@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The database that the modem's logs are decoded with lies beside them, on each medium, and
 // follows the modem's firmware.
 #include "sim/DemoStage.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A client fetches the modem's ring buffer and sleep log while the modem goes on logging.
 #include "sim/DemoStage.h"
 #include "sim/scenes/scenes.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The SD card comes and goes; the logs follow it.
 #include "sim/DemoStage.h"
 #include "sim/scenes/scenes.h"

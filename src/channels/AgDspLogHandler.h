@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log channel of the audio DSP. It collects three sources, the log device, a PCM
 // capture device and a memory dump device, into the same rotating log files, each chunk
 // behind a DspChunkHeader. A readable dump device means that the DSP has asserted.

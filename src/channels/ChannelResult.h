@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the operations of a channel, and of the controller on channels, come to. They return
 // int: 0 for success, one of these otherwise; a reply code of the control socket stands for
 // each failure.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the consumers of CP memory dumps share: naming, opening and discarding the dump
 // files. Owned by the channel for one dump.
 #ifndef CHANNELS_CPDUMPCONSUMER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What subscribed control clients are told about a CP's memory dump.
 #ifndef CHANNELS_CPDUMPEVENT_H_
 #define CHANNELS_CPDUMPEVENT_H_

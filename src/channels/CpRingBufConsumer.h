@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Fetches a CP's ring buffer into a file. Owned by the channel for one transaction.
 #ifndef CHANNELS_CPRINGBUFCONSUMER_H_
 #define CHANNELS_CPRINGBUFCONSUMER_H_

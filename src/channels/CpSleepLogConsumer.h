@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Fetches a CP's sleep log into a file. Owned by the channel for one transaction.
 #ifndef CHANNELS_CPSLEEPLOGCONSUMER_H_
 #define CHANNELS_CPSLEEPLOGCONSUMER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Interprets what one transaction reads from a CP's diag device, keeps the result in
 // the CP's storage and reports the outcome once.
 //

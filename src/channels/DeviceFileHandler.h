@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Reads a device into a buffer and hands each chunk to its subclass. Made for the
 // duration of one exchange with a CP and owned by the channel that runs it. The device
 // is opened from a path and closed with the handler, or borrowed from the channel and

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The diag device of a CP during a transaction: feeds what it reads to the
 // transaction's DataConsumer. Owned by the channel, like the consumer.
 #ifndef CHANNELS_DIAGDEVICEHANDLER_H_

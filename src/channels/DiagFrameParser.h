@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The frames of the diag devices: 0x7E, the escaped body, 0x7E. In the body a byte
 // 0x7D or 0x7E is sent as 0x7D and the byte XOR 0x20; there is no checksum. The body
 // begins with a DiagHeader. Each frame carries an opening flag of its own.

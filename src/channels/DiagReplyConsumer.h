@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the ring buffer and the sleep log consumers share: one request frame to the CP,
 // the payload of its data frames into a file, until an end frame, a refusal, an error, a
 // silence of 3 seconds or 30 seconds of frames that are no answer. Owned by the channel for

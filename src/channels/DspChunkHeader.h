@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The header before each chunk in the audio DSP's log files: it tells the chunk's kind
 // and length, so that a decoder can separate log, PCM and dump data. 20 bytes,
 // little-endian.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Saves the memory of the connectivity chip, which the chip pushes over its diag device
 // on its own after a crash, raw into a ".dmp" file, until a fixed text ends the stream.
 // There is no request and no time-out. Owned by the ExtWcnLogHandler for one dump.

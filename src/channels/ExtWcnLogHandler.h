@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log channel of the external wireless-connectivity chip. Owned by the LogController.
 #ifndef CHANNELS_EXTWCNLOGHANDLER_H_
 #define CHANNELS_EXTWCNLOGHANDLER_H_

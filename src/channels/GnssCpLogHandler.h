@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log channel of the GNSS receiver. It has no diag device dump. Owned by the LogController.
 #ifndef CHANNELS_GNSSCPLOGHANDLER_H_
 #define CHANNELS_GNSSCPLOGHANDLER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log channel of one CP. Owns the CP's log device and copies everything it yields
 // into the CP's storage, reopens the device when it fails, reacts to the CP's assert
 // and alive events and runs the exchanges over the CP's diag device.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of LogPipeHandler that heads a new directory with the version file and a new log
 // file with the time record.
 #include <cutils/properties.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of LogPipeHandler that reacts to the events of its CP and runs the transactions
 // over the diag device.
 #include <cutils/properties.h>

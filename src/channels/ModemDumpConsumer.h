@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Saves the memory of an asserted modem, which the modem sends over its diag device
 // after a short request, raw into a ".dmp" file. When the stream breaks off, the
 // kernel's memory file of the modem is copied into a ".mem" file instead.

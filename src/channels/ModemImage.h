@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The container of the modem's firmware image, as far as the log parsing database in it
 // goes. All integers are little-endian. Nothing in an image is trusted: the parser logs
 // nothing and says what is wrong, the channel that asked turns that into a message.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Asks the CP time service, a local server of the handset, for the time that heads a log
 // file. Made for one question. It blocks, but not for much longer than a second, whatever
 // the service does. Logs nothing.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The record that heads every log file of a modem: it pairs the CP's time base with
 // the time of day, so that a decoder can place the CP's own time. 16 bytes,
 // little-endian.

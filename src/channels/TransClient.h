@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Who waits for the result of a channel's transaction, as the channel knows it. Not owned by
 // the channel, which holds an ObjectRef: a waiter may go at any time.
 #ifndef CHANNELS_TRANSCLIENT_H_

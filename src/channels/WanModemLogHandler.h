@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log channel of a cellular modem in one of its radio modes. Owned by the LogController.
 #ifndef CHANNELS_WANMODEMLOGHANDLER_H_
 #define CHANNELS_WANMODEMLOGHANDLER_H_

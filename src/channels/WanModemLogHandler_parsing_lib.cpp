@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of WanModemLogHandler that keeps the modem's log parsing database beside its
 // logs: taken from the firmware image, with the digest that tells whether it is current.
 #include <cutils/properties.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // How a modem's memory dump ends: the payload of its last diag frame.
 #ifndef CHANNELS_MODEM_DUMP_END_H_
 #define CHANNELS_MODEM_DUMP_END_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A handler that reads a stream of text from a peer into a fixed buffer and leaves the
 // meaning of the bytes to its subclass: control clients and CP supervisors. Never reads
 // more than the buffer holds. Loop thread only.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // One connection to the control socket: splits what the client sends into requests,
 // carries them out through the LogController and answers each with one line.
 //

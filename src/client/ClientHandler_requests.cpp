@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What each request does. Every handler checks its parameters, logs, calls the
 // controller and replies, and does nothing else.
 #include "channels/LogPipeHandler.h"

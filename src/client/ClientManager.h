@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The control server: owns the listening socket and the handler of every connected
 // client, and serves a limited number of clients at once; further ones wait unaccepted.
 //

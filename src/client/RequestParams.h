@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The parameters of a control request: a reader that takes one after the other in the
 // forms that requests use. It does not own the text, which need not be NUL-terminated,
 // and never looks beyond it. What is wrong with a parameter is for the request's own

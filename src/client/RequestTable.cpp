@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Which handler carries out which request.
 #include "client/RequestTable.h"
 

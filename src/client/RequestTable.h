@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The requests of the control socket, one per row. Plain data, without the handlers:
 // ClientHandler must have a handler for each row, kestctl derives its commands, help and
 // completion from the rows, and tests compare the documents with them.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Reads a configuration file line by line. Owned by the reader of one file, on its stack;
 // closes the file in the end.
 //

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The co-processors (CPs) and all their names. The configuration files, the control
 // requests and the system properties each have their own vocabulary; one table in
 // CpType.cpp holds them all, and the functions below look up in it. All names are

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Reader of the general logging service's configuration file, of which only the CP log
 // streams and the global switch matter here; every other line is skipped. Lives for one
 // reload request: created, filled by one read_config(), iterated and destroyed.

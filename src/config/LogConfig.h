@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The service's settings: defaults, overridden by the command line and by the settings
 // file, changed by control requests and written back whole by save(). Also finds from
 // system properties what the handset's build decides: the modem type, the CPs' devices

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the readers of the two configuration files share: tokens, number fields and the
 // arguments that stream lines have in common.
 //

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Every system property and environment variable that the service reads, in one
 // place. Their values belong to the handset's build and are used as given.
 #ifndef CONFIG_PROPERTY_NAMES_H_

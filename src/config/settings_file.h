@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The settings file on its medium: written so that neither a kill nor a full partition
 // costs the settings, and made from the system default when there is none.
 //

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The central object of the service. Owns the event loop, the storage manager, one log
 // channel per configured CP, the control server and the connections to the supervisors
 // for the life of the process; brings the service up, carries out the control operations,

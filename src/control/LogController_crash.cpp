@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of LogController that saves what tells of a crash: the mini dump of the CP and
 // the records of the inter-processor communication driver.
 #include "control/LogController.h"

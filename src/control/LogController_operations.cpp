@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The control operations of LogController: what the requests of the clients do.
 #include <stddef.h>
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Base of every object that owns a descriptor the service waits on. The object is the
 // identity of its registration with the Multiplexer; it owns its descriptor, so
 // destroying a handler unregisters it and closes the descriptor. Handlers are owned by

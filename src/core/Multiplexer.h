@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The event loop of the service. All input passes through it: it polls the descriptors
 // of the registered handlers, runs the timers that are due and calls the handlers that
 // are ready. Owned by the LogController for the whole life of the process; handlers are

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // References that cannot dangle. A class whose objects are owned and destroyed by
 // one owner while others still hold pointers to them derives from RefTarget; the
 // holders keep an ObjectRef instead of a plain pointer. When the object is destroyed,

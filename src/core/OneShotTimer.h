@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A timer that its owner can start, start again and stop any number of times; it calls back
 // once for each start that is not taken back. A member of its owner, which it does not
 // outlive: a pending timer is stopped with it. In the callback the timer is no longer

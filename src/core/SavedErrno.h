@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Keeps errno across clean-up: what a scope does after it has made one of these does not
 // change the errno that its caller sees.
 #ifndef CORE_SAVEDERRNO_H_

@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "core/TimerManager.h"
 
 #include <limits.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // One-shot timers in order of expiry, on the clock that keeps counting while the handset
 // sleeps. A member of the Multiplexer, which sleeps until the earliest timer and then has
 // the due ones run. Owns the timers: one that has fired or was cancelled is deleted, and

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Diagnostics of the whole service. Every message begins with the full signature
 // of the function that logs it; a message about a failure ends with errno and its
 // text. Both macros give one line at error priority under the tag "KESTCP" and

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Entry point: builds the configuration and the controller, prepares the process and
 // hands the thread to the event loop. Exit status 255: the configuration cannot be
 // read; 2: the storage cannot be initialised. Otherwise the process runs until killed.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Opening of files that somebody else may have put in place: settings, kernel records, what
 // lies on a card. Where a regular file is expected there may be a FIFO, a device, a socket
 // or a directory, and an ordinary open() of a FIFO waits for ever for its other end. These

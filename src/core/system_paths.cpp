@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "core/system_paths.h"
 
 #include <stdlib.h>

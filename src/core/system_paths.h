@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Every path and socket name of the outside world that the service itself fixes,
 // in one place, and the one function that turns such a path into the path to use.
 // Paths that come from a property or from the environment are used as given and

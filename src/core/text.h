@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Helpers on byte ranges: a pointer and a length, never NUL-terminated text. Every
 // parser of requests, messages, file names and configuration lines is built on them;
 // none reads a byte outside its range.

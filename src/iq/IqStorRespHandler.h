@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The loop's end of the channel to the I/Q saving thread: commands out, responses in,
 // one byte each. Owned by the WcdmaIqManager, whose end of the pair this is.
 #ifndef IQ_IQSTORRESPHANDLER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Captures the modem's WCDMA I/Q sample buffers: maps the I/Q memory device, waits until
 // the driver reports a filled buffer and has a thread of its own copy it into a new file
 // in the CP's log directory, so that the loop goes on serving the log channels. The

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of WcdmaIqManager that runs on the saving thread.
 #include <errno.h>
 #include <poll.h>

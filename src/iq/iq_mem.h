@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The I/Q memory device: what its driver promises.
 #ifndef IQ_IQ_MEM_H_
 #define IQ_IQ_MEM_H_

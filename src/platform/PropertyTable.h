@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The properties in the text of a "default.prop": its grammar apart from the file. See
 // cutils/properties.h for what a line may be.
 #ifndef PLATFORM_PROPERTYTABLE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The one thing that the stand-in for the handset's libraries and the service itself both
 // know of the host: a handset may live below a directory other than "/". Outside include/,
 // which is not searched on a handset: this header is needed there, too.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Connection to a supervisor, a process that watches a CP and announces what happens to
 // it in short texts. Connects and reconnects for ever, hands what it reads to the
 // subclass to recognise, and passes events on to the LogController. A connection that

@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "state/ExtWcnStateHandler.h"
 
 ExtWcnStateHandler::ExtWcnStateHandler(LogController* ctrl, Multiplexer* mux, const char* serv_name)

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Connection to the supervisor of the external WCN chip. Owned by the LogController.
 #ifndef STATE_EXTWCNSTATEHANDLER_H_
 #define STATE_EXTWCNSTATEHANDLER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Connection to the supervisor of the cellular modem. Its events are for CT_WANMODEM,
 // whichever modem the handset has. Owned by the LogController.
 #ifndef STATE_MODEMSTATEHANDLER_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A log channel as the storage and the I/Q capture know it: something that is called back
 // when a file is made, and whose name is that of its CP's directory and files.
 #ifndef STORAGE_CPCHANNEL_H_

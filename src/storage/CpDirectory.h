@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The directory of one CP inside one set directory. Owns the LogFile objects of the
 // files in it, keeps them in the order in which trimming deletes them (unknown files,
 // then timed files from oldest to newest, then version records; files made at run time

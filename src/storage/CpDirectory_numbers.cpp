@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of CpDirectory that numbers the log files: 0 is the newest, and each older one
 // has a larger number than the next younger.
 #include <errno.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of CpDirectory that finds out what is on the medium.
 #include <dirent.h>
 #include <errno.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // One timestamped set directory under a medium's log root: one CP directory per CP
 // that wrote into it. A new set is started whenever writing on a medium begins.
 // Owns its CpDirectory objects; owned by its MediaStorage. Files lying directly in

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The single door through which one CP's channel and the savers of its crash material
 // reach the storage. Every write follows a change of medium, notices a log file that
 // vanished, renumbers and starts log files at the size limit, calls the channel back

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Tells its owner that a file, in practice a device of a CP, can be read: it keeps the
 // file open and registered with the loop and calls the owner back each time the
 // descriptor is ready. The owner reads the descriptor itself, says whether it

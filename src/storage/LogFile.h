@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // One file in a CP directory: a rotating log file or one of the other files kept
 // beside the logs. While open it owns a descriptor and a staging buffer that turns
 // many small pieces of log data into few writes.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The kinds of files that the service keeps in a CP directory.
 #ifndef STORAGE_LOGTYPE_H_
 #define STORAGE_LOGTYPE_H_

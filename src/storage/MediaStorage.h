@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The log tree on one medium: scans the sets that earlier runs left, starts new sets,
 // hands out files in the set being written (the working set), keeps the total size
 // and frees space oldest data first, by a quota and when the medium is full. The

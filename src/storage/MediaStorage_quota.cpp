@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The part of MediaStorage that keeps the medium within its limits.
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The storage media.
 #ifndef STORAGE_MEDIATYPE_H_
 #define STORAGE_MEDIATYPE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Owns the two media, the internal data partition and the external SD card, decides
 // which of them is in use, follows the SD card coming and going, makes the CP storages
 // through which the channels write, and tells subscribers when the medium in use

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Subscribers to one kind of event, each a callback and its client pointer, called in
 // the order of their subscription. A callback may subscribe and unsubscribe anybody,
 // itself included: who leaves during a round is not called any more in it, who joins

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Copying of whole files by path; used to put the default settings in place.
 #ifndef STORAGE_COPY_FILE_H_
 #define STORAGE_COPY_FILE_H_

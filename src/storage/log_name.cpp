@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "storage/log_name.h"
 
 #include <string.h>

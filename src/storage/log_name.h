@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The names of the files in a CP directory: what a name found on a medium tells
 // about the file, and the texts of local times in names. Names on a card are input
 // from strangers; every parser here stays within the length it is given.

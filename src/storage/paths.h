@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Paths of the log tree: joining without allocation, and the removal of directories.
 #ifndef STORAGE_PATHS_H_
 #define STORAGE_PATHS_H_

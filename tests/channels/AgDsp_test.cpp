@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The audio DSP's three devices in one log.
 #include "channels/AgDspLogHandler.h"
 #include "channels/DspChunkHeader.h"

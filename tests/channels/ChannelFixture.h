@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The surroundings of a channel test: a controller in a temporary root, its loop driven
 // step by step, FIFOs that stand for the log devices, and a time service.
 #ifndef TESTS_CHANNELS_CHANNELFIXTURE_H_

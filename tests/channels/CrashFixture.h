@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The surroundings of the tests of crashes and transactions: modems whose devices are
 // raw pseudo-terminals, so that the test plays the CP byte by byte, control clients on
 // the real socket, and a look at the files that crashes and transactions leave.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The crash fixture with a C library that can be made to fail and clocks set by hand.
 #ifndef TESTS_CHANNELS_FAULTFIXTURE_H_
 #define TESTS_CHANNELS_FAULTFIXTURE_H_

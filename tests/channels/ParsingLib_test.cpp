@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The modem's log parsing database, taken from the firmware image to the log root.
 #include <sys/resource.h>
 #include <sys/wait.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What comes between a transaction and its end.
 #include "channels/FaultFixture.h"
 

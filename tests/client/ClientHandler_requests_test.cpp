@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Every request in every form, by what the client reads and what is logged.
 #include <map>
 #include <regex>

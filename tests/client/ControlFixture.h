@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A controller on a temporary root, a control server of its own beside the one that the
 // controller runs, and clients on real sockets. The tests drive the loop.
 #ifndef TESTS_CLIENT_CONTROLFIXTURE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The surroundings of a configuration test: a root whose properties and environment
 // let a configuration be read without a message, and a command line.
 #ifndef TESTS_CONFIG_CONFIGFIXTURE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the configuration finds in the handset's properties and environment.
 #include "config/ConfigFixture.h"
 

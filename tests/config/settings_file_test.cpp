@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The settings file through kills, faults and whatever stands in its place.
 #include <errno.h>
 #include <sys/stat.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
 #include "channels/CrashFixture.h"
 #include "storage/faults.h"

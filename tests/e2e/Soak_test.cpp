@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Thousands of crashes, transactions and clients: nothing may grow.
 #include <malloc.h>
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The settings file: whatever was read can be written, and what was written is read
 // back without a complaint but of limits of 0, and to the same settings.
 #include <sstream>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The audio DSP's chunk header: a chunk that the service writes is read back whole, and one
 // that is cut is told.
 #include "channels/DspChunkHeader.h"

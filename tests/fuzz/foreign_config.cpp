@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The general logger's configuration: only the CPs known to it come out, off without the
 // global switch, in the order and number of the file.
 #include <vector>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The decoder of diag frames: how the bytes are split over reads does not matter, what
 // was framed comes out as it was, and no garbage makes a later frame unreadable.
 #include <string.h>

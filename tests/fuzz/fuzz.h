@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A fuzz target is one LLVMFuzzerTestOneInput that checks properties with FUZZ_CHECK and
 // leaves nothing behind, so that every input can be replayed alone.
 #ifndef TESTS_FUZZ_FUZZ_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Names of files found on a medium: kind, time and number agree with the text, and
 // nothing is read behind its end.
 #include "storage/log_name.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestlog's scanner of a log file: every byte is accounted for, and every piece is what stands
 // at its place.
 #include <string.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The modem's firmware image: whatever it holds, a database that is found lies in the image
 // behind its digest, and the table of entries is read no further than it may be.
 #include "channels/ModemImage.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // "default.prop": exactly the lines that set a property count, the last one of a key, and
 // whatever stands before a good line does not hide it.
 #include <cutils/properties.h>

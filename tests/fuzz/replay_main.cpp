@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Runs a fuzz target without a fuzzer: over every file of a directory, over beginnings of
 // each, and over changes of it that are the same at every run. The input that ends the
 // program stays in a file beside the program, as does the log, a sanitizer's report in it.

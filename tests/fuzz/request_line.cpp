@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A control client: every request that is not blank gets one reply line, in order, however
 // the bytes are split; only a request that does not fit ends the connection; what was set
 // is what the settings file says afterwards.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestlog's scanner over a text, every piece kept.
 #ifndef TESTS_FUZZ_SCAN_H_
 #define TESTS_FUZZ_SCAN_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What a supervisor sends: every read gives one line in the log, of limited length and
 // without control bytes; an event comes exactly when a pattern is there.
 #include <ctype.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The time service's reply becomes the record at the head of a log file, byte by byte.
 #include <string.h>
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The end of the connectivity chip's dump: the marker counts in a chunk below 4096 bytes and
 // nowhere else, and nothing is read behind the chunk.
 #include <vector>

@@ -1,4 +1,6 @@
 #!/usr/bin/env python3
+# SPDX-License-Identifier: Apache-2.0
+
 """The handset build and the CMake build compile the same files.
 
 usage: file_lists_test.py SOURCE_DIR

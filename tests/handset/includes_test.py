@@ -1,4 +1,6 @@
 #!/usr/bin/env python3
+# SPDX-License-Identifier: Apache-2.0
+
 """Files of src include only what stands below them.
 
 usage: includes_test.py SOURCE_DIR

@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "iq/fake_devices.h"
 
 #include <errno.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Memory devices of the handset for tests: a FIFO in the test root that the service
 // polls, behind it a scripted driver. The program is linked with --wrap for ioctl, mmap,
 // munmap and read; only calls on such a FIFO (or its mapping) are diverted. Looking whether

@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include <gtest/gtest.h>
 #include <utils/String8.h>
 #include <utils/Vector.h>

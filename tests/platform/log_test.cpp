@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include <android/log.h>
 #include <errno.h>
 #include <gtest/gtest.h>

@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include <cutils/sockets.h>
 #include <errno.h>
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What is written while a medium fails: the logs of one channel, block by block, a second
 // apart.
 #include <errno.h>

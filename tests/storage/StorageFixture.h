@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the storage tests share: a root with the storage manager on it, a fixed clock in
 // UTC, no file-creation mask (as the service runs), and a look at a medium's totals.
 #ifndef TESTS_STORAGE_STORAGEFIXTURE_H_

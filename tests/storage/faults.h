@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Faults of the C library for the storage tests, linked with --wrap: the n-th call of a
 // kind fails or transfers less. Only calls on the log tree count (a path with "/modem_log"
 // in it; for write and writev any descriptor above standard error). Also the clock of the

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Help shared by all tests: a temporary directory that stands for the handset's "/",
 // the capture of the service's log, and waiting for a condition.
 #ifndef TESTS_SUPPORT_TESTROOT_H_

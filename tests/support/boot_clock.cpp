@@ -1,3 +1,5 @@
+// SPDX-License-Identifier: Apache-2.0
+
 #include "support/boot_clock.h"
 
 #include <errno.h>

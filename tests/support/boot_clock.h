@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The clock of the timers under the test's control: a test program that takes boot_clock.cpp
 // among its sources and clock_gettime into its WRAP list moves CLOCK_BOOTTIME by hand, so
 // that time-outs of seconds pass at once. Every other clock stays real.

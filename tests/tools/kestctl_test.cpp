@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Runs the real kestctl against a scripted service in the test.
 #include <cutils/sockets.h>
 #include <gtest/gtest.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Runs the real kestlog over good trees and over a table of damages.
 #include <fcntl.h>
 #include <gtest/gtest.h>

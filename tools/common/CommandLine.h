@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The command line of a tool: options, a command and its parameters. The tool describes
 // its syntax once; parsing, --help, completion and usage errors follow from that.
 #ifndef COMMON_COMMANDLINE_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Escapes text from an untrusted source (the service, a medium that anyone may have written
 // to) for a terminal or a JSON reader.
 #ifndef COMMON_TEXT_H_

@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: Apache-2.0
 # bash completion for kestctl: the program itself knows what may come next.
 _kestctl() {
     # $1 is the command as typed, $2 the word up to the cursor.

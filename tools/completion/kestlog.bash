@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: Apache-2.0
 # bash completion for kestlog: the program knows its words, the shell its files.
 _kestlog() {
     # $1 is the command as typed, $2 the word up to the cursor.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The commands of kestctl: one for each request of the service's table, and status, watch
 // and raw. Dispatch, --help, completion and the parameter checks all use this list.
 #ifndef KESTCTL_COMMANDS_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A connection to the service's control socket: sends request lines and separates their
 // replies from the notifications, which may arrive at any time. One deadline limits all
 // waiting. Operations return an ExitStatus; after one that is not ES_OK, failure()

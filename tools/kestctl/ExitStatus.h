@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The exit statuses of kestctl, for scripts. They are documented in the man page and never
 // change their meaning.
 #ifndef KESTCTL_EXITSTATUS_H_

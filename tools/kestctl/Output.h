@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Everything that kestctl prints. Results go to standard output, as text or, with --json,
 // as one object per line. Errors go to standard error as text and, with --json, also to
 // standard output as an object. Text from the service is escaped. Each line is flushed.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Parsers for the lines that the service sends. The service is not trusted: a line that is
 // not exactly a reply or a notification is rejected.
 #ifndef KESTCTL_REPLY_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The settings that no request returns, read from the settings file of the service. The
 // file is never created, copied or repaired, and lines that the service would report are
 // ignored silently.

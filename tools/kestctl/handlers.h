@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the commands do once the connection is open: Command::run.
 #ifndef KESTCTL_HANDLERS_H_
 #define KESTCTL_HANDLERS_H_

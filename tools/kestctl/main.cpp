@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestctl: the command-line client of the service's control socket.
 #include <stdio.h>
 #include <stdlib.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the commands of kestlog do. Each prints everything and returns the exit status.
 #ifndef KESTLOG_COMMANDS_H_
 #define KESTLOG_COMMANDS_H_

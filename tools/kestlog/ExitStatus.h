@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The exit statuses of kestlog, for scripts. They are documented in the man page and never
 // change their meaning. When several apply, the largest is used.
 #ifndef KESTLOG_EXITSTATUS_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // What the name of a file in the log tree says about the file. The service's own parsers
 // are lenient; here a name must be exactly one that the service creates, and any other
 // name says nothing.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The content of one file: its time record, its frames or audio DSP chunks, and its damage.
 // A CP's log may hold anything, so bytes outside frames are counted but are not damage. An
 // audio DSP log must consist of chunks only.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Reads a file of any size from start to end through a window of fixed size. Reads no further
 // than the size at opening, so that it also ends on a file that is being written.
 #ifndef KESTLOG_LOGREADER_H_

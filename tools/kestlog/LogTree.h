@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The directories of a log tree: log roots contain sets, sets contain CP directories, and
 // those contain files. Links are listed as strays and never followed.
 #ifndef KESTLOG_LOGTREE_H_

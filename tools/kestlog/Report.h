@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The output of kestlog: text, or objects with --json. Names and contents come from a medium
 // that anyone may have written to, so both are escaped.
 #ifndef KESTLOG_REPORT_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestlog: reads and checks what the service writes.
 #include <stdio.h>
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // kestlog verify.
 #include <errno.h>
 #include <stdio.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's log interface. On this host a message is one line on standard
 // error: "E/<tag>(<pid>): <text>", written by a single write() so that lines of
 // several threads and processes never mix.

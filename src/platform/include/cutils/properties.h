@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's system properties, read-only. On this host they are the lines
 // "key=value" of the text file "default.prop" in the root directory.
 #ifndef PLATFORM_CUTILS_PROPERTIES_H_

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's local sockets: AF_UNIX sockets known by a name. On this host only
 // the abstract namespace exists. With a root directory (KESTMODEM_ROOT set and not
 // empty) the name in use is the given name, "@" and the root, so that services with

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's doubly linked list. Elements are copied in; a list of pointers does
 // not own what they point to. An iterator stays valid until its own element is erased.
 #ifndef PLATFORM_UTILS_LIST_H_

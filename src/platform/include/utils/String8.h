@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's byte string, always NUL-terminated. A value type: copies are
 // independent. Text up to 15 bytes, the empty string included, allocates nothing.
 // A null pointer counts as "". Arguments may point into the string itself.

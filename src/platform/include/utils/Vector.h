@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // The platform's growing array. Elements are copied in; any insertion or removal
 // invalidates iterators and references, but not indexes below it. An index beyond the
 // end is the caller's fault and ends the program.
