@@ -28,12 +28,6 @@
 #include "control/LogController.h"
 #include "support/TestRoot.h"
 
-inline int64_t monotonic_ms() {
-    struct timespec t;
-    clock_gettime(CLOCK_MONOTONIC, &t);
-    return static_cast<int64_t>(t.tv_sec) * 1000 + t.tv_nsec / 1000000;
-}
-
 // One pass of the loop that ends after about 20 ms even when nothing happens.
 inline void pump_once(Multiplexer& mux) {
     bool fired = false;
@@ -195,10 +189,7 @@ protected:
         root.write_file("kest_modem.conf", settings);
         config = std::make_unique<LogConfig>(root.path("kest_modem.conf").c_str());
         args.insert(args.begin(), "kestmodem");
-        std::vector<char*> argv(args.size() + 1);
-        std::transform(args.begin(), args.end(), argv.begin(),
-                       [](std::string& s) { return &s[0]; });
-        EXPECT_EQ(config->read_config(static_cast<int>(args.size()), argv.data()), 0);
+        EXPECT_EQ(config->read_config(static_cast<int>(args.size()), argv_of(args).data()), 0);
         ctrl = std::make_unique<LogController>();
         const int result = ctrl->init(config.get());
         m_others = Multiplexer::MAX_HANDLERS - Filler::free_slots(mux());

@@ -30,12 +30,7 @@ protected:
 
     static int read(LogConfig& config, std::vector<std::string> args = {}) {
         args.insert(args.begin(), "kestmodem");
-        std::vector<char*> argv;
-        for (std::string& arg : args) {
-            argv.push_back(&arg[0]);
-        }
-        argv.push_back(nullptr);
-        return config.read_config(static_cast<int>(args.size()), argv.data());
+        return config.read_config(static_cast<int>(args.size()), argv_of(args).data());
     }
 
     TestRoot root;

@@ -21,11 +21,7 @@ protected:
 
     // Runs a command with its standard error in the file "log".
     void run(std::vector<std::string> args = {KESTMODEM_BIN}) {
-        std::vector<char*> argv;
-        for (std::string& arg : args) {
-            argv.push_back(&arg[0]);
-        }
-        argv.push_back(nullptr);
+        const std::vector<char*> argv = argv_of(args);
         const int file =
             open(root.path("log").c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
         pid = fork();

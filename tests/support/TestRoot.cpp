@@ -2,14 +2,12 @@
 
 #include "support/TestRoot.h"
 
-#include <dirent.h>
 #include <errno.h>
 #include <fcntl.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/mman.h>
-#include <sys/stat.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -157,35 +155,35 @@ void LogCapture::clear() {
     }
 }
 
+std::vector<char*> argv_of(std::vector<std::string>& args) {
+    std::vector<char*> argv;
+    for (std::string& arg : args) {
+        argv.push_back(&arg[0]);
+    }
+    argv.push_back(nullptr);
+    return argv;
+}
+
+int64_t monotonic_ms() {
+    struct timespec t;
+    clock_gettime(CLOCK_MONOTONIC, &t);
+    return static_cast<int64_t>(t.tv_sec) * 1000 + t.tv_nsec / 1000000;
+}
+
 bool wait_until(const std::function<bool()>& condition, int timeout_ms) {
-    struct timespec start;
-    clock_gettime(CLOCK_MONOTONIC, &start);
-    for (;;) {
-        if (condition()) {
-            return true;
-        }
-        struct timespec now;
-        clock_gettime(CLOCK_MONOTONIC, &now);
-        const long elapsed =
-            (now.tv_sec - start.tv_sec) * 1000 + (now.tv_nsec - start.tv_nsec) / 1000000;
-        if (elapsed > timeout_ms) {
+    const int64_t end = monotonic_ms() + timeout_ms;
+    while (!condition()) {
+        if (monotonic_ms() > end) {
             return false;
         }
         usleep(2000);
     }
+    return true;
 }
 
 size_t open_descriptors() {
-    size_t n = 0;
-    DIR* dir = opendir("/proc/self/fd");
-    if (!dir) {
-        die("/proc/self/fd");
-    }
-    while (readdir(dir)) {
-        ++n;
-    }
-    closedir(dir);
-    return n - 3;  // ".", ".." and the descriptor of the listing itself
+    const fs::directory_iterator descriptors("/proc/self/fd");
+    return static_cast<size_t>(std::distance(begin(descriptors), end(descriptors))) - 1;  // its own
 }
 
 std::string pattern_bytes(size_t len, uint32_t seed) {

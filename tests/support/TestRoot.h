@@ -58,6 +58,11 @@ private:
     int m_file;
 };
 
+int64_t monotonic_ms();
+
+// The arguments as main gets them, with a null at the end; valid as long as they are.
+std::vector<char*> argv_of(std::vector<std::string>& args);
+
 // Runs the condition until it is true or the time is over; true when it became true. The
 // time is one that no loaded machine misses.
 bool wait_until(const std::function<bool()>& condition, int timeout_ms = 60000);

@@ -40,11 +40,7 @@ protected:
 
     void start(Strings args, const std::string& out_path = "") {
         args.insert(args.begin(), KESTCTL);
-        std::vector<char*> argv;
-        for (std::string& arg : args) {
-            argv.push_back(&arg[0]);
-        }
-        argv.push_back(nullptr);
+        const std::vector<char*> argv = argv_of(args);
         m_pid = fork();
         if (m_pid == 0) {
             const std::string out = out_path.empty() ? m_root.path("out") : out_path;
