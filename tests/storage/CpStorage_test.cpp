@@ -5,7 +5,6 @@
 #include <errno.h>
 
 #include "core/Multiplexer.h"
-#include "storage/CpChannel.h"
 #include "storage/StorageFixture.h"
 #include "storage/paths.h"
 
@@ -14,20 +13,10 @@ namespace {
 const std::string SET = "2016-03-01-09-15-00/";
 const std::string INT = "data/modem_log/";
 
-// A channel that has a name and nothing else.
-class NamedChannel : public CpChannel {
-public:
-    explicit NamedChannel(const char* name) : CpChannel(-1, nullptr, nullptr), m_name(name) {}
-
-    void process(int /*events*/) override {}
-    const android::String8& name() const override { return m_name; }
-
-private:
-    const android::String8 m_name;
-};
-
 class CpStorageTest : public StorageTest {
 public:  // for the hooks, which are plain functions
+    using StorageTest::m_channel;
+    using StorageTest::m_store;
     using StorageTest::plug_card;
 
     CpStorageTest() {
@@ -47,11 +36,6 @@ public:  // for the hooks, which are plain functions
     }
 
     int write(const std::string& data) { return m_store->write(data.data(), data.size()); }
-    // Writes in the next second.
-    int write_later(const std::string& data) {
-        faults::set_time(++m_now);
-        return write(data);
-    }
     Names files(const std::string& set) { return m_root.list(set + "/cp_gnss"); }
     std::string content(const std::string& name) {
         return m_root.read_file(INT + SET + "cp_gnss/" + name);
@@ -62,13 +46,10 @@ public:  // for the hooks, which are plain functions
     }
 
     static CpStorageTest* s_test;
-    NamedChannel m_channel{"cp_gnss"};
     NamedChannel m_other_channel{"cp_wcn"};
-    CpStorage* m_store;
     CpStorage* m_other;
     std::string m_events;
     void (*m_in_hook)() = [] {};
-    time_t m_now = NOW;
 };
 
 CpStorageTest* CpStorageTest::s_test;
@@ -172,11 +153,13 @@ TEST_F(CpStorageTest, QuotaWithoutOverwrite) {
 }
 
 TEST_F(CpStorageTest, QuotaTrimsTheOldest) {
+    LogCapture log;
     m_mgr.set_file_size(10);
     m_mgr.set_data_part_size(50);
     for (int i = 0; i < 30; ++i) {
         EXPECT_EQ(write_later("0123456789"), 10);
     }
+    EXPECT_TRUE(log.has("int MediaStorage::check_quota(): data large: 60/0M\n"));
     // The first log is still there and numbered behind the oldest of the others.
     EXPECT_EQ(files(INT + set_names(internal()).back()),
               (Names{log_name(0, 30), log_name(1, 29), log_name(2, 28), log_name(3, 27),

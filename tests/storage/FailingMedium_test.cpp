@@ -3,9 +3,7 @@
 // apart.
 #include <errno.h>
 
-#include "channels/GnssCpLogHandler.h"
-#include "control/LogController.h"
-#include "storage/CpStorage.h"
+#include "core/Multiplexer.h"
 #include "storage/StorageFixture.h"
 #include "storage/paths.h"
 
@@ -13,16 +11,10 @@ namespace {
 
 class FailingMediumTest : public StorageTest {
 protected:
-    FailingMediumTest()
-        : m_entry{"cp_gnss", CT_GNSS, true, 0, 0},
-          m_channel(&m_ctrl, &m_ctrl.multiplexer(), &m_entry, &m_mgr) {
+    FailingMediumTest() {
         static Multiplexer mux;  // outlives the manager
         EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &mux), 0);
         m_store = m_mgr.create_storage(&m_channel);
-    }
-    int write_later(const std::string& data) {
-        faults::set_time(++m_now);
-        return m_store->write(data.data(), data.size());
     }
     // How many of that many blocks are lost.
     int lost_of(int blocks, const std::string& block) {
@@ -32,12 +24,6 @@ protected:
         }
         return lost;
     }
-
-    LogController m_ctrl;  // never started
-    LogConfig::ConfigEntry m_entry;
-    GnssCpLogHandler m_channel;
-    CpStorage* m_store;
-    time_t m_now = NOW;
 };
 
 // Files can be made on the card, but nothing can be written to them.

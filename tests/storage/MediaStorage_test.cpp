@@ -12,7 +12,6 @@ namespace {
 const std::string ROOT = "data/modem_log/";
 const std::string TODAY = "2016-03-01-09-15-00";
 const std::string DATA_LARGE = "int MediaStorage::check_quota(): data large: ";
-constexpr uint64_t MIB = 1 << 20;
 
 class MediaStorageTest : public StorageTest {
 protected:
@@ -70,39 +69,6 @@ TEST_F(MediaStorageTest, OneObjectForOneSecond) {
     faults::set_time(-1);
     EXPECT_EQ(internal().create_cp_set(), nullptr);
     EXPECT_EQ(internal().working_set(), set);
-}
-
-TEST_F(MediaStorageTest, Quota) {
-    const struct {
-        uint64_t quota;  // this and left in MiB
-        bool overwrite;
-        int result;
-        uint64_t left;
-        size_t sets_left;
-    } cases[] = {{0, true, 0, 30, 3},
-                 {30, true, 0, 30, 3},
-                 {25, false, -1, 30, 3},
-                 {25, true, 0, 25, 3},
-                 {24, true, 0, 20, 2}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.quota);
-        for (const char* set :
-             {"2016-02-01-00-00-00", "2016-02-02-00-00-00", "2016-02-03-00-00-00"}) {
-            put(ROOT + set + "/cp/1", 5 * MIB);
-            put(ROOT + set + "/cp/2", 5 * MIB);
-        }
-        internal().clear();
-        init();
-        internal().set_quota(c.quota * MIB);
-        m_mgr.set_overwrite(c.overwrite);
-        LogCapture log;
-        EXPECT_EQ(internal().check_quota(), c.result);
-        EXPECT_EQ(internal().size(), c.left * MIB);
-        EXPECT_EQ(internal().sets().size(), c.sets_left);
-        EXPECT_EQ(m_root.list(ROOT).size(), c.sets_left);
-        EXPECT_EQ(log.has(DATA_LARGE + "31457280/" + std::to_string(c.quota) + "M\n"), c.left < 30);
-        check_sums(internal());
-    }
 }
 
 // What somebody else deleted stayed in the totals: fresh files were trimmed for it, and in

@@ -16,8 +16,10 @@
 #include <vector>
 
 #include "core/ObjectRef.h"
+#include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpSetDirectory.h"
+#include "storage/CpStorage.h"
 #include "storage/LogFile.h"
 #include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
@@ -47,6 +49,18 @@ inline mode_t mode_of(const std::string& path) {
     struct stat st;
     return ::lstat(path.c_str(), &st) == 0 ? st.st_mode & 07777u : 0;
 }
+
+// A channel that has a name and nothing else.
+class NamedChannel : public CpChannel {
+public:
+    explicit NamedChannel(const char* name) : CpChannel(-1, nullptr, nullptr), m_name(name) {}
+
+    void process(int /*events*/) override {}
+    const android::String8& name() const override { return m_name; }
+
+private:
+    const android::String8 m_name;
+};
 
 class StorageTest : public testing::Test {
 protected:
@@ -85,6 +99,12 @@ protected:
         EXPECT_EQ(truncate(m_root.path(rel).c_str(), static_cast<off_t>(size)), 0);
     }
 
+    // The store writes in the next second.
+    int write_later(const std::string& data) {
+        faults::set_time(++m_now);
+        return m_store->write(data.data(), data.size());
+    }
+
     // Every size is the sum of the sizes below. extra: bytes known to be left in the totals
     // above, by a file or directory that vanished.
     static void check_sums(const MediaStorage& media, uint64_t set_extra = 0,
@@ -110,6 +130,9 @@ protected:
     StorageManager m_mgr;
     CpSetDirectory* m_set = nullptr;
     CpDirectory* m_dir = nullptr;
+    NamedChannel m_channel{"cp_gnss"};
+    CpStorage* m_store = nullptr;  // of that channel, in tests that make one
+    time_t m_now = NOW;
 
 private:
     mode_t m_umask;
