@@ -4,7 +4,6 @@
 #include "channels/DspChunkHeader.h"
 #include "channels/FaultFixture.h"
 #include "iq/fake_devices.h"
-#include "support/boot_clock.h"
 
 namespace {
 
@@ -160,7 +159,6 @@ TEST_F(AgDspTest, FailingDevices) {
 // Whatever is ready for ever took a whole core: in a second a hung-up dump device gave 45,000
 // lines, a PCM device at its end 2.5 MB of headers.
 TEST_F(AgDspTest, DevicesThatGiveNothingAreLeftAlone) {
-    boot_clock::freeze();
     const struct {
         FakeDevice& device;
         int error;  // 0: its end
@@ -194,7 +192,6 @@ TEST_F(AgDspTest, DevicesThatGiveNothingAreLeftAlone) {
     }
     // A chunk of data for each case, and the headers of the PCM device at its end.
     EXPECT_EQ(stored().size(), std::size(cases) * 21 + 11 * 20);
-    boot_clock::real();
 }
 
 }  // namespace

@@ -138,51 +138,6 @@ TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
 
 // ---- CP events
 
-// The receiver has no dump; the rest is that of every CP.
-TEST_F(LogPipeHandlerTest, AssertSavesWhatIsWantedAndAliveRecovers) {
-    root.write_file("proc/cptl/mini_dump", "MINI");
-    const struct {
-        const char *settings, *reset;
-        bool mini_dump;
-        std::vector<std::string> saved;
-        bool stays_open, tries_to_dump;
-    } cases[] = {
-        {"stream cp_gnss on 5 3\n", "1", false, {}, true, false},
-        {"stream cp_gnss on 5 3\n", "0x1", true, {"mini_dump"}, true, false},
-        {"stream cp_gnss on 5 3\n", "", true, {"mini_dump", "sblock", "sbuf", "smsg"}, false, true},
-        {"stream cp_gnss off 5 3\n", "2", false, {"sblock", "sbuf", "smsg"}, false, false},
-    };
-    for (const char* name : {"smsg", "sbuf", "sblock"}) {
-        root.write_file(std::string("d/dipx/") + name, name);
-    }
-    const Fifo fifo(root.path("gnss"));
-    for (const auto& c : cases) {
-        SCOPED_TRACE(std::string(c.settings) + "reset=" + c.reset);
-        root.set_prop("persist.sys.vexa.modemreset", c.reset);
-        ASSERT_EQ(boot(c.settings), 0);
-        gnss = ctrl->get_cp(CT_GNSS);
-        const size_t slots = polled();
-        gnss->process_assert(c.mini_dump);
-        gnss->process_assert(c.mini_dump);  // ignored
-        EXPECT_EQ(gnss->state(), CWS_NOT_WORKING);
-        EXPECT_EQ(gnss->fd() >= 0, c.stays_open);
-        EXPECT_EQ(log.count("Start dump transaction error"), c.tries_to_dump ? 1u : 0u);
-        std::vector<std::string> saved;
-        for (const auto& file : files("cp_gnss")) {
-            saved.push_back(
-                file.first.substr(5, file.first.find("_2") - 5));  // "data:name_2016..."
-        }
-        EXPECT_EQ(saved, c.saved);
-        for (int alive = 0; alive < 2; ++alive) {
-            gnss->process_alive();
-            EXPECT_EQ(gnss->state(), CWS_WORKING);
-            EXPECT_EQ(gnss->fd() >= 0, gnss->enabled());
-            EXPECT_EQ(polled(), slots);
-        }
-        end_service();
-    }
-}
-
 // A modem's log files get the time record, and its new directories the version. A storage
 // that is first made for the crash material gives every CP's log files the record, and no
 // version file.
@@ -211,19 +166,18 @@ TEST_F(LogPipeHandlerTest, WhatHeadsALogFileAndItsDirectory) {
     EXPECT_EQ(files("cp_gnss"), Files{});
 }
 
-TEST_F(LogPipeHandlerTest, EventsNeitherLeakNorOpenTwice) {
+TEST_F(LogPipeHandlerTest, OpensOnceWhenTheCpIsAlive) {
     const Fifo fifo(root.path("gnss"));
     ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
     gnss = ctrl->get_cp(CT_GNSS);
-    const size_t before = open_descriptors();
     gnss->process_assert(false);
     gnss->stop();
     gnss->start();
     EXPECT_EQ(gnss->fd(), -1) << "not before it is alive";
     gnss->process_alive();
+    const int device = gnss->fd();
     gnss->process_alive();
-    gnss->start();
-    EXPECT_EQ(open_descriptors(), before);
+    EXPECT_EQ(gnss->fd(), device) << "not opened twice";
     ASSERT_TRUE(feed(fifo, "x"));
     gnss->process_assert(false);
     EXPECT_EQ(content("cp_gnss"), "x") << "nothing stays staged while the CP is down";

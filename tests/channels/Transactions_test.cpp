@@ -211,19 +211,6 @@ TEST_F(TransactionsTest, ALoopWithoutRoomServesTransactions) {
     }
 }
 
-// A log device that the loop has no room for waits for it.
-TEST_F(TransactionsTest, ALogDeviceComesBackWhenTheLoopHasRoom) {
-    boot_modem(false);
-    modem()->process_assert(false);
-    run_clock(3100);
-    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
-    auto fillers = Filler::fill(mux());
-    modem()->process_alive();
-    EXPECT_TRUE(log.has(": no room to poll log device of cp_wcdma, waiting for it ["));
-    fillers.clear();
-    EXPECT_TRUE(both_log("<again>"));
-}
-
 // A try to open the log device that falls into a transaction is made up for afterwards.
 TEST_F(TransactionsTest, ALogDeviceThatIsMissingAtTheStartIsOpenedAfterATransaction) {
     boot_modem(false);

@@ -156,18 +156,4 @@ TEST_F(ClientHandlerTest, ClientGoneBeforeItsResult) {
     EXPECT_EQ(wcdma_state(), CWS_WORKING);
 }
 
-// What the sockets alone do not bring about.
-TEST_F(ClientHandlerTest, ResultThatNobodyWaitsForIsNotSent) {
-    int fds[2];
-    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, fds), 0);
-    Client peer(fds[0]);
-    ClientHandler client(fds[1], ctrl.get(), &mux(), manager.get());
-    client.process(POLLIN);  // nothing is there
-    client.notify_trans_result(-1);
-    EXPECT_TRUE(
-        log.has("void ClientHandler::notify_trans_result(int): Non CTS_EXECUTING state "
-                "notification -1 ["));
-    EXPECT_EQ(peer.heard(), "");
-}
-
 }  // namespace

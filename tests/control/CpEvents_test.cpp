@@ -1,18 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
-#include "channels/CrashFixture.h"
-#include "storage/faults.h"
+#include "channels/FaultFixture.h"
 
 namespace {
 
-constexpr time_t NOON = 1456811100;  // 2016-03-01 05:45:00 UTC, 09:15:00 here
-const std::string STAMP = "_2016-03-01_09-15-00";
-
-class CpEventsTest : public CrashFixture {
+class CpEventsTest : public FaultFixture {
 protected:
     CpEventsTest() {
-        faults::reset();
-        faults::set_time(NOON);
         root.write_file("d/dipx/smsg", "S");
         root.write_file("d/dipx/sbuf", "B");
         root.write_file("d/dipx/sblock", "K");
@@ -23,7 +17,6 @@ protected:
         ctrl.reset();
         close(m_modemd);
         close(m_wcnd);
-        faults::reset();
     }
 
     void boot_supervised(const std::string& settings = "") {
@@ -114,7 +107,7 @@ TEST_F(CpEventsTest, WcnHasItsOwnSupervisorAndReset) {
     for (bool mini_dump : {false, true}) {
         if (mini_dump) {
             ctrl->enable_md();
-            expected["data:mini_dump" + STAMP + ".bin"] = "MINI TL";
+            expected[std::string("data:mini_dump") + STAMP + ".bin"] = "MINI TL";
         }
         ASSERT_TRUE(wcnd->say("WCN-EXTERNAL-DUMP"));
         ASSERT_TRUE(reaches(wcn, CWS_NOT_WORKING));

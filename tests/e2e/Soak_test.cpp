@@ -14,20 +14,6 @@ constexpr int ROUNDS = 1000;
 
 class SoakTest : public CrashFixture {
 protected:
-    // The rounds make 60,000 files: in memory, where the system offers that.
-    SoakTest() {
-        char dir[] = "/dev/shm/kestmodem-soak-XXXXXX";
-        if (mkdtemp(dir)) {
-            m_memory_dir = dir;
-            remove_tree("data");
-            std::filesystem::create_symlink(dir, root.path("data"));
-        }
-    }
-    ~SoakTest() override {
-        ctrl.reset();
-        std::filesystem::remove_all(m_memory_dir);
-    }
-
     // One client, one dump, one transaction and a recovery.
     bool round(int i) {
         Client client;
@@ -46,8 +32,7 @@ protected:
         }
         modem()->process_alive();
         diag_dev.forget();
-        const int sleep_log = i % 3 == 0 ? 1 : 0;
-        if (!client.say(sleep_log ? "SAVE_SLEEP_LOG WCDMA\n" : "SAVE_RINGBUF WCDMA\n") ||
+        if (!client.say("SAVE_RINGBUF WCDMA\n") ||
             !pump([&] { return modem()->state() != CWS_WORKING; })) {
             return false;
         }
@@ -57,10 +42,9 @@ protected:
         if (fate == CLIENT_GONE) {
             client.hang_up();
         }
-        const int type = 0x3A + sleep_log;
         if (fate == RECOVERED) {
             modem()->process_alive();
-        } else if (!diag_dev.put(frame(type, 'd', "data") + frame(type, fate == REFUSED ? 9 : 1))) {
+        } else if (!diag_dev.put(frame(0x3A, 'd', "data") + frame(0x3A, fate == REFUSED ? 9 : 1))) {
             return false;
         }
         return pump([&] { return modem()->state() == CWS_WORKING; }) &&
@@ -79,7 +63,6 @@ protected:
         EXPECT_TRUE(pump([&] { return Filler::free_slots(mux()) == m_slots; }));
     }
 
-    std::string m_memory_dir;
     size_t m_slots = 0;
 };
 

@@ -1,14 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // "default.prop": exactly the lines that set a property count, the last one of a key, and
 // whatever stands before a good line does not hide it.
-#include <cutils/properties.h>
-
 #include <map>
 #include <sstream>
 
 #include "fuzz/fuzz.h"
 #include "platform/PropertyTable.h"
-#include "support/TestRoot.h"
 
 namespace {
 
@@ -35,20 +32,11 @@ bool has(const PropertyTable& table, const std::string& key, const std::string& 
     return table.find(key, found) && found == value;
 }
 
-std::string get(const std::string& key) {
-    char value[PROPERTY_VALUE_MAX];
-    const int len = property_get(key.c_str(), value, "DEFAULT");
-    FUZZ_CHECK(len >= 0 && len < PROPERTY_VALUE_MAX && value[len] == '\0');
-    return value;
-}
-
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    static const TestRoot root;
     const std::string text = fuzz_text(data, size);
     const Properties properties = read_lines(text);
-    root.write_file("default.prop", text);
 
     PropertyTable table;
     table.parse(text);
@@ -58,7 +46,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         const auto& [key, value] = property;
         FUZZ_CHECK(has(table, key, value));
         FUZZ_CHECK(table.find(key + "x", found) == (properties.count(key + "x") == 1));
-        FUZZ_CHECK(get(key) == (value.size() < PROPERTY_VALUE_MAX ? value : "DEFAULT"));
     }
 
     table.parse(text + "\nlast=one\n");

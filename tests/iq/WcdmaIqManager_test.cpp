@@ -392,16 +392,6 @@ TEST_F(WcdmaIqManagerTest, AThreadThatCannotPollNeitherSpinsNorIsStuck) {
     EXPECT_EQ(newest(), "two");
 }
 
-TEST_F(WcdmaIqManagerTest, AFullTableOnlyDelaysTheCapture) {
-    auto fillers = Filler::fill(mux());
-    ASSERT_EQ(start(), 0);
-    EXPECT_TRUE(log.has("no room to poll the I/Q saving thread, waiting for it ["));
-    EXPECT_TRUE(log.has("no room to poll the I/Q memory device, waiting for it ["));
-    fillers.resize(fillers.size() - 2);
-    ASSERT_TRUE(save("one"));
-    EXPECT_EQ(newest(), "one");
-}
-
 // It made thousands of empty files a second.
 TEST_F(WcdmaIqManagerTest, ADeviceThatGivesNothingIsLeftAlone) {
     boot_clock::freeze();

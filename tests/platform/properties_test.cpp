@@ -1,10 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 
 #include <cutils/properties.h>
-#include <errno.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <stdarg.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>

@@ -15,20 +15,6 @@
 #include "support/TestRoot.h"
 
 namespace {
-bool g_close_spoils_errno;
-}  // namespace
-
-extern "C" int __real_close(int fd);
-extern "C" int __wrap_close(int fd) {
-    const int result = __real_close(fd);
-    if (g_close_spoils_errno) {
-        errno = EIO;
-    }
-    return result;
-}
-
-namespace {
-
 int server(const std::string& name, int name_space = ANDROID_SOCKET_NAMESPACE_ABSTRACT) {
     return socket_local_server(name.c_str(), name_space, SOCK_STREAM);
 }
@@ -49,10 +35,8 @@ class Sockets : public testing::Test {
 protected:
     Sockets() : m_name("t" + std::to_string(getpid())), m_descriptors(open_descriptors()) {
         unsetenv("KESTMODEM_ROOT");
-        g_close_spoils_errno = true;
     }
     ~Sockets() override {
-        g_close_spoils_errno = false;
         unsetenv("KESTMODEM_ROOT");
         EXPECT_EQ(open_descriptors(), m_descriptors);
     }

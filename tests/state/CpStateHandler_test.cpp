@@ -122,18 +122,6 @@ TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     EXPECT_EQ(say("Modem Assert", "12 bytes: Modem Assert"), CWS_NOT_WORKING);
     modem->init();  // connected: nothing to do
     EXPECT_FALSE(supervisor->accept());
-
-    // Connected without a place in the loop: heard as soon as there is one.
-    modem->process_conn_error(EIO);
-    supervisor->accept();
-    ModemStateHandler second(ctrl.get(), &loop, SUPERVISOR);
-    {
-        const auto fillers = Filler::fill(loop);
-        EXPECT_EQ(second.init(), 0);
-        ASSERT_TRUE((peer = supervisor->accept()));
-        EXPECT_TRUE(log.has("no room to poll supervisor_test, waiting for it [105("));
-    }
-    EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
 }
 
 // It was connected 19,000 times a second.
