@@ -27,6 +27,8 @@ void complete_dump(int fd) {
 // How long the driver may take for the next part of a dump, and a step of that time.
 constexpr int DUMP_PATIENCE_MS = 3000;
 constexpr int DUMP_STEP_MS = 10;
+// In a row; a device whose every read is interrupted has failed.
+constexpr int MAX_INTERRUPTIONS = 300;
 
 // Lets a step of time pass. The first one ends with new data; a driver that goes on to have
 // none may claim to be ready all the same.
@@ -152,10 +154,15 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
         return;
     }
     bool stored = false;
-    int waited_ms = 0;  // since the last data
+    int waited_ms = 0;      // since the last data
+    int interruptions = 0;  // likewise
     for (;;) {
         const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
-        if (n < 0 && (errno == EAGAIN || errno == EINTR)) {
+        if (n < 0 && errno == EINTR && interruptions < MAX_INTERRUPTIONS) {
+            ++interruptions;
+            continue;
+        }
+        if (n < 0 && errno == EAGAIN) {
             if (!stored) {
                 // The dump has not begun: the loop tells when there is something to read.
                 notifier->note_read(false);
@@ -181,6 +188,7 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
         }
         stored = true;
         waited_ms = 0;
+        interruptions = 0;
     }
     notifier->note_read(stored);
     complete_dump(notifier->fd());

@@ -82,6 +82,7 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
          chunk(0, DUMP, "a") + chunk(1, DUMP, "b"),
          ""},
         {{{"", EIO}}, "", "save_dump(FileNotifier*): read AG-DSP dump device error [5("},
+        {FakeDevice::Steps(301, {"", EINTR}), "", "read AG-DSP dump device error [4("},
         // The driver needs a moment.
         {{{"c", 0}, {"", EAGAIN}, {"", EAGAIN}, {"d", 0}, {"", 0}},
          chunk(2, DUMP, "c") + chunk(3, DUMP, "d"),
@@ -93,6 +94,7 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
         log.clear();
         ASSERT_TRUE(yields(mem, c.steps));
         EXPECT_EQ(mem.count(COMPLETE), ++completions);
+        EXPECT_EQ(log.count("AG-DSP agdsp assert"), 1u);
         EXPECT_EQ(log.count("dump device error"), *c.message ? 1u : 0u);
         EXPECT_TRUE(log.has(c.message)) << log.text();
         EXPECT_EQ(content("agdsp"), expected += c.stored);
