@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Buffers of I/Q samples are captured while the logs go on.
-#include <algorithm>
+#include <sys/stat.h>
+
 #include <filesystem>
+#include <map>
 
 #include "sim/DemoStage.h"
 #include "sim/WriteClock.h"
@@ -40,17 +42,29 @@ std::string current_dir(DemoStage& stage, const SimCp& cp) {
     return newest;
 }
 
+// The captures by what they are on the medium: one of the same second takes over the name.
+std::map<ino_t, std::string> captures(DemoStage& stage, const SimCp& cp) {
+    std::map<ino_t, std::string> found;
+    for (const std::string& path : stage.files(cp, cp.name + "_wiq_", ".bin")) {
+        struct stat st;
+        if (stat(path.c_str(), &st) == 0) {
+            found[st.st_ino] = path;
+        }
+    }
+    return found;
+}
+
 // Announces the samples, waits until they are saved and checks the file.
 bool capture(DemoStage& stage, const Buffer& buffer, uint32_t seed) {
     SimIqDevice& iq = stage.handset().iq_memory();
     SimCp& cp = stage.modem();
-    const auto earlier = stage.files(cp, cp.name + "_wiq_", ".bin");
+    const auto earlier = captures(stage, cp);
     const unsigned released = iq.released();
     bool good = iq.announce(buffer.offset, buffer.len) &&
                 stage.wait_until([&] { return iq.released() > released; }, 30);
     std::vector<std::string> fresh;
-    for (const std::string& path : stage.files(cp, cp.name + "_wiq_", ".bin")) {
-        if (std::find(earlier.begin(), earlier.end(), path) == earlier.end()) {
+    for (const auto& [file, path] : captures(stage, cp)) {
+        if (earlier.count(file) == 0) {
             fresh.push_back(path);
         }
     }
