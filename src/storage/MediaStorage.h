@@ -103,6 +103,7 @@ private:
     void insert_scanned(CpSetDirectory* set);
     CpSetDirectory* find_set(const android::String8& path) const;
     void drop_working_set();
+    bool above_quota() const;
     bool recount_helps();
     void recount();
 

@@ -47,24 +47,24 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
     return removed;
 }
 
+bool MediaStorage::above_quota() const {
+    return m_quota != 0 && m_size > m_quota;
+}
+
 int MediaStorage::check_quota() {
-    if (m_quota == 0 || m_size <= m_quota) {
-        m_refusals = 0;
-        return 0;
-    }
-    if (m_uncertain) {
+    if (above_quota() && m_uncertain) {
         recount();
-        if (m_size <= m_quota) {
-            return 0;
-        }
     }
-    if (!m_overwrite) {
-        return recount_helps() ? 0 : -1;
+    if (above_quota() && m_overwrite) {
+        info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
+                 static_cast<unsigned int>(m_quota >> 20));
+        trim(m_size - m_quota);
     }
-    info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
-             static_cast<unsigned int>(m_quota >> 20));
-    trim(m_size - m_quota);
-    return m_size <= m_quota || recount_helps() ? 0 : -1;
+    if (above_quota() && !recount_helps()) {
+        return -1;
+    }
+    m_refusals = 0;
+    return 0;
 }
 
 // True when the total is within the quota once what somebody else deleted has left it.
@@ -72,7 +72,7 @@ bool MediaStorage::recount_helps() {
     if (m_refusals++ % CHECKS_PER_RECOUNT == 0) {
         recount();
     }
-    return m_size <= m_quota;
+    return !above_quota();
 }
 
 // Counts again what the lists hold and drops what is gone from the medium. A working set

@@ -7,6 +7,7 @@
 #include <stddef.h>
 #include <unistd.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/open_file.h"
 
@@ -44,9 +45,8 @@ int copy_file(const char* src, const char* dst) {
         return -1;
     }
     const int result = copy_content(src_fd, dst_fd);
-    const int error = errno;
+    const SavedErrno keep;
     close(dst_fd);
     close(src_fd);
-    errno = error;
     return result;
 }
