@@ -10,10 +10,9 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <fstream>
 #include <future>
-#include <iterator>
 
+#include "sim/files.h"
 #include "sim/kernel_files.h"
 
 namespace fs = std::filesystem;
@@ -59,8 +58,7 @@ bool DemoStage::fail(const std::string& text) {
 // within their quotas, the dumps, and what is fed while the quotas are lifted.
 bool DemoStage::has_room() {
     const uint64_t needed = (uint64_t{380} << 20) + uint64_t{m_options.rate} * 1024 * 30;
-    fs::path place =
-        m_options.root.empty() ? fs::path(SimHandset::temp_dir()) : fs::absolute(m_options.root);
+    fs::path place = m_options.root.empty() ? fs::path(temp_dir()) : fs::absolute(m_options.root);
     std::error_code ec;
     while (place.has_relative_path() && !fs::exists(place, ec)) {
         place = place.parent_path();
@@ -336,9 +334,7 @@ bool DemoStage::check_new_file(const SimCp& cp, const std::string& prefix,
         return check(false, std::to_string(fresh.size()) + " new files " + prefix + "*" + suffix +
                                 " of " + cp.name + " instead of one");
     }
-    std::ifstream in(fresh[0], std::ios::binary);
-    const std::vector<char> data((std::istreambuf_iterator<char>(in)),
-                                 std::istreambuf_iterator<char>());
+    const std::string data = read_text_file(fresh[0]);
     const bool same =
         data.size() == content.size() && memcmp(data.data(), content.data(), data.size()) == 0;
     return check(same, fs::path(fresh[0]).filename().string() + ", " + std::to_string(data.size()) +

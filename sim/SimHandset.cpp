@@ -4,7 +4,6 @@
 
 #include <errno.h>
 #include <stdio.h>
-#include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
@@ -12,6 +11,7 @@
 #include <filesystem>
 
 #include "sim/LogCollector.h"
+#include "sim/files.h"
 
 namespace fs = std::filesystem;
 
@@ -71,20 +71,14 @@ bool SimHandset::fail(const std::string& what) {
     return false;
 }
 
-std::string SimHandset::temp_dir() {
-    const char* tmp = getenv("TMPDIR");
-    return tmp && *tmp ? tmp : "/tmp";
-}
-
 bool SimHandset::create(const std::string& dir, const SimSizes& sizes) {
     m_sizes = sizes;
     std::error_code ec;
     if (dir.empty()) {
-        std::string made = temp_dir() + "/kestsim.XXXXXX";
-        if (!mkdtemp(made.data())) {
-            return fail("cannot make " + made);
+        m_root = make_temp_dir(temp_dir(), "kestsim");
+        if (m_root.empty()) {
+            return fail("cannot make a directory in " + temp_dir());
         }
-        m_root = made;
     } else {
         fs::create_directories(dir, ec);
         if (!ec && !fs::is_empty(dir, ec) && !ec) {
@@ -225,8 +219,5 @@ bool SimHandset::settle(LogCollector& logs, int timeout_ms) {
 }
 
 void SimHandset::remove_root() {
-    std::error_code ec;
-    if (!m_root.empty()) {
-        fs::remove_all(m_root, ec);
-    }
+    remove_dir(m_root);
 }

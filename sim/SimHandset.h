@@ -53,9 +53,6 @@ public:
     SimHandset(const SimHandset&) = delete;
     SimHandset& operator=(const SimHandset&) = delete;
 
-    // Where new roots are made: $TMPDIR or /tmp.
-    static std::string temp_dir();
-
     // Makes the root: the given directory, which must be absent or empty, or a new one
     // in temp_dir(). Starts the time service. False with error() set on failure.
     bool create(const std::string& dir, const SimSizes& sizes = SimSizes());

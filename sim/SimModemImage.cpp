@@ -7,10 +7,9 @@
 #include <unistd.h>
 
 #include <filesystem>
-#include <fstream>
-#include <iterator>
 
 #include "sim/SimHandset.h"
+#include "sim/files.h"
 #include "sim/sha1.h"
 
 namespace {
@@ -36,11 +35,6 @@ void put_entry(std::vector<uint8_t>& bytes, uint8_t type, uint8_t flags, size_t 
     bytes.insert(bytes.end(), {type, flags, 0xEE, 0xEE});
     put32(bytes, offset);
     put32(bytes, size);
-}
-
-std::string file_text(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 
 }  // namespace
@@ -102,8 +96,8 @@ bool SimModemImage::install(SimHandset& handset, const std::string& mode) const 
 }
 
 bool SimModemImage::saved_in(const std::string& log_root) const {
-    const std::string saved = file_text(log_root + "/modem_db.gz");
+    const std::string saved = read_text_file(log_root + "/modem_db.gz");
     return saved.size() == m_database.size() &&
            memcmp(saved.data(), m_database.data(), saved.size()) == 0 &&
-           file_text(log_root + "/sha1.txt") == m_digest_text;
+           read_text_file(log_root + "/sha1.txt") == m_digest_text;
 }

@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // A client asks for settings and changes one.
-#include <fstream>
-#include <iterator>
-
 #include "sim/DemoStage.h"
+#include "sim/files.h"
 #include "sim/scenes/scenes.h"
 
 void play_control(DemoStage& stage) {
@@ -17,9 +15,8 @@ void play_control(DemoStage& stage) {
     stage.expect("SET_LOG_FILE_SIZE " + changed + "MB", "ERROR 2");
     stage.expect("SET_LOG_FILE_SIZE " + changed, "OK");
     stage.expect("GET_LOG_FILE_SIZE", "OK " + changed);
-    std::ifstream in(stage.handset().path("data/local/tmp/kestmodem/kest_modem.conf"));
-    const std::string config((std::istreambuf_iterator<char>(in)),
-                             std::istreambuf_iterator<char>());
+    const std::string config =
+        read_text_file(stage.handset().path("data/local/tmp/kestmodem/kest_modem.conf"));
     stage.check(config.find("log_file_size " + changed) != std::string::npos ||
                     config.find("log_file_size\t" + changed) != std::string::npos,
                 "the settings file holds the new size");
