@@ -21,18 +21,13 @@
 #include <poll.h>
 #include <sched.h>
 #include <signal.h>
-#include <stddef.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/ioctl.h>
-#include <sys/prctl.h>
-#include <sys/resource.h>
-#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/statfs.h>
-#include <sys/un.h>
 #include <sys/wait.h>
 #include <time.h>
 #include <unistd.h>
@@ -43,13 +38,19 @@
 #include <string>
 #include <vector>
 
+#include "sim/LogCollector.h"
+#include "sim/ServiceProcess.h"
+#include "sim/SimHandset.h"
+#include "sim/SimSupervisor.h"
+#include "sim/files.h"
+
 namespace fs = std::filesystem;
 
 namespace {
 
 constexpr uint64_t MIB = 1 << 20;
 constexpr double TARGET = 1.15;  // CPU of the service relative to cat
-constexpr uint64_t FILE_MIB = 5;
+constexpr unsigned FILE_MIB = 5;
 constexpr int START_TIMEOUT_MS = 5000;
 
 // scripts/bench --help prints the same file.
@@ -74,10 +75,6 @@ void on_signal(int /*signo*/) {
     g_interrupted = 1;
 }
 
-double seconds(const struct timeval& t) {
-    return static_cast<double>(t.tv_sec) + static_cast<double>(t.tv_usec) / 1e6;
-}
-
 double read_clock(clockid_t clock) {
     struct timespec t;
     clock_gettime(clock, &t);
@@ -93,178 +90,42 @@ bool fail(const char* what, const std::string& name) {
     return false;
 }
 
-std::string read_text(const std::string& path) {
-    std::string text;
-    if (FILE* file = fopen(path.c_str(), "re")) {
-        char buf[4096];
-        for (size_t n; (n = fread(buf, 1, sizeof(buf), file)) > 0;) {
-            text.append(buf, n);
-        }
-        fclose(file);
-    }
-    return text;
-}
-
-bool write_text(const std::string& path, const std::string& text) {
-    FILE* file = fopen(path.c_str(), "we");
-    if (!file) {
-        return fail("create", path);
-    }
-    const bool written = fwrite(text.data(), 1, text.size(), file) == text.size();
-    return (fclose(file) == 0 && written) || fail("write", path);
-}
-
-// A directory that goes with everything in it.
-class TempDir {
-public:
-    explicit TempDir(const std::string& parent) : m_path(parent + "/kestbench.XXXXXX") {
-        if (!mkdtemp(m_path.data())) {
-            fail("create", m_path);
-            m_path.clear();
-        }
-    }
-    ~TempDir() {
-        std::error_code ignored;
-        if (!m_path.empty()) {
-            fs::remove_all(m_path, ignored);
-        }
-    }
-    TempDir(const TempDir&) = delete;
-    TempDir& operator=(const TempDir&) = delete;
-    const std::string& path() const { return m_path; }
-
-private:
-    std::string m_path;
-};
-
-// A listening socket of the handset that a service of this root connects to. Nothing is
-// ever said on it: without it the service would try again every few seconds.
-class SilentServer {
-public:
-    SilentServer(const char* name, const std::string& root) {
-        struct sockaddr_un address;
-        memset(&address, 0, sizeof(address));
-        address.sun_family = AF_UNIX;
-        const std::string full = std::string(name) + "@" + root;
-        const size_t len = std::min(full.size(), sizeof(address.sun_path) - 1);
-        memcpy(address.sun_path + 1, full.data(), len);
-        m_fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-        if (bind(m_fd, reinterpret_cast<struct sockaddr*>(&address),
-                 static_cast<socklen_t>(offsetof(struct sockaddr_un, sun_path) + 1 + len)) < 0 ||
-            listen(m_fd, 4) < 0) {
-            fail("listen on", full);
-        }
-    }
-    ~SilentServer() { close(m_fd); }
-    SilentServer(const SilentServer&) = delete;
-    SilentServer& operator=(const SilentServer&) = delete;
-
-private:
-    int m_fd;
-};
-
 struct Result {
     bool ok = false;
-    double user = 0;
-    double sys = 0;
+    ChildProcess::Cost cost;
     double wall = 0;
     double deleting = 0;  // CPU time of the benchmark for the deletion of old data
-    uint64_t reads = 0;   // read calls, those of start-up included
-    uint64_t writes = 0;  // write and writev calls
-    double cpu() const { return user + sys; }
-    double with_deleting() const { return user + sys + deleting; }
+    double cpu() const { return cost.user_s + cost.system_s; }
+    double with_deleting() const { return cpu() + deleting; }
 };
 
-// A child process that reads a FIFO.
-class Reader {
-public:
-    ~Reader() {
-        if (m_pid > 0) {
-            kill(m_pid, SIGKILL);
-            waitpid(m_pid, nullptr, 0);
+// The writing end of the FIFO, once the reader has opened its end; or -1.
+int open_writer(const std::string& fifo, ChildProcess& reader) {
+    for (int waited = 0; waited < START_TIMEOUT_MS && reader.alive(); ++waited) {
+        const int fd = open(fifo.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC);
+        if (fd >= 0) {
+            fcntl(fd, F_SETFL, 0);
+            return fd;
         }
+        sleep_ms(1);
     }
+    fail("no reader of", fifo);
+    return -1;
+}
 
-    bool start(const std::vector<std::string>& args, const std::string& out,
-               const std::string& err) {
-        std::vector<char*> argv;
-        for (const std::string& arg : args) {
-            argv.push_back(const_cast<char*>(arg.c_str()));
-        }
-        argv.push_back(nullptr);
-        m_pid = fork();
-        if (m_pid == 0) {
-            prctl(PR_SET_PDEATHSIG, SIGKILL);
-            signal(SIGPIPE, SIG_DFL);
-            const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC;
-            const int out_fd = open(out.c_str(), flags, 0644);
-            const int err_fd = open(err.c_str(), flags, 0644);
-            dup2(out_fd, STDOUT_FILENO);
-            dup2(err_fd, STDERR_FILENO);
-            execvp(argv[0], argv.data());
-            _exit(127);
-        }
-        return m_pid > 0 || fail("start", args[0]);
+// Waits until the program has not been on a CPU for so long.
+void wait_idle(const ChildProcess& program, int ms) {
+    for (std::string state; state != program.run_state();) {
+        state = program.run_state();
+        sleep_ms(ms);
     }
+}
 
-    // The writing end of the FIFO, once the child has opened the reading end; or -1.
-    int connect(const std::string& fifo) {
-        for (int waited = 0; waited < START_TIMEOUT_MS && running(); ++waited) {
-            const int fd = open(fifo.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC);
-            if (fd >= 0) {
-                fcntl(fd, F_SETFL, 0);
-                return fd;
-            }
-            sleep_ms(1);
-        }
-        fail("no reader of", fifo);
-        return -1;
-    }
-
-    bool running() const {
-        siginfo_t info;
-        info.si_pid = 0;
-        waitid(P_PID, static_cast<id_t>(m_pid), &info, WEXITED | WNOHANG | WNOWAIT);
-        return info.si_pid == 0;
-    }
-
-    // Nanoseconds on a CPU and the like, as the kernel shows them: equal texts mean that
-    // the child did not run.
-    std::string run_state() const { return read_text(proc("schedstat")); }
-
-    void end(int signo) { kill(m_pid, signo); }
-
-    // Waits for the child's end and takes what it cost.
-    bool collect(int expected_signal, Result& result) {
-        siginfo_t info;
-        while (waitid(P_PID, static_cast<id_t>(m_pid), &info, WEXITED | WNOWAIT) < 0) {
-            if (errno != EINTR || g_interrupted) {
-                return false;
-            }
-        }
-        unsigned long long reads = 0;
-        unsigned long long writes = 0;
-        sscanf(read_text(proc("io")).c_str(), "rchar: %*u wchar: %*u syscr: %llu syscw: %llu",
-               &reads, &writes);
-        int status;
-        struct rusage usage;
-        wait4(m_pid, &status, 0, &usage);
-        m_pid = -1;
-        result.user = seconds(usage.ru_utime);
-        result.sys = seconds(usage.ru_stime);
-        result.reads = reads;
-        result.writes = writes;
-        return expected_signal ? WIFSIGNALED(status) && WTERMSIG(status) == expected_signal
-                               : WIFEXITED(status) && WEXITSTATUS(status) == 0;
-    }
-
-private:
-    std::string proc(const char* file) const {
-        return "/proc/" + std::to_string(m_pid) + "/" + file;
-    }
-
-    pid_t m_pid = -1;
-};
+// Kills the program: true when that is what it ended by.
+bool end(ChildProcess& program) {
+    program.signal(SIGKILL);
+    return program.wait() && WIFSIGNALED(program.status()) && WTERMSIG(program.status()) == SIGKILL;
+}
 
 bool write_all(int fd, const uint8_t* data, size_t len) {
     while (len > 0) {
@@ -303,9 +164,9 @@ bool feed(int fd, uint64_t size, size_t block, Trim trim) {
 }
 
 // Waits until the reader has emptied the FIFO.
-bool wait_empty(int fd, const Reader& reader) {
+bool wait_empty(int fd, ChildProcess& reader) {
     for (int unread = 1; unread > 0;) {
-        if (ioctl(fd, FIONREAD, &unread) < 0 || g_interrupted || !reader.running()) {
+        if (ioctl(fd, FIONREAD, &unread) < 0 || g_interrupted || !reader.alive()) {
             return false;
         }
         if (unread > 0) {
@@ -315,48 +176,38 @@ bool wait_empty(int fd, const Reader& reader) {
     return true;
 }
 
-// The handset in a directory that the service is started for.
-class Handset {
+// The handset that the service is started for: a GNSS receiver, and supervisors to connect
+// to, without which the service would try again every few seconds.
+class BenchHandset {
 public:
-    Handset(const std::string& dir, uint64_t kept_mib)
-        : m_root(dir + "/h"),
-          m_modemd("modemd", m_root),
-          m_wcnd("external_wcn_kest", m_root),
-          m_kept_mib(kept_mib) {
-        std::error_code error;
-        fs::create_directories(m_root + "/data/local/tmp/kestmodem", error);
-        fs::create_directories(m_root + "/dev", error);
-        m_ok = (mkfifo(fifo().c_str(), 0600) == 0 || fail("create", fifo())) &&
-               write_text(m_root + "/default.prop", "ro.modem.gnss.diag=" + fifo() + "\n") &&
-               write_text(m_root + "/data/local/tmp/kestmodem/kest_modem.conf",
-                          "minidump disable\texternal\nlog_file_size " + std::to_string(FILE_MIB) +
-                              "\ndata_log_size " + std::to_string(kept_mib) +
-                              "\nsd_log_size 250\nlog_overwrite enable\n"
-                              "stream\tcp_gnss\ton\t0\t0\n") &&
-               setenv("KESTMODEM_ROOT", m_root.c_str(), 1) == 0;
+    BenchHandset(const std::string& dir, uint64_t kept_mib) : m_kept_mib(kept_mib) {
+        const SimSizes sizes = {FILE_MIB, static_cast<unsigned>(kept_mib), 250, true};
+        SimCp* gnss = m_sim.create(dir + "/h", sizes) ? m_sim.add_cp("cp_gnss") : nullptr;
+        if (!gnss) {
+            fprintf(stderr, "bench_log_path: %s\n", m_sim.error().c_str());
+            return;
+        }
+        gnss->log.leave_to_writer();
+        m_fifo = gnss->log.path();
+        m_ok = (m_modemd.start("modemd", m_sim.root()) &&
+                m_wcnd.start("external_wcn_kest", m_sim.root())) ||
+               fail("listen in", m_sim.root());
     }
-    ~Handset() {
-        std::error_code ignored;
-        fs::remove_all(m_root, ignored);
-    }
-    Handset(const Handset&) = delete;
-    Handset& operator=(const Handset&) = delete;
+    ~BenchHandset() { m_sim.remove_root(); }
+    BenchHandset(const BenchHandset&) = delete;
+    BenchHandset& operator=(const BenchHandset&) = delete;
 
     bool ok() const { return m_ok; }
-    std::string fifo() const { return m_root + "/dev/gnss"; }
+    const SimHandset& sim() const { return m_sim; }
+    const std::string& fifo() const { return m_fifo; }
 
     // True when the log files hold what they must after size bytes: all but what may
     // still be staged in the service, or what the quota allows.
     bool check_logs(uint64_t size) const {
         constexpr uint64_t STAGED = 65536;
-        uint64_t found = 0;
-        std::error_code error;
-        for (fs::recursive_directory_iterator it(m_root + "/data/modem_log", error), end;
-             !error && it != end; it.increment(error)) {
-            if (it->is_regular_file(error)) {
-                found += it->file_size(error);
-            }
-        }
+        LogCollector logs(m_sim);
+        logs.scan();
+        const uint64_t found = logs.media()[0].bytes;
         const uint64_t quota = m_kept_mib ? m_kept_mib * MIB : size;
         const uint64_t most = std::min(quota, size);
         const uint64_t tolerance = size > quota ? (FILE_MIB + 1) * MIB : 0;
@@ -369,38 +220,50 @@ public:
     }
 
 private:
-    std::string m_root;
-    SilentServer m_modemd;
-    SilentServer m_wcnd;
-    uint64_t m_kept_mib;
+    SimHandset m_sim;
+    SimSupervisor m_modemd;
+    SimSupervisor m_wcnd;
+    std::string m_fifo;
+    const uint64_t m_kept_mib;
     bool m_ok = false;
 };
+
+// Starts the service, or a wrapper of it, for the handset; the writing end of the GNSS
+// receiver's log device, or -1.
+int start_service(const std::vector<std::string>& args, const BenchHandset& handset,
+                  ServiceProcess& service) {
+    if (!handset.ok()) {
+        return -1;
+    }
+    if (!service.start(args[0], handset.sim(), {args.begin() + 1, args.end()})) {
+        fail("start", args[0]);
+        return -1;
+    }
+    const int fd = open_writer(handset.fifo(), service);
+    if (fd < 0) {
+        fputs(service.log_text().c_str(), stderr);
+    }
+    return fd;
+}
 
 // ---- CPU time
 
 Result run_service(const Options& options, const std::string& dir) {
     Result result;
-    const Handset handset(dir, options.kept_mib);
-    Reader reader;
-    if (!handset.ok() || !reader.start({options.service}, dir + "/out", dir + "/err")) {
-        return result;
-    }
-    const int fd = reader.connect(handset.fifo());
+    const BenchHandset handset(dir, options.kept_mib);
+    ServiceProcess service;
+    const int fd = start_service({options.service}, handset, service);
     if (fd < 0) {
-        fputs(read_text(dir + "/err").c_str(), stderr);
         return result;
     }
     const uint64_t size = options.mib * MIB;
     const double start = read_clock(CLOCK_MONOTONIC);
-    if (feed(fd, size, options.block, [](uint64_t) {}) && wait_empty(fd, reader)) {
+    if (feed(fd, size, options.block, [](uint64_t) {}) && wait_empty(fd, service)) {
         result.wall = read_clock(CLOCK_MONOTONIC) - start;
         // The last block is read but may not be stored yet.
-        for (std::string state; state != reader.run_state();) {
-            state = reader.run_state();
-            sleep_ms(20);
-        }
-        reader.end(SIGKILL);
-        result.ok = reader.collect(SIGKILL, result) && handset.check_logs(size);
+        wait_idle(service, 20);
+        result.ok = end(service) && handset.check_logs(size);
+        result.cost = service.cost();
     }
     close(fd);
     return result;
@@ -411,12 +274,12 @@ template <typename Trim>
 Result run_tool(const Options& options, const std::string& dir,
                 const std::vector<std::string>& args, const std::string& out, Trim trim) {
     Result result;
-    const std::string fifo = dir + "/fifo";
-    Reader reader;
-    if (!reader.start(args, out, dir + "/err")) {
+    ChildProcess reader;
+    if (!reader.start({args, out, dir + "/err", false, {}, -1})) {
+        fail("start", args[0]);
         return result;
     }
-    const int fd = reader.connect(fifo);
+    const int fd = open_writer(dir + "/fifo", reader);
     if (fd < 0) {
         return result;
     }
@@ -427,7 +290,8 @@ Result run_tool(const Options& options, const std::string& dir,
         result.deleting += read_clock(CLOCK_THREAD_CPUTIME_ID) - before;
     });
     close(fd);
-    result.ok = reader.collect(0, result) && fed;
+    result.ok = reader.wait() && reader.status() == 0 && fed;
+    result.cost = reader.cost();
     result.wall = read_clock(CLOCK_MONOTONIC) - start;
     return result;
 }
@@ -509,11 +373,11 @@ int measure(const Options& options, const std::string& dir) {
             const double to_work = r.with_deleting() / cat.with_deleting();
             const double size = static_cast<double>(options.mib * MIB);
             printf("%-6s%-10s%8.3f%8.3f%8.3f%10.3f%8.3f%11.3f%8.0f%8llu%8llu%10.1f\n",
-                   round ? std::to_string(round).c_str() : "warm", readers[i].name, r.user, r.sys,
-                   r.cpu(), r.deleting, to_cat, to_work, size / 1e6 / r.wall,
-                   static_cast<unsigned long long>(r.reads),
-                   static_cast<unsigned long long>(r.writes),
-                   size / 1024 / static_cast<double>(std::max<uint64_t>(r.reads, 1)));
+                   round ? std::to_string(round).c_str() : "warm", readers[i].name, r.cost.user_s,
+                   r.cost.system_s, r.cpu(), r.deleting, to_cat, to_work, size / 1e6 / r.wall,
+                   static_cast<unsigned long long>(r.cost.reads),
+                   static_cast<unsigned long long>(r.cost.writes),
+                   size / 1024 / static_cast<double>(std::max<uint64_t>(r.cost.reads, 1)));
             fflush(stdout);
             if (round > 0) {
                 cpu[i].push_back(r.cpu());
@@ -557,37 +421,28 @@ Calls parse_calls(const std::string& text) {
 // The calls of a whole run in which the service got this many blocks, one by one.
 bool count_run(const Options& options, const std::string& dir, size_t block, int blocks,
                Calls& calls) {
-    const Handset handset(dir, options.kept_mib);
+    const BenchHandset handset(dir, options.kept_mib);
     const std::string table = dir + "/calls";
     unlink(table.c_str());
-    Reader reader;
     // A property file that has just been changed is read again and again for a while.
     sleep_ms(200);
     // -D: the service stays the child, and strace ends with it.
-    if (!handset.ok() || !reader.start({"strace", "-D", "-f", "-c", "-o", table, options.service},
-                                       dir + "/out", dir + "/err")) {
-        return false;
-    }
-    const int fd = reader.connect(handset.fifo());
+    ServiceProcess service;
+    const int fd =
+        start_service({"strace", "-D", "-f", "-c", "-o", table, options.service}, handset, service);
     if (fd < 0) {
-        fputs(read_text(dir + "/err").c_str(), stderr);
         return false;
     }
     const std::vector<uint8_t> data(block, 0x5a);
     bool fed = true;
     for (int i = 0; i < blocks && fed; ++i) {
-        fed = write_all(fd, data.data(), block) && wait_empty(fd, reader);
+        fed = write_all(fd, data.data(), block) && wait_empty(fd, service);
     }
-    for (std::string state; state != reader.run_state();) {
-        state = reader.run_state();
-        sleep_ms(50);
-    }
-    Result ignored;
-    reader.end(SIGKILL);
-    fed = reader.collect(SIGKILL, ignored) && fed;
+    wait_idle(service, 50);
+    fed = end(service) && fed;
     close(fd);
     for (int waited = 0; waited < START_TIMEOUT_MS; waited += 10) {
-        const std::string text = read_text(table);
+        const std::string text = read_text_file(table);
         if (text.find(" total\n") != std::string::npos) {
             calls = parse_calls(text);
             calls.erase("total");
@@ -644,8 +499,7 @@ std::string default_dir(const Options& options) {
         access("/dev/shm", W_OK) == 0) {
         return "/dev/shm";
     }
-    const char* tmp = getenv("TMPDIR");
-    return tmp && *tmp ? tmp : "/tmp";
+    return temp_dir();
 }
 
 bool parse_options(int argc, char** argv, Options& options) {
@@ -708,8 +562,9 @@ int main(int argc, char** argv) {
     action.sa_handler = SIG_IGN;
     sigaction(SIGPIPE, &action, nullptr);
 
-    const TempDir dir(options.dir);
+    const TempDir dir(options.dir, "kestbench");
     if (dir.path().empty()) {
+        fail("make a directory in", options.dir);
         return 2;
     }
     if (options.count_calls) {

@@ -28,13 +28,17 @@ void SimLogDevice::remove() {
         m_terminal.remove();
         m_path.clear();
     }
-    if (m_fd >= 0) {
-        close(m_fd);
-        m_fd = -1;
-    }
+    leave_to_writer();
     if (!m_path.empty()) {
         unlink(m_path.c_str());
         m_path.clear();
+    }
+}
+
+void SimLogDevice::leave_to_writer() {
+    if (m_fd >= 0) {
+        close(m_fd);
+        m_fd = -1;
     }
 }
 

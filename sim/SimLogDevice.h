@@ -25,6 +25,10 @@ public:
     // Takes the device away: a service that holds it open gets no more data from it.
     void remove();
 
+    // Lets go of the FIFO, which stays: a writer of the caller's own takes its place, sees
+    // when the service opens it and waits for the service in its writes.
+    void leave_to_writer();
+
     // Never blocks. Number of bytes taken (0 when the device is full), -1 on an error.
     ssize_t feed(const void* data, size_t len);
     // Bytes fed that the service has not read yet; of a terminal see SimDiagDevice.

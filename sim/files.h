@@ -15,4 +15,19 @@ std::string make_temp_dir(const std::string& parent, const std::string& prefix);
 // Removes the directory with everything below it.
 void remove_dir(const std::string& path);
 
+// Such a directory as long as the object lives.
+class TempDir {
+public:
+    TempDir(const std::string& parent, const std::string& prefix)
+        : m_path(make_temp_dir(parent, prefix)) {}
+    ~TempDir() { remove_dir(m_path); }
+    TempDir(const TempDir&) = delete;
+    TempDir& operator=(const TempDir&) = delete;
+
+    const std::string& path() const { return m_path; }  // "" when it could not be made
+
+private:
+    const std::string m_path;
+};
+
 #endif  // SIM_FILES_H_
