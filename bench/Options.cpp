@@ -8,6 +8,7 @@
 #include <unistd.h>
 
 #include "bench/common.h"
+#include "bench/measurements.h"
 #include "sim/files.h"
 
 std::string default_dir(const Options& options) {
@@ -23,10 +24,11 @@ std::string default_dir(const Options& options) {
 }
 
 bool parse_options(int argc, char** argv, Options& options) {
+    options.measurement = find_measurement(nullptr);
     for (int i = 1; i < argc; ++i) {
         const std::string arg = argv[i];
-        if (arg == "--strace") {
-            options.count_calls = true;
+        if (const Measurement* asked = find_measurement(argv[i])) {
+            options.measurement = asked;
             continue;
         }
         if (arg == "--spread") {

@@ -8,13 +8,15 @@
 
 #include <string>
 
+struct Measurement;
+
 struct Options {
     uint64_t mib = 1024;
     uint64_t kept_mib = 50;  // 0: everything
     size_t block = 65536;    // bytes a write to the FIFO
     int rounds = 3;
     bool spread = false;  // over all CPUs
-    bool count_calls = false;
+    const Measurement* measurement = nullptr;
     std::string dir;
     std::string service;
 };

@@ -11,15 +11,16 @@
 //
 // Writer and reader share one CPU: on two, what the reader's copies cost depends on which
 // caches the data is in, and the ratio is different in every round (--spread shows it).
+#include <sched.h>
 #include <stdio.h>
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <vector>
 
+#include "bench/Options.h"
 #include "bench/common.h"
 #include "bench/log_readers.h"
-#include "bench/measurements.h"
 
 namespace {
 
@@ -40,6 +41,20 @@ int measure_log_path(const Options& options, const std::string& dir) {
     } readers[] = {{"cat", run_cat}, {"split", run_split}, {"kestmodem", run_service}};
     constexpr size_t READERS = 3;
 
+    if (!options.spread) {
+        cpu_set_t one;
+        CPU_ZERO(&one);
+        CPU_SET(sched_getcpu(), &one);
+        sched_setaffinity(0, sizeof(one), &one);
+    }
+    printf("%llu MiB through a FIFO in writes of %zu bytes, files of %llu MiB in %s, ",
+           static_cast<unsigned long long>(options.mib), options.block,
+           static_cast<unsigned long long>(FILE_MIB), options.dir.c_str());
+    if (options.kept_mib) {
+        printf("%llu MiB kept\n", static_cast<unsigned long long>(options.kept_mib));
+    } else {
+        printf("everything kept\n");
+    }
     if (mkfifo((dir + "/fifo").c_str(), 0600) < 0) {
         fail("create", dir + "/fifo");
         return 2;

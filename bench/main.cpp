@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The benchmark of the service: reads the options, makes a directory for the measurement
 // and runs it there.
-#include <sched.h>
 #include <signal.h>
 #include <stdio.h>
 #include <string.h>
@@ -53,22 +52,5 @@ int main(int argc, char** argv) {
         fail("make a directory in", options.dir);
         return 2;
     }
-    if (options.count_calls) {
-        return count_system_calls(options, dir.path());
-    }
-    if (!options.spread) {
-        cpu_set_t one;
-        CPU_ZERO(&one);
-        CPU_SET(sched_getcpu(), &one);
-        sched_setaffinity(0, sizeof(one), &one);
-    }
-    printf("%llu MiB through a FIFO in writes of %zu bytes, files of %llu MiB in %s, ",
-           static_cast<unsigned long long>(options.mib), options.block,
-           static_cast<unsigned long long>(FILE_MIB), options.dir.c_str());
-    if (options.kept_mib) {
-        printf("%llu MiB kept\n", static_cast<unsigned long long>(options.kept_mib));
-    } else {
-        printf("everything kept\n");
-    }
-    return measure_log_path(options, dir.path());
+    return options.measurement->run(options, dir.path());
 }

@@ -8,9 +8,9 @@
 #include <vector>
 
 #include "bench/BenchHandset.h"
+#include "bench/Options.h"
 #include "bench/common.h"
 #include "bench/feeding.h"
-#include "bench/measurements.h"
 #include "sim/files.h"
 
 namespace {
