@@ -2,8 +2,8 @@
 // The audio DSP's three devices in one log.
 #include "channels/AgDspLogHandler.h"
 #include "channels/DspChunkHeader.h"
-#include "channels/FaultFixture.h"
-#include "iq/fake_devices.h"
+#include "support/FaultFixture.h"
+#include "support/fake_devices.h"
 
 namespace {
 

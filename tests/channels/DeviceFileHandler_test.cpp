@@ -2,7 +2,7 @@
 
 #include "channels/DeviceFileHandler.h"
 
-#include "channels/ChannelFixture.h"
+#include "support/ChannelFixture.h"
 
 namespace {
 

@@ -2,8 +2,8 @@
 
 #include "channels/DiagReplyConsumer.h"
 
-#include "channels/FaultFixture.h"
 #include "storage/MediaStorage.h"
+#include "support/FaultFixture.h"
 
 namespace {
 

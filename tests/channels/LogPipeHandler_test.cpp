@@ -2,7 +2,7 @@
 
 #include "channels/LogPipeHandler.h"
 
-#include "channels/CrashFixture.h"
+#include "support/CrashFixture.h"
 #include "support/boot_clock.h"
 
 namespace {

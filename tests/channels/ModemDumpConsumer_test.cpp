@@ -4,8 +4,8 @@
 
 #include <malloc.h>
 
-#include "channels/FaultFixture.h"
 #include "storage/MediaStorage.h"
+#include "support/FaultFixture.h"
 
 namespace {
 

@@ -3,9 +3,9 @@
 #include <sys/resource.h>
 #include <sys/wait.h>
 
-#include "channels/FaultFixture.h"
 #include "channels/ModemImage.h"
 #include "channels/WanModemLogHandler.h"
+#include "support/FaultFixture.h"
 
 namespace {
 

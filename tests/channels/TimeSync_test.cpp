@@ -2,8 +2,8 @@
 
 #include <sys/un.h>
 
-#include "channels/ChannelFixture.h"
 #include "channels/TimeSyncRecord.h"
+#include "support/ChannelFixture.h"
 
 namespace {
 

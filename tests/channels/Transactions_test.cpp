@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // What comes between a transaction and its end.
-#include "channels/FaultFixture.h"
+#include "support/FaultFixture.h"
 
 namespace {
 

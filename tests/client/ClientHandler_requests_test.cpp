@@ -4,7 +4,7 @@
 #include <regex>
 #include <sstream>
 
-#include "client/ControlFixture.h"
+#include "support/ControlFixture.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 // Framing, subscriptions, delayed results.
 #include "client/ClientHandler.h"
 
-#include "client/ControlFixture.h"
+#include "support/ControlFixture.h"
 
 namespace {
 

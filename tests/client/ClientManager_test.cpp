@@ -7,7 +7,7 @@
 
 #include <list>
 
-#include "client/ControlFixture.h"
+#include "support/ControlFixture.h"
 #include "support/boot_clock.h"
 
 namespace {

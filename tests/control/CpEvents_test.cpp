@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
-#include "channels/FaultFixture.h"
+#include "support/FaultFixture.h"
 
 namespace {
 

@@ -2,8 +2,8 @@
 
 #include <sstream>
 
-#include "channels/CrashFixture.h"
 #include "storage/MediaStorage.h"
+#include "support/CrashFixture.h"
 
 namespace {
 

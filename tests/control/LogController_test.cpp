@@ -3,11 +3,11 @@
 #include "control/LogController.h"
 
 #include "channels/AgDspLogHandler.h"
-#include "channels/ChannelFixture.h"
 #include "channels/ExtWcnLogHandler.h"
 #include "channels/GnssCpLogHandler.h"
 #include "channels/WanModemLogHandler.h"
 #include "storage/CpStorage.h"
+#include "support/ChannelFixture.h"
 
 namespace {
 

@@ -7,7 +7,7 @@
 #include <map>
 #include <sstream>
 
-#include "channels/ChannelFixture.h"
+#include "support/ChannelFixture.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 // Thousands of crashes, transactions and clients: nothing may grow.
 #include <malloc.h>
 
-#include "channels/CrashFixture.h"
+#include "support/CrashFixture.h"
 
 namespace {
 

@@ -8,13 +8,13 @@
 
 #include <filesystem>
 
-#include "channels/ChannelFixture.h"
 #include "iq/IqStorRespHandler.h"
-#include "iq/fake_devices.h"
 #include "iq/iq_mem.h"
 #include "storage/CpStorage.h"
 #include "storage/StorageManager.h"
+#include "support/ChannelFixture.h"
 #include "support/boot_clock.h"
+#include "support/fake_devices.h"
 
 // Interposed: writes of the saving thread and commands to it, its polls, the clock of the
 // names, the making of threads and of the connection to them.

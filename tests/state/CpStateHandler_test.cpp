@@ -2,9 +2,9 @@
 
 #include "state/CpStateHandler.h"
 
-#include "client/ControlFixture.h"
 #include "state/ExtWcnStateHandler.h"
 #include "state/ModemStateHandler.h"
+#include "support/ControlFixture.h"
 #include "support/boot_clock.h"
 
 namespace {

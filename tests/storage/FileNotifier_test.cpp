@@ -16,8 +16,8 @@
 #include "core/Multiplexer.h"
 #include "core/system_paths.h"
 #include "storage/copy_file.h"
-#include "storage/faults.h"
 #include "support/TestRoot.h"
+#include "support/faults.h"
 
 namespace {
 

@@ -23,8 +23,8 @@
 #include "storage/LogFile.h"
 #include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
-#include "storage/faults.h"
 #include "support/TestRoot.h"
+#include "support/faults.h"
 
 typedef std::vector<std::string> Names;
 

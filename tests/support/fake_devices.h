@@ -3,8 +3,8 @@
 // polls, behind it a scripted driver. The program is linked with --wrap for ioctl, mmap,
 // munmap and read; only calls on such a FIFO (or its mapping) are diverted. Looking whether
 // it is one takes no lock, so that a thread sanitizer sees only the service's own order.
-#ifndef TESTS_IQ_FAKE_DEVICES_H_
-#define TESTS_IQ_FAKE_DEVICES_H_
+#ifndef TESTS_SUPPORT_FAKE_DEVICES_H_
+#define TESTS_SUPPORT_FAKE_DEVICES_H_
 
 #include <stdint.h>
 #include <sys/stat.h>
@@ -68,4 +68,4 @@ private:
     size_t m_maps = 0;
 };
 
-#endif  // TESTS_IQ_FAKE_DEVICES_H_
+#endif  // TESTS_SUPPORT_FAKE_DEVICES_H_

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 
-#include "storage/faults.h"
+#include "support/faults.h"
 
 #include <errno.h>
 #include <fcntl.h>

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // The crash fixture with a C library that can be made to fail and clocks set by hand.
-#ifndef TESTS_CHANNELS_FAULTFIXTURE_H_
-#define TESTS_CHANNELS_FAULTFIXTURE_H_
+#ifndef TESTS_SUPPORT_FAULTFIXTURE_H_
+#define TESTS_SUPPORT_FAULTFIXTURE_H_
 
-#include "channels/CrashFixture.h"
-#include "storage/faults.h"
+#include "support/CrashFixture.h"
 #include "support/boot_clock.h"
+#include "support/faults.h"
 
 constexpr time_t NOON = 1456811100;  // 2016-03-01 05:45:00 UTC, 09:15:00 here
 const char STAMP[] = "_2016-03-01_09-15-00";
@@ -31,4 +31,4 @@ protected:
     }
 };
 
-#endif  // TESTS_CHANNELS_FAULTFIXTURE_H_
+#endif  // TESTS_SUPPORT_FAULTFIXTURE_H_

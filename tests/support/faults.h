@@ -3,8 +3,8 @@
 // kind fails or transfers less. Only calls on the log tree count (a path with "/modem_log"
 // in it; for write and writev any descriptor above standard error). Also the clock of the
 // names and a record of commands.
-#ifndef TESTS_STORAGE_FAULTS_H_
-#define TESTS_STORAGE_FAULTS_H_
+#ifndef TESTS_SUPPORT_FAULTS_H_
+#define TESTS_SUPPORT_FAULTS_H_
 
 #include <stddef.h>
 #include <time.h>
@@ -35,4 +35,4 @@ const std::vector<std::string>& commands();
 
 }  // namespace faults
 
-#endif  // TESTS_STORAGE_FAULTS_H_
+#endif  // TESTS_SUPPORT_FAULTS_H_

@@ -2,8 +2,8 @@
 // The surroundings of the tests of crashes and transactions: modems whose devices are
 // raw pseudo-terminals, so that the test plays the CP byte by byte, control clients on
 // the real socket, and a look at the files that crashes and transactions leave.
-#ifndef TESTS_CHANNELS_CRASHFIXTURE_H_
-#define TESTS_CHANNELS_CRASHFIXTURE_H_
+#ifndef TESTS_SUPPORT_CRASHFIXTURE_H_
+#define TESTS_SUPPORT_CRASHFIXTURE_H_
 
 #include <signal.h>
 #include <sys/syscall.h>
@@ -11,7 +11,7 @@
 
 #include <map>
 
-#include "channels/ChannelFixture.h"
+#include "support/ChannelFixture.h"
 
 // A CP's device: the service opens path(), the test holds the CP's end and keeps the
 // service's end open, so that nothing is lost while the service has it closed.
@@ -242,4 +242,4 @@ protected:
     Pty* log_dev = nullptr;
 };
 
-#endif  // TESTS_CHANNELS_CRASHFIXTURE_H_
+#endif  // TESTS_SUPPORT_CRASHFIXTURE_H_

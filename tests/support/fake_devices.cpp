@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 
-#include "iq/fake_devices.h"
+#include "support/fake_devices.h"
 
 #include <errno.h>
 #include <fcntl.h>

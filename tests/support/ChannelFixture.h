@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // The surroundings of a channel test: a controller in a temporary root, its loop driven
 // step by step, FIFOs that stand for the log devices, and a time service.
-#ifndef TESTS_CHANNELS_CHANNELFIXTURE_H_
-#define TESTS_CHANNELS_CHANNELFIXTURE_H_
+#ifndef TESTS_SUPPORT_CHANNELFIXTURE_H_
+#define TESTS_SUPPORT_CHANNELFIXTURE_H_
 
 #include <cutils/sockets.h>
 #include <fcntl.h>
@@ -232,4 +232,4 @@ private:
     size_t m_others = 0;
 };
 
-#endif  // TESTS_CHANNELS_CHANNELFIXTURE_H_
+#endif  // TESTS_SUPPORT_CHANNELFIXTURE_H_

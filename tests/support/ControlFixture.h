@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // A controller on a temporary root, a control server of its own beside the one that the
 // controller runs, and clients on real sockets. The tests drive the loop.
-#ifndef TESTS_CLIENT_CONTROLFIXTURE_H_
-#define TESTS_CLIENT_CONTROLFIXTURE_H_
+#ifndef TESTS_SUPPORT_CONTROLFIXTURE_H_
+#define TESTS_SUPPORT_CONTROLFIXTURE_H_
 
-#include "channels/CrashFixture.h"
 #include "client/ClientHandler.h"
 #include "client/ClientManager.h"
+#include "support/CrashFixture.h"
 
 constexpr char TEST_SERVER[] = "control_test";
 
@@ -37,4 +37,4 @@ protected:
     std::unique_ptr<ClientManager> manager;
 };
 
-#endif  // TESTS_CLIENT_CONTROLFIXTURE_H_
+#endif  // TESTS_SUPPORT_CONTROLFIXTURE_H_
