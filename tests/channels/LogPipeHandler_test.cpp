@@ -3,7 +3,7 @@
 #include "channels/LogPipeHandler.h"
 
 #include "support/CrashFixture.h"
-#include "support/boot_clock.h"
+#include "support/faults.h"
 
 namespace {
 

@@ -4,53 +4,7 @@
 
 #include "channels/TimeSyncRecord.h"
 #include "support/ChannelFixture.h"
-
-namespace {
-
-// What the loop's thread does for one record, and what happens meanwhile. Its sleeps pass
-// at once; its wait for the answer ends with it, or at once when there will be none.
-struct Record {
-    useconds_t slept = 0;
-    bool connected = false;  // what is polled next is the connection
-    int waited = -1;         // the time-out of the wait for the answer
-    std::function<void()> on_sleep = [] {};
-    bool answers = true;
-} g_record;
-const pthread_t s_main = pthread_self();
-time_t g_now = 0;  // what the clock says; 0: the real time, -1: it cannot be read
-
-}  // namespace
-
-extern "C" int __real_connect(int fd, const struct sockaddr* address, socklen_t len);
-extern "C" int __wrap_connect(int fd, const struct sockaddr* address, socklen_t len) {
-    const char* name = reinterpret_cast<const struct sockaddr_un*>(address)->sun_path;
-    const int result = __real_connect(fd, address, len);
-    g_record.connected =
-        result == 0 && std::string(name + 1, len - 3).find("time_sync") != std::string::npos;
-    return result;
-}
-extern "C" int __real_usleep(useconds_t us);
-extern "C" int __wrap_usleep(useconds_t us) {
-    if (us < 10000) {  // the test's own
-        return __real_usleep(us);
-    }
-    g_record.slept += us;
-    g_record.on_sleep();
-    return 0;
-}
-extern "C" int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
-extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
-    if (pthread_equal(pthread_self(), s_main) && g_record.connected) {
-        g_record.connected = false;
-        g_record.waited = timeout;
-        timeout = g_record.answers ? -1 : 0;
-    }
-    return __real_poll(fds, num, timeout);
-}
-extern "C" time_t __real_time(time_t* t);
-extern "C" time_t __wrap_time(time_t* t) {
-    return g_now ? (t ? *t = g_now : g_now) : __real_time(t);
-}
+#include "support/faults.h"
 
 namespace {
 
@@ -78,16 +32,41 @@ private:
 
 class TimeSyncTest : public ChannelFixture {
 protected:
-    TimeSyncTest() { set_zone("UTC0"); }
-    ~TimeSyncTest() override {
+    TimeSyncTest() {
         set_zone("UTC0");
-        g_record = Record();
+        faults::instead.connect = [this](int fd, const struct sockaddr* address, socklen_t len) {
+            const char* name = reinterpret_cast<const struct sockaddr_un*>(address)->sun_path;
+            const int result = real::connect(fd, address, len);
+            loop.connected = result == 0 &&
+                             std::string(name + 1, len - 3).find("time_sync") != std::string::npos;
+            return result;
+        };
+        faults::instead.usleep = [this](useconds_t us) {
+            if (us < 10000) {  // the test's own
+                return real::usleep(us);
+            }
+            loop.slept += us;
+            loop.on_sleep();
+            return 0;
+        };
+        faults::instead.poll = [this](struct pollfd* fds, nfds_t num, int timeout) {
+            if (pthread_equal(pthread_self(), main) && loop.connected) {
+                loop.connected = false;
+                loop.waited = timeout;
+                timeout = loop.answers ? -1 : 0;
+            }
+            return real::poll(fds, num, timeout);
+        };
+    }
+    ~TimeSyncTest() override {
+        faults::instead = {};
+        set_zone("UTC0");
     }
 
     static void set_zone(const char* tz) {
         setenv("TZ", tz, 1);
         tzset();
-        g_now = 0;
+        faults::set_time(0);
     }
     // Has a modem start one log file with the data "log". The file's content.
     std::string start_file() {
@@ -100,6 +79,17 @@ protected:
         remove_tree("data/modem_log");
         return result;
     }
+
+    // What the loop's thread does for one record, and what happens meanwhile. Its sleeps pass
+    // at once; its wait for the answer ends with it, or at once when there will be none.
+    struct Record {
+        useconds_t slept = 0;
+        bool connected = false;  // what is polled next is the connection
+        int waited = -1;         // the time-out of the wait for the answer
+        std::function<void()> on_sleep = [] {};
+        bool answers = true;
+    } loop;
+    const pthread_t main = pthread_self();
 };
 
 TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
@@ -125,10 +115,10 @@ TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
         SCOPED_TRACE(c.what);
         std::unique_ptr<TimeServer> server;
         std::unique_ptr<Silent> silent;
-        g_record = Record();
-        g_record.answers = !c.reply.empty();
-        g_record.on_sleep = [&] {
-            if (g_record.slept == static_cast<useconds_t>(c.missed) * 100000) {
+        loop = Record();
+        loop.answers = !c.reply.empty();
+        loop.on_sleep = [&] {
+            if (loop.slept == static_cast<useconds_t>(c.missed) * 100000) {
                 if (c.reply.empty()) {
                     silent = std::make_unique<Silent>("cp_time_sync_server");
                 } else {
@@ -136,12 +126,12 @@ TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
                 }
             }
         };
-        g_record.on_sleep();
+        loop.on_sleep();
         EXPECT_EQ(start_file(), c.head + "log");
         EXPECT_EQ(log.count("save_timestamp"), *c.message ? 1u : 0u) << log.text();
         EXPECT_TRUE(log.has(c.message));
-        EXPECT_EQ(g_record.slept, static_cast<useconds_t>(c.missed) * 100000);
-        EXPECT_EQ(g_record.waited, c.waited);
+        EXPECT_EQ(loop.slept, static_cast<useconds_t>(c.missed) * 100000);
+        EXPECT_EQ(loop.waited, c.waited);
     }
 }
 
@@ -186,10 +176,10 @@ TEST_F(TimeSyncTest, ZoneIsTheDifferenceOfTheHoursFoldedAtMidnight) {
     };
     for (const auto& c : cases) {
         set_zone(c.tz);
-        g_now = midnight + c.hour * 3600 + c.minute * 60;
+        faults::set_time(midnight + c.hour * 3600 + c.minute * 60);
         EXPECT_EQ(time_zone_hours(), c.zone) << c.tz << " at " << c.hour << ":" << c.minute;
     }
-    g_now = -1;
+    faults::set_time(-1);
     EXPECT_EQ(time_zone_hours(), 0);
 }
 

@@ -3,30 +3,11 @@
 #include "client/ClientManager.h"
 
 #include <errno.h>
-#include <sys/socket.h>
 
 #include <list>
 
 #include "support/ControlFixture.h"
-#include "support/boot_clock.h"
-
-namespace {
-
-bool g_no_descriptors = false;
-int g_refused_accepts = 0;
-
-}  // namespace
-
-extern "C" int __real_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags);
-extern "C" int __wrap_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags);
-extern "C" int __wrap_accept4(int fd, struct sockaddr* addr, socklen_t* len, int flags) {
-    if (g_no_descriptors) {
-        ++g_refused_accepts;
-        errno = EMFILE;
-        return -1;
-    }
-    return __real_accept4(fd, addr, len, flags);
-}
+#include "support/faults.h"
 
 namespace {
 
@@ -82,17 +63,17 @@ TEST_F(ClientManagerTest, FullLoop) {
 TEST_F(ClientManagerTest, NoDescriptorsLeft) {
     boot_clock::freeze();
     Client client(TEST_SERVER);
-    g_no_descriptors = true;
-    g_refused_accepts = 0;
+    faults::fail(faults::ACCEPT4, 1, EMFILE, faults::FOREVER);
+    const int before = faults::calls(faults::ACCEPT4);
     for (int refused : {10, 11, 12}) {
         for (int i = 0; i < 15; ++i) {
             pump_once(mux());
         }
-        EXPECT_EQ(g_refused_accepts, refused);
+        EXPECT_EQ(faults::calls(faults::ACCEPT4) - before, refused);
         boot_clock::advance(3000);
     }
     EXPECT_EQ(log.count("server socket gave nothing 10 times in a row"), 1u);
-    g_no_descriptors = false;
+    faults::reset();
     talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
     EXPECT_EQ(manager->idle_wakeups(), 0u);
     boot_clock::real();

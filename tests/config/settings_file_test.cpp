@@ -7,48 +7,7 @@
 #include <algorithm>
 
 #include "config/ConfigFixture.h"
-
-namespace {
-
-// Called before each call that changes the file. False: it fails.
-std::function<bool()> s_before_change;
-size_t s_most = SIZE_MAX;  // bytes that one write takes
-size_t s_room = SIZE_MAX;  // bytes that fit into the file
-
-bool call_fails() {
-    return s_before_change && !s_before_change();
-}
-
-}  // namespace
-
-extern "C" {
-ssize_t __real_write(int fd, const void* data, size_t len);
-ssize_t __real_pwrite(int fd, const void* data, size_t len, off_t at);
-int __real_ftruncate(int fd, off_t len);
-int __real_close(int fd);
-
-ssize_t __wrap_write(int fd, const void* data, size_t len) {
-    return __real_write(fd, data, fd > STDERR_FILENO ? std::min(len, s_most) : len);
-}
-
-ssize_t __wrap_pwrite(int fd, const void* data, size_t len, off_t at) {
-    const size_t begin = static_cast<size_t>(at);
-    if (call_fails() || begin >= s_room) {
-        errno = ENOSPC;
-        return -1;
-    }
-    return __real_pwrite(fd, data, std::min({len, s_most, s_room - begin}), at);
-}
-
-int __wrap_ftruncate(int fd, off_t len) {
-    return call_fails() ? -1 : __real_ftruncate(fd, len);
-}
-
-int __wrap_close(int fd) {
-    const bool fails = call_fails();
-    return __real_close(fd) < 0 || fails ? -1 : 0;
-}
-}
+#include "support/faults.h"
 
 namespace {
 
@@ -56,7 +15,26 @@ const std::string ON = DEFAULTS + "stream\tcp_wcn\ton\t1\t1\n";
 
 class SettingsFileTest : public ConfigFixture {
 protected:
-    ~SettingsFileTest() override { s_most = s_room = SIZE_MAX; }
+    SettingsFileTest() {
+        faults::instead.write = [this](int fd, const void* data, size_t len) {
+            return real::write(fd, data, fd > STDERR_FILENO ? std::min(len, most) : len);
+        };
+        faults::instead.pwrite = [this](int fd, const void* data, size_t len, off_t at) {
+            const size_t begin = static_cast<size_t>(at);
+            errno = ENOSPC;
+            return !before_change() || begin >= room
+                       ? -1
+                       : real::pwrite(fd, data, std::min({len, most, room - begin}), at);
+        };
+        faults::instead.ftruncate = [this](int fd, off_t len) {
+            return before_change() ? real::ftruncate(fd, len) : -1;
+        };
+        faults::instead.close = [this](int fd) {
+            const bool works = before_change();
+            return real::close(fd) == 0 && works ? 0 : -1;
+        };
+    }
+    ~SettingsFileTest() override { faults::instead = {}; }
 
     // A start with this text in the settings file finds the stream, on or off, and has
     // nothing to say.
@@ -67,10 +45,15 @@ protected:
         EXPECT_EQ(read(config), 0);
         EXPECT_TRUE(log.text().empty() && config.find_stream(CT_WCN)) << log.text() << text;
     }
+
+    // Called before each call that changes the file. False: it fails.
+    std::function<bool()> before_change = [] { return true; };
+    size_t most = SIZE_MAX;  // bytes that one write takes
+    size_t room = SIZE_MAX;  // bytes that fit into the file
 };
 
 TEST_F(SettingsFileTest, KillsAndFaultsLeaveTheOldSettingsOrTheNew) {
-    s_most = 4096;  // a kill between two pages is a moment of its own
+    most = 4096;  // a kill between two pages is a moment of its own
     const std::string line = "stream cp_wcn off 1 1";
     std::string commented = line;
     while (commented.size() < 10000) {
@@ -84,12 +67,12 @@ TEST_F(SettingsFileTest, KillsAndFaultsLeaveTheOldSettingsOrTheNew) {
             ASSERT_EQ(read(config), 0);
             config.set_stream(CT_WCN, true);
             std::vector<std::string> moments;
-            s_before_change = [&] {
+            before_change = [&] {
                 moments.push_back(root.read_file("kest_modem.conf"));
                 return static_cast<int>(moments.size()) != failing;
             };
             const int result = config.save();
-            s_before_change = nullptr;
+            before_change = [] { return true; };
             EXPECT_EQ(result, static_cast<int>(moments.size()) < failing ? 0 : -1);
             EXPECT_EQ(config.dirty(), result < 0);
             moments.push_back(root.read_file("kest_modem.conf"));
@@ -110,11 +93,11 @@ TEST_F(SettingsFileTest, AFullMediumLeavesTheFileAsItWas) {
         root.write_file("kest_modem.conf", old);
         ASSERT_EQ(read(config), 0);
         unlink(old.empty() ? file.c_str() : "");
-        s_room = 30;
+        room = 30;
         EXPECT_EQ(config.save(), -1);
         EXPECT_EQ(root.read_file("kest_modem.conf"), old);
         EXPECT_TRUE(config.dirty()) << "pending, though nothing was changed";
-        s_room = SIZE_MAX;
+        room = SIZE_MAX;
         EXPECT_EQ(config.save(), 0);
         EXPECT_EQ(root.read_file("kest_modem.conf"), old.empty() ? DEFAULTS : ON);
     }
@@ -148,12 +131,12 @@ TEST_F(SettingsFileTest, TheDefaultReplacesWhatIsMissingEmptyOrAnUnfinishedCopy)
         EXPECT_TRUE(config.find_stream(CT_WCN));
         EXPECT_EQ(log.text(), "");
     }
-    for (const size_t room : {0u, 5u, 5021u}) {  // a medium that is full, then one that is not
+    for (const size_t free : {0u, 5u, 5021u}) {  // a medium that is full, then one that is not
         unlink(file.c_str());
-        s_most = room;
-        const bool fits = room == whole.size();
+        most = free;
+        const bool fits = free == whole.size();
         LogConfig config(file.c_str());
-        EXPECT_EQ(read(config), fits ? 0 : -1) << room;
+        EXPECT_EQ(read(config), fits ? 0 : -1) << free;
         EXPECT_EQ(root.exists("kest_modem.conf"), fits);
         EXPECT_EQ(log.has("incomplete copy " + file + " deleted [28("), !fits);
         log.clear();

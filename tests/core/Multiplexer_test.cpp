@@ -15,28 +15,7 @@
 
 #include "core/FdHandler.h"
 #include "support/TestRoot.h"
-#include "support/boot_clock.h"
-
-namespace {
-
-// What the loop handed to the last poll, and an error to give instead of polling.
-std::vector<struct pollfd> g_polled;
-int g_timeout;
-int g_poll_error;
-
-}  // namespace
-
-extern "C" int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
-extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout);
-extern "C" int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
-    g_polled.assign(fds, fds + num);
-    g_timeout = timeout;
-    if (g_poll_error) {
-        errno = g_poll_error;
-        return -1;
-    }
-    return __real_poll(fds, num, timeout);
-}
+#include "support/faults.h"
 
 namespace {
 
@@ -85,8 +64,16 @@ private:
 
 class MultiplexerTest : public testing::Test {
 protected:
+    MultiplexerTest() {
+        faults::instead.poll = [this](struct pollfd* fds, nfds_t num, int timeout) {
+            polled.assign(fds, fds + num);
+            waited = timeout;
+            errno = poll_error;
+            return poll_error ? -1 : real::poll(fds, num, timeout);
+        };
+    }
     ~MultiplexerTest() override {
-        g_poll_error = 0;
+        faults::instead = {};
         boot_clock::real();
     }
     std::unique_ptr<Probe> ready_probe() {
@@ -95,6 +82,10 @@ protected:
         return probe;
     }
     Multiplexer mux;
+    // What the loop handed to the last poll, and an error to give instead of polling.
+    std::vector<struct pollfd> polled;
+    int waited = 0;
+    int poll_error = 0;
 };
 
 const std::vector<int> ONE_INPUT(1, POLLIN);
@@ -118,18 +109,18 @@ TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
     boot_clock::freeze();
     std::unique_ptr<Probe> probe = ready_probe();
     mux.run_once();  // leaves returned events in the poll array
-    EXPECT_EQ(g_timeout, -1);
+    EXPECT_EQ(waited, -1);
     int fired = 0;
     mux.timer_mgr().add_timer(
         30, [](void* n) { ++*static_cast<int*>(n); }, &fired);
-    g_poll_error = EINTR;
+    poll_error = EINTR;
     LogCapture log;
     mux.run_once();
-    EXPECT_EQ(g_timeout, 30);
+    EXPECT_EQ(waited, 30);
     EXPECT_EQ(fired, 0);
     boot_clock::advance(30);
     mux.run_once();
-    EXPECT_EQ(g_timeout, 0);
+    EXPECT_EQ(waited, 0);
     EXPECT_EQ(fired, 1);
     EXPECT_EQ(probe->calls, ONE_INPUT);
     EXPECT_EQ(log.text(), "");
@@ -151,20 +142,20 @@ TEST_F(MultiplexerTest, TimersAndThenHandlersMayDestroyHandlers) {
         victim = ready_probe();
     };
     mux.run_once();
-    EXPECT_EQ(g_polled.size(), 4u);
+    EXPECT_EQ(polled.size(), 4u);
     EXPECT_TRUE(victim->calls.empty());
     EXPECT_EQ(last->calls, ONE_INPUT);
     mux.run_once();
-    EXPECT_EQ(g_polled.size(), 2u);
+    EXPECT_EQ(polled.size(), 2u);
     EXPECT_EQ(victim->calls, ONE_INPUT);
     // Whatever the events, and also when the descriptor is closed already.
     victim->close();
     last->add_events(POLLOUT);
     victim.reset();
     last.reset();
-    g_poll_error = EINTR;  // it would wait for ever
+    poll_error = EINTR;  // it would wait for ever
     mux.run_once();
-    EXPECT_TRUE(g_polled.empty());
+    EXPECT_TRUE(polled.empty());
     EXPECT_EQ(open_descriptors(), descriptors);
 }
 
@@ -271,14 +262,14 @@ TEST_F(MultiplexerTest, TableTakesTwentyHandlers) {
     withdrawn.del_events(POLLIN);
     destroyed.reset();
     mux.run_once();
-    EXPECT_EQ(g_polled.size(), 20u);
+    EXPECT_EQ(polled.size(), 20u);
     EXPECT_EQ(probes[0]->calls, ONE_INPUT);
     EXPECT_EQ(probes[19]->calls, std::vector<int>(1, POLLIN | POLLOUT));
     EXPECT_TRUE(first.calls.empty());
     probes.erase(probes.begin());
     mux.run_once();
     EXPECT_EQ(first.calls, ONE_INPUT);
-    EXPECT_EQ(g_polled[19].fd, first.fd());
+    EXPECT_EQ(polled[19].fd, first.fd());
     EXPECT_TRUE(last.calls.empty());
     probes.clear();
     mux.run_once();

@@ -8,7 +8,7 @@
 #include <string>
 
 #include "support/TestRoot.h"
-#include "support/boot_clock.h"
+#include "support/faults.h"
 
 namespace {
 

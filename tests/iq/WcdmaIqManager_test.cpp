@@ -13,18 +13,8 @@
 #include "storage/CpStorage.h"
 #include "storage/StorageManager.h"
 #include "support/ChannelFixture.h"
-#include "support/boot_clock.h"
 #include "support/fake_devices.h"
-
-// Interposed: writes of the saving thread and commands to it, its polls, the clock of the
-// names, the making of threads and of the connection to them.
-extern "C" {
-ssize_t __real_write(int fd, const void* data, size_t len);
-int __real_poll(struct pollfd* fds, nfds_t num, int timeout);
-int __real_socketpair(int domain, int type, int protocol, int* pair);
-int __real_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
-                          void* arg);
-}
+#include "support/faults.h"
 
 namespace {
 
@@ -56,7 +46,6 @@ struct Script {
         }
     }
 };
-Script* s_script;
 
 ssize_t thread_write(Script& script, int fd, const char* data, size_t len) {
     script.writes.push_back(len);
@@ -65,73 +54,69 @@ ssize_t thread_write(Script& script, int fd, const char* data, size_t len) {
         errno = ENOSPC;
         return -1;
     }
-    ssize_t n = __real_write(fd, data, std::min<size_t>(len, 1000));
+    ssize_t n = real::write(fd, data, std::min<size_t>(len, 1000));
     script.pass(2 * call - 1);
     if (call != script.half_at) {
-        n += __real_write(fd, data + n, len - static_cast<size_t>(n));
+        n += real::write(fd, data + n, len - static_cast<size_t>(n));
     }
     script.pass(2 * call);
     return n;
 }
 
-}  // namespace
-
-extern "C" {
-
-ssize_t __wrap_write(int fd, const void* data, size_t len) {
+// Interposed are writes of the saving thread and commands to it, its polls, the clock of the
+// names and the making of the connection to it.
+ssize_t scripted_write(Script& script, int fd, const void* data, size_t len) {
     struct stat st;
-    if (fd <= STDERR_FILENO || !s_script || fstat(fd, &st) != 0) {
-        return __real_write(fd, data, len);
+    if (fd <= STDERR_FILENO || fstat(fd, &st) != 0) {
+        return real::write(fd, data, len);
     }
     const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
     if (S_ISREG(st.st_mode) && !in_main) {
-        return thread_write(*s_script, fd, static_cast<const char*>(data), len);
+        return thread_write(script, fd, static_cast<const char*>(data), len);
     }
     const int message = S_ISSOCK(st.st_mode) ? *static_cast<const uint8_t*>(data) : -1;
-    if (in_main && message >= 0 && message == s_script->refused_cmd) {
+    if (in_main && message >= 0 && message == script.refused_cmd) {
         errno = EAGAIN;
         return -1;
     }
-    const ssize_t n = __real_write(fd, data, len);
+    const ssize_t n = real::write(fd, data, len);
     if (in_main && (message == IQST_STOP || message == IQST_QUIT)) {  // which opens the gate
-        s_script->shut.store(false, std::memory_order_relaxed);
+        script.shut.store(false, std::memory_order_relaxed);
     }
-    s_script->saved_sent.fetch_add(message == IQST_SAVED, std::memory_order_relaxed);
+    script.saved_sent.fetch_add(message == IQST_SAVED, std::memory_order_relaxed);
     return n;
 }
 
-time_t __wrap_time(time_t* result) {
-    const time_t now = s_script ? s_script->time += s_script->tick : 0;
-    return result ? *result = now : now;
-}
-
-int __wrap_poll(struct pollfd* fds, nfds_t num, int timeout) {
+int scripted_poll(Script& script, struct pollfd* fds, nfds_t num, int timeout) {
     const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
-    if (s_script && s_script->no_polls[in_main]) {
-        ++s_script->failed_polls;
+    if (script.no_polls[in_main]) {
+        ++script.failed_polls;
         errno = ENOMEM;
         return -1;
     }
-    return __real_poll(fds, num,
-                       s_script && in_main && s_script->impatient ? std::min(timeout, 1) : timeout);
+    return real::poll(fds, num, in_main && script.impatient ? std::min(timeout, 1) : timeout);
 }
 
-int __wrap_socketpair(int domain, int type, int protocol, int* pair) {
-    const int result = __real_socketpair(domain, type, protocol, pair);
-    if (s_script) {
-        std::copy(pair, pair + 2, s_script->pair);
-    }
-    return result;
+void follow(Script& script) {
+    faults::instead.write = [&script](int fd, const void* data, size_t len) {
+        return scripted_write(script, fd, data, len);
+    };
+    faults::instead.poll = [&script](struct pollfd* fds, nfds_t num, int timeout) {
+        return scripted_poll(script, fds, num, timeout);
+    };
+    faults::instead.time = [&script](time_t* result) {
+        const time_t now = script.time += script.tick;
+        return result ? *result = now : now;
+    };
+    faults::instead.socketpair = [&script](int domain, int type, int protocol, int* pair) {
+        const int result = real::socketpair(domain, type, protocol, pair);
+        std::copy(pair, pair + 2, script.pair);
+        return result;
+    };
+    faults::instead.pthread_create = [&script](auto... arguments) {
+        return script.no_threads ? EAGAIN : real::pthread_create(arguments...);
+    };
 }
-
-int __wrap_pthread_create(pthread_t* thread, const pthread_attr_t* attr, void* (*run)(void*),
-                          void* arg) {
-    return s_script && s_script->no_threads ? EAGAIN
-                                            : __real_pthread_create(thread, attr, run, arg);
-}
-}
-
-namespace {
 
 std::string samples(uint32_t len) {
     static const std::string bytes = pattern_bytes(25 * MB, 8);
@@ -144,7 +129,7 @@ protected:
         setenv("TZ", "UTC0", 1);
         tzset();
         signal(SIGPIPE, SIG_IGN);  // as the service does
-        s_script = &script;
+        follow(script);
         device.on_buf_info = [this] { script.pass(0); };
         EXPECT_EQ(boot("stream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
         iq = std::make_unique<WcdmaIqManager>(ctrl->get_cp(CT_GNSS));
@@ -152,7 +137,7 @@ protected:
     ~WcdmaIqManagerTest() override {
         iq.reset();
         ctrl.reset();
-        s_script = nullptr;
+        faults::instead = {};
         boot_clock::real();
     }
 

@@ -14,13 +14,9 @@
 #include <thread>
 
 #include "support/TestRoot.h"
+#include "support/faults.h"
 
 namespace {
-
-std::atomic<int> g_opens;
-std::atomic<int> g_stats;
-time_t g_wall_clock_shift;
-bool g_clocks_fail;
 
 // Newer kernels give finer times to a file that is being watched; the common tick is 10 ms.
 void coarsen(struct stat* st) {
@@ -28,53 +24,6 @@ void coarsen(struct stat* st) {
         t->tv_nsec -= t->tv_nsec % 10000000;
     }
 }
-
-}  // namespace
-
-extern "C" {
-int __real_open(const char* path, int flags, mode_t mode);
-int __real_stat(const char* path, struct stat* st);
-int __real_fstat(int fd, struct stat* st);
-int __real_clock_gettime(clockid_t clock, struct timespec* t);
-
-// The mode is passed on whether it was given or not; without O_CREAT nobody reads it.
-int __wrap_open(const char* path, int flags, mode_t mode) {
-    ++g_opens;
-    return __real_open(path, flags, mode);
-}
-int __wrap_stat(const char* path, struct stat* st) {
-    ++g_stats;
-    const int result = __real_stat(path, st);
-    if (result == 0) {
-        coarsen(st);
-    }
-    return result;
-}
-int __wrap_fstat(int fd, struct stat* st) {
-    const int result = __real_fstat(fd, st);
-    if (result == 0) {
-        coarsen(st);
-    }
-    return result;
-}
-// The names where off_t was asked to have 64 bits.
-int __wrap_open64(const char*, int, mode_t) __attribute__((alias("__wrap_open")));
-int __wrap_stat64(const char*, struct stat*) __attribute__((alias("__wrap_stat")));
-int __wrap_fstat64(int, struct stat*) __attribute__((alias("__wrap_fstat")));
-int __wrap_clock_gettime(clockid_t clock, struct timespec* t) {
-    if (g_clocks_fail) {
-        *t = {g_wall_clock_shift += 3600, 0};  // whatever was there
-        return -1;
-    }
-    const int result = __real_clock_gettime(clock, t);
-    if (clock != CLOCK_MONOTONIC) {
-        t->tv_sec += g_wall_clock_shift;
-    }
-    return result;
-}
-}
-
-namespace {
 
 std::string get(const char* key, const char* fallback = "DEFAULT") {
     char value[PROPERTY_VALUE_MAX + 8];
@@ -86,21 +35,37 @@ std::string get(const char* key, const char* fallback = "DEFAULT") {
 }
 
 int opens_of_one_read() {
-    const int before = g_opens;
+    const int before = faults::calls(faults::OPEN);
     get("k");
-    return g_opens - before;
+    return faults::calls(faults::OPEN) - before;
 }
 
 // Replaces bytes of the file, keeping its inode and its size.
 void overwrite(const TestRoot& root, off_t at, const std::string& bytes) {
-    const int fd = __real_open(root.path("default.prop").c_str(), O_WRONLY | O_CLOEXEC, 0);
+    const int fd = open(root.path("default.prop").c_str(), O_WRONLY | O_CLOEXEC);
     EXPECT_EQ(pwrite(fd, bytes.data(), bytes.size(), at), static_cast<ssize_t>(bytes.size()));
     close(fd);
 }
 
 class Properties : public testing::Test {
 protected:
-    ~Properties() override { g_wall_clock_shift = 0; }
+    Properties() {
+        faults::only_on("default.prop");
+        faults::instead.stat = [](const char* path, struct stat* st) {
+            const int result = real::stat(path, st);
+            coarsen(st);
+            return result;
+        };
+        faults::instead.fstat = [](int fd, struct stat* st) {
+            const int result = real::fstat(fd, st);
+            coarsen(st);
+            return result;
+        };
+    }
+    ~Properties() override {
+        faults::reset();
+        faults::instead = {};
+    }
 
     TestRoot m_root;
 };
@@ -171,14 +136,14 @@ TEST_F(Properties, SteadyStateCostsOneStat) {
     m_root.write_file("default.prop", "k=value that is longer than a short string\n");
     ASSERT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
     char value[PROPERTY_VALUE_MAX];
-    const int opens = g_opens;
-    const int stats = g_stats;
+    const int opens = faults::calls(faults::OPEN);
+    const int stats = faults::calls(faults::STAT);
     for (int i = 0; i < 1000; ++i) {
         property_get("k", value, "");
         property_get("a key that is missing and longer than a short string", value, "");
     }
-    EXPECT_EQ(g_opens, opens);
-    EXPECT_LE(g_stats, stats + 2000);
+    EXPECT_EQ(faults::calls(faults::OPEN), opens);
+    EXPECT_LE(faults::calls(faults::STAT), stats + 2000);
     // A change is still seen, and the state then becomes steady again.
     overwrite(m_root, 2, "VALUE");
     EXPECT_EQ(get("k"), "VALUE that is longer than a short string");
@@ -188,10 +153,16 @@ TEST_F(Properties, SteadyStateCostsOneStat) {
 // A file older than the clock's tick is settled at once; a clock set back does not keep
 // it from settling. Without a clock nothing tells.
 TEST_F(Properties, WallClockJumps) {
+    time_t wall_clock_shift = 0;
+    faults::instead.clock_gettime = [&](clockid_t clock, struct timespec* t) {
+        const int result = real::clock_gettime(clock, t);
+        t->tv_sec += clock == CLOCK_MONOTONIC ? 0 : wall_clock_shift;
+        return result;
+    };
     for (const time_t shift : {3600, -3600}) {
         TestRoot root;
         root.write_file("default.prop", "k=v\n");
-        g_wall_clock_shift = shift;
+        wall_clock_shift = shift;
         EXPECT_EQ(opens_of_one_read(), 1);
         EXPECT_TRUE(shift < 0 || opens_of_one_read() == 0);
         EXPECT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
@@ -200,12 +171,14 @@ TEST_F(Properties, WallClockJumps) {
     }
     setenv("KESTMODEM_ROOT", m_root.root().c_str(), 1);
     m_root.write_file("default.prop", "k=v\n");
-    g_wall_clock_shift = 0x70000000;
-    g_clocks_fail = true;
+    wall_clock_shift = 0x70000000;
+    faults::instead.clock_gettime = [&](clockid_t, struct timespec* t) {
+        *t = {wall_clock_shift += 3600, 0};  // whatever was there
+        return -1;
+    };
     for (int i = 0; i < 3; ++i) {
         EXPECT_EQ(opens_of_one_read(), 1);
     }
-    g_clocks_fail = false;
 }
 
 TEST_F(Properties, ReadersInSeveralThreadsGetWholeValues) {

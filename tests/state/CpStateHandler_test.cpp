@@ -5,7 +5,7 @@
 #include "state/ExtWcnStateHandler.h"
 #include "state/ModemStateHandler.h"
 #include "support/ControlFixture.h"
-#include "support/boot_clock.h"
+#include "support/faults.h"
 
 namespace {
 

@@ -4,7 +4,6 @@
 
 #include <errno.h>
 #include <fcntl.h>
-#include <stdarg.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/mman.h>
@@ -14,20 +13,42 @@
 #include <atomic>
 #include <filesystem>
 
-extern "C" {
-int __real_ioctl(int fd, unsigned long cmd, ...);
-void* __real_mmap(void* addr, size_t len, int prot, int flags, int fd, off_t offset);
-int __real_munmap(void* addr, size_t len);
-ssize_t __real_read(int fd, void* data, size_t len);
-}
+#include "support/faults.h"
 
 typedef std::lock_guard<std::mutex> Lock;
 
 static std::atomic<FakeDevice*> s_devices[4];
 
+// The driver's side: each call goes to the device that it is for, or to the C library.
+static void install_driver() {
+    faults::instead.ioctl = [](int fd, unsigned long cmd, unsigned long arg) {
+        FakeDevice* device = FakeDevice::find(fd);
+        return device ? device->do_ioctl(cmd, arg) : real::ioctl(fd, cmd, arg);
+    };
+    faults::instead.mmap = [](void* addr, size_t len, int prot, int flags, int fd, off_t offset) {
+        FakeDevice* device = FakeDevice::find(fd);
+        return device ? device->do_mmap(len == IQ_MEM_SIZE && offset == 0 && flags == MAP_PRIVATE &&
+                                        prot == (PROT_READ | PROT_WRITE) &&
+                                        (fcntl(fd, F_GETFL) & O_ACCMODE) == O_RDONLY)
+                      : real::mmap(addr, len, prot, flags, fd, offset);
+    };
+    faults::instead.munmap = [](void* addr, size_t len) {
+        FakeDevice* device = FakeDevice::find(-1, addr);
+        if (!device || len != IQ_MEM_SIZE) {
+            return real::munmap(addr, len);
+        }
+        device->do_munmap();
+        return 0;
+    };
+    faults::instead.read = [](int fd, void* data, size_t len) {
+        FakeDevice* device = FakeDevice::find(fd);
+        return device ? device->do_read(data, len) : real::read(fd, data, len);
+    };
+}
+
 FakeDevice::FakeDevice(const std::string& path)
-    : m_memory(static_cast<uint8_t*>(__real_mmap(nullptr, IQ_MEM_SIZE, PROT_READ | PROT_WRITE,
-                                                 MAP_PRIVATE | MAP_ANONYMOUS, -1, 0))) {
+    : m_memory(static_cast<uint8_t*>(real::mmap(nullptr, IQ_MEM_SIZE, PROT_READ | PROT_WRITE,
+                                                MAP_PRIVATE | MAP_ANONYMOUS, -1, 0))) {
     std::filesystem::create_directories(std::filesystem::path(path).parent_path());
     mkfifo(path.c_str(), 0600);
     m_fd = ::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC);
@@ -35,12 +56,13 @@ FakeDevice::FakeDevice(const std::string& path)
         abort();
     }
     *std::find(s_devices, s_devices + 4, nullptr) = this;
+    install_driver();
 }
 
 FakeDevice::~FakeDevice() {
     *std::find(s_devices, s_devices + 4, this) = nullptr;
     close(m_fd);
-    __real_munmap(m_memory, IQ_MEM_SIZE);
+    real::munmap(m_memory, IQ_MEM_SIZE);
 }
 
 FakeDevice* FakeDevice::find(int fd, const void* mapping) {
@@ -59,7 +81,7 @@ FakeDevice* FakeDevice::find(int fd, const void* mapping) {
 
 void FakeDevice::set_ready(bool ready) {
     char byte = 0;
-    if (ready != m_ready && (ready ? write(m_fd, &byte, 1) : __real_read(m_fd, &byte, 1)) != 1) {
+    if (ready != m_ready && (ready ? write(m_fd, &byte, 1) : real::read(m_fd, &byte, 1)) != 1) {
         abort();
     }
     m_ready = ready;
@@ -135,38 +157,4 @@ void FakeDevice::fill(uint32_t offset, uint32_t len, const std::string& content)
 std::vector<long> FakeDevice::ioctls(unsigned long cmd) {
     const Lock lock(m_mutex);
     return m_ioctls[cmd];
-}
-
-extern "C" {
-
-int __wrap_ioctl(int fd, unsigned long cmd, ...) {
-    va_list args;
-    va_start(args, cmd);
-    const unsigned long arg = va_arg(args, unsigned long);
-    va_end(args);
-    FakeDevice* device = FakeDevice::find(fd);
-    return device ? device->do_ioctl(cmd, arg) : __real_ioctl(fd, cmd, arg);
-}
-
-void* __wrap_mmap(void* addr, size_t len, int prot, int flags, int fd, off_t offset) {
-    FakeDevice* device = FakeDevice::find(fd);
-    return device ? device->do_mmap(len == IQ_MEM_SIZE && offset == 0 && flags == MAP_PRIVATE &&
-                                    prot == (PROT_READ | PROT_WRITE) &&
-                                    (fcntl(fd, F_GETFL) & O_ACCMODE) == O_RDONLY)
-                  : __real_mmap(addr, len, prot, flags, fd, offset);
-}
-
-int __wrap_munmap(void* addr, size_t len) {
-    FakeDevice* device = FakeDevice::find(-1, addr);
-    if (!device || len != IQ_MEM_SIZE) {
-        return __real_munmap(addr, len);
-    }
-    device->do_munmap();
-    return 0;
-}
-
-ssize_t __wrap_read(int fd, void* data, size_t len) {
-    FakeDevice* device = FakeDevice::find(fd);
-    return device ? device->do_read(data, len) : __real_read(fd, data, len);
-}
 }

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Memory devices of the handset for tests: a FIFO in the test root that the service
-// polls, behind it a scripted driver. The program is linked with --wrap for ioctl, mmap,
-// munmap and read; only calls on such a FIFO (or its mapping) are diverted. Looking whether
-// it is one takes no lock, so that a thread sanitizer sees only the service's own order.
+// polls, behind it a scripted driver. Only calls on such a FIFO (or its mapping) are diverted.
+// Looking whether it is one takes no lock, so that a thread sanitizer sees only the service's
+// own order.
 #ifndef TESTS_SUPPORT_FAKE_DEVICES_H_
 #define TESTS_SUPPORT_FAKE_DEVICES_H_
 

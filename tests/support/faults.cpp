@@ -3,21 +3,19 @@
 #include "support/faults.h"
 
 #include <errno.h>
-#include <fcntl.h>
-#include <stdarg.h>
 #include <string.h>
-#include <sys/stat.h>
-#include <sys/uio.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
+#include <type_traits>
 
 namespace {
 
 struct Fault {
-    int calls = 0;
-    int from = 0;  // first failing call, counted like calls; 0: none
-    int until = 0;
+    std::atomic<int> calls{0};  // the only thing that other threads change
+    int from = 0;               // first failing call, counted like calls; 0: none
+    int last = 0;
     int error = 0;
     bool hit = false;
     bool cut = false;
@@ -26,14 +24,33 @@ struct Fault {
 
 Fault s_faults[faults::NUM_CALLS];
 time_t s_time;
-std::string s_part;
+std::string s_part = "/modem_log";
 std::vector<std::string> s_commands;
 
+enum { REAL, FROZEN, FAILING } s_boot_clock = REAL;
+timespec s_boot_time = {1000, 999999999};
+
+bool counts(int fd) {
+    return fd > STDERR_FILENO;
+}
+bool counts(const char* path) {
+    return strstr(path, s_part.c_str()) != nullptr;
+}
+template <typename T>
+bool counts(T /*first*/) {
+    return true;
+}
+
 // Counts a call; true when it has to fail, with errno set.
-bool fails(faults::Call call) {
+template <typename First, typename... Rest>
+bool fails(faults::Call call, First first, Rest... /*rest*/) {
+    if (!counts(first)) {
+        return false;
+    }
     Fault& fault = s_faults[call];
-    ++fault.calls;
-    if (fault.from == 0 || fault.calls < fault.from || fault.calls >= fault.until) {
+    // Without an order, which would put the threads of the program in one.
+    const int number = fault.calls.fetch_add(1, std::memory_order_relaxed) + 1;
+    if (fault.from == 0 || number < fault.from || number > fault.last) {
         return false;
     }
     fault.hit = true;
@@ -41,8 +58,13 @@ bool fails(faults::Call call) {
     return true;
 }
 
-bool fails(faults::Call call, const char* path) {
-    return strstr(path, s_part.c_str()) && fails(call);
+template <typename Result>
+Result failure() {
+    if constexpr (std::is_pointer_v<Result>) {
+        return reinterpret_cast<Result>(-1);
+    } else {
+        return static_cast<Result>(-1);
+    }
 }
 
 // The bytes of a transfer that are left when it is to be short.
@@ -51,12 +73,55 @@ size_t limit(faults::Call call, size_t len) {
     return fault.cut ? (fault.cut = false, std::min(len, fault.max)) : len;
 }
 
+// What the special calls do when they do not fail.
+namespace special {
+
+ssize_t write(int fd, const void* data, size_t len) {
+    return real::write(fd, data, fd > STDERR_FILENO ? limit(faults::WRITE, len) : len);
+}
+
+ssize_t writev(int fd, const iovec* pieces, int num) {
+    std::string all;
+    for (int i = 0; i < num; ++i) {
+        all.append(static_cast<const char*>(pieces[i].iov_base), pieces[i].iov_len);
+    }
+    const size_t len = limit(faults::WRITEV, all.size());
+    return len < all.size() ? real::write(fd, all.data(), len) : real::writev(fd, pieces, num);
+}
+
+int system(const char* command) {
+    s_commands.push_back(command);
+    return real::system(command);
+}
+
+time_t time(time_t* result) {
+    const time_t now = s_time ? s_time : real::time(nullptr);
+    return result ? *result = now : now;
+}
+
+int clock_gettime(clockid_t id, timespec* now) {
+    if (id != CLOCK_BOOTTIME || s_boot_clock == REAL) {
+        return real::clock_gettime(id, now);
+    }
+    *now = s_boot_time;
+    errno = EINVAL;
+    return s_boot_clock == FROZEN ? 0 : -1;
+}
+
+}  // namespace special
+
 }  // namespace
 
 namespace faults {
 
+Instead instead;
+
 void reset() {
-    std::fill(s_faults, s_faults + NUM_CALLS, Fault());
+    for (Fault& fault : s_faults) {
+        fault.calls = 0;
+        fault.from = 0;
+        fault.hit = fault.cut = false;
+    }
     s_time = 0;
     s_part = "/modem_log";
     s_commands.clear();
@@ -65,7 +130,7 @@ void reset() {
 void fail(Call call, int nth, int error, int times) {
     Fault& fault = s_faults[call];
     fault.from = fault.calls + nth;
-    fault.until = fault.from + times;
+    fault.last = times == FOREVER ? FOREVER : fault.from + times - 1;
     fault.error = error;
     fault.hit = false;
 }
@@ -97,76 +162,38 @@ const std::vector<std::string>& commands() {
 
 }  // namespace faults
 
-extern "C" {
+namespace boot_clock {
 
-ssize_t __real_write(int fd, const void* data, size_t len);
-ssize_t __real_writev(int fd, const struct iovec* pieces, int num);
-int __real_open(const char* path, int flags, ...);
-int __real_mkdir(const char* path, mode_t mode);
-int __real_rename(const char* from, const char* to);
-int __real_unlink(const char* path);
-int __real_access(const char* path, int mode);
-int __real_system(const char* command);
-time_t __real_time(time_t* result);
-
-ssize_t __wrap_write(int fd, const void* data, size_t len) {
-    if (fd <= STDERR_FILENO) {
-        return __real_write(fd, data, len);
-    }
-    return fails(faults::WRITE) ? -1 : __real_write(fd, data, limit(faults::WRITE, len));
+void real() {
+    s_boot_clock = REAL;
 }
 
-ssize_t __wrap_writev(int fd, const struct iovec* pieces, int num) {
-    if (fails(faults::WRITEV)) {
-        return -1;
-    }
-    std::string all;
-    for (int i = 0; i < num; ++i) {
-        all.append(static_cast<const char*>(pieces[i].iov_base), pieces[i].iov_len);
-    }
-    const size_t len = limit(faults::WRITEV, all.size());
-    return len < all.size() ? __real_write(fd, all.data(), len) : __real_writev(fd, pieces, num);
+void freeze() {
+    s_boot_clock = FROZEN;
 }
 
-int __wrap_open(const char* path, int flags, ...) {
-    va_list args;
-    va_start(args, flags);
-    const mode_t mode = flags & O_CREAT ? va_arg(args, mode_t) : 0;
-    va_end(args);
-    return fails(faults::OPEN, path) ? -1 : __real_open(path, flags, mode);
+void advance(unsigned int ms) {
+    const long ns = s_boot_time.tv_nsec + static_cast<long>(ms % 1000) * 1000000;
+    s_boot_time.tv_sec += static_cast<time_t>(ms / 1000) + ns / 1000000000;
+    s_boot_time.tv_nsec = ns % 1000000000;
 }
 
-// The name of open where off_t was asked to have 64 bits.
-int __wrap_open64(const char* path, int flags, ...) __attribute__((alias("__wrap_open")));
-
-int __wrap_mkdir(const char* path, mode_t mode) {
-    return fails(faults::MKDIR, path) ? -1 : __real_mkdir(path, mode);
+void fail() {
+    s_boot_clock = FAILING;
 }
 
-int __wrap_rename(const char* from, const char* to) {
-    return fails(faults::RENAME, from) ? -1 : __real_rename(from, to);
-}
+}  // namespace boot_clock
 
-int __wrap_unlink(const char* path) {
-    return fails(faults::UNLINK, path) ? -1 : __real_unlink(path);
-}
-
-int __wrap_access(const char* path, int mode) {
-    return fails(faults::ACCESS, path) ? -1 : __real_access(path, mode);
-}
-
-int __wrap_system(const char* command) {
-    s_commands.push_back(command);
-    return __real_system(command);
-}
-
-time_t __wrap_time(time_t* result) {
-    if (s_time == 0) {
-        return __real_time(result);
-    }
-    if (result) {
-        *result = s_time;
-    }
-    return s_time;
-}
-}
+#define WRAP(usual, NAME, name, result, params, args)                               \
+    extern "C" result __wrap_##name params {                                        \
+        if (fails(faults::NAME, ARGUMENTS args)) {                                  \
+            return failure<result>();                                               \
+        }                                                                           \
+        return faults::instead.name ? faults::instead.name args : usual::name args; \
+    }                                                                               \
+    extern "C" result __wrap_##name##64 params __attribute__((alias("__wrap_" #name)));
+#define ARGUMENTS(...) __VA_ARGS__
+#define PLAIN(NAME, name, bits, result, params, args) WRAP(real, NAME, name, result, params, args)
+#define SPECIAL(NAME, name, bits, result, params, args) \
+    WRAP(special, NAME, name, result, params, args)
+KEST_CALLS(PLAIN, SPECIAL)
