@@ -64,17 +64,20 @@ void TimeService::answer(int fd) {
     if (m_delay_ms > 0 && poll(&wake, 1, m_delay_ms) > 0) {
         return;
     }
-    const uint32_t now = m_seconds != 0 ? m_seconds.load() : static_cast<uint32_t>(time(nullptr));
-    const uint64_t count = m_served + 1u;
-    uint8_t reply[REPLY_SIZE];
-    for (size_t i = 0; i < 4; ++i) {
-        reply[i] = static_cast<uint8_t>(now >> (8 * i));
+    std::string reply = m_reply;
+    if (reply.empty()) {
+        const uint32_t now =
+            m_seconds != 0 ? m_seconds.load() : static_cast<uint32_t>(time(nullptr));
+        const uint64_t count = m_served + 1u;
+        for (size_t i = 0; i < 4; ++i) {
+            reply += static_cast<char>(now >> (8 * i));
+        }
+        for (size_t i = 0; i < 8; ++i) {
+            reply += static_cast<char>(count >> (8 * i));
+        }
+        reply.resize(std::min(m_reply_size.load(), reply.size()));
     }
-    for (size_t i = 0; i < 8; ++i) {
-        reply[4 + i] = static_cast<uint8_t>(count >> (8 * i));
-    }
-    const size_t size = std::min(m_reply_size.load(), sizeof reply);
-    if (send(fd, reply, size, MSG_NOSIGNAL) == static_cast<ssize_t>(size)) {
+    if (send(fd, reply.data(), reply.size(), MSG_NOSIGNAL) == static_cast<ssize_t>(reply.size())) {
         ++m_served;
     }
 }

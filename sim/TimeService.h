@@ -32,6 +32,8 @@ public:
     void set_delay(int ms) { m_delay_ms = ms; }
     // Answer with only the first bytes of the reply and hang up.
     void set_reply_size(size_t bytes) { m_reply_size = bytes; }
+    // Answer with these bytes. Before start().
+    void set_reply(const std::string& bytes) { m_reply = bytes; }
     // Give this time instead of the present; 0 for the present.
     void set_time(uint32_t seconds) { m_seconds = seconds; }
     // Connections answered so far.
@@ -41,6 +43,7 @@ private:
     void run();
     void answer(int fd);
 
+    std::string m_reply;  // empty: the time and the number
     int m_listen = -1;
     int m_wake[2] = {-1, -1};  // closing the writing end ends the thread
     std::thread m_thread;

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
+#include "sim/SimSupervisor.h"
 #include "support/FaultFixture.h"
 
 namespace {
@@ -12,17 +13,13 @@ protected:
         root.write_file("d/dipx/sblock", "K");
         root.write_file("proc/cpw/mini_dump", "MINI W");
         root.write_file("proc/cptl/mini_dump", "MINI TL");
-    }
-    ~CpEventsTest() override {
-        ctrl.reset();
-        close(m_modemd);
-        close(m_wcnd);
+        EXPECT_TRUE(modemd.start("modemd", root.root()));
+        EXPECT_TRUE(wcnd.start("external_wcn_kest", root.root()));
     }
 
     void boot_supervised(const std::string& settings = "") {
         ASSERT_NO_FATAL_FAILURE(boot_modem(false, settings));
-        modemd = std::make_unique<Client>(accept4(m_modemd, nullptr, nullptr, SOCK_CLOEXEC));
-        wcnd = std::make_unique<Client>(accept4(m_wcnd, nullptr, nullptr, SOCK_CLOEXEC));
+        ASSERT_TRUE(modemd.connected() && wcnd.connected());
     }
     bool reaches(LogPipeHandler* channel, CpWorkState state) {
         return pump([&] { return channel->state() == state; });
@@ -33,11 +30,7 @@ protected:
                 {medium + "sblock" + STAMP + ".log", "K"}};
     }
 
-    const int m_modemd =
-        socket_local_server("modemd", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
-    const int m_wcnd =
-        socket_local_server("external_wcn_kest", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
-    std::unique_ptr<Client> modemd, wcnd;  // the supervisors' connections with the service
+    SimSupervisor modemd, wcnd;
 };
 
 TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
@@ -66,7 +59,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
         ASSERT_EQ(ask(other, "SUBSCRIBE TD DUMP\n", "OK\n"), "OK\n");
         diag_dev.forget();
 
-        ASSERT_TRUE(modemd->say(c.message));
+        ASSERT_TRUE(modemd.send(c.message));
         ASSERT_TRUE(reaches(modem(), c.dumps ? CWS_DUMP : CWS_NOT_WORKING));
         Files expected;
         if (c.dumps) {
@@ -75,7 +68,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
             expected[medium + "cp_wcdma_memory" + STAMP + ".dmp"] = "memory" + end_marker();
             EXPECT_TRUE(pump([&] { return diag_dev.received() == "3\n"; }));
             // Further events of the same crash change nothing.
-            ASSERT_TRUE(modemd->say("Modem Blocked"));
+            ASSERT_TRUE(modemd.send("Modem Blocked"));
             pump_once(mux());
             ASSERT_TRUE(supply(diag_dev, "memory" + end_marker()));
             const std::string lines = "CP_DUMP_START WCDMA\nCP_DUMP_END WCDMA\n";
@@ -89,7 +82,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
         EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
         EXPECT_EQ(modem()->fd() < 0, c.dumps) << "stays open for a CP that is reset";
         EXPECT_EQ(files(), expected);
-        ASSERT_TRUE(modemd->say("Modem Alive"));
+        ASSERT_TRUE(modemd.send("Modem Alive"));
         ASSERT_TRUE(reaches(modem(), CWS_WORKING));
         EXPECT_TRUE(both_log("<after>"));
         EXPECT_EQ(subscribers[0].heard() + subscribers[1].heard() + other.heard(), "");
@@ -109,11 +102,11 @@ TEST_F(CpEventsTest, WcnHasItsOwnSupervisorAndReset) {
             ctrl->enable_md();
             expected[std::string("data:mini_dump") + STAMP + ".bin"] = "MINI TL";
         }
-        ASSERT_TRUE(wcnd->say("WCN-EXTERNAL-DUMP"));
+        ASSERT_TRUE(wcnd.send("WCN-EXTERNAL-DUMP"));
         ASSERT_TRUE(reaches(wcn, CWS_NOT_WORKING));
         EXPECT_EQ(files("cp_wcn"), expected);
         EXPECT_EQ(modem()->state(), CWS_WORKING);
-        ASSERT_TRUE(wcnd->say("WCN-EXTERNAL-ALIVE"));
+        ASSERT_TRUE(wcnd.send("WCN-EXTERNAL-ALIVE"));
         EXPECT_TRUE(reaches(wcn, CWS_WORKING));
         EXPECT_EQ(wcn->fd(), -1) << "still switched off";
         ASSERT_EQ(ctrl->clear_log(), 0);
@@ -150,7 +143,7 @@ TEST_F(CpEventsTest, NoControlServer) {
     const int taken =
         socket_local_server("kestmodem", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
     ASSERT_NO_FATAL_FAILURE(boot_supervised());
-    ASSERT_TRUE(modemd->say("Modem Assert"));
+    ASSERT_TRUE(modemd.send("Modem Assert"));
     ASSERT_TRUE(pump([&] { return diag_dev.received() == "3\n"; }));
     ASSERT_TRUE(supply(diag_dev, end_marker()));
     EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);

@@ -2,11 +2,12 @@
 // The real program as a child process: its exit statuses, its log lines, the files that
 // it leaves and the system calls that a block of log data costs.
 #include <signal.h>
-#include <sys/wait.h>
 
 #include <map>
 #include <sstream>
 
+#include "sim/ChildProcess.h"
+#include "sim/SimSupervisor.h"
 #include "support/ChannelFixture.h"
 
 namespace {
@@ -17,31 +18,12 @@ const size_t BLOCK = 32768;
 class ServiceTest : public ChannelFixture {
 protected:
     ServiceTest() { setenv("TZ", "UTC0", 1); }
-    ~ServiceTest() override { kill_now(); }
 
-    // Runs a command with its standard error in the file "log".
+    // Runs a command with its output in the file "log".
     void run(std::vector<std::string> args = {KESTMODEM_BIN}) {
-        const std::vector<char*> argv = argv_of(args);
-        const int file =
-            open(root.path("log").c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
-        pid = fork();
-        if (pid == 0) {
-            setpgid(0, 0);
-            umask(077);
-            dup2(file, STDERR_FILENO);
-            execvp(argv[0], argv.data());
-            _exit(127);
-        }
-        setpgid(pid, pid);  // whoever comes first
-        close(file);
-    }
-    // With its own children: a killed tracer would leave the traced program behind.
-    void kill_now() {
-        if (pid > 0) {
-            kill(-pid, SIGKILL);
-            waitpid(pid, nullptr, 0);
-        }
-        pid = -1;
+        const mode_t mask = umask(077);
+        EXPECT_TRUE(process.start({std::move(args), root.path("log"), "", false, {}, -1}));
+        umask(mask);
     }
     bool logged(const std::string& part) const {
         return root.read_file("log").find(part) != std::string::npos;
@@ -56,7 +38,7 @@ protected:
         wait_until([&] { return time(nullptr) > now; });
     }
 
-    pid_t pid = -1;
+    ChildProcess process;
 };
 
 TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
@@ -75,11 +57,9 @@ TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
         root.write_file(c.settings, "stream cp_gnss on 5 3\n");
         root.write_file(c.in_the_way, "a file");
         run();
-        const std::string prefix = "E/KESTCP(" + std::to_string(pid) + "): ";
-        int status = 0;
-        ASSERT_TRUE(wait_until([&] { return waitpid(pid, &status, WNOHANG) == pid; }));
-        pid = -1;
-        EXPECT_EQ(status, c.status << 8) << "exit status " << c.status;
+        const std::string prefix = "E/KESTCP(" + std::to_string(process.pid()) + "): ";
+        ASSERT_TRUE(wait_until([&] { return !process.alive(); }));
+        EXPECT_EQ(process.status_text(), "exit status " + std::to_string(c.status));
         char ids[100];
         snprintf(ids, sizeof(ids), "int main(int, char**): kestmodem start ID=%u/%u, GID=%u/%u\n",
                  getuid(), geteuid(), getgid(), getegid());
@@ -156,7 +136,7 @@ TEST_F(StreamsTest, NoByteIsLostAcrossRestartAndMediumChanges) {
     run();
     ASSERT_TRUE(send_blocks("data", 80));
     EXPECT_EQ(root.read_file(CONFIG), settings);
-    kill_now();
+    process.stop(SIGKILL);
     check("data", 3);
 
     next_second();
@@ -179,7 +159,7 @@ TEST_F(StreamsTest, NoByteIsLostAcrossRestartAndMediumChanges) {
     EXPECT_TRUE(logged("bool StorageManager::check_media_change(): sd card is umounted!"));
     EXPECT_FALSE(logged("save log"));
     EXPECT_FALSE(logged("kestcp: open "));
-    kill_now();
+    process.stop(SIGKILL);
     check("data", 3 + 2 + 1);
     check_modes("data/modem_log");
     check_modes("sd/modem_log");
@@ -193,9 +173,9 @@ TEST_F(ServiceTest, ABlockCostsFiveSystemCallsAtMost) {
     root.write_file(CONFIG, "stream cp_wcn on 5 3\nstream cp_gnss on 5 3\n");
     const Fifo wcn(root.path("wcn")), gnss(root.path("gnss"));
     // Supervisors to connect to, so that no attempt falls into the measured time.
-    const int supervisors[] = {
-        socket_local_server("modemd", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM),
-        socket_local_server("external_wcn_kest", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)};
+    SimSupervisor modemd, wcnd;
+    ASSERT_TRUE(modemd.start("modemd", root.root()) &&
+                wcnd.start("external_wcn_kest", root.root()));
     run({"strace", "-f", "-s", "32", "-o", root.path("trace"), KESTMODEM_BIN});
     // The first blocks make the files; the properties' file is not trusted while it is new.
     ASSERT_TRUE(feed(wcn, "x"));
@@ -230,8 +210,6 @@ TEST_F(ServiceTest, ABlockCostsFiveSystemCallsAtMost) {
     const std::map<std::string, int> expected = {
         {"poll", n}, {"read", n}, {"stat", n}, {"access", n}};
     EXPECT_EQ(calls, expected);
-    close(supervisors[0]);
-    close(supervisors[1]);
 }
 
 }  // namespace

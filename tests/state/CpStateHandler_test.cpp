@@ -2,6 +2,7 @@
 
 #include "state/CpStateHandler.h"
 
+#include "sim/SimSupervisor.h"
 #include "state/ExtWcnStateHandler.h"
 #include "state/ModemStateHandler.h"
 #include "support/ControlFixture.h"
@@ -11,18 +12,6 @@ namespace {
 
 constexpr char SUPERVISOR[] = "supervisor_test";
 
-// A supervisor's side: listens, and accepts when asked.
-struct Supervisor {
-    Supervisor()
-        : server(socket_local_server(SUPERVISOR, ANDROID_SOCKET_NAMESPACE_ABSTRACT,
-                                     SOCK_STREAM | SOCK_NONBLOCK)) {}
-    std::unique_ptr<Client> accept() const {
-        const int fd = accept4(server.fd(), nullptr, nullptr, SOCK_CLOEXEC);
-        return std::unique_ptr<Client>(fd < 0 ? nullptr : new Client(fd));
-    }
-    Client server;
-};
-
 // The handler has a loop of its own, so that nothing else is in it.
 class CpStateHandlerTest : public ControlFixture {
 protected:
@@ -30,24 +19,26 @@ protected:
         // Events then only change the state of the channel.
         root.set_prop("persist.sys.vexa.modemreset", "1");
         root.set_prop("persist.sys.vexa.wcnreset", "1");
+        EXPECT_TRUE(supervisor.start(SUPERVISOR, root.root()));
     }
     ~CpStateHandlerTest() override { boot_clock::real(); }
 
     // Sends one message, which is read in one piece; gives the state of the CP then.
     CpWorkState say(const std::string& message, const std::string& logged) {
         log.clear();
-        EXPECT_TRUE(peer->say(message));
+        EXPECT_TRUE(supervisor.send(message));
         EXPECT_TRUE(pump_until(loop, [&] { return log.has("bytes: "); }));
         EXPECT_TRUE(log.has("virtual int CpStateHandler::process_data(): " + logged + "\n"))
             << log.text();
         EXPECT_EQ(log.count("\n"), 1u);
         return state(CT_WCDMA);
     }
-    // The peer is then the supervisor's end of the handler's new connection.
     void connect(CpStateHandler& handler) {
         EXPECT_EQ(handler.init(), 0);
-        peer = supervisor->accept();
-        ASSERT_TRUE(peer);
+        ASSERT_TRUE(supervisor.connected());
+    }
+    bool reconnected() {
+        return pump_until(loop, [&] { return supervisor.connected(); });
     }
     int timeout() {
         int ms = -2;
@@ -57,9 +48,8 @@ protected:
     CpWorkState state(CpType type) { return ctrl->get_cp(type)->state(); }
 
     Multiplexer loop;
-    std::unique_ptr<Supervisor> supervisor{new Supervisor};
+    SimSupervisor supervisor;
     std::unique_ptr<ModemStateHandler> modem{new ModemStateHandler(ctrl.get(), &loop, SUPERVISOR)};
-    std::unique_ptr<Client> peer;
 };
 
 // One line a read, in which the text stays as it is.
@@ -93,6 +83,7 @@ TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
     EXPECT_TRUE(pump_until(loop, [&] { return log.has("15 bytes: xxxModem Assert\n"); }));
     EXPECT_EQ(state(CT_WCDMA), CWS_NOT_WORKING);
 
+    modem.reset();
     ExtWcnStateHandler wcn(ctrl.get(), &loop, SUPERVISOR);
     connect(wcn);
     CpType type = CT_GNSS;
@@ -108,53 +99,52 @@ TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
 // No supervisor, or no room in the loop: it tries again later.
 TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     boot_clock::freeze();
-    supervisor.reset();
+    supervisor.stop();
     log.clear();
     EXPECT_EQ(modem->init(), 0);
     EXPECT_EQ(modem->init(), 0);  // still one attempt pending
     EXPECT_EQ(modem->fd(), -1);
     EXPECT_EQ(timeout(), 3000);
-    supervisor.reset(new Supervisor);
+    EXPECT_TRUE(supervisor.start(SUPERVISOR, root.root()));
     boot_clock::advance(3000);
     loop.run_once();
-    ASSERT_TRUE((peer = supervisor->accept()));
+    ASSERT_TRUE(supervisor.connected());
     EXPECT_EQ(log.text(), "");
     EXPECT_EQ(say("Modem Assert", "12 bytes: Modem Assert"), CWS_NOT_WORKING);
     modem->init();  // connected: nothing to do
-    EXPECT_FALSE(supervisor->accept());
+    EXPECT_TRUE(supervisor.connected() && supervisor.accepted() == 1);
 }
 
 // It was connected 19,000 times a second.
 TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
     boot_clock::freeze();
     modem->init();
-    int connections = 0;
     const auto accept_and_close = [&] {
         for (int i = 0; i < 30; ++i) {
-            connections += supervisor->accept() != nullptr;
+            supervisor.connected();
+            supervisor.drop();
             pump_once(loop);
         }
-        return connections;
+        return supervisor.accepted();
     };
-    EXPECT_EQ(accept_and_close(), 11);
+    EXPECT_EQ(accept_and_close(), 11u);
     EXPECT_EQ(log.count("supervisor_test gave nothing 10 times in a row"), 1u);
     boot_clock::advance(3000);
-    EXPECT_EQ(accept_and_close(), 12);
+    EXPECT_EQ(accept_and_close(), 12u);
     boot_clock::advance(3000);
     // Nor is one of use that tells of an event before it closes.
-    ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
-    peer->say("Modem Assert");
-    peer.reset();
-    EXPECT_EQ(accept_and_close(), 12);
+    ASSERT_TRUE(reconnected() && supervisor.send("Modem Assert"));
+    supervisor.drop();
+    EXPECT_EQ(accept_and_close(), 13u);
     boot_clock::advance(3000);
     EXPECT_TRUE(pump_until(loop, [&] { return state(CT_WCDMA) == CWS_NOT_WORKING; }));
     // The next one stays; then it counts afresh.
-    ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+    ASSERT_TRUE(reconnected());
     EXPECT_TRUE(modem->resting());
     boot_clock::advance(6000);
     EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
-    peer.reset();
-    EXPECT_EQ(accept_and_close(), 12 + 11);
+    supervisor.drop();
+    EXPECT_EQ(accept_and_close(), 14u + 11);
     EXPECT_EQ(log.count("gave nothing"), 1u);
 }
 
@@ -162,18 +152,17 @@ TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     connect(*modem);
     const size_t descriptors = open_descriptors();
     for (int i = 0; i < 5; ++i) {
-        peer->say("Modem Al");
-        peer->hang_up();
-        ASSERT_TRUE(pump_until(loop, [&] { return (peer = supervisor->accept()) != nullptr; }));
+        supervisor.send("Modem Al");
+        supervisor.drop();
+        ASSERT_TRUE(reconnected());
         EXPECT_EQ(open_descriptors(), descriptors);
         EXPECT_EQ(say("ive", "3 bytes: ive"), CWS_WORKING);
     }
     modem->process_conn_error(EIO);
-    ASSERT_TRUE((peer = supervisor->accept()));
+    EXPECT_TRUE(supervisor.connected() && supervisor.accepted() == 7);
 
     // Gone for good: the retry is armed, once, and goes with the handler.
-    supervisor.reset();
-    peer.reset();
+    supervisor.stop();
     ASSERT_TRUE(pump_until(loop, [&] { return modem->fd() == -1 && timeout() > 100; }));
     EXPECT_EQ(Filler::free_slots(loop), Multiplexer::MAX_HANDLERS);
     modem.reset();

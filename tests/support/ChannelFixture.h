@@ -20,12 +20,12 @@
 #include <functional>
 #include <memory>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "channels/LogPipeHandler.h"
 #include "config/LogConfig.h"
 #include "control/LogController.h"
+#include "sim/TimeService.h"
 #include "support/TestRoot.h"
 
 // One pass of the loop that ends after about 20 ms even when nothing happens.
@@ -84,35 +84,12 @@ private:
     int m_fd;
 };
 
-// Answers every connection to the time service's socket on a thread of its own.
-class TimeServer : Unique {
-public:
-    explicit TimeServer(std::string reply)
-        : m_listen(socket_local_server("cp_time_sync_server", ANDROID_SOCKET_NAMESPACE_ABSTRACT,
-                                       SOCK_STREAM)) {
-        if (pipe2(m_stop, O_CLOEXEC) != 0) {
-            abort();
-        }
-        m_thread = std::thread([this, reply] {
-            struct pollfd fds[2] = {{m_stop[0], POLLIN, 0}, {m_listen, POLLIN, 0}};
-            while (poll(fds, 2, -1) > 0 && !fds[0].revents) {
-                const int conn = accept4(m_listen, nullptr, nullptr, SOCK_CLOEXEC);
-                send(conn, reply.data(), reply.size(), MSG_NOSIGNAL);  // unless it has given up
-                close(conn);
-            }
-        });
+// The time service, which gives every connection the same answer.
+struct TimeServer : TimeService {
+    explicit TimeServer(const std::string& reply) {
+        set_reply(reply);
+        EXPECT_TRUE(start(getenv("KESTMODEM_ROOT")));
     }
-    ~TimeServer() {
-        close(m_stop[1]);
-        m_thread.join();
-        close(m_stop[0]);
-        close(m_listen);
-    }
-
-private:
-    int m_stop[2];
-    int m_listen;
-    std::thread m_thread;
 };
 
 // The CP's log files on a medium in the order they were written: sets by their time, in

@@ -6,12 +6,12 @@
 #define TESTS_SUPPORT_CRASHFIXTURE_H_
 
 #include <signal.h>
-#include <sys/syscall.h>
 #include <termios.h>
 
 #include <map>
 
 #include "support/ChannelFixture.h"
+#include "support/faults.h"
 
 // A CP's device: the service opens path(), the test holds the CP's end and keeps the
 // service's end open, so that nothing is lost while the service has it closed.
@@ -40,11 +40,11 @@ public:
 
     const std::string& path() const { return m_path; }
     size_t unread() const { return bytes_waiting(m_slave); }
-    // Gives the service one chunk to read. Not through write(), which tests make fail.
+    // Gives the service one chunk to read.
     bool put(const std::string& data) const {
         struct pollfd slave = {m_slave, POLLIN, 0};
-        return syscall(SYS_write, m_master, data.data(), data.size()) ==
-                   static_cast<long>(data.size()) &&
+        return real::write(m_master, data.data(), data.size()) ==
+                   static_cast<ssize_t>(data.size()) &&
                poll(&slave, 1, 60000) == 1 && wait_until([&] { return unread() == data.size(); });
     }
     // What the service has written since the last call of forget().

@@ -4,7 +4,6 @@
 #define TESTS_SUPPORT_FAULTFIXTURE_H_
 
 #include "support/CrashFixture.h"
-#include "support/faults.h"
 
 constexpr time_t NOON = 1456811100;  // 2016-03-01 05:45:00 UTC, 09:15:00 here
 const char STAMP[] = "_2016-03-01_09-15-00";

@@ -14,7 +14,8 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
-#include <sstream>
+
+#include "sim/files.h"
 
 namespace fs = std::filesystem;
 
@@ -27,13 +28,11 @@ namespace {
 
 }  // namespace
 
-TestRoot::TestRoot() {
-    char name[] = "/tmp/kestmodem-test-XXXXXX";
-    if (!mkdtemp(name)) {
-        die("mkdtemp");
+TestRoot::TestRoot() : m_root(make_temp_dir("/tmp", "kestmodem-test")) {
+    if (m_root.empty()) {
+        die("make a directory");
     }
-    m_root = name;
-    setenv("KESTMODEM_ROOT", name, 1);
+    setenv("KESTMODEM_ROOT", m_root.c_str(), 1);
     make_dir("data");
 }
 
@@ -45,7 +44,7 @@ TestRoot::~TestRoot() {
             fs::permissions(entry.path(), fs::perms::owner_all, fs::perm_options::add, ec);
         }
     }
-    fs::remove_all(m_root, ec);
+    remove_dir(m_root);
 }
 
 void TestRoot::make_dir(const std::string& rel) const {
@@ -63,10 +62,7 @@ void TestRoot::write_file(const std::string& rel, const std::string& content) co
 }
 
 std::string TestRoot::read_file(const std::string& rel) const {
-    std::ifstream in(path(rel), std::ios::binary);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
+    return read_text_file(path(rel));
 }
 
 bool TestRoot::exists(const std::string& rel) const {

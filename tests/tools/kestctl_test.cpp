@@ -16,6 +16,7 @@
 #include <sstream>
 
 #include "core/system_paths.h"
+#include "sim/ChildProcess.h"
 #include "support/TestRoot.h"
 
 namespace {
@@ -40,26 +41,16 @@ protected:
 
     void start(Strings args, const std::string& out_path = "") {
         args.insert(args.begin(), KESTCTL);
-        const std::vector<char*> argv = argv_of(args);
-        m_pid = fork();
-        if (m_pid == 0) {
-            const std::string out = out_path.empty() ? m_root.path("out") : out_path;
-            if (freopen(out.c_str(), "w", stdout) &&
-                freopen(m_root.path("err").c_str(), "w", stderr)) {
-                execv(KESTCTL, argv.data());
-            }
-            _exit(99);
-        }
+        const std::string out = out_path.empty() ? m_root.path("out") : out_path;
+        EXPECT_TRUE(m_process.start({std::move(args), out, m_root.path("err"), false, {}, -1}));
     }
 
     // The exit status; -1 for a program that a signal ended or that did not end.
     int finish() {
-        int status = -1;
-        if (!wait_until([&] { return waitpid(m_pid, &status, WNOHANG) == m_pid; })) {
-            kill(m_pid, SIGKILL);
-            waitpid(m_pid, &status, 0);
+        if (!wait_until([&] { return !m_process.alive(); })) {
+            m_process.stop(SIGKILL);
         }
-        return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        return WIFEXITED(m_process.status()) ? WEXITSTATUS(m_process.status()) : -1;
     }
     int run(const Strings& args) {
         start(args);
@@ -108,7 +99,7 @@ protected:
     int m_listen =
         socket_local_server(SOCKET_CONTROL, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
     int m_conn = -1;
-    pid_t m_pid = -1;
+    ChildProcess m_process;
     std::string m_requests;
 };
 
@@ -221,7 +212,7 @@ TEST_F(KestctlTest, WatchPrintsAtOnceUntilInterrupted) {
         return out() == "CP_DUMP_START WCDMA\nCP_DUMP_END WCDMA\nCP_DUMP_START W\\x07\n";
     }));
     EXPECT_FALSE(wait_until([this] { return !err().empty(); }, 5200));
-    kill(m_pid, SIGINT);
+    m_process.signal(SIGINT);
     EXPECT_EQ(finish(), 0);
     EXPECT_EQ(err(), "");
     hang_up();
