@@ -2,7 +2,7 @@
 // The audio DSP's three devices in one log.
 #include "channels/AgDspLogHandler.h"
 #include "channels/DspChunkHeader.h"
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 #include "support/fake_devices.h"
 
 namespace {

@@ -2,7 +2,7 @@
 
 #include "channels/DeviceFileHandler.h"
 
-#include "support/ChannelFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -3,7 +3,7 @@
 #include "channels/DiagReplyConsumer.h"
 
 #include "storage/MediaStorage.h"
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The memory dump of the connectivity chip. A FIFO hands over exactly the chunks put in.
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 
 #include "channels/LogPipeHandler.h"
 
-#include "support/CrashFixture.h"
+#include "support/ServiceFixture.h"
 #include "support/faults.h"
 
 namespace {

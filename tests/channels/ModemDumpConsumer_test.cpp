@@ -5,7 +5,7 @@
 #include <malloc.h>
 
 #include "storage/MediaStorage.h"
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

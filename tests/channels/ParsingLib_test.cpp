@@ -5,7 +5,7 @@
 
 #include "channels/ModemImage.h"
 #include "channels/WanModemLogHandler.h"
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -3,7 +3,7 @@
 #include <sys/un.h>
 
 #include "channels/TimeSyncRecord.h"
-#include "support/ChannelFixture.h"
+#include "support/ServiceFixture.h"
 #include "support/faults.h"
 
 namespace {

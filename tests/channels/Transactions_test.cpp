@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // What comes between a transaction and its end.
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

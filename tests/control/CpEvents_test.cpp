@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
 #include "sim/SimSupervisor.h"
-#include "support/FaultFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

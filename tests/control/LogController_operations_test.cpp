@@ -3,7 +3,7 @@
 #include <sstream>
 
 #include "storage/MediaStorage.h"
-#include "support/CrashFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -7,7 +7,7 @@
 #include "channels/GnssCpLogHandler.h"
 #include "channels/WanModemLogHandler.h"
 #include "storage/CpStorage.h"
-#include "support/ChannelFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -8,7 +8,7 @@
 
 #include "sim/ChildProcess.h"
 #include "sim/SimSupervisor.h"
-#include "support/ChannelFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

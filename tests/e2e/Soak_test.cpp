@@ -2,7 +2,7 @@
 // Thousands of crashes, transactions and clients: nothing may grow.
 #include <malloc.h>
 
-#include "support/CrashFixture.h"
+#include "support/ServiceFixture.h"
 
 namespace {
 

@@ -12,7 +12,7 @@
 #include "iq/iq_mem.h"
 #include "storage/CpStorage.h"
 #include "storage/StorageManager.h"
-#include "support/ChannelFixture.h"
+#include "support/ServiceFixture.h"
 #include "support/fake_devices.h"
 #include "support/faults.h"
 

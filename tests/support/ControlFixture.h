@@ -6,7 +6,7 @@
 
 #include "client/ClientHandler.h"
 #include "client/ClientManager.h"
-#include "support/CrashFixture.h"
+#include "support/ServiceFixture.h"
 
 constexpr char TEST_SERVER[] = "control_test";
 
