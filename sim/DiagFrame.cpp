@@ -11,32 +11,34 @@ const uint8_t ESCAPE = 0x7d;
 const uint8_t ESCAPE_XOR = 0x20;
 const size_t HEADER_SIZE = 8;
 
-void append_escaped(std::vector<uint8_t>& out, uint8_t byte) {
-    if (byte == FLAG || byte == ESCAPE) {
-        out.push_back(ESCAPE);
-        byte ^= ESCAPE_XOR;
-    }
-    out.push_back(byte);
-}
-
 }  // namespace
 
-std::vector<uint8_t> DiagFrame::encode() const {
-    const size_t size = HEADER_SIZE + payload.size();
+std::vector<uint8_t> DiagFrame::enclose(const std::vector<uint8_t>& body) {
     std::vector<uint8_t> out = {FLAG};
-    out.reserve(size + size / 16 + 2);
-    for (int shift = 0; shift < 32; shift += 8) {
-        append_escaped(out, static_cast<uint8_t>(sequence >> shift));
-    }
-    append_escaped(out, static_cast<uint8_t>(size));
-    append_escaped(out, static_cast<uint8_t>(size >> 8));
-    append_escaped(out, type);
-    append_escaped(out, sub_type);
-    for (const uint8_t byte : payload) {
-        append_escaped(out, byte);
+    out.reserve(body.size() + body.size() / 16 + 2);
+    for (uint8_t byte : body) {
+        if (byte == FLAG || byte == ESCAPE) {
+            out.push_back(ESCAPE);
+            byte ^= ESCAPE_XOR;
+        }
+        out.push_back(byte);
     }
     out.push_back(FLAG);
     return out;
+}
+
+std::vector<uint8_t> DiagFrame::encode() const {
+    const size_t size = HEADER_SIZE + payload.size();
+    std::vector<uint8_t> body;
+    for (int shift = 0; shift < 32; shift += 8) {
+        body.push_back(static_cast<uint8_t>(sequence >> shift));
+    }
+    body.push_back(static_cast<uint8_t>(size));
+    body.push_back(static_cast<uint8_t>(size >> 8));
+    body.push_back(type);
+    body.push_back(sub_type);
+    body.insert(body.end(), payload.begin(), payload.end());
+    return enclose(body);
 }
 
 bool DiagFrame::take(std::vector<uint8_t>& bytes, DiagFrame* frame) {

@@ -17,6 +17,8 @@ struct DiagFrame {
 
     // The bytes on the wire.
     std::vector<uint8_t> encode() const;
+    // A body of any content on the wire: escaped, between two flags.
+    static std::vector<uint8_t> enclose(const std::vector<uint8_t>& body);
     // Takes the first whole frame from the bytes: fills *frame and removes the bytes up to
     // the frame's end. False when there is none yet; bytes in front of a flag are removed.
     // A body whose length field is wrong is skipped.

@@ -38,10 +38,12 @@ public:
 
     const std::string& path() const { return m_path; }
 
-private:
-    std::string m_path;
+protected:
     int m_master = -1;
     int m_slave = -1;  // kept open so that the device outlives the service's opening it
+
+private:
+    std::string m_path;
 };
 
 #endif  // SIM_SIMDIAGDEVICE_H_

@@ -158,7 +158,7 @@ TEST_F(DiagReplyTest, ACpThatIsSilentFailsAndLeavesWhatItSent) {
         // A time-out that comes late, with more data waiting, is none.
         ASSERT_TRUE(diag_dev.put(frame(kind.type, 'd', "s") + "\x7e half a frame"));
         run_clock(3100);
-        EXPECT_EQ(diag_dev.unread(), 0u);
+        EXPECT_EQ(diag_dev.pending(), 0u);
         run_clock(2900);
         EXPECT_NE(modem()->state(), CWS_WORKING);
         run_clock(150);

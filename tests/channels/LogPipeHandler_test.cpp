@@ -10,16 +10,8 @@ namespace {
 class LogPipeHandlerTest : public CrashFixture {
 protected:
     LogPipeHandlerTest() {
-        setenv("TZ", "UTC0", 1);
-        tzset();
+        set_zone("UTC0");
         remove_tree("gnss");  // each test has a device of its own there, or none
-    }
-    ~LogPipeHandlerTest() override { boot_clock::real(); }
-
-    void pass(int times) {
-        for (int i = 0; i < times; ++i) {
-            pump_once(mux());
-        }
     }
 
     LogPipeHandler* gnss = nullptr;

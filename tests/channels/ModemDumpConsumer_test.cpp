@@ -16,14 +16,8 @@ class ModemDumpTest : public FaultFixture {
 protected:
     // Where the dump file lies; "" when there is none.
     std::string dump_path() const {
-        for (const std::string medium : {"data", "sd"}) {
-            for (const std::string& name : root.tree(medium + "/modem_log")) {
-                if (name.find(".dmp") != std::string::npos) {
-                    return medium + "/modem_log/" + name;
-                }
-            }
-        }
-        return "";
+        const std::vector<std::string> dumps = root.find(".dmp");
+        return dumps.empty() ? "" : dumps[0];
     }
     std::string dir_of(const std::string& path) const { return path.substr(0, path.rfind('/')); }
 };

@@ -2,7 +2,11 @@
 
 #include <sys/un.h>
 
+#include <list>
+
 #include "channels/TimeSyncRecord.h"
+#include "sim/SimSupervisor.h"
+#include "sim/local_socket.h"
 #include "support/ServiceFixture.h"
 #include "support/faults.h"
 
@@ -10,24 +14,18 @@ namespace {
 
 const std::string TAG("\x78\x56\x34\x12");
 
-// A service that never looks at its connections; full: nor has room for more.
-class Silent {
+// A service that never looks at its connections and has no room for more.
+class FullService : public SimSupervisor {
 public:
-    explicit Silent(const char* name, bool full = false)
-        : m_server(socket_local_server(name, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM)) {
-        if (full) {
-            listen(m_server, 0);
-            m_queued = socket_local_client(name, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
+    explicit FullService(const char* name) {
+        EXPECT_TRUE(start(name, getenv("KESTMODEM_ROOT")));
+        for (int fd; (fd = connect_local(name, getenv("KESTMODEM_ROOT"))) >= 0;) {
+            m_queued.emplace_back(fd);
         }
-    }
-    ~Silent() {
-        close(m_queued);
-        close(m_server);
     }
 
 private:
-    int m_server;
-    int m_queued = -1;
+    std::list<Client> m_queued;
 };
 
 class TimeSyncTest : public ChannelFixture {
@@ -60,14 +58,10 @@ protected:
     }
     ~TimeSyncTest() override {
         faults::instead = {};
+        faults::reset();
         set_zone("UTC0");
     }
 
-    static void set_zone(const char* tz) {
-        setenv("TZ", tz, 1);
-        tzset();
-        faults::set_time(0);
-    }
     // Has a modem start one log file with the data "log". The file's content.
     std::string start_file() {
         const Fifo fifo(root.path("log_w"));
@@ -114,13 +108,13 @@ TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
         std::unique_ptr<TimeServer> server;
-        std::unique_ptr<Silent> silent;
+        SimSupervisor silent;  // never looks at its connections
         loop = Record();
         loop.answers = !c.reply.empty();
         loop.on_sleep = [&] {
             if (loop.slept == static_cast<useconds_t>(c.missed) * 100000) {
                 if (c.reply.empty()) {
-                    silent = std::make_unique<Silent>("cp_time_sync_server");
+                    EXPECT_TRUE(silent.start("cp_time_sync_server", root.root()));
                 } else {
                     server = std::make_unique<TimeServer>(c.reply);
                 }
@@ -137,8 +131,7 @@ TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
 
 // It would wait for ever.
 TEST_F(TimeSyncTest, HangingServicesDoNotBlockTheLoop) {
-    const Silent services[] = {Silent("cp_time_sync_server", true), Silent("modemd", true),
-                               Silent("external_wcn_kest", true)};
+    FullService time_service("cp_time_sync_server"), modemd("modemd"), wcnd("external_wcn_kest");
     EXPECT_EQ(start_file(), "log");
     EXPECT_TRUE(log.has("connect CP time sync server error [11(")) << log.text();
 }

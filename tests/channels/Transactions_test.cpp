@@ -34,13 +34,6 @@ protected:
         return client.say(transaction.request) &&
                pump([&] { return diag_dev.received() == frame(transaction.diag_type, 0); });
     }
-    size_t count_files(const std::string& part) const {
-        size_t n = 0;
-        for (const auto& file : files()) {
-            n += file.first.find(part) != std::string::npos;
-        }
-        return n;
-    }
 };
 
 TEST_F(TransactionsTest, OneThatCannotStartLeavesNothingBehind) {
@@ -123,7 +116,7 @@ TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogs
             if (!c.transaction.dump) {
                 EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
             }
-            EXPECT_EQ(count_files("_memory_"), c.lines.empty() ? 0u : 1u);
+            EXPECT_EQ(root.find("_memory_").size(), c.lines.empty() ? 0u : 1u);
 
             // And back to normal, from whatever state.
             if (!modem()->enabled()) {
@@ -175,7 +168,7 @@ TEST_F(TransactionsTest, ADeviceThatGivesNothingEndsItsTransactionAfterOneTimeou
             EXPECT_GT(modem()->state(), CWS_WORKING);
             run_clock(1);
             EXPECT_EQ(modem()->state(), dump ? CWS_NOT_WORKING : CWS_WORKING);
-            EXPECT_EQ(count_files(".mem") - count_files(".dmp"), dump ? 1u : 0u);
+            EXPECT_EQ(root.find(".mem").size() - root.find(".dmp").size(), dump ? 1u : 0u);
             EXPECT_EQ(log.count("unexpected event") + log.count(" return 0 ["), 1u);
             end_service();
         }

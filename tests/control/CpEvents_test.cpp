@@ -86,9 +86,7 @@ TEST_F(CpEventsTest, ModemAssertsAndRecovers) {
         ASSERT_TRUE(reaches(modem(), CWS_WORKING));
         EXPECT_TRUE(both_log("<after>"));
         EXPECT_EQ(subscribers[0].heard() + subscribers[1].heard() + other.heard(), "");
-        ctrl.reset();
-        remove_tree("data/modem_log");
-        remove_tree("sd/modem_log");
+        end_service();
     }
 }
 

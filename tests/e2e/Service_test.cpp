@@ -17,7 +17,7 @@ const size_t BLOCK = 32768;
 
 class ServiceTest : public ChannelFixture {
 protected:
-    ServiceTest() { setenv("TZ", "UTC0", 1); }
+    ServiceTest() { set_zone("UTC0"); }
 
     // Runs a command with its output in the file "log".
     void run(std::vector<std::string> args = {KESTMODEM_BIN}) {

@@ -4,9 +4,6 @@
 
 #include <errno.h>
 #include <pthread.h>
-#include <signal.h>
-
-#include <filesystem>
 
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
@@ -126,9 +123,7 @@ std::string samples(uint32_t len) {
 class WcdmaIqManagerTest : public ChannelFixture {
 protected:
     WcdmaIqManagerTest() {
-        setenv("TZ", "UTC0", 1);
-        tzset();
-        signal(SIGPIPE, SIG_IGN);  // as the service does
+        set_zone("UTC0");
         follow(script);
         device.on_buf_info = [this] { script.pass(0); };
         EXPECT_EQ(boot("stream cp_gnss on 5 3\nstream cp_wcn on 5 3\n"), 0);
@@ -138,7 +133,6 @@ protected:
         iq.reset();
         ctrl.reset();
         faults::instead = {};
-        boot_clock::real();
     }
 
     int start() { return iq->start(ctrl->get_cp(CT_GNSS)->storage()); }
@@ -174,15 +168,8 @@ protected:
         ASSERT_TRUE((cp == CT_GNSS ? gnss_dev : wcn_dev).put("log"));
         ctrl->get_cp(cp)->process(POLLIN);
     }
-    void remove(const std::string& path) { std::filesystem::remove_all(root.path(path)); }
-    void set_card(const char* state) { root.set_prop("init.svc.fuse_sdcard0", state); }
     // The I/Q files on both media, oldest first.
-    std::vector<std::string> iq_files() const {
-        std::vector<std::string> all = root.tree(""), files;
-        std::copy_if(all.begin(), all.end(), std::back_inserter(files),
-                     [](const auto& file) { return file.find("_wiq_") != std::string::npos; });
-        return files;
-    }
+    std::vector<std::string> iq_files() const { return root.find("_wiq_"); }
     std::string newest() const { return root.read_file(iq_files().back()); }
     // That the total of the medium in use is what its files hold.
     void expect_accounted() {
@@ -300,17 +287,17 @@ TEST_F(WcdmaIqManagerTest, KeepsSixtyFilesAcrossStopAndStart) {
     EXPECT_EQ(newest().size(), 62u);
     expect_accounted();
     // An entry never outlives its file: here they all go with their set.
-    remove("data/modem_log/" + root.list("data/modem_log")[0]);
+    remove_tree("data/modem_log/" + root.list("data/modem_log")[0]);
     log_data(CT_WCN);
     EXPECT_EQ(iq->num_files(), 0u);
     // Creating the file is what finds the card there, and gone.
-    for (const char* service : {"running", "", "running", "", "running"}) {
-        set_card(service);
-        ASSERT_TRUE(save(service));
+    for (const bool card : {true, false, true, false, true}) {
+        set_card(card);
+        ASSERT_TRUE(save("data"));
     }
     EXPECT_EQ(iq_files().size(), 5u);
     EXPECT_EQ(iq->num_files(), 3u) << "the first and the third went with the card";
-    set_card("");
+    set_card(false);
     log_data(CT_WCN);
     EXPECT_EQ(iq->num_files(), 2u);
     EXPECT_TRUE(waits());
@@ -391,7 +378,7 @@ TEST_F(WcdmaIqManagerTest, ADeviceThatGivesNothingIsLeftAlone) {
         disconnect();
     };
     const auto take_medium = [&] {
-        remove("data/modem_log");
+        remove_tree("data/modem_log");
         root.write_file("data/modem_log", "");
     };
     // Each comes on top of those before it.
@@ -446,11 +433,11 @@ TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeOnly) {
 
 TEST_F(WcdmaIqManagerTest, WithoutAFileOrACommandTheBufferIsDropped) {
     ASSERT_EQ(start(), 0);
-    remove("data/modem_log");
+    remove_tree("data/modem_log");
     root.write_file("data/modem_log", "");
     ASSERT_TRUE(save("lost"));
     EXPECT_EQ(log.count("process(int): create WCDMA I/Q file error [20("), 1u);
-    remove("data/modem_log");
+    remove_tree("data/modem_log");
     script.refused_cmd = IQST_SAVE;
     ASSERT_TRUE(save("lost too"));
     EXPECT_EQ(iq_files().size() + iq->num_files(), 0u);
@@ -538,9 +525,9 @@ TEST_P(SaveMomentTest, Stop) {
 }
 
 TEST_P(SaveMomentTest, TheCardGoes) {
-    set_card("running");
+    set_card(true);
     ASSERT_NO_FATAL_FAILURE(begin());
-    set_card("");
+    set_card(false);
     log_data(CT_WCN);
     EXPECT_FALSE(log.has(file_gone)) << "let go of before";
     EXPECT_EQ(iq->num_files(), 0u);
@@ -551,7 +538,7 @@ TEST_P(SaveMomentTest, TheCardGoes) {
 
 TEST_P(SaveMomentTest, TheSetGoes) {
     ASSERT_NO_FATAL_FAILURE(begin());
-    remove("data/modem_log/" + root.list("data/modem_log")[0]);
+    remove_tree("data/modem_log/" + root.list("data/modem_log")[0]);
     log_data(CT_WCN);
     EXPECT_EQ(iq->num_files(), 0u);
     EXPECT_TRUE(log.has(file_gone));

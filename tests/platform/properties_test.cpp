@@ -19,10 +19,11 @@
 namespace {
 
 // Newer kernels give finer times to a file that is being watched; the common tick is 10 ms.
-void coarsen(struct stat* st) {
+int coarsened(int result, struct stat* st) {
     for (struct timespec* t : {&st->st_mtim, &st->st_ctim}) {
         t->tv_nsec -= t->tv_nsec % 10000000;
     }
+    return result;
 }
 
 std::string get(const char* key, const char* fallback = "DEFAULT") {
@@ -52,14 +53,10 @@ protected:
     Properties() {
         faults::only_on("default.prop");
         faults::instead.stat = [](const char* path, struct stat* st) {
-            const int result = real::stat(path, st);
-            coarsen(st);
-            return result;
+            return coarsened(real::stat(path, st), st);
         };
         faults::instead.fstat = [](int fd, struct stat* st) {
-            const int result = real::fstat(fd, st);
-            coarsen(st);
-            return result;
+            return coarsened(real::fstat(fd, st), st);
         };
     }
     ~Properties() override {

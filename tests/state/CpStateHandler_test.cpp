@@ -21,7 +21,6 @@ protected:
         root.set_prop("persist.sys.vexa.wcnreset", "1");
         EXPECT_TRUE(supervisor.start(SUPERVISOR, root.root()));
     }
-    ~CpStateHandlerTest() override { boot_clock::real(); }
 
     // Sends one message, which is read in one piece; gives the state of the CP then.
     CpWorkState say(const std::string& message, const std::string& logged) {

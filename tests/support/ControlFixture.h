@@ -28,11 +28,7 @@ protected:
         EXPECT_EQ(ask(client, request, expected), expected) << request;
     }
     // Passes enough for whatever is there to be handled.
-    void settle() {
-        for (int i = 0; i < 5; ++i) {
-            pump_once(mux());
-        }
-    }
+    void settle() { pass(5); }
 
     std::unique_ptr<ClientManager> manager;
 };

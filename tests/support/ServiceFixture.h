@@ -62,7 +62,9 @@ inline std::string log_content(const TestRoot& root, const std::vector<std::stri
 
 class ChannelFixture : public testing::Test {
 protected:
+    ~ChannelFixture() override { boot_clock::real(); }
     ChannelFixture() {
+        signal(SIGPIPE, SIG_IGN);  // as the service does
         LogConfig::set_wan_modem_type(CT_UNKNOWN);
         setenv("EXTERNAL_STORAGE", root.path("sd").c_str(), 1);
         root.set_prop("persist.storage.type", "1");
@@ -74,6 +76,10 @@ protected:
         root.make_dir("sd");
     }
 
+    static void set_zone(const char* tz) {
+        setenv("TZ", tz, 1);
+        tzset();
+    }
     // A controller on a settings file of this text; what init returned.
     int boot(const std::string& settings, std::vector<std::string> args = {}) {
         ctrl.reset();
@@ -102,9 +108,18 @@ protected:
     // Log devices that the loop polls; the controller's other descriptors do not count.
     size_t polled() { return Multiplexer::MAX_HANDLERS - Filler::free_slots(mux()) - m_others; }
 
+    // The card that the service looks for; for a card that is pulled its files go, too.
+    void set_card(bool in) { root.set_prop("init.svc.fuse_sdcard0", in ? "running" : ""); }
+
     Multiplexer& mux() { return ctrl->multiplexer(); }
     bool pump(const std::function<bool()>& condition, int timeout_ms = 60000) {
         return pump_until(mux(), condition, timeout_ms);
+    }
+    // Passes of the loop, whatever there is to do.
+    void pass(int times) {
+        for (int i = 0; i < times; ++i) {
+            pump_once(mux());
+        }
     }
     // Sends the data through the channel's device in one piece of at most 32768 bytes.
     bool feed(const Fifo& fifo, const std::string& data) {
@@ -126,9 +141,7 @@ private:
 class CrashFixture : public ChannelFixture {
 protected:
     CrashFixture() : time_service(std::string(12, 't')), gnss_dev(root.path("gnss")) {
-        signal(SIGPIPE, SIG_IGN);  // as the service does
-        setenv("TZ", "XXX-3:30", 1);
-        tzset();
+        set_zone("XXX-3:30");
         root.write_file("proc/cpw/mem", MEMORY);
     }
 
@@ -145,7 +158,8 @@ protected:
     // Has the service read the data, in chunks.
     bool supply(const Pty& dev, const std::string& data) {
         for (size_t at = 0; at < data.size(); at += Pty::CHUNK) {
-            if (!dev.put(data.substr(at, Pty::CHUNK)) || !pump([&] { return dev.unread() == 0; })) {
+            if (!dev.put(data.substr(at, Pty::CHUNK)) ||
+                !pump([&] { return dev.pending() == 0; })) {
                 return false;
             }
         }
@@ -178,10 +192,7 @@ protected:
     size_t logged(const std::string& cp, const std::string& data) const {
         size_t n = 0;
         for (const char* medium : {"data/modem_log", "sd/modem_log"}) {
-            const std::string all = log_content(root, log_files(root, medium, cp));
-            for (size_t at = all.find(data); at != std::string::npos; at = all.find(data, at + 1)) {
-                ++n;
-            }
+            n += occurrences(log_content(root, log_files(root, medium, cp)), data);
         }
         return n;
     }
@@ -202,21 +213,15 @@ protected:
     }
     // Descriptors that are open when the time service has nothing to do.
     static size_t lasting_descriptors() {
-        const int last = socket_local_client("cp_time_sync_server",
-                                             ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
-        char answer[16];
-        while (recv(last, answer, sizeof(answer), 0) > 0) {  // to the end: after all before it
-        }
-        close(last);
+        Client last("cp_time_sync_server");
+        wait_until([&] { return last.ended(); });  // after all before it
+        last.hang_up();
         return open_descriptors();
     }
     // The loop's free places and the lasting descriptors, to be the same before and after.
     std::pair<size_t, size_t> resources() {
         return {Filler::free_slots(mux()), lasting_descriptors()};
     }
-    // The card that the service looks for; for a card that is pulled its files go, too.
-    void set_card(bool in) { root.set_prop("init.svc.fuse_sdcard0", in ? "running" : ""); }
-
     typedef std::map<std::string, std::string> Files;
     const std::string MEMORY = pattern_bytes(200001, 99);
     const TimeServer time_service;
@@ -232,10 +237,7 @@ const char STAMP[] = "_2016-03-01_09-15-00";
 class FaultFixture : public CrashFixture {
 protected:
     FaultFixture() { repair(); }
-    ~FaultFixture() override {
-        faults::reset();
-        boot_clock::real();
-    }
+    ~FaultFixture() override { faults::reset(); }
 
     // Everything works again, it is noon and the clock of the timers stands still.
     static void repair() {

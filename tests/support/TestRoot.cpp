@@ -26,6 +26,20 @@ namespace {
     abort();
 }
 
+// What the iterator meets, relative to the directory.
+template <typename Iterator>
+std::vector<std::string> sorted_names(const std::string& dir, bool directories) {
+    std::vector<std::string> names;
+    std::error_code ec;
+    for (const auto& entry : Iterator(dir, ec)) {
+        if (directories || !entry.is_directory(ec)) {
+            names.push_back(fs::path(entry.path()).lexically_relative(dir));
+        }
+    }
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
 }  // namespace
 
 TestRoot::TestRoot() : m_root(make_temp_dir("/tmp", "kestmodem-test")) {
@@ -70,25 +84,18 @@ bool TestRoot::exists(const std::string& rel) const {
 }
 
 std::vector<std::string> TestRoot::list(const std::string& rel) const {
-    std::vector<std::string> names;
-    std::error_code ec;
-    for (const auto& entry : fs::directory_iterator(path(rel), ec)) {
-        names.push_back(entry.path().filename());
-    }
-    std::sort(names.begin(), names.end());
-    return names;
+    return sorted_names<fs::directory_iterator>(path(rel), true);
 }
 
 std::vector<std::string> TestRoot::tree(const std::string& rel) const {
-    std::vector<std::string> names;
-    std::error_code ec;
-    for (const auto& entry : fs::recursive_directory_iterator(path(rel), ec)) {
-        if (!entry.is_directory(ec)) {
-            names.push_back(fs::relative(entry.path(), path(rel)));
-        }
-    }
-    std::sort(names.begin(), names.end());
-    return names;
+    return sorted_names<fs::recursive_directory_iterator>(path(rel), false);
+}
+
+std::vector<std::string> TestRoot::find(const std::string& part) const {
+    std::vector<std::string> all = tree(""), found;
+    std::copy_if(all.begin(), all.end(), std::back_inserter(found),
+                 [&](const auto& file) { return file.find(part) != std::string::npos; });
+    return found;
 }
 
 void TestRoot::set_prop(const std::string& key, const std::string& value) {
@@ -136,12 +143,7 @@ bool LogCapture::has(const std::string& part) const {
 }
 
 size_t LogCapture::count(const std::string& part) const {
-    const std::string all = text();
-    size_t n = 0;
-    for (size_t at = all.find(part); at != std::string::npos; at = all.find(part, at + 1)) {
-        ++n;
-    }
-    return n;
+    return occurrences(text(), part);
 }
 
 void LogCapture::clear() {
@@ -149,6 +151,14 @@ void LogCapture::clear() {
     if (ftruncate(m_file, 0) != 0 || lseek(m_file, 0, SEEK_SET) != 0) {
         die("LogCapture::clear");
     }
+}
+
+size_t occurrences(const std::string& text, const std::string& part) {
+    size_t n = 0;
+    for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) {
+        ++n;
+    }
+    return n;
 }
 
 std::vector<char*> argv_of(std::vector<std::string>& args) {
@@ -166,13 +176,14 @@ int64_t monotonic_ms() {
     return static_cast<int64_t>(t.tv_sec) * 1000 + t.tv_nsec / 1000000;
 }
 
-bool wait_until(const std::function<bool()>& condition, int timeout_ms) {
+bool wait_until(const std::function<bool()>& condition, int timeout_ms,
+                const std::function<void()>& meanwhile) {
     const int64_t end = monotonic_ms() + timeout_ms;
     while (!condition()) {
         if (monotonic_ms() > end) {
             return false;
         }
-        usleep(2000);
+        meanwhile();
     }
     return true;
 }

@@ -6,6 +6,7 @@
 
 #include <stdint.h>
 #include <sys/types.h>
+#include <unistd.h>
 
 #include <functional>
 #include <string>
@@ -31,6 +32,9 @@ public:
     std::vector<std::string> list(const std::string& rel) const;
     // Files below a directory, as paths relative to it, sorted.
     std::vector<std::string> tree(const std::string& rel) const;
+
+    // Files anywhere in the root that have the part in their path relative to it, sorted.
+    std::vector<std::string> find(const std::string& part) const;
 
     // Sets one property in default.prop, replacing the file by rename; "" removes it.
     void set_prop(const std::string& key, const std::string& value);
@@ -60,12 +64,17 @@ private:
 
 int64_t monotonic_ms();
 
+// How often the part occurs in the text.
+size_t occurrences(const std::string& text, const std::string& part);
+
 // The arguments as main gets them, with a null at the end; valid as long as they are.
 std::vector<char*> argv_of(std::vector<std::string>& args);
 
-// Runs the condition until it is true or the time is over; true when it became true. The
-// time is one that no loaded machine misses.
-bool wait_until(const std::function<bool()>& condition, int timeout_ms = 60000);
+// Runs the condition, and something between two runs of it, until it is true or the time is
+// over; true when it became true. The time is one that no loaded machine misses.
+bool wait_until(
+    const std::function<bool()>& condition, int timeout_ms = 60000,
+    const std::function<void()>& meanwhile = [] { usleep(2000); });
 
 // Number of descriptors that this process has open.
 size_t open_descriptors();

@@ -12,11 +12,12 @@
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <termios.h>
 #include <unistd.h>
 
 #include <string>
+#include <vector>
 
+#include "sim/SimDiagDevice.h"
 #include "sim/TimeService.h"
 #include "support/TestRoot.h"
 #include "support/faults.h"
@@ -61,59 +62,37 @@ struct TimeServer : TimeService {
     }
 };
 
-// A CP's device: the service opens path(), the test holds the CP's end and keeps the
-// service's end open, so that nothing is lost while the service has it closed.
-class Pty : Unique {
+// A CP's device: the service opens path(), the test holds the CP's end.
+class Pty : public SimDiagDevice {
 public:
-    Pty() : m_master(posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC | O_NONBLOCK)) {
-        char name[64] = "";
-        if (m_master < 0 || grantpt(m_master) != 0 || unlockpt(m_master) != 0 ||
-            ptsname_r(m_master, name, sizeof(name)) != 0) {
-            abort();
-        }
-        m_path = name;
-        m_slave = open(name, O_RDWR | O_NOCTTY | O_CLOEXEC);
-        struct termios raw;
-        tcgetattr(m_slave, &raw);
-        cfmakeraw(&raw);
-        tcsetattr(m_slave, TCSANOW, &raw);
-    }
-    ~Pty() {
-        close(m_slave);
-        close(m_master);
+    Pty() {
+        static int number = 0;
+        EXPECT_TRUE(create(getenv("KESTMODEM_ROOT") + ("/pty" + std::to_string(++number))));
     }
 
     // As many bytes as the service surely reads at once.
     static constexpr size_t CHUNK = 4000;
 
-    const std::string& path() const { return m_path; }
-    size_t unread() const { return bytes_waiting(m_slave); }
-    // Gives the service one chunk to read.
+    // Gives the service one chunk to read. Not by a call that tests make fail.
     bool put(const std::string& data) const {
         struct pollfd slave = {m_slave, POLLIN, 0};
         return real::write(m_master, data.data(), data.size()) ==
                    static_cast<ssize_t>(data.size()) &&
-               poll(&slave, 1, 60000) == 1 && wait_until([&] { return unread() == data.size(); });
+               poll(&slave, 1, 60000) == 1 && wait_until([&] { return pending() == data.size(); });
     }
     // What the service has written since the last call of forget().
     const std::string& received() {
-        char buf[256];
-        ssize_t n;
-        while ((n = read(m_master, buf, sizeof(buf))) > 0) {
-            m_received.append(buf, static_cast<size_t>(n));
-        }
+        const std::vector<uint8_t> more = read_request(0, 0);
+        m_received.append(more.begin(), more.end());
         return m_received;
     }
     void forget() {
         received();
         m_received.clear();
-        tcflush(m_slave, TCIFLUSH);
+        discard();
     }
 
 private:
-    int m_master;
-    int m_slave;
-    std::string m_path;
     std::string m_received;
 };
 

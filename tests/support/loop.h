@@ -25,14 +25,7 @@ inline void pump_once(Multiplexer& mux) {
 // Runs the loop until the condition holds; false when the time is over.
 inline bool pump_until(Multiplexer& mux, const std::function<bool()>& condition,
                        int timeout_ms = 60000) {
-    const int64_t end = monotonic_ms() + timeout_ms;
-    while (!condition()) {
-        if (monotonic_ms() > end) {
-            return false;
-        }
-        pump_once(mux);
-    }
-    return true;
+    return wait_until(condition, timeout_ms, [&] { pump_once(mux); });
 }
 
 // Fills the loop's table, or sees how many handlers it still takes.

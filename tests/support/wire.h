@@ -4,30 +4,20 @@
 #define TESTS_SUPPORT_WIRE_H_
 
 #include <string>
+#include <vector>
 
-inline std::string escaped(const std::string& body) {
-    std::string out;
-    for (char c : body) {
-        if (c == '\x7d' || c == '\x7e') {
-            out += '\x7d';
-            c = static_cast<char>(c ^ 0x20);
-        }
-        out += c;
-    }
-    return out;
-}
+#include "sim/DiagFrame.h"
 
 inline std::string raw_frame(const std::string& body) {
-    return "\x7e" + escaped(body) + "\x7e";
+    const std::vector<uint8_t> wire = DiagFrame::enclose({body.begin(), body.end()});
+    return {wire.begin(), wire.end()};
 }
 
 inline std::string frame(int type, int sub_type, const std::string& payload = "") {
-    std::string body(4, '\0');
-    for (size_t value : {(payload.size() + 8) & 0xff, (payload.size() + 8) >> 8,
-                         static_cast<size_t>(type), static_cast<size_t>(sub_type)}) {
-        body += static_cast<char>(value);
-    }
-    return raw_frame(body + payload);
+    const DiagFrame sent = {0, static_cast<uint8_t>(type), static_cast<uint8_t>(sub_type),
+                            std::vector<uint8_t>(payload.begin(), payload.end())};
+    const std::vector<uint8_t> wire = sent.encode();
+    return {wire.begin(), wire.end()};
 }
 
 const std::string END_TEXT = "\nmodem_memdump_finish";
@@ -35,6 +25,21 @@ const std::string END_TEXT = "\nmodem_memdump_finish";
 // The frame that ends a dump; its header does not matter.
 inline std::string end_marker() {
     return raw_frame("\x7e\x7d\x01\x02\x03\x04\x05\x06" + END_TEXT);
+}
+
+enum ChunkKind { LOG = 0x40, DUMP = 0x42, PCM = 0x43 };
+
+// A chunk of the audio DSP as its log file holds it, written down byte by byte.
+inline std::string chunk(uint32_t seq, ChunkKind kind, const std::string& data) {
+    const uint32_t n = static_cast<uint32_t>(data.size());
+    const uint32_t sum = n + 0x5a6a;
+    const uint32_t check = ~((sum >> 16) + (sum & 0xffff));
+    std::string head = "\x7e\x7e\x7e\x7e";
+    for (uint32_t half : {n + 16, 0u, 0x5a5au, check, seq & 0xffff, seq >> 16, n + 8}) {
+        head += static_cast<char>(half & 0xff);
+        head += static_cast<char>(half >> 8 & 0xff);
+    }
+    return head + '\x9d' + static_cast<char>(kind) + data;
 }
 
 #endif  // TESTS_SUPPORT_WIRE_H_

@@ -17,7 +17,7 @@
 
 #include "core/system_paths.h"
 #include "sim/ChildProcess.h"
-#include "support/TestRoot.h"
+#include "support/devices.h"
 
 namespace {
 
@@ -34,10 +34,7 @@ Strings split(const std::string& text, char separator) {
 
 class KestctlTest : public ::testing::Test {
 protected:
-    ~KestctlTest() override {
-        hang_up();
-        close(m_listen);
-    }
+    ~KestctlTest() override { close(m_listen); }
 
     void start(Strings args, const std::string& out_path = "") {
         args.insert(args.begin(), KESTCTL);
@@ -59,27 +56,23 @@ protected:
     std::string out() const { return m_root.read_file("out"); }
     std::string err() const { return m_root.read_file("err"); }
 
-    bool readable(int fd) {
-        struct pollfd pfd = {fd, POLLIN, 0};
-        return poll(&pfd, 1, 60000) == 1;
+    bool connecting(int timeout_ms) {
+        struct pollfd pfd = {m_listen, POLLIN, 0};
+        return poll(&pfd, 1, timeout_ms) == 1;
     }
-    void serve() { m_conn = readable(m_listen) ? accept(m_listen, nullptr, nullptr) : -1; }
-    void hang_up() {
-        close(m_conn);
-        m_conn = -1;
+    void serve() {
+        m_peer =
+            std::make_unique<Client>(connecting(60000) ? accept(m_listen, nullptr, nullptr) : -1);
     }
     // The next request with its line feed, or what came before the end.
     std::string receive() {
-        std::string line;
-        for (char c = 0; c != '\n' && readable(m_conn) && read(m_conn, &c, 1) == 1;) {
-            line += c;
-        }
+        wait_until(
+            [&] { return m_peer->heard().find('\n') != std::string::npos || m_peer->ended(); });
+        const std::string line = m_peer->heard();
+        m_peer->forget();
         return line;
     }
-    void reply(const std::string& bytes) {
-        EXPECT_EQ(send(m_conn, bytes.data(), bytes.size(), MSG_NOSIGNAL),
-                  static_cast<ssize_t>(bytes.size()));
-    }
+    void reply(const std::string& bytes) { EXPECT_TRUE(m_peer->say(bytes)); }
 
     // Runs a command to its end, answering each of its requests with the next reply, and
     // stores the requests. After the last reply the connection is closed.
@@ -91,14 +84,14 @@ protected:
             m_requests += receive();
             reply(text);
         }
-        hang_up();
+        m_peer.reset();
         return finish();
     }
 
     TestRoot m_root;
     int m_listen =
         socket_local_server(SOCKET_CONTROL, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
-    int m_conn = -1;
+    std::unique_ptr<Client> m_peer;
     ChildProcess m_process;
     std::string m_requests;
 };
@@ -183,7 +176,7 @@ TEST_F(KestctlTest, NotificationsAndSplitsDoNotHideTheReply) {
         reply(std::string(1, c));
         EXPECT_TRUE(wait_until([this] {
             int unread = 0;
-            return ioctl(m_conn, SIOCOUTQ, &unread) == 0 && unread == 0;
+            return ioctl(m_peer->fd(), SIOCOUTQ, &unread) == 0 && unread == 0;
         }));
     }
     EXPECT_EQ(finish(), 0) << err();
@@ -215,7 +208,7 @@ TEST_F(KestctlTest, WatchPrintsAtOnceUntilInterrupted) {
     m_process.signal(SIGINT);
     EXPECT_EQ(finish(), 0);
     EXPECT_EQ(err(), "");
-    hang_up();
+    m_peer.reset();
 
     EXPECT_EQ(exchange("--json watch wcn gnss", {"OK\n", "OK\nCP_DUMP_END WCN\n"}), 4);
     EXPECT_EQ(m_requests, "SUBSCRIBE WCN DUMP\nSUBSCRIBE GNSS DUMP\n");
@@ -306,8 +299,7 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
         EXPECT_EQ(run(split(c.args, ' ')), 1);
         EXPECT_EQ(err().find(std::string("kestctl: ") + c.said), 0u) << err();
     }
-    struct pollfd pfd = {m_listen, POLLIN, 0};
-    EXPECT_EQ(poll(&pfd, 1, 0), 0);  // none of them has even connected
+    EXPECT_FALSE(connecting(0)) << "none of them has even connected";
     EXPECT_EQ(exchange("raw " + std::string(255, 'A'), {"ERROR 1\n"}), 11);
 }
 

@@ -9,14 +9,12 @@
 
 #include <algorithm>
 
-#include "channels/DiagFrameParser.h"
-#include "channels/DspChunkHeader.h"
-#include "channels/TimeSyncRecord.h"
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
 #include "support/TestRoot.h"
+#include "support/wire.h"
 
 namespace {
 
@@ -31,32 +29,12 @@ const std::string OLD_DSP_LOG = DSP + "1-agdsp-2016-03-01_09-00-00.log";
 const std::string MODEM_LOG = MODEM + "0-cp_wcdma-" + STAMP + ".log";
 const std::string MODEM_DUMP = MODEM + "cp_wcdma_memory_" + STAMP + ".dmp";
 
-template <typename T>
-std::string bytes_of(const T& value) {
-    return std::string(reinterpret_cast<const char*>(&value), sizeof(value));
-}
-
-std::string chunk(const std::string& data, uint8_t kind, uint32_t seq) {
-    return bytes_of(make_dsp_chunk_header(data.size(), kind, seq)) + data;
-}
-
-std::string frame(const std::string& payload, uint8_t type = 0x9d, uint8_t sub_type = 1) {
-    uint8_t* buf;
-    size_t len;
-    DiagFrameParser::frame(type, sub_type, reinterpret_cast<const uint8_t*>(payload.data()),
-                           payload.size(), buf, len);
-    const std::string result(reinterpret_cast<char*>(buf), len);
-    delete[] buf;
-    return result;
+std::string frame(const std::string& payload, int type = 0x9d, int sub_type = 1) {
+    return ::frame(type, sub_type, payload);
 }
 
 // 2016-03-01 01:15:00 UTC, in a zone of 8 hours. The CP's time has the bytes of frames.
-std::string time_record() {
-    uint8_t reply[TIME_SYNC_REPLY_LEN] = {0, 0, 0, 0, 0x7e, 1, 0x7e, 3, 4, 5, 0x7d, 0xff};
-    const uint32_t seconds = 1456794900;
-    memcpy(reply, &seconds, sizeof(seconds));
-    return bytes_of(make_time_sync_record(reply, 8));
-}
+const std::string TIME_RECORD("\x78\x56\x34\x12\x94\x5d\xd5\x56\x7e\1\x7e\3\4\5\x7d\xff", 16);
 
 std::string altered(std::string text, size_t pos, char byte) {
     text[pos] = byte;
@@ -65,8 +43,8 @@ std::string altered(std::string text, size_t pos, char byte) {
 
 const std::string DUMP_END = frame("\nmodem_memdump_finish", 1, 2);
 const std::string LOG_DATA = pattern_bytes(1000, 1);
-const std::string THREE_CHUNKS = chunk("log~~~~", DSP_CHUNK_LOG, 7) + chunk("", DSP_CHUNK_PCM, 8) +
-                                 chunk(LOG_DATA, DSP_CHUNK_DUMP, 9);
+const std::string THREE_CHUNKS =
+    chunk(7, LOG, "log~~~~") + chunk(8, PCM, "") + chunk(9, DUMP, LOG_DATA);
 
 class KestlogTest : public ::testing::Test {
 protected:
@@ -88,8 +66,8 @@ protected:
     }
     // A tree with every kind of file and nothing wrong.
     void write_good_tree() {
-        write(MODEM_LOG, time_record() + frame("a\x7e") + frame(std::string(60000, '}')));
-        write(MODEM + "1-cp_wcdma-2016-03-01_09-00-00.log", time_record() + LOG_DATA);
+        write(MODEM_LOG, TIME_RECORD + frame("a\x7e") + frame(std::string(60000, '}')));
+        write(MODEM + "1-cp_wcdma-2016-03-01_09-00-00.log", TIME_RECORD + LOG_DATA);
         write(MODEM_DUMP, frame(LOG_DATA) + frame("") + DUMP_END);
         write(MODEM + "cp_wcdma.version", "baseband 1");
         for (const char* head :
@@ -102,7 +80,7 @@ protected:
         write(WCN_LOG, LOG_DATA);
         write(WCN + "cp_wcn_memory_" + STAMP + ".dmp", LOG_DATA);
         write(DSP_LOG, THREE_CHUNKS);
-        write(OLD_DSP_LOG, time_record() + THREE_CHUNKS);
+        write(OLD_DSP_LOG, TIME_RECORD + THREE_CHUNKS);
         write("modem_log/modem_db.gz", LOG_DATA);
         write("modem_log/sha1.txt", "0123456789ABCDEF0123456789ABCDEF01234567");
     }
@@ -154,7 +132,7 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         {WCN + "1-cp_wcn-2016-04-01_00-00-00.log", "x", "order", false, -1},
         {WCN_LOG, "", "empty", false, -1},
         {MODEM_LOG, frame("no record"), "record", false, -1},
-        {MODEM_LOG, time_record().substr(0, 15), "record", true, 0},
+        {MODEM_LOG, TIME_RECORD.substr(0, 15), "record", true, 0},
         {MODEM_DUMP, frame(LOG_DATA), "end", true, -1},
         {MODEM_DUMP, frame("x") + altered(frame("\x55"), 9, 0x7e) + DUMP_END, "frame", true, 11},
         {MODEM_DUMP, frame("x") + "between" + DUMP_END, "frame", false, -1},
@@ -245,12 +223,11 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
 }
 
 TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
-    static const uint8_t KINDS[] = {DSP_CHUNK_LOG, DSP_CHUNK_PCM, DSP_CHUNK_DUMP};
+    static const ChunkKind KINDS[] = {LOG, PCM, DUMP};
     std::string text, want[3];
     for (uint32_t seq = 0; seq < 60; ++seq) {
         const std::string data = pattern_bytes(seq * 500, seq) + "~~~~";
-        text += seq == 31 ? altered(chunk(data, KINDS[1], seq), 9, 0)
-                          : chunk(data, KINDS[seq % 3], seq);
+        text += seq == 31 ? altered(chunk(seq, PCM, data), 9, 0) : chunk(seq, KINDS[seq % 3], data);
         want[seq % 3] += seq == 31 ? "" : data;  // that one is lost
     }
     write(OLD_DSP_LOG, text);
