@@ -6,11 +6,13 @@
 
 #include <filesystem>
 #include <fstream>
-#include <iterator>
+#include <sstream>
 
 std::string read_text_file(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+    std::ostringstream text;
+    text << in.rdbuf();  // in blocks: files may have many megabytes
+    return text.str();
 }
 
 std::string temp_dir() {
