@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+// kestsim_play: plays a script against the service and prints what came of it.
+#include <getopt.h>
+#include <signal.h>
+#include <stdio.h>
+#include <stdlib.h>
+
+#include <filesystem>
+
+#include "sim/ScriptPlayer.h"
+
+namespace {
+
+const char USAGE[] =
+#include "sim/play_usage.txt"
+    ;
+
+const option OPTIONS[] = {
+    {"kestmodem", required_argument, nullptr, 'm'},
+    {"keep", no_argument, nullptr, 'k'},
+    {"help", no_argument, nullptr, 'h'},
+    {nullptr, 0, nullptr, 0},
+};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::error_code ec;
+    std::string program =
+        std::filesystem::read_symlink("/proc/self/exe", ec).replace_filename("kestmodem").string();
+    bool keep = false;
+    for (int opt; (opt = getopt_long(argc, argv, "", OPTIONS, nullptr)) != -1;) {
+        switch (opt) {
+            case 'm':
+                program = optarg;
+                break;
+            case 'k':
+                keep = true;
+                break;
+            case 'h':
+                fputs(USAGE, stdout);
+                return 0;
+            default:
+                fputs(USAGE, stderr);
+                return 2;
+        }
+    }
+    if (optind + 1 != argc) {
+        fputs(USAGE, stderr);
+        return 2;
+    }
+    signal(SIGPIPE, SIG_IGN);
+    setenv("TZ", "UTC0", 1);  // time records tell the local time
+    ScriptPlayer player(program, keep);
+    const bool played = player.play(argv[optind]);
+    fputs(player.outcome().c_str(), stdout);
+    if (!played) {
+        fprintf(stderr, "%s\n", player.error().c_str());
+    }
+    if (keep) {
+        fprintf(stderr, "The handset's root is %s\n", player.root().c_str());
+    }
+    return played ? 0 : 1;
+}
