@@ -5,7 +5,6 @@
 #include <errno.h>
 
 #include "core/log.h"
-#include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 
 CpDumpConsumer::CpDumpConsumer(const char* cp_name, CpStorage* storage, const struct tm& dump_time)
@@ -69,7 +68,7 @@ bool CpDumpConsumer::dump_on_sd() const {
 
 void CpDumpConsumer::discard_dump_file() {
     if (m_dump_file) {
-        m_dump_file->dir()->remove_file(m_dump_file.get());
+        m_dump_file->discard();
     }
 }
 

@@ -9,7 +9,6 @@
 
 #include "core/Multiplexer.h"
 #include "core/log.h"
-#include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 
 namespace {
@@ -85,7 +84,7 @@ void DiagReplyConsumer::close_file() {
 
 void DiagReplyConsumer::discard_file() {
     if (m_file) {
-        m_file->dir()->remove_file(m_file.get());
+        m_file->discard();
     }
 }
 

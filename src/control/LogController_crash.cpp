@@ -5,7 +5,6 @@
 #include "core/SavedErrno.h"
 #include "core/log.h"
 #include "core/system_paths.h"
-#include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 
 namespace {
@@ -36,7 +35,7 @@ int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType typ
     const int result = copy_and_close(file, cp_mini_dump_path(type));
     if (result < 0) {
         err_log("save mini dump error");
-        file->dir()->remove_file(file);
+        file->discard();
     }
     return result;
 }
@@ -58,7 +57,7 @@ int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
         }
         if (copy_and_close(file, source.path) != 0) {
             err_log("kestcp: save DIPX %s info failed", source.record);
-            file->dir()->remove_file(file);
+            file->discard();
             result = -1;
         }
     }

@@ -16,7 +16,6 @@
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
 #include "storage/CpChannel.h"
-#include "storage/CpDirectory.h"
 #include "storage/CpStorage.h"
 #include "storage/log_name.h"
 
@@ -199,7 +198,7 @@ void WcdmaIqManager::process(int /*events*/) {
     m_saved_bytes = 0;
     if (m_resp_handler->send_cmd(IQST_SAVE) < 0) {
         m_save_file = nullptr;
-        m_cur_file->dir()->remove_file(m_cur_file.get());
+        m_cur_file->discard();
         prune_files();
         release_buffer();
         note_saved(false);
@@ -224,7 +223,7 @@ LogFile* WcdmaIqManager::create_iq_file() {
     prune_files();
     while (m_files.size() >= MAX_FILES) {
         LogFile* oldest = m_files.begin()->get();
-        oldest->dir()->remove_file(oldest);
+        oldest->discard();
         m_files.erase(m_files.begin());
     }
     android::String8 name;

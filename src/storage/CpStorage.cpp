@@ -6,7 +6,6 @@
 
 #include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
-#include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
 
 CpStorage::CpStorage(StorageManager* manager, CpChannel* channel)
@@ -101,7 +100,7 @@ bool CpStorage::prepare_file() {
         }
         // It vanished: its successor goes to the same medium and takes its number.
         LogFile* vanished = m_cur_file.get();
-        MediaStorage* media = vanished->dir()->set()->media();
+        MediaStorage* media = vanished->media();
         stop();
         vanished->dir()->file_removed(vanished);
         return open_log_file(media);
@@ -181,5 +180,5 @@ void CpStorage::unsubscribe_ext_stor_umount_evt(void* client) {
 }
 
 bool CpStorage::on_sd(const LogFile* file) const {
-    return file->dir()->set()->media() == m_manager->get_media(MT_EXTERNAL);
+    return file->media() == m_manager->get_media(MT_EXTERNAL);
 }

@@ -13,6 +13,7 @@
 #include "core/log.h"
 #include "core/open_file.h"
 #include "storage/CpDirectory.h"
+#include "storage/CpSetDirectory.h"
 #include "storage/paths.h"
 
 LogFile::LogFile(const android::String8& name, CpDirectory* dir, LogType type, uint32_t size)
@@ -31,6 +32,10 @@ LogFile::~LogFile() {
         m_destroy_hook(m_destroy_client);
     }
     close();
+}
+
+MediaStorage* LogFile::media() const {
+    return m_dir->set()->media();
 }
 
 int LogFile::open() {
@@ -259,6 +264,10 @@ int LogFile::remove(const android::String8& dir_path) {
         return -1;
     }
     return 0;
+}
+
+void LogFile::discard() {
+    m_dir->remove_file(this);
 }
 
 bool LogFile::exists() const {

@@ -19,6 +19,7 @@
 #include "storage/log_name.h"
 
 class CpDirectory;
+class MediaStorage;
 
 class LogFile : public RefTarget {
 public:
@@ -43,6 +44,8 @@ public:
     uint64_t counted() const { return m_counted; }
     bool is_open() const { return m_fd >= 0; }
     CpDirectory* dir() const { return m_dir; }
+    // The medium that the file lies on.
+    MediaStorage* media() const;
     int fd() const { return m_fd; }
 
     // Opens the file for writing from its start, creating it when missing. 0, or -1
@@ -84,6 +87,8 @@ public:
     int rename_to(const android::String8& dir_path, const android::String8& new_name);
     // Deletes the file from the medium; one that is gone already counts as deleted.
     int remove(const android::String8& dir_path);
+    // Deletes the file from the medium and from its directory: this object is gone afterwards.
+    void discard();
     // False when the file vanished: it cannot be read and written on the medium any more.
     bool exists() const;
 
