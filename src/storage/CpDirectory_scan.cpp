@@ -1,9 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The part of CpDirectory that finds out what is on the medium.
-#include <dirent.h>
 #include <errno.h>
-#include <fcntl.h>
-#include <string.h>
 #include <sys/stat.h>
 
 #include <algorithm>
@@ -11,34 +8,24 @@
 
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
+#include "storage/dir_entries.h"
 #include "storage/log_name.h"
 #include "storage/paths.h"
 
 int CpDirectory::stat() {
-    DIR* dir = opendir(m_path.string());
-    if (!dir) {
-        return -1;
-    }
     std::vector<LogFile*> found;
-    while (const struct dirent* entry = readdir(dir)) {
-        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..")) {
-            continue;
+    const int result = for_each_entry(m_path, [&](const char* name, const struct stat& st) {
+        if (!S_ISREG(st.st_mode)) {
+            return;
         }
-        // Links are not followed: one on a card must not lead trimming out of the tree.
-        struct stat st;
-        if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
-            !S_ISREG(st.st_mode)) {
-            continue;
-        }
-        LogFile* file = new LogFile(android::String8(entry->d_name), this, LT_UNKNOWN, 0);
+        LogFile* file = new LogFile(android::String8(name), this, LT_UNKNOWN, 0);
         file->parse_name();
         file->found(static_cast<uint64_t>(st.st_size));
         found.push_back(file);
-        m_size += static_cast<uint64_t>(st.st_size);
-    }
-    closedir(dir);
+        m_size += file->counted();
+    });
     insert_scanned(found.data(), found.size());
-    return 0;
+    return result;
 }
 
 void CpDirectory::recount() {

@@ -2,14 +2,14 @@
 
 #include "storage/CpSetDirectory.h"
 
-#include <dirent.h>
-#include <fcntl.h>
-#include <string.h>
 #include <sys/stat.h>
+
+#include <memory>
 
 #include "core/SavedErrno.h"
 #include "storage/CpDirectory.h"
 #include "storage/MediaStorage.h"
+#include "storage/dir_entries.h"
 #include "storage/paths.h"
 
 CpSetDirectory::CpSetDirectory(MediaStorage* media, const android::String8& path)
@@ -30,28 +30,16 @@ int CpSetDirectory::remove() {
 }
 
 int CpSetDirectory::stat() {
-    DIR* dir = opendir(m_path.string());
-    if (!dir) {
-        return -1;
-    }
-    while (const struct dirent* entry = readdir(dir)) {
-        struct stat st;
-        // Links are not followed, as in CpDirectory::stat.
-        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..") ||
-            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
-            !S_ISDIR(st.st_mode)) {
-            continue;
+    return for_each_entry(m_path, [this](const char* name, const struct stat& st) {
+        if (!S_ISDIR(st.st_mode)) {
+            return;
         }
-        CpDirectory* cp_dir = new CpDirectory(this, android::String8(entry->d_name));
-        if (cp_dir->stat() < 0) {
-            delete cp_dir;
-            continue;
+        auto dir = std::make_unique<CpDirectory>(this, android::String8(name));
+        if (dir->stat() == 0) {
+            m_size += dir->size();
+            m_dirs.push_back(dir.release());
         }
-        m_dirs.push_back(cp_dir);
-        m_size += cp_dir->size();
-    }
-    closedir(dir);
-    return 0;
+    });
 }
 
 CpDirectory* CpSetDirectory::get_cp_dir(const android::String8& cp_name) const {
@@ -78,15 +66,15 @@ CpDirectory* CpSetDirectory::prepare_cp_dir(const android::String8& cp_name, boo
         delete dir;
         break;
     }
-    CpDirectory* dir = new CpDirectory(this, cp_name);
+    auto dir = std::make_unique<CpDirectory>(this, cp_name);
     if (dir->create() < 0) {
         const SavedErrno keep;
-        delete dir;
+        dir.reset();
         return nullptr;
     }
     new_dir = true;
-    m_dirs.push_back(dir);
-    return dir;
+    m_dirs.push_back(dir.get());
+    return dir.release();
 }
 
 LogFile* CpSetDirectory::create_file(const android::String8& cp_name, const android::String8& name,

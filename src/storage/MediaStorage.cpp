@@ -2,7 +2,6 @@
 
 #include "storage/MediaStorage.h"
 
-#include <dirent.h>
 #include <errno.h>
 #include <fcntl.h>
 #include <string.h>
@@ -10,12 +9,15 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <memory>
+#include <utility>
 #include <vector>
 
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/StorageManager.h"
+#include "storage/dir_entries.h"
 #include "storage/log_name.h"
 #include "storage/paths.h"
 
@@ -58,49 +60,36 @@ int MediaStorage::stat() {
 
 // Lists the sets in the log root, beside those that are listed already.
 int MediaStorage::scan_sets() {
-    DIR* dir = opendir(m_log_root.string());
-    if (!dir) {
-        return -1;
-    }
-    std::vector<CpSetDirectory*> found;
-    while (const struct dirent* entry = readdir(dir)) {
-        struct stat st;
-        // Links are not followed, as in CpDirectory::stat.
-        if (!strcmp(entry->d_name, ".") || !strcmp(entry->d_name, "..") ||
-            fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) < 0 ||
-            !S_ISDIR(st.st_mode)) {
-            continue;
+    std::vector<std::unique_ptr<CpSetDirectory>> found;
+    const int result = for_each_entry(m_log_root, [&](const char* name, const struct stat& st) {
+        if (!S_ISDIR(st.st_mode)) {
+            return;
         }
-        CpSetDirectory* set = new CpSetDirectory(
-            this,
-            android::String8(JoinedPath(m_log_root, android::String8(entry->d_name)).string()));
-        if (set->stat() < 0) {
-            delete set;
-            continue;
+        auto set = std::make_unique<CpSetDirectory>(
+            this, android::String8(JoinedPath(m_log_root, android::String8(name)).string()));
+        if (set->stat() == 0) {
+            found.push_back(std::move(set));
         }
-        found.push_back(set);
-    }
-    closedir(dir);
+    });
     // Ascending order: each insertion finds its place at the end of the list at once.
-    std::sort(found.begin(), found.end(), [](const CpSetDirectory* a, const CpSetDirectory* b) {
+    std::sort(found.begin(), found.end(), [](const auto& a, const auto& b) {
         return strcmp(a->path().string(), b->path().string()) < 0;
     });
-    for (CpSetDirectory* set : found) {
-        insert_scanned(set);
+    for (std::unique_ptr<CpSetDirectory>& set : found) {
+        insert_scanned(std::move(set));
     }
-    return 0;
+    return result;
 }
 
 // Puts a scanned set in front of the first one whose path compares greater. A set
 // that is listed already (it was started before the medium was scanned) stays as it is.
-void MediaStorage::insert_scanned(CpSetDirectory* set) {
+void MediaStorage::insert_scanned(std::unique_ptr<CpSetDirectory> set) {
     android::List<CpSetDirectory*>::iterator it = m_sets.end();
     while (it != m_sets.begin()) {
         android::List<CpSetDirectory*>::iterator before = it;
         --before;
         const int order = strcmp((*before)->path().string(), set->path().string());
         if (order == 0) {
-            delete set;
             return;
         }
         if (order < 0) {
@@ -108,8 +97,8 @@ void MediaStorage::insert_scanned(CpSetDirectory* set) {
         }
         it = before;
     }
-    m_sets.insert(it, set);
     m_size += set->size();
+    m_sets.insert(it, set.release());
 }
 
 CpSetDirectory* MediaStorage::find_set(const android::String8& path) const {

@@ -16,6 +16,8 @@
 #include <utils/List.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "storage/LogType.h"
 
 class CpDirectory;
@@ -100,7 +102,7 @@ private:
     int remake_log_root();
     int scan_sets();
     void forget_sets();
-    void insert_scanned(CpSetDirectory* set);
+    void insert_scanned(std::unique_ptr<CpSetDirectory> set);
     CpSetDirectory* find_set(const android::String8& path) const;
     void drop_working_set();
     bool above_quota() const;
