@@ -48,7 +48,7 @@ int LogFile::open() {
     if (m_fd < 0) {
         return -1;
     }
-    m_buffer = new uint8_t[BUFFER_SIZE];
+    m_buffer.reset(new uint8_t[BUFFER_SIZE]);
     m_capacity = BUFFER_SIZE;
     m_staged = 0;
     return 0;
@@ -61,8 +61,7 @@ int LogFile::close() {
     flush();
     ::close(m_fd);
     m_fd = -1;
-    delete[] m_buffer;
-    m_buffer = nullptr;
+    m_buffer.reset();
     m_capacity = 0;
     return 0;
 }
@@ -71,7 +70,7 @@ int LogFile::write_out() {
     if (m_fd < 0 || m_staged == 0) {
         return 0;
     }
-    const size_t dropped = m_staged - write_some(m_buffer, m_staged);
+    const size_t dropped = m_staged - write_some(m_buffer.get(), m_staged);
     m_staged = 0;
     if (dropped == 0) {
         return 0;
@@ -108,7 +107,7 @@ ssize_t LogFile::write(const void* data, size_t len) {
         return -1;
     }
     if (m_staged + len < m_capacity) {
-        memcpy(m_buffer + m_staged, data, len);
+        memcpy(m_buffer.get() + m_staged, data, len);
         m_staged += len;
         grow(len);
         return static_cast<ssize_t>(len);
@@ -134,7 +133,7 @@ ssize_t LogFile::write(const void* data, size_t len) {
 // out, 0 when not even all of the staged ones did, negative on failure.
 ssize_t LogFile::write_staged_with(const void* data, size_t len) {
     struct iovec pieces[2];
-    pieces[0].iov_base = m_buffer;
+    pieces[0].iov_base = m_buffer.get();
     pieces[0].iov_len = m_staged;
     pieces[1].iov_base = const_cast<void*>(data);
     pieces[1].iov_len = len;
@@ -145,7 +144,7 @@ ssize_t LogFile::write_staged_with(const void* data, size_t len) {
     const size_t written = static_cast<size_t>(n);
     if (written < m_staged) {
         m_staged -= written;
-        memmove(m_buffer, m_buffer + written, m_staged);
+        memmove(m_buffer.get(), m_buffer.get() + written, m_staged);
         return 0;
     }
     const size_t taken = written - m_staged;
@@ -198,12 +197,12 @@ int LogFile::copy(const char* source) {
     int result = -1;
     size_t copied = 0;
     for (;;) {
-        const ssize_t n = read(src, m_buffer, m_capacity);
+        const ssize_t n = read(src, m_buffer.get(), m_capacity);
         if (n <= 0) {
             result = n < 0 ? -1 : 0;
             break;
         }
-        const ssize_t written = ::write(m_fd, m_buffer, static_cast<size_t>(n));
+        const ssize_t written = ::write(m_fd, m_buffer.get(), static_cast<size_t>(n));
         if (written > 0) {
             copied += static_cast<size_t>(written);
         }

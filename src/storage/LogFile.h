@@ -14,6 +14,8 @@
 #include <time.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "core/ObjectRef.h"
 #include "storage/LogType.h"
 #include "storage/log_name.h"
@@ -115,7 +117,7 @@ private:
     uint32_t m_size;
     uint64_t m_counted;
     int m_fd = -1;
-    uint8_t* m_buffer = nullptr;
+    std::unique_ptr<uint8_t[]> m_buffer;  // while open
     size_t m_capacity = 0;
     size_t m_staged = 0;
     void (*m_destroy_hook)(void*) = nullptr;
