@@ -6,6 +6,9 @@
 #include <string.h>
 #include <sys/stat.h>
 
+#include <memory>
+#include <utility>
+
 #include "core/SavedErrno.h"
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
@@ -64,22 +67,30 @@ LogFile* CpDirectory::create_log_file() {
     }
     const android::String8 name = free_name(android::String8::format(
         "0-%s-%s.log", m_name.string(), LogTime::from_tm(t).file_stamp().string()));
-    LogFile* file = new LogFile(name, this, t);
-    if (file->open() < 0) {
-        const SavedErrno keep;
-        delete file;
+    LogFile* file = open_and_list(std::make_unique<LogFile>(name, this, t));
+    if (!file) {
         return nullptr;
     }
     bool first = true;
     for (const LogFile* listed : m_files) {
-        first = first && listed->type() != LT_LOG;
+        first = first && (listed == file || listed->type() != LT_LOG);
     }
     if (first) {
         m_first_log = file;
     }
-    m_files.push_back(file);
     m_cur_log = file;
     return file;
+}
+
+// Opens the file and puts it at the end of the list. Null with errno when it cannot be opened.
+LogFile* CpDirectory::open_and_list(std::unique_ptr<LogFile> file) {
+    if (file->open() < 0) {
+        const SavedErrno keep;
+        file.reset();
+        return nullptr;
+    }
+    m_files.push_back(file.get());
+    return file.release();
 }
 
 LogFile* CpDirectory::find(const android::String8& name) const {
@@ -140,14 +151,7 @@ android::String8 CpDirectory::free_name(const android::String8& name) {
 }
 
 LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
-    LogFile* file = new LogFile(free_name(name), this, type, 0);
-    if (file->open() < 0) {
-        const SavedErrno keep;
-        delete file;
-        return nullptr;
-    }
-    m_files.push_back(file);
-    return file;
+    return open_and_list(std::make_unique<LogFile>(free_name(name), this, type, 0));
 }
 
 int CpDirectory::remove_file(LogFile* file) {
@@ -193,42 +197,29 @@ void CpDirectory::dec_size(uint64_t num) {
 }
 
 uint64_t CpDirectory::trim(uint64_t wanted) {
-    uint64_t removed = 0;
-    while (!m_files.empty()) {
-        FileIter it = m_files.begin();
-        LogFile* file = *it;
-        if (file->remove(m_path) < 0) {
-            err_log("delete %s error", file->name().string());
-            break;
-        }
-        const uint64_t size = file->counted();
-        drop(it);
-        removed += size;
-        if (size >= wanted) {
-            break;
-        }
-        wanted -= size;
+    const LogFile* stuck = nullptr;
+    const uint64_t removed = delete_oldest(wanted, false, stuck);
+    if (stuck) {
+        err_log("delete %s error", stuck->name().string());
     }
     m_size -= removed;
     return removed;
 }
 
-bool CpDirectory::is_protected(const LogFile* file) const {
-    return file == m_first_log.get() || file == m_cur_log.get() || file->type() == LT_VERSION ||
-           file->type() == LT_WCDMA_IQ;
-}
-
-uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
+// Deletes files from the front, without those that are protected if spare says so, until the
+// bytes wanted are gone: at least one, if there is one. Ends at the first that can not be
+// deleted, stuck, with its errno. Returns the bytes removed; the sizes stay.
+uint64_t CpDirectory::delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck) {
     uint64_t removed = 0;
     FileIter it = m_files.begin();
     while (it != m_files.end()) {
         LogFile* file = *it;
-        if (is_protected(file)) {
+        if (spare && is_protected(file)) {
             ++it;
             continue;
         }
         if (file->remove(m_path) < 0) {
-            err_log("delete %s error", file->name().string());
+            stuck = file;
             break;
         }
         const uint64_t size = file->counted();
@@ -238,6 +229,20 @@ uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
             break;
         }
         wanted -= size;
+    }
+    return removed;
+}
+
+bool CpDirectory::is_protected(const LogFile* file) const {
+    return file == m_first_log.get() || file == m_cur_log.get() || file->type() == LT_VERSION ||
+           file->type() == LT_WCDMA_IQ;
+}
+
+uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
+    const LogFile* stuck = nullptr;
+    const uint64_t removed = delete_oldest(wanted, true, stuck);
+    if (stuck) {
+        err_log("delete %s error", stuck->name().string());
     }
     m_size -= removed;
     renumber_first_log();

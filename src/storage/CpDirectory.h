@@ -14,6 +14,8 @@
 #include <utils/List.h>
 #include <utils/String8.h>
 
+#include <memory>
+
 #include "core/ObjectRef.h"
 #include "storage/LogType.h"
 
@@ -80,12 +82,14 @@ public:
 private:
     typedef android::List<LogFile*>::iterator FileIter;
 
+    LogFile* open_and_list(std::unique_ptr<LogFile> file);
     LogFile* find(const android::String8& name) const;
     android::String8 free_name(const android::String8& name);
     android::String8 aside_name(const android::String8& name);
     bool taken_by_stranger(const android::String8& name) const;
     FileIter find(LogFile* file);
     FileIter drop(FileIter it);
+    uint64_t delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck);
     bool is_protected(const LogFile* file) const;
     void renumber_first_log();
     void insert_scanned(LogFile** files, size_t num);
