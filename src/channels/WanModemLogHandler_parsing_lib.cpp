@@ -12,6 +12,7 @@
 #include "channels/ModemImage.h"
 #include "channels/WanModemLogHandler.h"
 #include "config/property_names.h"
+#include "core/copy_bytes.h"
 #include "core/log.h"
 #include "core/open_file.h"
 #include "storage/CpStorage.h"
@@ -51,26 +52,6 @@ int remove_file(const char* path) {
 int create_anew(const char* path) {
     return remove_file(path) < 0 ? -1
                                  : open_to_write(path, O_WRONLY | O_CREAT | O_EXCL, Links::REFUSE);
-}
-
-int copy_bytes(int src, int dst, size_t n) {
-    static uint8_t buffer[COPY_SIZE];
-    size_t copied = 0;
-    while (copied < n) {
-        const size_t rest = n - copied;
-        const ssize_t num = read(src, buffer, rest < COPY_SIZE ? rest : COPY_SIZE);
-        if (num < 0) {
-            return -1;
-        }
-        if (num == 0) {
-            return 0;
-        }
-        if (write(dst, buffer, static_cast<size_t>(num)) != num) {
-            return -1;
-        }
-        copied += static_cast<size_t>(num);
-    }
-    return 0;
 }
 
 }  // namespace
@@ -182,8 +163,9 @@ int WanModemLogHandler::save_log_lib(const android::String8& db_path,
         return -1;
     }
     // An image that ends early is copied without an error, but is not the whole database.
-    const bool copied =
-        copy_bytes(fd, db, size) == 0 && lseek(db, 0, SEEK_CUR) == static_cast<off_t>(size);
+    static uint8_t buffer[COPY_SIZE];
+    uint64_t done;
+    const bool copied = copy_bytes(fd, db, buffer, sizeof(buffer), size, done) == 0 && done == size;
     // What the medium could not take may come out only now.
     const int closed = ::close(db);
     if (!copied || closed < 0) {

@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include "core/SavedErrno.h"
+#include "core/copy_bytes.h"
 #include "core/log.h"
 #include "core/open_file.h"
 #include "storage/CpDirectory.h"
@@ -194,24 +195,10 @@ int LogFile::copy(const char* source) {
         err_log("open %s error", source);
         return -1;
     }
-    int result = -1;
-    size_t copied = 0;
-    for (;;) {
-        const ssize_t n = read(src, m_buffer.get(), m_capacity);
-        if (n <= 0) {
-            result = n < 0 ? -1 : 0;
-            break;
-        }
-        const ssize_t written = ::write(m_fd, m_buffer.get(), static_cast<size_t>(n));
-        if (written > 0) {
-            copied += static_cast<size_t>(written);
-        }
-        if (written != n) {
-            break;
-        }
-    }
+    uint64_t copied;
+    const int result = copy_bytes(src, m_fd, m_buffer.get(), m_capacity, UINT64_MAX, copied);
     const SavedErrno keep;
-    grow(copied);
+    grow(static_cast<size_t>(copied));
     ::close(src);
     return result;
 }

@@ -2,33 +2,19 @@
 
 #include "storage/copy_file.h"
 
-#include <errno.h>
 #include <fcntl.h>
 #include <stddef.h>
+#include <stdint.h>
 #include <unistd.h>
 
 #include "core/SavedErrno.h"
+#include "core/copy_bytes.h"
 #include "core/log.h"
 #include "core/open_file.h"
 
 namespace {
 
 const size_t COPY_BUF_SIZE = 32768;
-
-int copy_content(int src_fd, int dst_fd) {
-    static char buf[COPY_BUF_SIZE];
-    for (;;) {
-        const ssize_t n = read(src_fd, buf, sizeof(buf));
-        if (n <= 0) {
-            return static_cast<int>(n);
-        }
-        const ssize_t written = write(dst_fd, buf, static_cast<size_t>(n));
-        if (written != n) {
-            errno = written < 0 ? errno : ENOSPC;
-            return -1;
-        }
-    }
-}
 
 }  // namespace
 
@@ -44,7 +30,9 @@ int copy_file(const char* src, const char* dst) {
         close(src_fd);
         return -1;
     }
-    const int result = copy_content(src_fd, dst_fd);
+    static uint8_t buffer[COPY_BUF_SIZE];
+    uint64_t copied;
+    const int result = copy_bytes(src_fd, dst_fd, buffer, sizeof(buffer), UINT64_MAX, copied);
     const SavedErrno keep;
     close(dst_fd);
     close(src_fd);

@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+// The one loop that copies from a descriptor to another.
+#ifndef CORE_COPY_BYTES_H_
+#define CORE_COPY_BYTES_H_
+
+#include <stddef.h>
+#include <stdint.h>
+
+// Copies up to limit bytes, or until src ends, through the caller's buffer. copied counts what
+// reached dst, also before a failure. 0, or -1 with errno: ENOSPC when dst took less than it
+// was given.
+int copy_bytes(int src, int dst, uint8_t* buffer, size_t buffer_size, uint64_t limit,
+               uint64_t& copied);
+
+#endif  // CORE_COPY_BYTES_H_
