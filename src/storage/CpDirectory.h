@@ -15,6 +15,8 @@
 #include <utils/String8.h>
 
 #include <memory>
+#include <set>
+#include <string_view>
 
 #include "core/ObjectRef.h"
 #include "storage/LogType.h"
@@ -86,7 +88,8 @@ private:
     LogFile* find(const android::String8& name) const;
     android::String8 free_name(const android::String8& name);
     android::String8 aside_name(const android::String8& name);
-    bool taken_by_stranger(const android::String8& name) const;
+    bool taken_by_stranger(const android::String8& name,
+                           const std::set<std::string_view>& listed) const;
     FileIter find(LogFile* file);
     FileIter drop(FileIter it);
     uint64_t delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck);

@@ -6,6 +6,8 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <set>
+#include <string_view>
 #include <vector>
 
 #include "core/log.h"
@@ -25,10 +27,11 @@ struct Numbered {
 
 }  // namespace
 
-// True when something that no list knows has the name: a file in a set taken over, say.
-bool CpDirectory::taken_by_stranger(const android::String8& name) const {
+// True when something that is not listed has the name: a file in a set taken over, say.
+bool CpDirectory::taken_by_stranger(const android::String8& name,
+                                    const std::set<std::string_view>& listed) const {
     struct stat st;
-    return !find(name) && lstat(JoinedPath(m_path, name).string(), &st) == 0;
+    return listed.count(name.string()) == 0 && lstat(JoinedPath(m_path, name).string(), &st) == 0;
 }
 
 // A file takes its number plus 1, and at least the new number of the next younger one plus
@@ -50,6 +53,10 @@ void CpDirectory::rotate_logs() {
     if (!renumber) {
         return;  // the number 0 is free: the file that was to take it could not be made
     }
+    std::set<std::string_view> listed;
+    for (const LogFile* file : m_files) {
+        listed.insert(file->name().string());
+    }
     std::reverse(logs.begin(), logs.end());
     std::stable_sort(logs.begin(), logs.end(),
                      [](const Numbered& a, const Numbered& b) { return a.number < b.number; });
@@ -58,7 +65,8 @@ void CpDirectory::rotate_logs() {
         log.target = std::max(uint64_t{log.number} + 1, least);
         while (log.target <= UINT32_MAX &&
                taken_by_stranger(
-                   with_number(log.file->name(), static_cast<uint32_t>(log.target), log.digits))) {
+                   with_number(log.file->name(), static_cast<uint32_t>(log.target), log.digits),
+                   listed)) {
             ++log.target;
         }
         least = log.target + 1;
