@@ -37,27 +37,41 @@ int CpStorage::write(const void* data, size_t len) {
     }
     MediaStorage* media = m_manager->get_media_stor();
     const int n = static_cast<int>(m_cur_file->write(data, len));
-    if (n <= 0) {
-        if (n == LogFile::FULL && media->free_space() != 0) {
-            if (media->make_room_with_new_set()) {
-                media->free_space();
-            }
-            m_quota_pending = true;
-            flush();
-        } else if (n < 0 && n != LogFile::FULL) {
-            m_manager->write_failed(media, errno);
-        }
-        return n;
+    if (n > 0) {
+        close_full_file(media);
+        keep_quota(media);
+    } else if (n == LogFile::FULL) {
+        make_room(media);
+    } else if (n < 0) {
+        m_manager->write_failed(media, errno);
     }
+    return n;
+}
+
+void CpStorage::close_full_file(const MediaStorage* media) {
     if (m_cur_file->size() >= media->file_size()) {
         m_cur_file->dir()->close_log_file();
         stop();
     }
+}
+
+void CpStorage::keep_quota(MediaStorage* media) {
     if (media->check_quota() != 0) {
         m_quota_pending = true;
         flush();
     }
-    return n;
+}
+
+// After a write that the full medium did not take.
+void CpStorage::make_room(MediaStorage* media) {
+    if (media->free_space() == 0) {
+        return;
+    }
+    if (media->make_room_with_new_set()) {
+        media->free_space();
+    }
+    m_quota_pending = true;
+    flush();
 }
 
 // Sees to it that there is a current file that may take len bytes more. The hooks for a new
@@ -72,7 +86,10 @@ bool CpStorage::prepare_write(size_t len) {
         if (!prepare_file()) {
             return false;
         }
-        if (m_cur_file && !pass_quota(m_manager->get_media_stor())) {
+        if (!m_cur_file) {
+            continue;  // a hook switched the medium
+        }
+        if (!pass_quota(m_manager->get_media_stor())) {
             return false;
         }
         if (m_cur_file) {

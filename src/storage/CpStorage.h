@@ -64,6 +64,9 @@ public:
 
 private:
     bool prepare_write(size_t len);
+    void close_full_file(const MediaStorage* media);
+    void keep_quota(MediaStorage* media);
+    void make_room(MediaStorage* media);
     bool prepare_file();
     bool open_log_file(MediaStorage* media);
     bool pass_quota(MediaStorage* media);
