@@ -17,7 +17,8 @@ class ClientHandler;
 
 class ClientManager : public FdHandler {
 public:
-    // max_clients: the most connections served at once; 0: no limit. Listens not yet.
+    // max_clients: the most connections served at once; 0: no limit. Does not listen until
+    // init().
     ClientManager(LogController* ctrl, Multiplexer* mux, size_t max_clients);
     // Disconnects every client.
     ~ClientManager() override;

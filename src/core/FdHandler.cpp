@@ -14,8 +14,8 @@ FdHandler::FdHandler(int fd, LogController* ctrl, Multiplexer* mux)
       m_rest_timer(mux ? &mux->timer_mgr() : nullptr, on_rest_over, this) {}
 
 FdHandler::~FdHandler() {
-    // Wholly, even without a descriptor: an entry left behind would be read when the
-    // poll set is built next.
+    // Remove the whole registration even when no descriptor is open: build_poll_set() would
+    // otherwise read this destroyed object.
     if (m_multiplexer) {
         m_multiplexer->forget(this);
     }

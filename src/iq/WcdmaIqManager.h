@@ -50,8 +50,8 @@ public:
     size_t num_files();
 
     // Starts the capture into the channel's storage, which outlives it. 0, or -1 when it
-    // runs already or the device or the thread is not to be had. A loop without room takes
-    // the device later.
+    // runs already or the device cannot be opened or the thread not created. A loop without room
+    // takes the device later.
     int start(CpStorage* storage);
     // Ends it; a save in progress ends with what is written. 0.
     int stop();

@@ -21,7 +21,7 @@ public:
     // How long a supervisor that cannot be reached is left alone.
     static constexpr unsigned int RECONNECT_MS = 3000;
 
-    // serv_name: the supervisor's local socket, copied. Connects not yet.
+    // serv_name: the supervisor's local socket, copied. Does not connect until init().
     CpStateHandler(LogController* ctrl, Multiplexer* mux, const char* serv_name);
     ~CpStateHandler() override;
 

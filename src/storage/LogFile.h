@@ -69,7 +69,7 @@ public:
     void flush() { write_out(); }
     // The same; 0, or -1 when bytes were dropped.
     int write_out();
-    // Accounts for a file that was filled with write_raw. Once per file.
+    // Adds the bytes written with write_raw to the totals. Call once per file.
     void set_size(uint32_t size);
     // Forgets what is staged, for a file that is being deleted. The sizes stay.
     void forget_staged() { m_staged = 0; }

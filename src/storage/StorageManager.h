@@ -57,7 +57,7 @@ public:
     MediaStorage* get_media_stor() { return get_media(m_media_type); }
     MediaType media_type() const { return m_media_type; }
 
-    // Looks where to write now; true when the medium in use changed.
+    // Chooses the medium to write to; true when that changed.
     bool check_media_change();
     bool is_sd_mounted() const;
 
