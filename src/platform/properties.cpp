@@ -87,6 +87,7 @@ private:
     std::string m_root;
     std::string m_path;
     Stamp m_stamp;
+    bool m_known = false;                 // the table is that of a file of this root
     bool m_settled = false;               // m_stamp was old enough when the content was read
     std::optional<int64_t> m_first_seen;  // monotonic time of the first load with m_stamp
     PropertyTable m_table;
@@ -96,18 +97,22 @@ bool PropertyFile::find(const char* root, const char* key, std::string_view& val
     if (m_path.empty() || m_root != root) {
         m_root = root;
         m_path = m_root + FILE_NAME;
+        m_known = false;
         m_settled = false;
     }
     return refresh() && m_table.find(key, value);
 }
 
-// Makes the table that of the file as it is now; false when there is no usable file.
+// Makes the table that of the file as it is now; false when there is no usable file. One that
+// is there and cannot be read, for want of a descriptor, say, leaves the table as it was.
 bool PropertyFile::refresh() {
     struct stat st;
     if (stat(m_path.c_str(), &st) < 0 || !acceptable(st)) {
+        m_known = false;
         return false;
     }
-    return (m_settled && Stamp(st) == m_stamp) || load();
+    m_known = (m_settled && Stamp(st) == m_stamp) || load() || m_known;
+    return m_known;
 }
 
 bool PropertyFile::load() {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 
 #include <cutils/properties.h>
+#include <errno.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <stdlib.h>
@@ -127,6 +128,15 @@ TEST_F(Properties, EveryChangeIsSeenByTheNextRead) {
         m_root.write_file("default.prop", "k=made\n");
         ASSERT_EQ(get("k"), "made");
     }
+}
+
+TEST_F(Properties, AFileThatCannotBeReadForAMomentKeepsItsValues) {
+    m_root.write_file("default.prop", "k=old\n");
+    ASSERT_EQ(get("k"), "old");
+    m_root.write_file("default.prop", "k=newer\n");
+    faults::fail(faults::OPEN, 1, EMFILE);
+    EXPECT_EQ(get("k"), "old");
+    EXPECT_EQ(get("k"), "newer");
 }
 
 TEST_F(Properties, SteadyStateCostsOneStat) {
