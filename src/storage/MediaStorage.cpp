@@ -219,5 +219,6 @@ void MediaStorage::clear() {
 
 void MediaStorage::clear_all() {
     forget_sets();
+    m_rescan = true;  // what could not be deleted, of a card that is out, say, still counts
     remove_numbered_entries(m_log_root);
 }

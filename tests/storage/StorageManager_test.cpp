@@ -108,6 +108,18 @@ TEST_F(StorageManagerTest, CardStateAndClearAll) {
     EXPECT_EQ(m_events, "EE");
 }
 
+TEST_F(StorageManagerTest, WhatClearAllCouldNotDeleteStillCounts) {
+    plug_card();
+    m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp/f", "1");
+    ASSERT_TRUE(m_mgr.check_media_change());
+    ASSERT_EQ(rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()), 0);
+    m_mgr.clear_all();
+    ASSERT_EQ(rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()), 0);
+    ASSERT_TRUE(m_mgr.check_media_change());
+    ASSERT_NE(m_mgr.get_media(MT_EXTERNAL)->prepare_cur_set(), nullptr);
+    EXPECT_EQ(m_mgr.get_media(MT_EXTERNAL)->size(), 1u);
+}
+
 typedef std::function<void()> Listener;
 
 void call(void* listener) {
