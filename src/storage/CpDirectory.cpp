@@ -24,8 +24,8 @@ CpDirectory::CpDirectory(CpSetDirectory* set, const android::String8& name)
 }
 
 CpDirectory::~CpDirectory() {
-    // What a file fails to write out as it closes has left the totals above with all of this
-    // directory already.
+    // The totals above no longer count this directory: a file that cannot write out what is
+    // staged as it closes must not subtract it there a second time.
     m_set = nullptr;
     for (LogFile* file : m_files) {
         delete file;
@@ -102,7 +102,7 @@ LogFile* CpDirectory::find(const android::String8& name) const {
     return nullptr;
 }
 
-// A name that nothing in the directory has, "-N" before the extension of the given one.
+// A name that is free in the directory: the given one with "-N" before its extension.
 android::String8 CpDirectory::aside_name(const android::String8& name) {
     const char* dot = strrchr(name.string(), '.');
     const size_t stem_len = dot ? static_cast<size_t>(dot - name.string()) : name.length();
@@ -115,9 +115,9 @@ android::String8 CpDirectory::aside_name(const android::String8& name) {
     return aside;
 }
 
-// Sees to it that a new file overwrites nothing: whatever has the name on the medium is set
-// aside under another one. Returns the name for the new file, which is another one only when
-// the older one cannot be moved.
+// Makes sure that a new file overwrites nothing: renames whatever has the name on the medium.
+// Returns the name for the new file, a different one only when the older file cannot be looked
+// at or renamed.
 android::String8 CpDirectory::free_name(const android::String8& name) {
     LogFile* older = find(name);
     const JoinedPath path(m_path, name);

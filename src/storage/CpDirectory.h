@@ -51,26 +51,26 @@ public:
     LogFile* create_log_file();
     // Makes, opens and appends another file. Null on failure. Owned by this directory.
     //
-    // Neither overwrites anything. Names have one-second resolution: an older file of the
-    // same name, listed or not, is set aside as "NAME-N.EXT".
+    // Neither of the two overwrites anything. Names have one-second resolution: an older file of
+    // the same name, listed or not, is set aside as "NAME-N.EXT".
     LogFile* create_file(const android::String8& name, LogType type);
-    // Drops a file from the list and deletes it, on the medium too, where it may be gone
-    // already. The object is gone when this returns 0; -1 when it is not in the list.
+    // Deletes a listed file: its object, and the file on the medium, where it may be gone
+    // already. 0, and the object is gone; -1 when it is not in the list.
     int remove_file(LogFile* file);
     // The file vanished from the medium: drops the object. Only this directory's size
-    // changes; the set's and the medium's are known to be uncertain from now on.
+    // changes; the totals of the set and the medium become uncertain.
     void file_removed(LogFile* file);
     // Closes the current log file; the next one starts fresh.
     void close_log_file();
-    // Makes the number 0 free for a new log file: adds 1 to the number of every log file,
-    // more where two have one number, because renaming failed once. Does nothing while no
-    // log file has the number 0. Never replaces a file; one that is gone is dropped.
+    // Frees the number 0 for a new log file: adds 1 to the number of every log file, or more
+    // where two share a number because a renaming failed. Does nothing while no log file has
+    // the number 0. Never replaces a file; drops those that are gone.
     void rotate_logs();
 
     // Bytes that came or went; the set and the medium count them too.
     void add_size(uint64_t num);
     void dec_size(uint64_t num);
-    // Counts again what the listed files have on the medium and drops those that are gone.
+    // Counts the listed files on the medium again and drops those that are gone.
     // Only this directory's size changes.
     void recount();
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// The part of CpDirectory that numbers the log files: 0 is the newest, and each older one
-// has a larger number than the next younger.
+// The part of CpDirectory that numbers the log files: the newest is 0, and each older one has
+// a larger number than the next younger one.
 #include <errno.h>
 #include <stdint.h>
 #include <sys/stat.h>
@@ -22,7 +22,7 @@ struct Numbered {
     LogFile* file;
     uint32_t number;
     size_t digits;
-    uint64_t target;  // above UINT32_MAX: there is no such number
+    uint64_t target;  // above UINT32_MAX: no number is left
 };
 
 }  // namespace
@@ -34,8 +34,8 @@ bool CpDirectory::taken_by_stranger(const android::String8& name,
     return listed.count(name.string()) == 0 && lstat(JoinedPath(m_path, name).string(), &st) == 0;
 }
 
-// A file takes its number plus 1, and at least the new number of the next younger one plus
-// 1. So two files that have one number, because a renaming failed between them, get two.
+// Each file gets its number plus 1, but at least 1 more than the next younger file gets. So two
+// files that share a number, because a renaming failed between them, get different ones.
 void CpDirectory::rotate_logs() {
     std::vector<Numbered> logs;  // youngest first; of equal numbers the later in the list
     bool renumber = false;
@@ -45,13 +45,13 @@ void CpDirectory::rotate_logs() {
         }
         Numbered log = {file, 0, 0, 0};
         if (parse_log_number(file->name(), log.number, log.digits) < 0) {
-            log.number = UINT32_MAX;  // too large for a number: rotate says so
+            log.number = UINT32_MAX;  // too large to be read: rotate() says so
         }
         renumber = renumber || log.number == 0;
         logs.push_back(log);
     }
     if (!renumber) {
-        return;  // the number 0 is free: the file that was to take it could not be made
+        return;  // 0 is free: the last new file could not be made
     }
     std::set<std::string_view> listed;
     for (const LogFile* file : m_files) {
@@ -71,7 +71,7 @@ void CpDirectory::rotate_logs() {
         }
         least = log.target + 1;
     }
-    // The oldest first: it makes room for the next one.
+    // The oldest first: each one makes room for the next.
     for (size_t i = logs.size(); i-- > 0;) {
         const Numbered& log = logs[i];
         errno = 0;  // not every failure sets it
@@ -84,7 +84,7 @@ void CpDirectory::rotate_logs() {
     }
 }
 
-// Keeps the numbers contiguous: the first log file follows on the oldest one left.
+// Keeps the numbers contiguous: the first log file gets the number after the oldest other one's.
 void CpDirectory::renumber_first_log() {
     if (!m_first_log) {
         return;

@@ -39,7 +39,7 @@ void CpDirectory::recount() {
             it = drop(it);
             continue;
         }
-        if (known && !file->is_open()) {  // of an open file a part may still be staged
+        if (known && !file->is_open()) {  // part of an open file may still be staged
             file->found(static_cast<uint64_t>(st.st_size));
         }
         m_size += file->counted();

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// One timestamped set directory under a medium's log root: one CP directory per CP
+// One timestamped set directory under a medium's log root, with one CP directory per CP
 // that wrote into it. A new set is started whenever writing on a medium begins.
 // Owns its CpDirectory objects; owned by its MediaStorage. Files lying directly in
 // the set directory are neither represented nor counted. Main thread only.
@@ -52,7 +52,8 @@ public:
     // Bytes that came or went; the medium counts them too.
     void add_size(uint64_t num);
     void dec_size(uint64_t num);
-    // Counts again what is listed and drops what is gone. Only this set's size changes.
+    // Counts the listed directories again and drops those that are gone. Only this set's size
+    // changes.
     void recount();
 
     // Frees at least the bytes wanted, if possible, CP directory by CP directory,

@@ -24,7 +24,7 @@ int FileNotifier::open() {
     if (m_fd < 0) {
         return -1;
     }
-    note_alive();  // what an earlier descriptor came to does not count
+    note_alive();  // an earlier descriptor's record does not count
     poll_when_room(POLLIN, m_path.string());
     return 0;
 }

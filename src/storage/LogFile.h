@@ -41,8 +41,8 @@ public:
     LogType type() const { return m_type; }
     const LogTime& time() const { return m_time; }
     uint32_t size() const { return m_size; }
-    // What the totals of the directory, the set and the medium hold for this file. The size
-    // is kept in 32 bits; a file found on a medium may be larger.
+    // What this file adds to the totals of the directory, the set and the medium. size() is
+    // kept in 32 bits; a file found on a medium may be larger.
     uint64_t counted() const { return m_counted; }
     bool is_open() const { return m_fd >= 0; }
     CpDirectory* dir() const { return m_dir; }
@@ -64,8 +64,8 @@ public:
     // As write_data, with FULL for a full medium. Touches nothing but the descriptor, so
     // that the I/Q thread may call it while it alone uses the file.
     ssize_t write_raw(const void* data, size_t len);
-    // Hands what is staged to the system; what it does not take is dropped, and leaves the
-    // sizes.
+    // Writes out what is staged. What the system does not take is dropped and subtracted from
+    // the sizes.
     void flush() { write_out(); }
     // The same; 0, or -1 when bytes were dropped.
     int write_out();
@@ -73,7 +73,7 @@ public:
     void set_size(uint32_t size);
     // Forgets what is staged, for a file that is being deleted. The sizes stay.
     void forget_staged() { m_staged = 0; }
-    // Corrects size and counted(), here only, to what a scan found on the medium.
+    // Sets size() and counted() to what a scan found on the medium. The totals stay.
     void found(uint64_t bytes);
 
     // Fills this freshly opened file with the source file's content. 0 or -1; what was

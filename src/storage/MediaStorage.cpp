@@ -58,7 +58,7 @@ int MediaStorage::stat() {
     return 0;
 }
 
-// Lists the sets in the log root, beside those that are listed already.
+// Adds the sets found in the log root to those that are listed already.
 int MediaStorage::scan_sets() {
     std::vector<std::unique_ptr<CpSetDirectory>> found;
     const int result = for_each_entry(m_log_root, [&](const char* name, const struct stat& st) {
@@ -126,8 +126,8 @@ CpSetDirectory* MediaStorage::create_cp_set() {
     CpSetDirectory* set = find_set(path);
     if (!set) {
         set = new CpSetDirectory(this, path);
-        // Normally the directory is new and empty. One that was there already, unlisted, is
-        // taken over with what it holds, so that nothing in it is uncounted.
+        // Normally the directory is new and empty. One that existed, unlisted, is taken over
+        // with what it holds, so that everything in it is counted.
         set->stat();
         m_size += set->size();
         m_sets.push_back(set);
@@ -136,11 +136,11 @@ CpSetDirectory* MediaStorage::create_cp_set() {
     return set;
 }
 
-// Somebody deleted the whole log root, or the card is another one: begins afresh.
+// Somebody deleted the whole log root, or the card is another one: starts over.
 int MediaStorage::remake_log_root() {
     m_manager->media_vanished(this);
     forget_sets();
-    m_rescan = true;  // should it have been there all the time
+    m_rescan = true;  // it may have been there all the time
     return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root);
 }
 

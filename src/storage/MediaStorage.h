@@ -4,11 +4,11 @@
 // and frees space oldest data first, by a quota and when the medium is full. The
 // protected files of the working set are never deleted.
 //
-// Owned by the StorageManager, one object a medium. Main thread only.
+// Owned by the StorageManager, one object per medium. Main thread only.
 //
-// Set names resolve to a second. A set that is started within the second of another
-// one on the same medium is that set: create_cp_set() makes the existing object the
-// working set again, so that one directory never has two objects.
+// Set names have one-second resolution. A set that is started within the same second as
+// another one on the same medium is that set: create_cp_set() makes the existing object
+// the working set again, so that one directory never has two objects.
 #ifndef STORAGE_MEDIASTORAGE_H_
 #define STORAGE_MEDIASTORAGE_H_
 
@@ -72,8 +72,8 @@ public:
 
     void add_size(uint64_t num) { m_size += num; }
     void dec_size(uint64_t num) { m_size -= num; }
-    // Something vanished from the medium: the totals may hold what is no longer there.
-    // check_quota counts again before it deletes anything for them.
+    // Something vanished from the medium: the totals may count what is no longer there.
+    // check_quota counts again before it deletes anything because of them.
     void totals_uncertain() { m_uncertain = true; }
     // Bytes of log data arrived for this medium, whether they can be written or not.
     void data_arrived(size_t len) { m_arrived += len; }
@@ -83,10 +83,10 @@ public:
     // Trims to the quota. 0 when the total is within it now, else -1. Files deleted by
     // somebody else are found missing before it gives up.
     int check_quota();
-    // For a medium that check_quota left above its quota: when only files that trimming
-    // spares in the working set keep it there, starts a new set, so that the old one can be
-    // trimmed like any other. At most once for each file size of data that arrived. True when
-    // the total is within the quota now; the CP storages have closed their files then.
+    // For a medium that is above its quota even after check_quota, because trimming spares
+    // files in the working set: starts a new set, so that the old one can be trimmed like any
+    // other. At most once per file size of data that arrived. True when the total is within
+    // the quota now; the CP storages have closed their files then.
     bool make_room_with_new_set();
     // Frees one file size after the medium ran full. 0 when at least half of it could
     // be freed, else -1.
@@ -111,7 +111,7 @@ private:
 
     StorageManager* m_manager;
     bool m_scanned = false;
-    bool m_rescan = false;  // the log root was given up and has to be scanned when it is there
+    bool m_rescan = false;  // the log root vanished: scan it when it is there again
     uint64_t m_quota = 0;
     uint32_t m_file_size = 512u << 20;
     bool m_overwrite = true;
@@ -122,7 +122,7 @@ private:
     uint64_t m_size = 0;
     bool m_uncertain = false;         // something vanished since the last recount
     unsigned int m_refusals = 0;      // checks that failed in a row
-    uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; at first enough
+    uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; enough at first
 };
 
 #endif  // STORAGE_MEDIASTORAGE_H_

@@ -8,8 +8,8 @@
 
 namespace {
 
-// A medium above its quota is counted again at the first failing check and then at every
-// one of so many: somebody may delete files at any time, and counting looks at every file.
+// A medium that stays above its quota is counted again at the first failing check and then at
+// one in this many: somebody may delete files at any time, but counting looks at every file.
 constexpr unsigned int CHECKS_PER_RECOUNT = 16;
 
 }  // namespace
@@ -67,7 +67,7 @@ int MediaStorage::check_quota() {
     return 0;
 }
 
-// True when the total is within the quota once what somebody else deleted has left it.
+// True when counting again, after somebody else deleted files, finds the total within the quota.
 bool MediaStorage::recount_helps() {
     if (m_refusals++ % CHECKS_PER_RECOUNT == 0) {
         recount();
@@ -75,8 +75,8 @@ bool MediaStorage::recount_helps() {
     return !above_quota();
 }
 
-// Counts again what the lists hold and drops what is gone from the medium. A working set
-// that is gone stays until prepare_cur_set finds it so.
+// Counts what is listed again and drops what is gone from the medium. A working set that is
+// gone stays listed: prepare_cur_set deals with it.
 void MediaStorage::recount() {
     m_uncertain = false;
     m_size = 0;
@@ -101,7 +101,7 @@ bool MediaStorage::make_room_with_new_set() {
     const android::String8 old = m_working_set->path();  // the set itself may go
     const CpSetDirectory* set = create_cp_set();
     if (!set || set->path() == old) {
-        return false;  // set names have one-second resolution: later
+        return false;  // set names have one-second resolution: try later
     }
     m_arrived = 0;
     m_manager->stop_all_storages();

@@ -14,7 +14,7 @@
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
 
-// Nothing happens when a card's rest is over: the next write tries it.
+// Nothing happens when a card's rest is over: the next write tries the card.
 StorageManager::StorageManager()
     : m_internal(this),
       m_external(this),
@@ -33,7 +33,7 @@ int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*
         m_card_rest_timer.bind(mux->timer_mgr());
     }
     android::String8 internal_top = system_path(PATH_DATA_PARTITION);
-    // Without a known SD card the external log root is a path that the service fixes.
+    // Without a known SD card the external log root is a fixed path.
     android::String8 external_top = sd_root.isEmpty() ? system_path("") : sd_root;
     if (m_kest_layout) {
         internal_top.append(DIR_KEST);
@@ -118,7 +118,7 @@ bool StorageManager::check_media_change() {
     return true;
 }
 
-// Whatever is known of the SD card is not true of the next one, in use or not.
+// Nothing that is known of this card, in use or not, holds for the next one.
 void StorageManager::card_removed() {
     if (m_external.scanned() || !m_external.sets().empty()) {
         m_external.clear();
@@ -128,7 +128,7 @@ void StorageManager::card_removed() {
     m_card_rest_timer.stop();
 }
 
-// Starts a new set. One that fails on a full medium frees space for the next try.
+// Starts a new set. When the medium is full, frees space for the next try.
 CpSetDirectory* StorageManager::start_set(MediaStorage& media) {
     CpSetDirectory* set = media.create_cp_set();
     if (!set && errno == ENOSPC) {
@@ -149,7 +149,7 @@ void StorageManager::write_failed(MediaStorage* media, int error) {
 }
 
 // A dying card's file system becomes read-only, its driver gives up, or it is gone while it
-// still counts as mounted. A want of the service's own is no fault of the card.
+// still counts as mounted. When the service itself lacks something, the card is not to blame.
 bool StorageManager::card_failed(MediaStorage* media, int error) {
     const bool own_want =
         error == 0 || error == EMFILE || error == ENFILE || error == ENOMEM || error == EINTR;
@@ -161,7 +161,7 @@ bool StorageManager::card_failed(MediaStorage* media, int error) {
     stop_all_storages();
     m_media_type = MT_NONE;
     if (m_card_suspect) {
-        // It was tried again, seemed to work, and failed: not from block to block.
+        // It was tried again, seemed to work and failed: do not try it with every block.
         m_card_rest_timer.start(m_card_rest_ms);
         m_card_rest_ms = std::min(2 * m_card_rest_ms, MAX_CARD_REST_MS);
     }
@@ -171,7 +171,7 @@ bool StorageManager::card_failed(MediaStorage* media, int error) {
 
 // Takes the SD card into use with a new set. False when no set can be started there.
 bool StorageManager::use_external() {
-    // A directory can sometimes be made, or is there, where no file can.
+    // Sometimes a directory can be made, or exists, where no file can be made.
     if ((m_card_suspect && !m_external.can_make_files()) || !start_set(m_external)) {
         return false;
     }

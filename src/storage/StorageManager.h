@@ -86,8 +86,8 @@ public:
     void unsubscribe_ext_stor_umount_evt(void* client);
 
 private:
-    // How long an SD card that failed again and again is left alone, at first and at most:
-    // each time twice as long.
+    // How long an SD card that keeps failing is left alone: at first, and at most after doubling
+    // with each failure.
     static constexpr unsigned int CARD_REST_MS = 3000;
     static constexpr unsigned int MAX_CARD_REST_MS = 600000;
 
@@ -108,7 +108,7 @@ private:
     bool m_kest_layout = false;
     bool m_card_suspect = false;  // it failed in use since it was mounted
     unsigned int m_card_rest_ms = CARD_REST_MS;
-    OneShotTimer m_card_rest_timer;  // pending: it is left alone
+    OneShotTimer m_card_rest_timer;  // pending: the card is left alone
 };
 
 #endif  // STORAGE_STORAGEMANAGER_H_

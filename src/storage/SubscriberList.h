@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Subscribers to one kind of event, each a callback and its client pointer, called in
 // the order of their subscription. A callback may subscribe and unsubscribe anybody,
-// itself included: who leaves during a round is not called any more in it, who joins
-// is called from the next one on.
+// itself included. Whoever leaves during a round is not called again in it; whoever joins is
+// called from the next round on.
 #ifndef STORAGE_SUBSCRIBERLIST_H_
 #define STORAGE_SUBSCRIBERLIST_H_
 

@@ -10,7 +10,7 @@
 
 namespace {
 
-// Length of "2016-03-01_09-15-00"; its digit fields stand at fixed offsets, the
+// Length of "2016-03-01_09-15-00"; its digit fields stand at fixed offsets; the
 // characters between them are not examined.
 constexpr size_t TIMESTAMP_LEN = 19;
 
@@ -61,7 +61,7 @@ bool ends_with(const char* text, size_t len, const char* suffix) {
     return len >= n && memcmp(text + len - n, suffix, n) == 0;
 }
 
-// A memory dump's timestamp stands behind the first "_" that four digits follow.
+// A memory dump's timestamp follows the first "_" that has four digits after it.
 bool find_dump_time(const char* name, size_t len, LogTime& time) {
     for (size_t i = 0; i + 5 <= len; ++i) {
         if (name[i] == '_' && digits_at(name + i + 1, 4)) {
@@ -76,7 +76,7 @@ struct PrefixRule {
     LogType type;
 };
 
-// Names whose timestamp stands right behind the prefix.
+// Names whose timestamp follows directly after the prefix.
 constexpr PrefixRule PREFIX_RULES[] = {
     {"mini_dump_", LT_MINI_DUMP},
     {"sblock_", LT_IPC_INFO},

@@ -12,7 +12,7 @@
 
 #include "storage/LogType.h"
 
-// A time as it stands in names: year with century, month 1 to 12; all 0: unknown.
+// A time as written in names: year with century, month 1 to 12; all 0: unknown.
 struct LogTime {
     int year = 0;
     int month = 0;

@@ -26,15 +26,16 @@ android::String8 shell_path(const android::String8& path);
 // 0, or what system() returns.
 int remove_tree(const android::String8& path);
 
-// As remove_tree, for every entry of the directory whose name begins with a digit.
+// Deletes every entry of the directory whose name begins with a digit, by a shell. Result as
+// above.
 int remove_numbered_entries(const android::String8& dir);
 
 // mkdir with mode 0775; 0 when the directory was made or something of this name
 // exists already, else -1.
 int make_log_dir(const android::String8& path);
 
-// True when an access that failed with this errno tells that the file or directory is not
-// there any more, for us at least. Any other failure is a passing one and tells nothing.
+// True when this errno of a failed access means that the file or directory is not there any
+// more, for us at least. Any other failure may be a passing one.
 bool means_vanished(int error);
 
 // False when the directory vanished: it cannot be read, written and searched any more.
