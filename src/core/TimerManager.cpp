@@ -4,6 +4,7 @@
 
 #include <limits.h>
 
+#include "core/list_find.h"
 #include "core/log.h"
 
 namespace {
@@ -45,14 +46,6 @@ bool TimerManager::is_earlier(const struct timespec& a, const struct timespec& b
     return a.tv_sec != b.tv_sec ? a.tv_sec < b.tv_sec : a.tv_nsec < b.tv_nsec;
 }
 
-android::List<TimerManager::Timer*>::iterator TimerManager::find(Timer* t) {
-    auto it = m_timers.begin();
-    while (it != m_timers.end() && *it != t) {
-        ++it;
-    }
-    return it;
-}
-
 int TimerManager::add_timer(unsigned int ms, timer_callback cb, void* client_data) {
     if (!create_timer(ms, cb, client_data)) {
         err_log("clock_gettime CLOCK_BOOTTIME error");
@@ -78,7 +71,7 @@ TimerManager::Timer* TimerManager::create_timer(unsigned int ms, timer_callback 
 
 int TimerManager::set_new_due_time(Timer* t, unsigned int ms) {
     struct timespec now;
-    auto it = find(t);
+    auto it = find_object(m_timers, t);
     if (it == m_timers.end() || !read_clock(now)) {
         return -1;
     }
@@ -103,7 +96,7 @@ int TimerManager::set_new_due_time(Timer* t, unsigned int ms) {
 }
 
 void TimerManager::del_timer(Timer* t) {
-    auto it = find(t);
+    auto it = find_object(m_timers, t);
     if (it != m_timers.end()) {
         m_timers.erase(it);
         delete t;

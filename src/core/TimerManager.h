@@ -66,8 +66,6 @@ public:
     static bool is_earlier(const struct timespec& a, const struct timespec& b);
 
 private:
-    android::List<Timer*>::iterator find(Timer* t);
-
     android::List<Timer*> m_timers;  // by due time, earliest first
     uint64_t m_pass = 0;             // passes begun
 };

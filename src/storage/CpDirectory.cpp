@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "core/SavedErrno.h"
+#include "core/list_find.h"
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
@@ -38,14 +39,6 @@ int CpDirectory::create() {
 
 int CpDirectory::remove() {
     return remove_tree(m_path);
-}
-
-CpDirectory::FileIter CpDirectory::find(LogFile* file) {
-    FileIter it = m_files.begin();
-    while (it != m_files.end() && *it != file) {
-        ++it;
-    }
-    return it;
 }
 
 // Takes a file that is gone from the medium out of the list and deletes its object, which
@@ -94,12 +87,7 @@ LogFile* CpDirectory::open_and_list(std::unique_ptr<LogFile> file) {
 }
 
 LogFile* CpDirectory::find(const android::String8& name) const {
-    for (LogFile* file : m_files) {
-        if (file->name() == name) {
-            return file;
-        }
-    }
-    return nullptr;
+    return find_named(m_files, &LogFile::name, name);
 }
 
 // A name that is free in the directory: the given one with "-N" before its extension.
@@ -155,7 +143,7 @@ LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
 }
 
 int CpDirectory::remove_file(LogFile* file) {
-    FileIter it = find(file);
+    FileIter it = find_object(m_files, file);
     if (it == m_files.end()) {
         return -1;
     }
@@ -167,7 +155,7 @@ int CpDirectory::remove_file(LogFile* file) {
 }
 
 void CpDirectory::file_removed(LogFile* file) {
-    FileIter it = find(file);
+    FileIter it = find_object(m_files, file);
     if (it == m_files.end()) {
         err_log("log %s does not exist in dir %s", file->name().string(), m_name.string());
         return;

@@ -90,7 +90,6 @@ private:
     android::String8 aside_name(const android::String8& name);
     bool taken_by_stranger(const android::String8& name,
                            const std::set<std::string_view>& listed) const;
-    FileIter find(LogFile* file);
     FileIter drop(FileIter it);
     uint64_t delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck);
     bool is_protected(const LogFile* file) const;

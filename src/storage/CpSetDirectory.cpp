@@ -7,6 +7,7 @@
 #include <memory>
 
 #include "core/SavedErrno.h"
+#include "core/list_find.h"
 #include "storage/CpDirectory.h"
 #include "storage/MediaStorage.h"
 #include "storage/dir_entries.h"
@@ -43,28 +44,19 @@ int CpSetDirectory::stat() {
 }
 
 CpDirectory* CpSetDirectory::get_cp_dir(const android::String8& cp_name) const {
-    for (CpDirectory* dir : m_dirs) {
-        if (dir->name() == cp_name) {
-            return dir;
-        }
-    }
-    return nullptr;
+    return find_named(m_dirs, &CpDirectory::name, cp_name);
 }
 
 CpDirectory* CpSetDirectory::prepare_cp_dir(const android::String8& cp_name, bool& new_dir) {
-    for (android::List<CpDirectory*>::iterator it = m_dirs.begin(); it != m_dirs.end(); ++it) {
-        CpDirectory* dir = *it;
-        if (dir->name() != cp_name) {
-            continue;
-        }
-        if (dir_usable(dir->path())) {
-            return dir;
-        }
-        m_dirs.erase(it);
-        m_size -= dir->size();
+    CpDirectory* listed = get_cp_dir(cp_name);
+    if (listed && dir_usable(listed->path())) {
+        return listed;
+    }
+    if (listed) {
+        m_dirs.erase(find_object(m_dirs, listed));
+        m_size -= listed->size();
         m_media->totals_uncertain();
-        delete dir;
-        break;
+        delete listed;
     }
     auto dir = std::make_unique<CpDirectory>(this, cp_name);
     if (dir->create() < 0) {

@@ -13,6 +13,7 @@
 #include <utility>
 #include <vector>
 
+#include "core/list_find.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpSetDirectory.h"
@@ -101,15 +102,6 @@ void MediaStorage::insert_scanned(std::unique_ptr<CpSetDirectory> set) {
     m_sets.insert(it, set.release());
 }
 
-CpSetDirectory* MediaStorage::find_set(const android::String8& path) const {
-    for (CpSetDirectory* set : m_sets) {
-        if (set->path() == path) {
-            return set;
-        }
-    }
-    return nullptr;
-}
-
 CpSetDirectory* MediaStorage::create_cp_set() {
     struct tm t;
     if (get_local_time(t) < 0) {
@@ -123,7 +115,7 @@ CpSetDirectory* MediaStorage::create_cp_set() {
         err_log("create CP set %s failed", path.string());
         return nullptr;
     }
-    CpSetDirectory* set = find_set(path);
+    CpSetDirectory* set = find_named(m_sets, &CpSetDirectory::path, path);
     if (!set) {
         set = new CpSetDirectory(this, path);
         // Normally the directory is new and empty. One that existed, unlisted, is taken over
@@ -173,11 +165,7 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
 void MediaStorage::drop_working_set() {
     CpSetDirectory* vanished = m_working_set;
     m_working_set = nullptr;
-    android::List<CpSetDirectory*>::iterator it = m_sets.begin();
-    while (*it != vanished) {
-        ++it;
-    }
-    m_sets.erase(it);
+    m_sets.erase(find_object(m_sets, vanished));
     m_size -= vanished->size();
     delete vanished;
 }

@@ -103,7 +103,6 @@ private:
     int scan_sets();
     void forget_sets();
     void insert_scanned(std::unique_ptr<CpSetDirectory> set);
-    CpSetDirectory* find_set(const android::String8& path) const;
     void drop_working_set();
     bool above_quota() const;
     bool recount_helps();

@@ -10,6 +10,7 @@
 
 #include "config/property_names.h"
 #include "core/Multiplexer.h"
+#include "core/list_find.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
@@ -199,13 +200,10 @@ CpStorage* StorageManager::create_storage(CpChannel* channel) {
 }
 
 void StorageManager::delete_storage(CpStorage* storage) {
-    for (android::List<CpStorage*>::iterator it = m_storages.begin(); it != m_storages.end();
-         ++it) {
-        if (*it == storage) {
-            m_storages.erase(it);
-            delete storage;
-            return;
-        }
+    android::List<CpStorage*>::iterator it = find_object(m_storages, storage);
+    if (it != m_storages.end()) {
+        m_storages.erase(it);
+        delete storage;
     }
 }
 
