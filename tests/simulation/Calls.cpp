@@ -1,0 +1,696 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "simulation/Calls.h"
+
+#include <dirent.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <stdarg.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/uio.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <map>
+#include <vector>
+
+#include "simulation/Ledger.h"
+#include "simulation/World.h"
+
+FdInfo g_fds[MAX_FDS];
+State* g_state;
+bool g_inside;
+bool g_plan_over;
+
+namespace {
+
+int s_trace_fd = -1;
+std::map<DIR*, std::pair<std::vector<struct dirent>, size_t>> s_dirs;
+
+constexpr uint64_t MAX_CALLS_A_PASS = 200000;
+constexpr int SHORT_COUNT = -1;  // a call shall do less than it was asked for
+
+const char* const CALL_NAMES[CALL_COUNT + 1] = {
+    "open",   "read",    "write",  "close",   "stat",    "access",   "rename",
+    "unlink", "mkdir",   "rmdir",  "opendir", "readdir", "truncate", "system",
+    "socket", "connect", "accept", "fcntl",   "poll",    "other"};
+const char* const PLACE_NAMES[PLACE_COUNT] = {"any",   "data",   "card",   "settings",
+                                              "props", "device", "socket", "other"};
+
+std::string without_root(const char* text) {
+    std::string cut(text);
+    const std::string& root = world().root();
+    for (size_t at; (at = cut.find(root)) != std::string::npos;) {
+        cut.replace(at, root.size(), "");
+    }
+    return cut;
+}
+
+[[noreturn]] void die() {
+    const Outside outside;
+    ++g_state->counters.kills;
+    g_state->kill_at = 0;
+    g_state->killed = true;
+    trace("killed");
+    world().service_dies();
+    ledger::excuse_kill();
+    _exit(LIFE_KILLED);
+}
+
+// What every call of the service begins with: 0, the errno to fail with, or SHORT_COUNT.
+int begin(Call call, Place place) {
+    State& state = *g_state;
+    ++state.counters.calls;
+    state.boot_ns += 1000;
+    if (state.kill_at && state.counters.calls >= state.kill_at) {
+        die();
+    }
+    if (state.counters.calls - state.pass_calls > MAX_CALLS_A_PASS) {
+        fail_run("hang", "%llu calls in one pass of the loop, now %s in %s",
+                 static_cast<unsigned long long>(MAX_CALLS_A_PASS), CALL_NAMES[call],
+                 PLACE_NAMES[place]);
+    }
+    for (FaultRule& rule : state.faults) {
+        // What fails in the start for want of these stays so for the life of the process.
+        if (state.starting && (place == PLACE_PROPS || place == PLACE_SOCKET)) {
+            continue;
+        }
+        if (!rule.active || rule.call != call || (rule.place != PLACE_ANY && rule.place != place)) {
+            continue;
+        }
+        if (rule.skip > 0) {
+            --rule.skip;
+            continue;
+        }
+        if (rule.times != UINT32_MAX && --rule.times == 0) {
+            rule.active = false;
+        }
+        ++state.counters.faults;
+        state.fault_in_step = true;
+        state.fault_seen = true;
+        state.faulted = true;
+        const Outside outside;
+        world().rule_fired(call, place);
+        ledger::excuse_all();
+        trace("fault %s %s %d", CALL_NAMES[call], PLACE_NAMES[place], rule.error);
+        return rule.error ? rule.error : SHORT_COUNT;
+    }
+    return 0;
+}
+
+int failed(int error) {
+    errno = error;
+    return -1;
+}
+
+Place place_of_fd(int fd) {
+    return fd >= 0 && fd < MAX_FDS ? g_fds[fd].place : PLACE_OTHER;
+}
+
+bool on_medium(Place place) {
+    return place == PLACE_DATA || place == PLACE_CARD;
+}
+
+// Why nothing can be changed in that place now: 0 when it can.
+int refusal(Place place, bool takes_room) {
+    State& state = *g_state;
+    int error = 0;
+    if (place == PLACE_CARD && !state.card_in) {
+        error = EACCES;
+    } else if (place == PLACE_CARD && state.card_read_only) {
+        error = EROFS;
+    } else if (takes_room && on_medium(place) &&
+               state.room[place == PLACE_CARD ? MED_CARD : MED_DATA] == 0) {
+        error = ENOSPC;
+    }
+    if (error) {
+        state.fault_in_step = true;
+        ledger::excuse_all();
+    }
+    return error;
+}
+
+int result_of(const char* name, const char* path, int result) {
+    const int error = errno;
+    {
+        const Outside outside;
+        trace("%s %s = %d%s%s", name, without_root(path).c_str(), result < 0 ? -1 : 0,
+              result < 0 ? " " : "", result < 0 ? strerror(error) : "");
+    }
+    errno = error;
+    return result;
+}
+
+void forget_fd(int fd) {
+    if (fd >= 0 && fd < MAX_FDS) {
+        g_fds[fd] = FdInfo();
+    }
+}
+
+FdInfo& remember_fd(int fd, FdClass cls, Place place) {
+    if (fd >= MAX_FDS) {
+        fail_run("leak", "descriptor %d", fd);
+    }
+    g_fds[fd] = FdInfo();
+    g_fds[fd].cls = cls;
+    g_fds[fd].place = place;
+    return g_fds[fd];
+}
+
+// A write of the service into a log tree, as far as the medium takes it.
+ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault) {
+    FdInfo& info = g_fds[fd];
+    State& state = *g_state;
+    if (info.place == PLACE_CARD && (!state.card_in || info.generation != state.card_generation)) {
+        state.fault_in_step = true;
+        const Outside outside;
+        ledger::excuse_all();
+        return failed(EIO);
+    }
+    std::vector<uint8_t> bytes;
+    for (int i = 0; i < count; ++i) {
+        const uint8_t* const data = static_cast<const uint8_t*>(pieces[i].iov_base);
+        bytes.insert(bytes.end(), data, data + pieces[i].iov_len);
+    }
+    size_t len = bytes.size();
+    if (fault == SHORT_COUNT && len > 1) {
+        len = 1 + state.counters.calls % (len - 1);
+    }
+    if (!info.removed) {
+        if (const int error = refusal(info.place, true)) {
+            return failed(error);
+        }
+        uint64_t& room = state.room[info.place == PLACE_CARD ? MED_CARD : MED_DATA];
+        if (room != UINT64_MAX) {
+            if (room < len) {
+                state.fault_in_step = true;
+                ledger::excuse_all();
+                len = room;
+            }
+            room -= len;
+        }
+    }
+    const Outside outside;
+    const ssize_t n = write(fd, bytes.data(), len);
+    if (n > 0 && info.cls == FD_LOG_FILE) {
+        ledger::file_written(info, bytes.data(), static_cast<size_t>(n));
+    }
+    trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
+    return n;
+}
+
+}  // namespace
+
+const char* name_of(Call call) {
+    return CALL_NAMES[call];
+}
+
+const char* name_of(Place place) {
+    return PLACE_NAMES[place];
+}
+
+void print_traces_to(int fd) {
+    s_trace_fd = fd;
+}
+
+void trace(const char* format, ...) {
+    const Outside outside;
+    char text[1200];
+    va_list args;
+    va_start(args, format);
+    int len = vsnprintf(text, sizeof(text) - 1, format, args);
+    va_end(args);
+    const std::string cut = without_root(std::string(text).substr(0, sizeof(text) - 2).c_str());
+    len = static_cast<int>(cut.size());
+    memcpy(text, cut.data(), cut.size());
+    text[len] = '\n';
+    uint64_t digest = g_state->digest;
+    for (int i = 0; i <= len; ++i) {
+        digest = (digest ^ static_cast<uint8_t>(text[i])) * 0x100000001b3u;
+    }
+    g_state->digest = digest;
+    if (s_trace_fd >= 0) {
+        dprintf(s_trace_fd, "%10.3f ", static_cast<double>(g_state->boot_ns) / 1e9);
+        if (write(s_trace_fd, text, static_cast<size_t>(len) + 1) < 0) {
+            s_trace_fd = -1;
+        }
+    }
+}
+
+void fail_run(const char* failure_class, const char* format, ...) {
+    const Outside outside;
+    snprintf(g_state->failure_class, sizeof(g_state->failure_class), "%s", failure_class);
+    va_list args;
+    va_start(args, format);
+    vsnprintf(g_state->failure, sizeof(g_state->failure), format, args);
+    va_end(args);
+    trace("FAILED %s: %s", failure_class, without_root(g_state->failure).c_str());
+    if (getenv("SIMULATION_ABORT")) {
+        abort();  // a stack trace is wanted
+    }
+    _exit(LIFE_FAILED);
+}
+
+#define REAL(result, name, ...) extern "C" result __real_##name(__VA_ARGS__)
+#define WRAPPED(result, name, ...)                \
+    extern "C" result __real_##name(__VA_ARGS__); \
+    extern "C" result __wrap_##name(__VA_ARGS__); \
+    extern "C" result __wrap_##name(__VA_ARGS__)
+
+// ---- Time
+
+WRAPPED(int, clock_gettime, clockid_t clock, struct timespec* now) {
+    if (!g_inside) {
+        return __real_clock_gettime(clock, now);
+    }
+    const int64_t ns = g_state->boot_ns + (clock == CLOCK_REALTIME ? g_state->wall_ns : 0);
+    now->tv_sec = ns / 1000000000;
+    now->tv_nsec = ns % 1000000000;
+    return 0;
+}
+
+WRAPPED(time_t, time, time_t* result) {
+    if (!g_inside) {
+        return __real_time(result);
+    }
+    const time_t now = (g_state->boot_ns + g_state->wall_ns) / 1000000000;
+    if (result) {
+        *result = now;
+    }
+    return now;
+}
+
+WRAPPED(int, usleep, useconds_t us) {
+    if (!g_inside) {
+        return __real_usleep(us);
+    }
+    begin(CALL_COUNT, PLACE_OTHER);
+    g_state->boot_ns += int64_t{us} * 1000;
+    const Outside outside;
+    world().pump();
+    return 0;
+}
+
+WRAPPED(pid_t, getpid, ) {
+    return g_inside ? 77 : __real_getpid();
+}
+
+// ---- The loop
+
+WRAPPED(int, poll, struct pollfd* fds, nfds_t count, int timeout) {
+    if (!g_inside) {
+        return __real_poll(fds, count, timeout);
+    }
+    const bool loops_own = world().is_loops_own(fds);
+    if (const int error = begin(CALL_POLL, PLACE_ANY)) {
+        if (loops_own) {
+            world().pass_ends(0);
+        }
+        return failed(error == SHORT_COUNT ? EINTR : error);
+    }
+    const Outside outside;
+    return world().wait(fds, count, timeout, loops_own);
+}
+
+// ---- Descriptors
+
+extern "C" int __real_open(const char* path, int flags, mode_t mode);
+extern "C" int __wrap_open(const char* path, int flags, ...);
+extern "C" int __wrap_open(const char* path, int flags, ...) {
+    mode_t mode = 0;
+    if (flags & O_CREAT) {
+        va_list args;
+        va_start(args, flags);
+        mode = va_arg(args, mode_t);
+        va_end(args);
+    }
+    if (!g_inside) {
+        return __real_open(path, flags, mode);
+    }
+    const Place place = world().place_of(path);
+    if (const int error = begin(CALL_OPEN, place)) {
+        return result_of("open", path, failed(error == SHORT_COUNT ? EMFILE : error));
+    }
+    const Outside outside;
+    if (place == PLACE_DEVICE) {
+        return result_of("open", path, world().open_device(path));
+    }
+    struct stat st;
+    const bool exists = lstat(path, &st) == 0;
+    if (exists && S_ISFIFO(st.st_mode) && !(flags & O_NONBLOCK)) {
+        fail_run("hang", "blocking open of the FIFO %s", path);
+    }
+    if ((flags & O_ACCMODE) != O_RDONLY && on_medium(place)) {
+        if (const int error = refusal(place, (flags & O_CREAT) && !exists)) {
+            return result_of("open", path, failed(error));
+        }
+    }
+    const int fd = __real_open(path, flags, mode);
+    if (fd >= 0) {
+        world().file_opened(path, place, remember_fd(fd, FD_OTHER, place), fd);
+    }
+    return result_of("open", path, fd);
+}
+
+WRAPPED(int, close, int fd) {
+    if (!g_inside) {
+        return __real_close(fd);
+    }
+    const int error = begin(CALL_CLOSE, place_of_fd(fd));
+    forget_fd(fd);
+    const int result = __real_close(fd);
+    return error > 0 ? failed(error) : result;
+}
+
+WRAPPED(ssize_t, read, int fd, void* data, size_t len) {
+    if (!g_inside) {
+        return __real_read(fd, data, len);
+    }
+    const int fault = begin(CALL_READ, place_of_fd(fd));
+    if (fault > 0) {
+        return failed(fault);
+    }
+    FdInfo& info = g_fds[fd];
+    if (info.failed) {
+        world().reading_failed();
+        return failed(EIO);
+    }
+    if (fault == SHORT_COUNT && len > 1) {
+        len = 1 + g_state->counters.calls % std::min<size_t>(len - 1, 100);
+    }
+    const ssize_t n = __real_read(fd, data, len);
+    const int error = errno;
+    if (n > 0) {
+        const Outside outside;
+        world().service_read(info, static_cast<const uint8_t*>(data), static_cast<size_t>(n));
+    }
+    errno = error;
+    return n;
+}
+
+WRAPPED(ssize_t, write, int fd, const void* data, size_t len) {
+    if (!g_inside) {
+        return __real_write(fd, data, len);
+    }
+    if (fd == STDERR_FILENO) {
+        const Outside outside;
+        const std::string text(static_cast<const char*>(data), len);
+        world().message(without_root(text.c_str()));
+        return static_cast<ssize_t>(len);
+    }
+    const int fault = begin(CALL_WRITE, place_of_fd(fd));
+    if (fault > 0) {
+        return failed(fault);
+    }
+    if (on_medium(g_fds[fd].place)) {
+        const struct iovec piece = {const_cast<void*>(data), len};
+        return write_to_medium(fd, &piece, 1, fault);
+    }
+    if (g_fds[fd].failed) {
+        return failed(EIO);
+    }
+    // A short line on a local socket is taken whole.
+    const bool cut = fault == SHORT_COUNT && len > 1 && g_fds[fd].place != PLACE_SOCKET;
+    return __real_write(fd, data, cut ? len / 2 : len);
+}
+
+WRAPPED(ssize_t, writev, int fd, const struct iovec* pieces, int count) {
+    if (!g_inside || !on_medium(g_fds[fd].place)) {
+        return __real_writev(fd, pieces, count);
+    }
+    const int fault = begin(CALL_WRITE, place_of_fd(fd));
+    return fault > 0 ? failed(fault) : write_to_medium(fd, pieces, count, fault);
+}
+
+WRAPPED(ssize_t, pwrite, int fd, const void* data, size_t len, off_t offset) {
+    if (!g_inside) {
+        return __real_pwrite(fd, data, len, offset);
+    }
+    const int fault = begin(CALL_WRITE, place_of_fd(fd));
+    if (fault > 0) {
+        return failed(fault);
+    }
+    return __real_pwrite(fd, data, fault == SHORT_COUNT && len > 1 ? len / 2 : len, offset);
+}
+
+WRAPPED(int, ftruncate, int fd, off_t len) {
+    if (!g_inside) {
+        return __real_ftruncate(fd, len);
+    }
+    const int fault = begin(CALL_TRUNCATE, place_of_fd(fd));
+    return fault > 0 ? failed(fault) : __real_ftruncate(fd, len);
+}
+
+WRAPPED(int, fcntl, int fd, int command, long argument) {
+    if (!g_inside) {
+        return __real_fcntl(fd, command, argument);
+    }
+    const int fault = begin(CALL_FCNTL, place_of_fd(fd));
+    return fault > 0 ? failed(fault) : __real_fcntl(fd, command, argument);
+}
+
+WRAPPED(int, fclose, FILE* file) {
+    if (!g_inside) {
+        return __real_fclose(file);
+    }
+    const int fault = begin(CALL_CLOSE, place_of_fd(fileno(file)));
+    forget_fd(fileno(file));
+    const int result = __real_fclose(file);
+    return fault > 0 ? failed(fault) : result;
+}
+
+WRAPPED(int, ioctl, int fd, unsigned long request, unsigned long argument) {
+    return g_inside ? 0 : __real_ioctl(fd, request, argument);
+}
+
+// ---- Names
+
+WRAPPED(int, stat, const char* path, struct stat* st) {
+    const int fault = g_inside ? begin(CALL_STAT, world().place_of(path)) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    const int result = __real_stat(path, st);
+    if (g_inside && result == 0) {
+        world().set_times(path, *st);
+    }
+    return result;
+}
+
+WRAPPED(int, lstat, const char* path, struct stat* st) {
+    const int fault = g_inside ? begin(CALL_STAT, world().place_of(path)) : 0;
+    return fault > 0 ? failed(fault) : __real_lstat(path, st);
+}
+
+WRAPPED(int, fstat, int fd, struct stat* st) {
+    const int fault = g_inside ? begin(CALL_STAT, place_of_fd(fd)) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    const int result = __real_fstat(fd, st);
+    if (g_inside && result == 0 && g_fds[fd].place == PLACE_PROPS) {
+        world().set_times("", *st);
+    }
+    return result;
+}
+
+WRAPPED(int, fstatat, int fd, const char* name, struct stat* st, int flags) {
+    const int fault = g_inside ? begin(CALL_STAT, place_of_fd(fd)) : 0;
+    return fault > 0 ? failed(fault) : __real_fstatat(fd, name, st, flags);
+}
+
+WRAPPED(int, access, const char* path, int mode) {
+    if (!g_inside) {
+        return __real_access(path, mode);
+    }
+    const Place place = world().place_of(path);
+    if (const int fault = begin(CALL_ACCESS, place)) {
+        return failed(fault == SHORT_COUNT ? EIO : fault);
+    }
+    if (place == PLACE_CARD && g_state->card_read_only && (mode & W_OK)) {
+        g_state->fault_in_step = true;
+        ledger::excuse_all();
+        return failed(EROFS);
+    }
+    return __real_access(path, mode);
+}
+
+WRAPPED(int, rename, const char* from, const char* to) {
+    if (!g_inside) {
+        return __real_rename(from, to);
+    }
+    const Place place = world().place_of(from);
+    const int fault = begin(CALL_RENAME, place);
+    if (fault > 0) {
+        return result_of("rename", from, failed(fault));
+    }
+    if (const int error = refusal(place, false)) {
+        return result_of("rename", from, failed(error));
+    }
+    {
+        const Outside outside;
+        struct stat st;
+        if (lstat(to, &st) == 0) {
+            fail_run("replaced", "rename of %s replaces %s", from, to);
+        }
+    }
+    return result_of("rename", to, __real_rename(from, to));
+}
+
+WRAPPED(int, unlink, const char* path) {
+    if (!g_inside) {
+        return __real_unlink(path);
+    }
+    const Place place = world().place_of(path);
+    const int fault = begin(CALL_UNLINK, place);
+    if (fault > 0) {
+        return result_of("unlink", path, failed(fault));
+    }
+    if (const int error = refusal(place, false)) {
+        return result_of("unlink", path, failed(error));
+    }
+    {
+        const Outside outside;
+        world().service_deletes(path, place);
+    }
+    return result_of("unlink", path, __real_unlink(path));
+}
+
+WRAPPED(int, mkdir, const char* path, mode_t mode) {
+    if (!g_inside) {
+        return __real_mkdir(path, mode);
+    }
+    const Place place = world().place_of(path);
+    const int fault = begin(CALL_MKDIR, place);
+    if (fault > 0) {
+        return result_of("mkdir", path, failed(fault));
+    }
+    struct stat st;
+    if (__real_lstat(path, &st) == 0) {
+        return failed(EEXIST);
+    }
+    if (const int error = refusal(place, true)) {
+        return result_of("mkdir", path, failed(error));
+    }
+    return result_of("mkdir", path, __real_mkdir(path, mode));
+}
+
+WRAPPED(int, rmdir, const char* path) {
+    if (!g_inside) {
+        return __real_rmdir(path);
+    }
+    const Place place = world().place_of(path);
+    const int fault = begin(CALL_RMDIR, place);
+    if (fault > 0) {
+        return failed(fault);
+    }
+    if (const int error = refusal(place, false)) {
+        return failed(error);
+    }
+    return result_of("rmdir", path, __real_rmdir(path));
+}
+
+WRAPPED(int, system, const char* command) {
+    if (!g_inside) {
+        return __real_system(command);
+    }
+    const int fault = begin(CALL_SYSTEM, PLACE_ANY);
+    const Outside outside;
+    trace("system %s", without_root(command).c_str());
+    return fault > 0 ? failed(fault) : world().remove_by_shell(command);
+}
+
+WRAPPED(DIR*, opendir, const char* path) {
+    if (!g_inside) {
+        return __real_opendir(path);
+    }
+    const int fault = begin(CALL_OPENDIR, world().place_of(path));
+    if (fault > 0) {
+        errno = fault;
+        return nullptr;
+    }
+    const Outside outside;
+    DIR* const dir = opendir(path);
+    if (dir) {
+        remember_fd(dirfd(dir), FD_DIR, world().place_of(path));
+        auto& entries = s_dirs[dir].first;
+        while (const struct dirent* entry = readdir(dir)) {
+            entries.push_back(*entry);
+        }
+        std::sort(entries.begin(), entries.end(),
+                  [](const auto& a, const auto& b) { return strcmp(a.d_name, b.d_name) < 0; });
+    }
+    return dir;
+}
+
+WRAPPED(struct dirent*, readdir, DIR* dir) {
+    if (!g_inside) {
+        return __real_readdir(dir);
+    }
+    if (const int fault = begin(CALL_READDIR, place_of_fd(dirfd(dir)))) {
+        errno = fault == SHORT_COUNT ? 0 : fault;
+        return nullptr;
+    }
+    auto& listing = s_dirs[dir];
+    return listing.second < listing.first.size() ? &listing.first[listing.second++] : nullptr;
+}
+
+WRAPPED(int, closedir, DIR* dir) {
+    if (g_inside) {
+        begin(CALL_CLOSE, place_of_fd(dirfd(dir)));
+        forget_fd(dirfd(dir));
+        s_dirs.erase(dir);
+    }
+    return __real_closedir(dir);
+}
+
+// ---- Sockets
+
+WRAPPED(int, socket, int domain, int type, int protocol) {
+    const int fault = g_inside ? begin(CALL_SOCKET, PLACE_SOCKET) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    const int fd = __real_socket(domain, type, protocol);
+    if (g_inside && fd >= 0) {
+        remember_fd(fd, FD_CONNECTION, PLACE_SOCKET);
+    }
+    return fd;
+}
+
+WRAPPED(int, listen, int fd, int backlog) {
+    if (g_inside) {
+        g_fds[fd].cls = FD_SERVER;
+    }
+    return __real_listen(fd, backlog);
+}
+
+WRAPPED(int, connect, int fd, const struct sockaddr* address, socklen_t len) {
+    const int fault = g_inside ? begin(CALL_CONNECT, PLACE_SOCKET) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    if (g_inside && !(__real_fcntl(fd, F_GETFL, 0) & O_NONBLOCK)) {
+        fail_run("hang", "blocking connect");
+    }
+    return __real_connect(fd, address, len);
+}
+
+WRAPPED(int, accept4, int fd, struct sockaddr* address, socklen_t* len, int flags) {
+    const int fault = g_inside ? begin(CALL_ACCEPT, PLACE_SOCKET) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    const int client = __real_accept4(fd, address, len, flags);
+    if (g_inside && client >= 0) {
+        remember_fd(client, FD_CLIENT, PLACE_SOCKET);
+        world().progress();
+    }
+    return client;
+}

@@ -1,0 +1,437 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "simulation/Clients.h"
+
+#include <errno.h>
+#include <stddef.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include "simulation/Calls.h"
+#include "simulation/World.h"
+
+namespace {
+
+enum Kind {
+    DOES,         // OK
+    MAY,          // OK or an error: it depends on what is going on
+    WRONG,        // the error of the argument
+    SETS,         // OK; sets the setting to the argument
+    GETS,         // OK and the setting
+    SETS_STREAM,  // OK; switches the logging of a stream
+    GETS_STREAM,
+    SAVES,  // OK or an error, when the transaction ends
+    NOTHING
+};
+
+struct Request {
+    const char* text;
+    Kind kind;
+    unsigned what;  // setting, stream or error
+    unsigned argument;
+};
+
+// FLUSH is the first: REQUEST_FLUSH.
+const Request REQUESTS[] = {
+    {"FLUSH", DOES, 0, 0},
+    {"GET_LOG_FILE_SIZE", GETS, SET_FILE_MB, 0},
+    {"GET_DATA_MAX_SIZE", GETS, SET_DATA_MB, 0},
+    {"GET_SD_MAX_SIZE", GETS, SET_CARD_MB, 0},
+    {"GET_LOG_OVERWRITE", GETS, SET_OVERWRITE, 0},
+    {"GET_MD_STOR_POS", GETS, SET_MD_INTERNAL, 0},
+    {"SET_LOG_FILE_SIZE 1", SETS, SET_FILE_MB, 1},
+    {"SET_LOG_FILE_SIZE 2", SETS, SET_FILE_MB, 2},
+    {"SET_DATA_MAX_SIZE 0", SETS, SET_DATA_MB, 0},
+    {"SET_DATA_MAX_SIZE 4", SETS, SET_DATA_MB, 4},
+    {"SET_DATA_MAX_SIZE\t12", SETS, SET_DATA_MB, 12},
+    {"SET_SD_MAX_SIZE 4", SETS, SET_CARD_MB, 4},
+    {"SET_SD_MAX_SIZE 14", SETS, SET_CARD_MB, 14},
+    {"ENABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 1},
+    {"ENABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 1},
+    {"DISABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 0},
+    {"SET_MD_STOR_POS INTERNAL", SETS, SET_MD_INTERNAL, 1},
+    {"SET_MD_STOR_POS EXTERNAL", SETS, SET_MD_INTERNAL, 0},
+    {"ENABLE_MD", DOES, 0, 0},
+    {"DISABLE_MD", DOES, 0, 0},
+    {"MINI_DUMP", WRONG, 3, 0},
+    {"ENABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 1},
+    {"ENABLE_LOG WCN", SETS_STREAM, ST_WCN, 1},
+    {"ENABLE_LOG GNSS", SETS_STREAM, ST_GNSS, 1},
+    {"ENABLE_LOG AG-DSP", SETS_STREAM, ST_DSP, 1},
+    {"ENABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 1},
+    {"ENABLE_LOG WCN", SETS_STREAM, ST_WCN, 1},
+    {"DISABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 0},
+    {"DISABLE_LOG WCN", SETS_STREAM, ST_WCN, 0},
+    {"DISABLE_LOG GNSS", SETS_STREAM, ST_GNSS, 0},
+    {"DISABLE_LOG AG-DSP", SETS_STREAM, ST_DSP, 0},
+    {"GET_LOG_STATE WCDMA", GETS_STREAM, ST_WCDMA, 0},
+    {"GET_LOG_STATE WCN", GETS_STREAM, ST_WCN, 0},
+    {"GET_LOG_STATE GNSS", GETS_STREAM, ST_GNSS, 0},
+    {"GET_LOG_STATE AG-DSP", GETS_STREAM, ST_DSP, 0},
+    {"GET_LOG_STATE NONE", WRONG, 9, 0},
+    {"kestctl clear", MAY, 0, 0},
+    {"kestctl reload", MAY, 0, 0},
+    {"SAVE_RINGBUF WCDMA", SAVES, ST_WCDMA, 0},
+    {"SAVE_RINGBUF WCN", SAVES, ST_WCN, 0},
+    {"SAVE_SLEEP_LOG WCDMA", SAVES, ST_WCDMA, 0},
+    {"SAVE_SLEEP_LOG WCN", SAVES, ST_WCN, 0},
+    {"SAVE_RINGBUF GNSS", SAVES, ST_GNSS, 0},
+    {"SUBSCRIBE WCDMA DUMP", DOES, 0, 0},
+    {"SUBSCRIBE WCN DUMP", DOES, 0, 0},
+    {"UNSUBSCRIBE GNSS DUMP", DOES, 0, 0},
+    {"NONSENSE", WRONG, 1, 0},
+    {"kestctl", WRONG, 1, 0},
+    {"SET_LOG_FILE_SIZE ten", WRONG, 2, 0},
+    {"FLUSH now", WRONG, 1, 0},
+    {"", NOTHING, 0, 0},
+};
+constexpr uint64_t REQUEST_COUNT = sizeof(REQUESTS) / sizeof(REQUESTS[0]);
+// The transactions' own limit is 33 seconds; a queue of them and a dump may come before.
+constexpr int64_t MAX_WAIT_NS = int64_t{300} * 1000000000;
+
+const Request& request_of(uint64_t index) {
+    return REQUESTS[index % REQUEST_COUNT];
+}
+
+std::string value_text(unsigned which, unsigned value) {
+    switch (which) {
+        case SET_OVERWRITE:
+            return value ? "OK ENABLE" : "OK DISABLE";
+        case SET_MD_INTERNAL:
+            return value ? "OK INTERNAL" : "OK EXTERNAL";
+        default:
+            return "OK " + std::to_string(value);
+    }
+}
+
+unsigned value_of(unsigned which, const std::string& line) {
+    if (which == SET_OVERWRITE || which == SET_MD_INTERNAL) {
+        return line == value_text(which, 1);
+    }
+    return static_cast<unsigned>(strtoul(line.c_str() + 2, nullptr, 10));
+}
+
+bool is_error(const std::string& line, const char* codes) {
+    return line.size() == 7 && line.compare(0, 6, "ERROR ") == 0 && strchr(codes, line[6]);
+}
+
+// What the request sets, or null.
+Setting* set_by(const Request& request) {
+    switch (request.kind) {
+        case SETS:
+            return &g_state->settings[request.what];
+        case SETS_STREAM:
+            return &g_state->streams[request.what].logged;
+        default:
+            return nullptr;
+    }
+}
+
+// Compares a value with what was set when it was asked for; one that was uncertain is known
+// from now on.
+bool agrees(Setting& setting, unsigned value, const Setting& expected, bool contested) {
+    if (!expected.uncertain && !contested) {
+        return value == expected.value;
+    }
+    if (setting.uncertain && !contested) {
+        setting.value = value;
+        setting.uncertain = false;
+    }
+    return true;
+}
+
+// What the request asks for, or null.
+Setting* asked_by(const Request& request) {
+    switch (request.kind) {
+        case GETS:
+            return &g_state->settings[request.what];
+        case GETS_STREAM:
+            return &g_state->streams[request.what].logged;
+        default:
+            return nullptr;
+    }
+}
+
+bool acceptable(const Request& request, const std::string& line, const Setting& expected,
+                bool contested) {
+    switch (request.kind) {
+        case DOES:
+        case SETS:
+        case SETS_STREAM:
+            return line == "OK";
+        case MAY:
+            return line == "OK" || is_error(line, "34");
+        case SAVES:
+            return line == "OK" || is_error(line, "345678");
+        case WRONG:
+            return line == "ERROR " + std::to_string(request.what);
+        case GETS: {
+            const unsigned value = value_of(request.what, line);
+            return line == value_text(request.what, value) &&
+                   agrees(*asked_by(request), value, expected, contested);
+        }
+        case GETS_STREAM:
+            return (line == "OK ON" || line == "OK OFF") &&
+                   agrees(*asked_by(request), line == "OK ON", expected, contested);
+        case NOTHING:
+            break;
+    }
+    return false;
+}
+
+}  // namespace
+
+uint64_t Clients::request_named(const char* text) {
+    uint64_t index = 0;
+    while (strcmp(REQUESTS[index].text, text) != 0) {
+        ++index;
+    }
+    return index;
+}
+
+bool Clients::connected(Client& client) {
+    if (client.fd >= 0) {
+        return true;
+    }
+    client.fd = socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
+    struct sockaddr_un address;
+    memset(&address, 0, sizeof(address));
+    address.sun_family = AF_UNIX;
+    const std::string name = "kestmodem@" + m_root;
+    memcpy(address.sun_path + 1, name.data(), name.size());
+    const socklen_t len =
+        static_cast<socklen_t>(offsetof(struct sockaddr_un, sun_path) + 1 + name.size());
+    if (connect(client.fd, reinterpret_cast<struct sockaddr*>(&address), len) < 0) {
+        close(client.fd);
+        client.fd = -1;
+        return false;
+    }
+    return true;
+}
+
+void Clients::drop(Client& client) {
+    for (const Asked& asked : client.asked) {
+        if (Setting* const setting = set_by(request_of(asked.index))) {
+            setting->uncertain = true;
+        }
+    }
+    m_ghosts = m_ghosts || !client.asked.empty();
+    if (client.fd >= 0) {
+        close(client.fd);
+    }
+    client = Client();
+    for (Client& other : m_clients) {
+        for (Asked& asked : other.asked) {
+            asked.at = g_state->boot_ns;  // it may have waited for this place
+        }
+    }
+}
+
+// Requests behind one that waits for a transaction would be answered before it.
+bool Clients::saves(const Client& client) {
+    return !client.asked.empty() && request_of(client.asked.back().index).kind == SAVES;
+}
+
+void Clients::ask(Client& client, uint64_t index) {
+    const Request& request = request_of(index);
+    if (request.kind == NOTHING) {
+        return;
+    }
+    bool contested = m_ghosts;
+    for (Client& other : m_clients) {
+        if (&other != &client && !other.asked.empty()) {
+            contested = true;
+            for (Asked& asked : other.asked) {
+                asked.contested = true;
+            }
+        }
+    }
+    if (Setting* const setting = set_by(request)) {
+        setting->value = request.argument;
+        setting->uncertain = contested;
+        if (request.kind == SETS) {
+            g_state->save_failed = false;
+        }
+    }
+    if (strcmp(request.text, "kestctl reload") == 0) {
+        for (StreamState& stream : g_state->streams) {
+            stream.logged.uncertain = true;
+        }
+    }
+    if (strncmp(request.text, "SUBSCRIBE WC", 12) == 0) {
+        client.subscribed = true;
+    }
+    const Setting* const asked = asked_by(request);
+    client.asked.push_back({index, g_state->boot_ns, contested, asked ? *asked : Setting()});
+    ++g_state->counters.requests;
+}
+
+void Clients::send_text(Client& client, const std::string& text) {
+    if (send(client.fd, text.data(), text.size(), MSG_NOSIGNAL) !=
+        static_cast<ssize_t>(text.size())) {
+        drop(client);
+    }
+}
+
+void Clients::request(unsigned number, uint64_t index, bool in_pieces) {
+    Client& client = m_clients[number % COUNT];
+    if (saves(client) || !connected(client) || !client.rest.empty()) {
+        return;
+    }
+    std::string text =
+        std::string(request_of(index).text) + (index % 3 ? "\n" : std::string(1, '\0'));
+    trace("client %u: %s", number % COUNT, request_of(index).text);
+    ask(client, index);
+    if (in_pieces) {
+        client.rest = text.substr(text.size() / 2);
+        text.resize(text.size() / 2);
+    }
+    send_text(client, text);
+}
+
+void Clients::flood(unsigned number, uint64_t index) {
+    Client& client = m_clients[number % COUNT];
+    if (saves(client) || !connected(client) || !client.rest.empty()) {
+        return;
+    }
+    std::string text;
+    for (uint64_t i = index; i < index + 10; ++i) {
+        if (request_of(i).kind == SAVES) {
+            continue;
+        }
+        text.append(request_of(i).text).append("\n");
+        ask(client, i);
+    }
+    send_text(client, text);
+}
+
+void Clients::leave(unsigned number) {
+    drop(m_clients[number % COUNT]);
+}
+
+void Clients::finish_pieces() {
+    for (Client& client : m_clients) {
+        if (client.fd >= 0 && !client.rest.empty()) {
+            const std::string rest = client.rest;
+            client.rest.clear();
+            if (!client.asked.empty()) {
+                client.asked.back().at = g_state->boot_ns;
+            }
+            send_text(client, rest);
+        }
+    }
+}
+
+void Clients::pump() {
+    for (Client& client : m_clients) {
+        char bytes[1024];
+        while (client.fd >= 0) {
+            const ssize_t n = recv(client.fd, bytes, sizeof(bytes), 0);
+            if (n <= 0) {
+                if (n == 0 || errno != EAGAIN) {
+                    if (!g_state->fault_seen) {
+                        fail_run("reply", "a client was disconnected");
+                    }
+                    drop(client);
+                }
+                break;
+            }
+            client.received.append(bytes, static_cast<size_t>(n));
+            for (size_t end; (end = client.received.find('\n')) != std::string::npos;) {
+                const std::string line = client.received.substr(0, end);
+                client.received.erase(0, end + 1);
+                take_line(client, line);
+            }
+        }
+    }
+}
+
+void Clients::take_line(Client& client, const std::string& line) {
+    trace("reply %s", line.c_str());
+    if (line.compare(0, 8, "CP_DUMP_") == 0) {
+        take_notice(client, line);
+        return;
+    }
+    ++g_state->counters.replies;
+    if (client.asked.empty()) {
+        fail_run("reply", "'%s' answers no request", line.c_str());
+    }
+    const char* request;
+    do {
+        const Asked asked = client.asked.front();
+        client.asked.pop_front();
+        request = request_of(asked.index).text;
+        const Request& done = request_of(asked.index);
+        if (acceptable(done, line, asked.expected, asked.contested)) {
+            if (done.kind == SAVES && line == "OK") {
+                world().check_saved(done.what, strncmp(done.text, "SAVE_RINGBUF", 12) == 0
+                                                   ? "_ringbuf_"
+                                                   : "_sleeplog_");
+            }
+            return;
+        }
+    } while (g_state->reply_lost && !client.asked.empty());
+    fail_run("reply", "'%s' is answered '%s'", request, line.c_str());
+}
+
+void Clients::take_notice(Client& client, const std::string& line) {
+    const bool start = line.compare(0, 14, "CP_DUMP_START ") == 0;
+    const std::string cp = line.substr(start ? 14 : 12);
+    const unsigned stream = cp == "WCDMA" ? ST_WCDMA : ST_WCN;
+    int& open = client.dumps[stream];
+    open += start ? 1 : -1;
+    ++g_state->counters.dumps;
+    // A client that subscribed during a dump hears its end only.
+    if (open > 1 || open < -1) {
+        fail_run("notice", "'%s', %d dumps are open", line.c_str(), open);
+    }
+    if (open < 0) {
+        open = 0;
+    }
+}
+
+unsigned Clients::connected_count() const {
+    unsigned connected = 0;
+    for (const Client& client : m_clients) {
+        connected += client.fd >= 0;
+    }
+    return connected;
+}
+
+void Clients::service_rests() {
+    m_ghosts = m_ghosts && connected_count() >= SERVED;
+}
+
+void Clients::check_waiting() const {
+    if (connected_count() > SERVED) {
+        return;
+    }
+    for (const Client& client : m_clients) {
+        if (!client.asked.empty() && client.rest.empty() &&
+            g_state->boot_ns - client.asked.front().at > MAX_WAIT_NS && !g_state->fault_seen) {
+            fail_run("reply", "'%s' is not answered", request_of(client.asked.front().index).text);
+        }
+    }
+}
+
+bool Clients::waiting() const {
+    for (const Client& client : m_clients) {
+        if (!client.asked.empty()) {
+            return true;
+        }
+    }
+    return false;
+}
+
+void Clients::mark_uncertain() {
+    for (const Client& client : m_clients) {
+        for (const Asked& asked : client.asked) {
+            if (Setting* const setting = set_by(request_of(asked.index))) {
+                setting->uncertain = true;
+            }
+        }
+    }
+}

@@ -1,0 +1,335 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "simulation/Ledger.h"
+
+#include <string.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <fstream>
+#include <vector>
+
+#include "simulation/Calls.h"
+#include "simulation/CodedStream.h"
+#include "simulation/State.h"
+
+namespace {
+
+constexpr size_t RECORD_LEN = 16;
+const uint8_t RECORD_MAGIC[] = {0x78, 0x56, 0x34, 0x12};
+constexpr size_t CHUNK_HEADER_LEN = 20;
+constexpr uint8_t CHUNK_KIND_LOG = 0x40;
+// Bytes of something else may go on like a stream by chance, but not more than these.
+constexpr uint64_t CHANCE = 8;
+// A slice of fewer bytes may hold no whole word of the stream.
+constexpr size_t LOCATABLE = 15;
+
+const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
+
+unsigned long long number(uint64_t n) {
+    return n;
+}
+
+void gap(unsigned stream, uint64_t to) {
+    StreamState& s = g_state->streams[stream];
+    const uint64_t len = to - s.written;
+    trace("lost %s %llu bytes at %llu", NAMES[stream], number(len), number(s.written));
+    if (s.written > s.excuse_until || len > s.excuse + s.unplaced) {
+        fail_run("lost", "%s: %llu bytes lost at %llu; explained are %llu up to %llu",
+                 NAMES[stream], number(len), number(s.written), number(s.excuse),
+                 number(s.excuse_until));
+    }
+    s.excuse -= std::min(len, s.excuse);
+    s.unplaced = 0;
+    s.lost += len;
+    s.written = to;
+}
+
+// Bytes of the stream that reached a file.
+void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
+    StreamState& s = g_state->streams[stream];
+    s.stored += len;
+    s.removed += removed ? len : 0;
+    while (len > 0) {
+        size_t same = coded_stream::match(
+            stream, s.written, data,
+            static_cast<size_t>(std::min<uint64_t>(len, s.consumed - s.written)));
+        if (s.answers_logged > 0 && same < LOCATABLE && same < len) {
+            same = 0;  // as good as chance
+        }
+        s.written += same;
+        data += same;
+        len -= same;
+        if (len == 0) {
+            break;
+        }
+        uint64_t position;
+        if (s.answers_logged > 0 &&
+            (len < LOCATABLE || !coded_stream::locate(stream, data, len, &position))) {
+            --s.answers_logged;
+            ++s.unplaced;
+            ++data;
+            --len;
+            continue;
+        }
+        if (len < LOCATABLE || !coded_stream::locate(stream, data, len, &position)) {
+            if (len < LOCATABLE && s.written + len <= s.consumed) {
+                // Too short to tell: somewhere behind a gap.
+                trace("%s: %zu bytes that cannot be placed", NAMES[stream], len);
+                s.unplaced += len;
+                return;
+            }
+            fail_run("foreign",
+                     "%s: %zu bytes behind %llu are not the stream's: %02x %02x %02x %02x ...",
+                     NAMES[stream], len, number(s.written), data[0], data[1], data[2], data[3]);
+        }
+        if (position < s.written && s.written - position <= CHANCE && s.answers_seen) {
+            s.written = position;  // the last bytes before were an answer's
+            continue;
+        }
+        if (position < s.written) {
+            fail_run("twice", "%s: bytes of %llu are written once more at %llu", NAMES[stream],
+                     number(position), number(s.written));
+        }
+        gap(stream, position);
+    }
+    if (s.written > s.consumed) {
+        fail_run("foreign", "%s: written up to %llu, read only up to %llu", NAMES[stream],
+                 number(s.written), number(s.consumed));
+    }
+    if (s.written > s.excuse_until) {
+        s.excuse = 0;
+    }
+}
+
+bool is_chunk_header(const uint8_t* data, size_t len) {
+    return len >= CHUNK_HEADER_LEN && memcmp(data, "~~~~", 4) == 0 && data[8] == 0x5a &&
+           data[9] == 0x5a;
+}
+
+void take_chunks(FdInfo& file, const uint8_t* data, size_t len) {
+    if (len >= 4 && memcmp(data, "~~~~", 4) == 0 &&
+        (file.payload_left > 0 || file.header_len > 0)) {
+        // A full medium cut the last chunk off.
+        trace("%s: chunk cut off", NAMES[file.stream]);
+        ++g_state->streams[file.stream].cuts;
+        file.payload_left = file.header_len = 0;
+    }
+    while (len > 0) {
+        if (file.payload_left > 0) {
+            const size_t n = std::min(len, file.payload_left);
+            if (file.header[19] == CHUNK_KIND_LOG) {
+                take(file.stream, data, n, file.removed);
+            }
+            file.payload_left -= n;
+            data += n;
+            len -= n;
+            continue;
+        }
+        file.header[file.header_len++] = *data++;
+        --len;
+        if (file.header_len == CHUNK_HEADER_LEN) {
+            file.header_len = 0;
+            file.payload_left = static_cast<size_t>(file.header[4] | file.header[5] << 8) - 16;
+            if (memcmp(file.header, "~~~~", 4) != 0 || file.payload_left > 65535) {
+                fail_run("foreign", "agdsp: no chunk where one has to begin");
+            }
+        }
+    }
+}
+
+// Bytes that reached a file, without the time record that may head it.
+size_t skip_record(FdInfo& file, const uint8_t* data, size_t len) {
+    if (file.stream == ST_DSP || file.position >= RECORD_LEN) {
+        return 0;
+    }
+    if (file.position == 0) {
+        file.has_record = memcmp(data, RECORD_MAGIC, std::min(len, sizeof(RECORD_MAGIC))) == 0;
+        // In the calm, nothing is in the way of the record.
+        if (!file.has_record && file.stream == ST_WCDMA && file.opened_in_calm) {
+            fail_run("record", "a log file of the modem has no time record");
+        }
+    }
+    return file.has_record ? std::min<size_t>(len, static_cast<size_t>(RECORD_LEN - file.position))
+                           : 0;
+}
+
+std::vector<uint8_t> content(const std::string& path) {
+    std::vector<uint8_t> bytes;
+    std::ifstream in(path, std::ios::binary | std::ios::ate);
+    if (in) {
+        bytes.resize(static_cast<size_t>(in.tellg()));
+        in.seekg(0);
+        in.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
+    }
+    return bytes;
+}
+
+// For how many bytes a header that begins there goes on until another one begins: 0 when it is
+// whole.
+size_t cut_header(const std::vector<uint8_t>& bytes, size_t at) {
+    for (size_t len = 4; len < CHUNK_HEADER_LEN && at + len < bytes.size(); ++len) {
+        if (is_chunk_header(bytes.data() + at + len, bytes.size() - at - len)) {
+            return len;
+        }
+    }
+    return 0;
+}
+
+// Whether a chunk begins there, be it one that a full medium cut off within its header.
+bool chunk_begins(const std::vector<uint8_t>& bytes, size_t at) {
+    return bytes.size() - at >= 4 && memcmp(bytes.data() + at, "~~~~", 4) == 0 &&
+           (is_chunk_header(bytes.data() + at, bytes.size() - at) || cut_header(bytes, at) > 0);
+}
+
+std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
+    std::vector<uint8_t> payload;
+    for (size_t at = 0; at < bytes.size();) {
+        if (!is_chunk_header(bytes.data() + at, bytes.size() - at)) {
+            ++at;  // the rest of a header that was cut off
+            continue;
+        }
+        if (const size_t cut = cut_header(bytes, at)) {
+            at += cut;
+            continue;
+        }
+        const size_t len = static_cast<size_t>(bytes[at + 4] | bytes[at + 5] << 8) - 16;
+        const bool log = bytes[at + 19] == CHUNK_KIND_LOG;
+        const size_t from = at + CHUNK_HEADER_LEN;
+        const size_t end = std::min(from + len, bytes.size());
+        at = from;
+        while (at < end && !chunk_begins(bytes, at)) {
+            const void* const flag = memchr(&bytes[at] + 1, '~', end - at - 1);
+            at = flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - bytes.data()) : end;
+        }
+        if (log) {
+            payload.insert(payload.end(), bytes.begin() + static_cast<ptrdiff_t>(from),
+                           bytes.begin() + static_cast<ptrdiff_t>(at));
+        }
+    }
+    return payload;
+}
+
+// The stream's bytes of a whole log file.
+std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
+    std::vector<uint8_t> bytes = content(path);
+    if (stream == ST_DSP) {
+        return chunk_payload(bytes);
+    }
+    if (bytes.size() >= sizeof(RECORD_MAGIC) &&
+        memcmp(bytes.data(), RECORD_MAGIC, sizeof(RECORD_MAGIC)) == 0) {
+        bytes.erase(bytes.begin(),
+                    bytes.begin() + static_cast<ptrdiff_t>(std::min(RECORD_LEN, bytes.size())));
+    }
+    return bytes;
+}
+
+}  // namespace
+
+namespace ledger {
+
+void excuse(unsigned stream) {
+    StreamState& s = g_state->streams[stream];
+    s.excuse = s.consumed - s.written;
+    s.excuse_until = s.consumed;
+}
+
+void excuse_all() {
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        excuse(stream);
+    }
+}
+
+void excuse_kill() {
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        StreamState& s = g_state->streams[stream];
+        const uint64_t open = s.consumed - s.written;
+        if (open > STAGED_AND_BLOCK + s.excuse) {
+            fail_run("lost", "%s: %llu bytes were not on the medium when the service was killed",
+                     NAMES[stream], number(open));
+        }
+        excuse(stream);
+    }
+}
+
+void consumed(unsigned stream, size_t len, bool diverted) {
+    StreamState& s = g_state->streams[stream];
+    s.consumed += len;
+    g_state->counters.bytes += len;
+    if (diverted) {
+        excuse(stream);
+    }
+    const uint64_t open = s.consumed - s.written;
+    if (open > STAGED_AND_BLOCK + s.excuse) {
+        fail_run("lost", "%s: %llu bytes read and not written", NAMES[stream], number(open));
+    }
+}
+
+void file_written(FdInfo& file, const uint8_t* data, size_t len) {
+    const size_t record = skip_record(file, data, len);
+    file.position += len;
+    data += record;
+    len -= record;
+    if (file.stream == ST_DSP) {
+        take_chunks(file, data, len);
+    } else {
+        take(file.stream, data, len, file.removed);
+    }
+}
+
+void file_removed(const std::string& path, unsigned stream) {
+    g_state->streams[stream].removed += stream_part(path, stream).size();
+    struct stat st;
+    if (stat(path.c_str(), &st) != 0) {
+        return;
+    }
+    for (FdInfo& info : g_fds) {
+        if (info.cls == FD_LOG_FILE && info.inode == st.st_ino) {
+            info.removed = true;
+        }
+    }
+}
+
+void check_settled() {
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        const StreamState& s = g_state->streams[stream];
+        const uint64_t open = s.consumed - s.written;
+        if (open > s.excuse || (open > 0 && s.written > s.excuse_until)) {
+            fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
+                     number(open));
+        }
+        if (s.logged.value && !s.logged.uncertain && s.fed != s.consumed) {
+            fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],
+                     number(s.fed - s.consumed));
+        }
+        if (s.logged.value && !s.logged.uncertain && open > 0) {
+            fail_run("stopped", "%s: the last bytes, in calm, are not in a file", NAMES[stream]);
+        }
+    }
+}
+
+uint64_t stream_bytes(const std::string& path, unsigned stream) {
+    const std::vector<uint8_t> bytes = stream_part(path, stream);
+    uint64_t next = 0;
+    for (size_t at = 0; at < bytes.size();) {
+        uint64_t position;
+        if (!coded_stream::locate(stream, bytes.data() + at, bytes.size() - at, &position)) {
+            if (bytes.size() - at < LOCATABLE) {
+                break;
+            }
+            ++at;  // a slice too short to tell
+            continue;
+        }
+        if (position + CHANCE < next) {
+            fail_run("order", "%s: bytes of %llu behind %llu", path.c_str(), number(position),
+                     number(next));
+        }
+        const size_t same =
+            coded_stream::match(stream, position, bytes.data() + at, bytes.size() - at);
+        at += same;
+        next = position + same;
+    }
+    return bytes.size();
+}
+
+}  // namespace ledger

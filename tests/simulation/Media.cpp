@@ -1,0 +1,338 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "simulation/Media.h"
+
+#include <string.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <map>
+#include <set>
+
+#include "simulation/Calls.h"
+#include "simulation/Ledger.h"
+#include "simulation/Plan.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+const char* const CP_NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
+const char* const HOSTILE_NAMES[] = {
+    "it's; rm -rf x",      "-rf",    "$(id)", "9999-99-99-99-99-99",
+    "2020-01-01-00-00-00", "a b\nc", "0",     "*"};
+
+// In an order that is the same each time.
+std::vector<fs::path> entries(const fs::path& dir) {
+    std::vector<fs::path> found;
+    std::error_code error;
+    for (fs::directory_iterator it(dir, error), end; !error && it != end; it.increment(error)) {
+        found.push_back(it->path());
+    }
+    std::sort(found.begin(), found.end());
+    return found;
+}
+
+bool is_dir(const fs::path& path) {
+    struct stat st;
+    return lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
+}
+
+std::vector<fs::path> dirs(const fs::path& dir) {
+    std::vector<fs::path> found = entries(dir);
+    found.erase(std::remove_if(found.begin(), found.end(),
+                               [](const fs::path& each) { return !is_dir(each); }),
+                found.end());
+    return found;
+}
+
+template <typename T>
+const T* pick(const std::vector<T>& all, Chance& chance) {
+    return all.empty() ? nullptr : &all[chance.below(all.size())];
+}
+
+void make_text_file(const fs::path& path) {
+    std::ofstream(path) << "stranger";
+}
+
+}  // namespace
+
+std::string Media::log_root(MediumId medium) const {
+    return m_root + (medium == MED_DATA ? "/data/modem_log" : "/card/modem_log");
+}
+
+unsigned Media::stream_of(const std::string& path) {
+    const std::string dir = fs::path(path).parent_path().filename();
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        if (dir == CP_NAMES[stream]) {
+            return stream;
+        }
+    }
+    return STREAM_COUNT;
+}
+
+bool Media::is_log_name(const std::string& name) {
+    const size_t digits = name.find_first_not_of("0123456789");
+    return digits != 0 && digits != std::string::npos && name[digits] == '-' && name.size() > 4 &&
+           name.compare(name.size() - 4, 4, ".log") == 0;
+}
+
+// ---- Cards
+
+void Media::pull_card() {
+    if (!g_state->card_in) {
+        return;
+    }
+    g_state->card_in = false;
+    g_state->card_read_only = false;
+    g_state->room[MED_CARD] = UINT64_MAX;
+    ++g_state->card_generation;
+    rename((m_root + "/card").c_str(),
+           (m_root + "/cards/" + std::to_string(g_state->card)).c_str());
+    mkdir((m_root + "/card").c_str(), 0775);
+    // What was staged for it is lost, in every channel.
+    ledger::excuse_all();
+}
+
+void Media::insert_card(bool fresh) {
+    if (g_state->card_in) {
+        return;
+    }
+    rmdir((m_root + "/card").c_str());
+    if (fresh) {
+        g_state->card += 1;
+        mkdir((m_root + "/card").c_str(), 0775);
+    } else {
+        rename((m_root + "/cards/" + std::to_string(g_state->card)).c_str(),
+               (m_root + "/card").c_str());
+    }
+    g_state->card_in = true;
+}
+
+std::vector<std::string> Media::trees() const {
+    std::vector<std::string> all = {log_root(MED_DATA), log_root(MED_CARD)};
+    for (const fs::path& card : dirs(m_root + "/cards")) {
+        all.push_back(card.string() + "/modem_log");
+    }
+    return all;
+}
+
+// ---- Looking
+
+Media::Seen Media::look(MediumId medium) const {
+    return look_at(log_root(medium));
+}
+
+Media::Seen Media::look_at(const std::string& tree) const {
+    Seen seen;
+    const std::vector<fs::path> sets = dirs(tree);
+    for (const fs::path& set : sets) {
+        seen.spared = 0;
+        for (const fs::path& cp : dirs(set)) {
+            std::map<uint64_t, uint64_t> sizes;
+            for (const fs::path& file : entries(cp)) {
+                struct stat st;
+                if (lstat(file.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) {
+                    continue;
+                }
+                const uint64_t size = static_cast<uint64_t>(st.st_size);
+                seen.bytes += size;
+                const unsigned stream = stream_of(file);
+                if (is_log_name(file.filename()) && stream < STREAM_COUNT) {
+                    const uint64_t number = strtoull(file.filename().c_str(), nullptr, 10);
+                    seen.logs.push_back({file, stream, number, size});
+                    sizes[number] = size;
+                }
+            }
+            if (!sizes.empty()) {
+                seen.spared += sizes.begin()->second + sizes.rbegin()->second;
+            }
+        }
+    }
+    return seen;
+}
+
+bool Media::holds(unsigned stream, const char* kind, const std::string& content) const {
+    for (const std::string& tree : trees()) {
+        for (const fs::path& set : dirs(tree)) {
+            for (const fs::path& file : entries(set / CP_NAMES[stream])) {
+                if (file.filename().native().find(kind) == std::string::npos ||
+                    fs::file_size(file) != content.size()) {
+                    continue;
+                }
+                std::ifstream in(file, std::ios::binary);
+                if (std::string(std::istreambuf_iterator<char>(in), {}) == content) {
+                    return true;
+                }
+            }
+        }
+    }
+    return false;
+}
+
+bool Media::must_refuse(MediumId medium, uint64_t quota, bool overwrite) const {
+    // What is staged counts and is not seen here.
+    constexpr uint64_t UNSEEN = STREAM_COUNT * 2 * 65536;
+    const Seen seen = look(medium);
+    return quota != 0 && (overwrite ? seen.spared : seen.bytes) + UNSEEN >= quota;
+}
+
+// ---- Other people's hands
+
+void Media::book_removal(const std::string& path) const {
+    struct stat st;
+    const unsigned stream = stream_of(path);
+    if (lstat(path.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) {
+        return;
+    }
+    const uint64_t size = static_cast<uint64_t>(st.st_size);
+    if (stream < STREAM_COUNT && is_log_name(fs::path(path).filename())) {
+        ledger::file_removed(path, stream);
+    }
+    const bool card = path.compare(0, m_root.size() + 6, m_root + "/card/") == 0;
+    uint64_t& room = g_state->room[card ? MED_CARD : MED_DATA];
+    room = room > UINT64_MAX - size ? UINT64_MAX : room + size;
+}
+
+void Media::remove_all(const std::string& path) {
+    if (is_dir(path)) {
+        for (const fs::path& each : entries(path)) {
+            remove_all(each);
+        }
+        rmdir(path.c_str());
+        return;
+    }
+    book_removal(path);
+    unlink(path.c_str());
+}
+
+void Media::remove_matching(const std::string& dir) {
+    for (const fs::path& each : entries(dir)) {
+        if (isdigit(each.filename().native()[0])) {
+            remove_all(each);
+        }
+    }
+}
+
+bool Media::remove_something(uint64_t what, Chance chance) {
+    const std::string tree = log_root(chance.one_in(2) ? MED_DATA : MED_CARD);
+    const std::vector<fs::path> sets = dirs(tree);
+    const fs::path* const set =
+        sets.empty() || chance.one_in(2) ? pick(sets, chance) : &sets.back();
+    const std::vector<fs::path> cps = set ? dirs(*set) : std::vector<fs::path>();
+    const fs::path* const cp = pick(cps, chance);
+    const std::vector<fs::path> files = cp ? entries(*cp) : std::vector<fs::path>();
+    const fs::path* victim = nullptr;
+    const fs::path whole(tree);
+    switch (what % DEL_COUNT) {
+        case DEL_LOG:
+            victim = files.empty() ? nullptr : &files.front();
+            break;
+        case DEL_FILE:
+            victim = pick(files, chance);
+            break;
+        case DEL_CP_DIR:
+            victim = cp;
+            break;
+        case DEL_SET:
+            victim = set;
+            break;
+        default:
+            victim = &whole;
+            break;
+    }
+    if (!victim) {
+        return false;
+    }
+    trace("somebody deletes %s", victim->c_str());
+    g_state->tampered = true;
+    remove_all(*victim);
+    return true;
+}
+
+void Media::make_something(uint64_t what, Chance chance) {
+    const MediumId medium = chance.one_in(2) || !g_state->card_in ? MED_DATA : MED_CARD;
+    const std::vector<fs::path> sets = dirs(log_root(medium));
+    const std::vector<fs::path> cps = sets.empty() ? sets : dirs(sets.back());
+    const fs::path dir = cps.empty() ? fs::path(log_root(medium)) : *pick(cps, chance);
+    const fs::path path = dir / chance.pick(HOSTILE_NAMES);
+    struct stat st;
+    if (lstat(path.c_str(), &st) == 0) {
+        return;
+    }
+    trace("somebody makes %s", path.c_str());
+    g_state->tampered = true;
+    switch (what % 5) {
+        case 0:
+            make_text_file(path);
+            break;
+        case 1:
+            mkdir(path.c_str(), 0775);
+            make_text_file(path / "inside");
+            break;
+        case 2:
+            if (symlink("/etc", path.c_str()) < 0) {
+                break;
+            }
+            break;
+        case 3:
+            mkfifo(path.c_str(), 0666);
+            break;
+        default:
+            mkdir((fs::path(log_root(medium)) / chance.pick(HOSTILE_NAMES)).c_str(), 0775);
+            break;
+    }
+}
+
+// ---- Checks
+
+void Media::check_bytes() const {
+    uint64_t there[STREAM_COUNT] = {};
+    for (const std::string& tree : trees()) {
+        for (const LogFileSeen& log : look_at(tree).logs) {
+            there[log.stream] += ledger::stream_bytes(log.path, log.stream);
+        }
+    }
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        const StreamState& s = g_state->streams[stream];
+        // The first bytes of a header that was cut off there may look like the payload's last.
+        const uint64_t expected = s.stored - s.removed;
+        const uint64_t difference =
+            there[stream] > expected ? there[stream] - expected : expected - there[stream];
+        if (difference > 3 * s.cuts) {
+            fail_run("media", "%s: %llu bytes on the media, %llu written and %llu of them deleted",
+                     CP_NAMES[stream], static_cast<unsigned long long>(there[stream]),
+                     static_cast<unsigned long long>(s.stored),
+                     static_cast<unsigned long long>(s.removed));
+        }
+    }
+}
+
+void Media::check_names() const {
+    if (g_state->tampered || g_state->faulted) {
+        return;
+    }
+    constexpr uint64_t MAX_SIZE = (2 << 20) + 65536;
+    for (MediumId medium : {MED_DATA, MED_CARD}) {
+        std::map<std::string, std::set<uint64_t>> numbers;
+        for (const LogFileSeen& log : look(medium).logs) {
+            if (log.size > MAX_SIZE) {
+                fail_run("size", "%s has %llu bytes", log.path.c_str(),
+                         static_cast<unsigned long long>(log.size));
+            }
+            if (!numbers[fs::path(log.path).parent_path()].insert(log.number).second) {
+                fail_run("numbers", "%s: its number is there twice", log.path.c_str());
+            }
+        }
+        for (const auto& dir : numbers) {
+            // One may be missing behind 0, and one more after a kill.
+            const size_t missing = *dir.second.rbegin() + 1 - dir.second.size();
+            if (missing > (g_state->killed ? 2u : 1u)) {
+                fail_run("numbers", "%s: %zu numbers are missing", dir.first.c_str(), missing);
+            }
+        }
+    }
+}

@@ -1,0 +1,68 @@
+// SPDX-License-Identifier: Apache-2.0
+// The media as somebody sees them who looks from outside, and what others do to them: cards
+// that come and go, files that are deleted or made under the service's hands.
+#ifndef SIMULATION_MEDIA_H_
+#define SIMULATION_MEDIA_H_
+
+#include <stdint.h>
+#include <sys/stat.h>
+
+#include <string>
+#include <vector>
+
+#include "simulation/Chance.h"
+#include "simulation/State.h"
+
+class Media {
+public:
+    explicit Media(const std::string& root) : m_root(root) {}
+
+    struct LogFileSeen {
+        std::string path;
+        unsigned stream;
+        uint64_t number;
+        uint64_t size;
+    };
+    struct Seen {
+        std::vector<LogFileSeen> logs;
+        uint64_t bytes = 0;   // of all files
+        uint64_t spared = 0;  // of those that a quota does not delete, of the newest set
+    };
+
+    std::string log_root(MediumId medium) const;
+
+    void pull_card();
+    // fresh: another one, empty.
+    void insert_card(bool fresh);
+    // Everything of one medium that is there now.
+    Seen look(MediumId medium) const;
+    // Whether a file of the stream's directory, with this in its name, has that content.
+    bool holds(unsigned stream, const char* kind, const std::string& content) const;
+    // Whether the medium is so full, by its quota, that a write has to be refused.
+    bool must_refuse(MediumId medium, uint64_t quota, bool overwrite) const;
+
+    // Somebody else's hands. False when there was nothing to delete.
+    bool remove_something(uint64_t what, Chance chance);
+    void make_something(uint64_t what, Chance chance);
+    // rm -fr, also of a pattern at the end. Log files that go are booked.
+    void remove_all(const std::string& path);
+    void remove_matching(const std::string& dir);
+    // Books a file that is about to be deleted.
+    void book_removal(const std::string& path) const;
+
+    // Compares the bytes that were written with those that are there, on every card, and the
+    // names with their rules.
+    void check_bytes() const;
+    void check_names() const;
+    // The stream whose directory this is part of, or STREAM_COUNT.
+    static unsigned stream_of(const std::string& path);
+    static bool is_log_name(const std::string& name);
+
+private:
+    std::vector<std::string> trees() const;
+    Seen look_at(const std::string& tree) const;
+
+    const std::string m_root;
+};
+
+#endif  // SIMULATION_MEDIA_H_

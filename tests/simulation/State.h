@@ -1,0 +1,114 @@
+// SPDX-License-Identifier: Apache-2.0
+// What survives a kill of the service: the state of the world around it and of the model that
+// judges it. Lies in memory that all lives of the service, each a process of its own, share; so
+// it is plain data.
+#ifndef SIMULATION_STATE_H_
+#define SIMULATION_STATE_H_
+
+#include <stddef.h>
+#include <stdint.h>
+
+enum StreamId : unsigned { ST_WCDMA, ST_WCN, ST_GNSS, ST_DSP, STREAM_COUNT };
+enum MediumId : unsigned { MED_DATA, MED_CARD, MEDIUM_COUNT };
+
+// The settings that clients can ask for, as they were set last.
+enum SettingId : unsigned {
+    SET_FILE_MB,
+    SET_DATA_MB,
+    SET_CARD_MB,
+    SET_OVERWRITE,
+    SET_MD_INTERNAL,
+    SETTING_COUNT
+};
+
+struct Setting {
+    unsigned value;
+    bool uncertain;  // it was being changed when something failed, or by two at a time
+};
+
+// The bytes of one log device.
+struct StreamState {
+    uint64_t fed;       // given by the device so far
+    uint64_t consumed;  // read by the service
+    uint64_t written;   // up to where the service has written or lost them
+    uint64_t lost;      // of these
+    uint64_t stored;    // bytes that went to a file
+    uint64_t removed;   // of these: went with a file that was deleted
+    // Bytes of answers that the service read as log data, because no exchange ran.
+    uint64_t answers_logged;
+    bool answers_seen;  // there were such, at any time
+    uint64_t cuts;      // chunks that a full medium cut off
+    uint64_t unplaced;  // bytes in files, behind a gap, of slices too short to be placed
+    // How much may be lost, for what happened while not more than this was consumed.
+    uint64_t excuse;
+    uint64_t excuse_until;
+    bool gone;  // the device cannot be opened
+    Setting logged;
+    uint8_t answers;  // how the diag device answers
+};
+
+struct FaultRule {
+    bool active;
+    uint8_t call;
+    uint8_t place;
+    int error;  // 0: fewer bytes than asked for
+    uint32_t skip;
+    uint32_t times;  // UINT32_MAX: from now on
+};
+
+constexpr size_t MAX_FAULTS = 8;
+
+struct Counters {
+    uint64_t events;
+    uint64_t calls;
+    uint64_t faults;
+    uint64_t kills;
+    uint64_t bytes;
+    uint64_t requests;
+    uint64_t replies;
+    uint64_t dumps;
+    uint64_t passes;
+    uint64_t checks;
+};
+
+struct State {
+    int64_t boot_ns;
+    int64_t wall_ns;  // to be added for the time of day
+    uint32_t zone;
+    size_t next_event;
+    uint64_t digest;
+    uint64_t pass_calls;  // number of the call with which this pass of the loop began
+    uint64_t kill_at;     // number of the call that does not return; 0: none
+    int64_t props_ns;     // when the properties were last changed
+    uint32_t lives;
+
+    StreamState streams[STREAM_COUNT];
+    bool card_in;
+    bool card_read_only;
+    uint32_t card;                // number of the card in the slot, or of the last one
+    uint32_t card_generation;     // counts pulls
+    uint64_t room[MEDIUM_COUNT];  // bytes left; UINT64_MAX: no limit
+    FaultRule faults[MAX_FAULTS];
+    bool fault_in_step;  // something failed since the loop last waited
+    bool fault_seen;     // a call failed by a rule since everything was calm
+    bool starting;
+    int64_t calm_ns;  // when everything was put in order; 0: something happened since
+    bool reply_lost;  // by a failed write, since everything was calm
+    bool tampered;    // files were deleted or made by others: names need not be contiguous
+    bool killed;
+    bool faulted;           // fault_seen, at any time in the run
+    int64_t clock_back_ns;  // when the clock was last set back
+    Setting settings[SETTING_COUNT];
+    bool save_failed;       // the settings file may be older than the settings
+    uint32_t time_answers;  // TimeAnswers
+    bool supervisor_gone[2];
+    bool cp_reset[2];
+    uint32_t version;
+    int64_t card_told_ns;  // when the property tells that the card went; 0: it has been told
+
+    Counters counters;
+    char failure_class[24];
+    char failure[1500];
+};
+
+#endif  // SIMULATION_STATE_H_

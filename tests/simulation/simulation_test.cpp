@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+// The simulation in the test run: a few seeds of each weather, every plan that once found
+// something, and the proof that a seed repeats.
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <fstream>
+#include <string>
+
+#include "simulation/Runner.h"
+
+namespace {
+
+std::string text_of(const Plan& plan) {
+    std::string text;
+    for (const Event& event : plan) {
+        text += to_text(event) + "\n";
+    }
+    return text;
+}
+
+Plan read_plan(const std::filesystem::path& path) {
+    Plan plan;
+    std::ifstream in(path);
+    for (std::string line; std::getline(in, line);) {
+        EXPECT_TRUE(add_line(plan, line)) << path << ": " << line;
+    }
+    return plan;
+}
+
+TEST(Simulation, ASeedRepeatsExactlyAlsoWithKills) {
+    const Plan plan = make_plan(3, WEATHER_STORM, 300);
+    const RunResult first = run_plan(plan);
+    const RunResult second = run_plan(plan);
+    EXPECT_GT(first.counters.kills, 0u);
+    EXPECT_GT(first.counters.faults, 0u);
+    EXPECT_EQ(second.digest, first.digest);
+    EXPECT_EQ(second.counters.calls, first.counters.calls);
+}
+
+TEST(Simulation, APlanIsTheSameAfterItWasWrittenDown) {
+    const Plan plan = make_plan(7, WEATHER_STORM, 200);
+    Plan again;
+    std::string text = text_of(plan);
+    for (size_t end; (end = text.find('\n')) != std::string::npos; text.erase(0, end + 1)) {
+        ASSERT_TRUE(add_line(again, text.substr(0, end)));
+    }
+    EXPECT_EQ(text_of(again), text_of(plan));
+}
+
+TEST(Simulation, PlansThatOnceFoundSomethingFindNothing) {
+    size_t plans = 0;
+    for (const auto& entry : std::filesystem::directory_iterator(SIMULATION_REGRESSIONS)) {
+        const RunResult result = run_plan(read_plan(entry.path()));
+        EXPECT_TRUE(result.passed)
+            << entry.path() << ": " << result.failure_class << ": " << result.failure;
+        ++plans;
+    }
+    EXPECT_GT(plans, 0u);
+}
+
+class SimulatedWeather : public testing::TestWithParam<Weather> {};
+
+TEST_P(SimulatedWeather, NothingIsFound) {
+    for (uint64_t seed = 1; seed <= 5; ++seed) {
+        const RunResult result = run_plan(make_plan(seed, GetParam(), 300));
+        EXPECT_TRUE(result.passed)
+            << "seed " << seed << ": " << result.failure_class << ": " << result.failure;
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(All, SimulatedWeather,
+                         testing::Values(WEATHER_FAIR, WEATHER_OUTSIDE, WEATHER_FAULTS,
+                                         WEATHER_STORM));
+
+}  // namespace
