@@ -9,6 +9,16 @@
 
 #include <vector>
 
+// What stands in the frames of the exchanges, from the co-processor's side.
+constexpr uint8_t RING_BUFFER_TYPE = 0x3a;
+constexpr uint8_t SLEEP_LOG_TYPE = 0x3b;
+constexpr uint8_t SUB_REFUSED = 0x00;
+constexpr uint8_t SUB_END = 0x01;
+constexpr uint8_t SUB_DATA = 0x64;
+constexpr char DUMP_REQUEST[] = "3\n";
+constexpr char DUMP_END[] = "\nmodem_memdump_finish";      // of a modem, in a frame
+constexpr char CHIP_DUMP_END[] = "corbet_memdump_finish";  // of the WCN chip, unframed
+
 struct DiagFrame {
     uint32_t sequence = 0;
     uint8_t type = 0;

@@ -16,17 +16,8 @@ namespace {
 using std::chrono::milliseconds;
 
 const uint8_t DUMP_TYPE = 0x9d;  // the service looks at no type in a dump
-const uint8_t RING_BUFFER_TYPE = 0x3a;
-const uint8_t SLEEP_LOG_TYPE = 0x3b;
 const uint8_t OTHER_TYPE = 0x98;
-const uint8_t SUB_REFUSED = 0;
-const uint8_t SUB_END = 1;
-const uint8_t SUB_DATA = 0x64;
 const uint8_t SUB_UNEXPECTED = 0x42;
-
-const char DUMP_REQUEST[] = "3\n";
-const char DUMP_END[] = "\nmodem_memdump_finish";
-const char PUSH_END[] = "corbet_memdump_finish";
 
 // A service that has not read for so long will not read the rest.
 const int GIVE_UP_MS = 3000;
@@ -201,7 +192,7 @@ void SimDiagResponder::play_end(Exchange exchange, const Plan& plan, bool framed
     }
     if (!framed) {
         // In a piece of its own: what the service reads together with it is not kept.
-        const std::vector<uint8_t> end = to_bytes(PUSH_END);
+        const std::vector<uint8_t> end = to_bytes(CHIP_DUMP_END);
         const auto half = end.begin() + static_cast<long>(end.size() / 2);
         if (!wait_read()) {
             return;

@@ -21,13 +21,6 @@ const char* const LOG_PATHS[STREAM_COUNT] = {"/sim/wcdma_log", "/sim/wcn", "/sim
 const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", ""};
 const char* const QUIET_PATHS[] = {"/dev/audio_dsp_pcm", "/dev/audio_dsp_mem"};
 
-constexpr uint8_t TYPE_RING_BUFFER = 0x3a;
-constexpr uint8_t TYPE_SLEEP_LOG = 0x3b;
-constexpr uint8_t SUB_REFUSED = 0x00;
-constexpr uint8_t SUB_END = 0x01;
-constexpr uint8_t SUB_DATA = 0x64;
-const char DUMP_END[] = "\nmodem_memdump_finish";
-const char CHIP_DUMP_END[] = "corbet_memdump_finish";
 constexpr int64_t NS_PER_MS = 1000000;
 
 enum Answers : uint8_t { WELL, WELL_TOO, SLOWLY, REFUSING, WRONGLY, NEVER, CUT_OFF, ANSWERS_COUNT };
@@ -224,14 +217,14 @@ void Devices::take_requests(End& end, unsigned stream) {
     while ((n = recv(end.peer, bytes, sizeof(bytes), 0)) > 0) {
         end.requests.insert(end.requests.end(), bytes, bytes + n);
     }
-    if (end.requests.size() >= 2 && memcmp(end.requests.data(), "3\n", 2) == 0) {
+    if (end.requests.size() >= 2 && memcmp(end.requests.data(), DUMP_REQUEST, 2) == 0) {
         end.requests.clear();
         answer(end, stream, 0, true);
         return;
     }
     DiagFrame request;
     while (DiagFrame::take(end.requests, &request)) {
-        if (request.type == TYPE_RING_BUFFER || request.type == TYPE_SLEEP_LOG) {
+        if (request.type == RING_BUFFER_TYPE || request.type == SLEEP_LOG_TYPE) {
             answer(end, stream, request.type, false);
         }
     }
