@@ -3,28 +3,29 @@
 #ifndef BENCH_OPTIONS_H_
 #define BENCH_OPTIONS_H_
 
-#include <stddef.h>
 #include <stdint.h>
 
 #include <string>
+#include <vector>
 
-struct Measurement;
+struct TableMaker;
 
 struct Options {
-    uint64_t mib = 1024;
-    uint64_t kept_mib = 50;  // 0: everything
-    size_t block = 65536;    // bytes a write to the FIFO
-    int rounds = 3;
-    bool spread = false;  // over all CPUs
-    const Measurement* measurement = nullptr;
-    std::string dir;
-    std::string service;
+    uint64_t mib = 256;  // through the log path
+    int rounds = 5;
+    bool quick = false;
+    bool spread = false;                    // over all CPUs
+    std::vector<const TableMaker*> tables;  // in the order in which they are printed
+    std::string dir;                        // where the tables' directories are made
+    std::string service;                    // program
+
+    // A number of files, requests or bytes: a tenth of it when it has to be quick.
+    uint64_t scaled(uint64_t full) const { return quick ? full / 10 : full; }
+    // A program that is built beside the benchmark.
+    std::string built(const char* name) const;
 };
 
-// False when the command line is wrong.
+// Fills in what is not asked for. False when the command line is wrong.
 bool parse_options(int argc, char** argv, Options& options);
-// Where the measurements are made unless the options say it: a tmpfs with room for what is
-// kept and some more, or the usual place.
-std::string default_dir(const Options& options);
 
 #endif  // BENCH_OPTIONS_H_

@@ -5,9 +5,7 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <sched.h>
-#include <signal.h>
 #include <sys/ioctl.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -35,11 +33,6 @@ void wait_idle(const ChildProcess& program, int ms) {
     }
 }
 
-bool end(ChildProcess& program) {
-    program.signal(SIGKILL);
-    return program.wait() && WIFSIGNALED(program.status()) && WTERMSIG(program.status()) == SIGKILL;
-}
-
 bool write_all(int fd, const uint8_t* data, size_t len) {
     while (len > 0) {
         const ssize_t n = write(fd, data, len);
@@ -54,22 +47,26 @@ bool write_all(int fd, const uint8_t* data, size_t len) {
     return true;
 }
 
-bool feed(int fd, uint64_t size, size_t block, const std::function<void(uint64_t)>& trim) {
-    std::vector<uint8_t> data(block);
-    for (size_t i = 0; i < block; ++i) {
-        data[i] = static_cast<uint8_t>(i * 167 >> 3);
+std::vector<uint8_t> log_text(size_t len) {
+    constexpr size_t LINE = 100;
+    std::vector<uint8_t> text(len);
+    for (size_t i = 0; i < len; ++i) {
+        text[i] = static_cast<uint8_t>(i % LINE == LINE - 1 ? '\n' : ' ' + i * 7 % 95);
     }
-    uint64_t next_trim = FILE_MIB * MIB;
+    return text;
+}
+
+bool feed(int fd, uint64_t size, size_t block, const std::function<void(uint64_t)>& each_mib) {
+    const std::vector<uint8_t> data = log_text(block);
     for (uint64_t fed = 0; fed < size;) {
         const size_t len = static_cast<size_t>(std::min<uint64_t>(block, size - fed));
         if (!write_all(fd, data.data(), len)) {
             return false;
         }
-        fed += len;
-        if (fed >= next_trim) {
-            trim(fed);
-            next_trim += FILE_MIB * MIB;
+        if ((fed + len) / MIB > fed / MIB) {
+            each_mib((fed + len) / MIB);
         }
+        fed += len;
     }
     return true;
 }

@@ -9,6 +9,10 @@ kest_has() {
     case "$1" in
         g++) command -v c++ >/dev/null ;;
         clang) command -v clang++ >/dev/null ;;
+        s6) command -v s6-log >/dev/null ;;
+        runit) command -v svlogd >/dev/null ;;
+        daemontools) command -v multilog >/dev/null ;;
+        apache2-utils) command -v rotatelogs >/dev/null ;;
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;

@@ -1,0 +1,34 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "bench/tables.h"
+
+Outcome measure_log_path(const Options& options, const std::string& dir);
+Outcome count_system_calls(const Options& options, const std::string& dir);
+
+namespace {
+
+const TableMaker TABLES[] = {
+    {"log-path", true, measure_log_path},
+    {"strace", false, count_system_calls},
+};
+
+}  // namespace
+
+const TableMaker* find_table(const std::string& name) {
+    for (const TableMaker& table : TABLES) {
+        if (name == table.name) {
+            return &table;
+        }
+    }
+    return nullptr;
+}
+
+std::vector<const TableMaker*> default_tables() {
+    std::vector<const TableMaker*> tables;
+    for (const TableMaker& table : TABLES) {
+        if (table.by_default) {
+            tables.push_back(&table);
+        }
+    }
+    return tables;
+}
