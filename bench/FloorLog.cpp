@@ -39,6 +39,7 @@ void FloorLog::write(const uint8_t* data, size_t len) {
     if (m_staged + len < STAGING && !full) {
         memcpy(m_staging.get() + m_staged, data, len);
         m_staged += len;
+        m_calls.staged += len;
         return;
     }
     write_out(data, len);

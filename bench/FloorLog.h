@@ -20,6 +20,7 @@ public:
     // Calls of each kind so far.
     struct Calls {
         unsigned long access = 0;
+        unsigned long staged = 0;  // bytes
         unsigned long writev = 0;
         unsigned long open = 0;
         unsigned long rename = 0;

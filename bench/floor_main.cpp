@@ -47,9 +47,10 @@ int main(int argc, char** argv) {
             log.write(block.data(), static_cast<size_t>(n));
         }
         const FloorLog::Calls& calls = log.calls();
-        printf("poll %lu\nread %lu\nstat %lu\naccess %lu\nwritev %lu\n", polls, reads, reads,
-               calls.access, calls.writev);
-        printf("open %lu\nrename %lu\nunlink %lu\n", calls.open, calls.rename, calls.unlink);
+        printf("poll %lu\nread %lu\nstat %lu\naccess %lu\nstaged %lu\n", polls, reads, reads,
+               calls.access, calls.staged);
+        printf("writev %lu\nopen %lu\nrename %lu\nunlink %lu\n", calls.writev, calls.open,
+               calls.rename, calls.unlink);
     }
     return 0;
 }

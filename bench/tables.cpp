@@ -3,12 +3,19 @@
 #include "bench/tables.h"
 
 Outcome measure_log_path(const Options& options, const std::string& dir);
+Outcome measure_floor_calls(const Options& options, const std::string& dir);
+Outcome measure_memory(const Options& options, const std::string& dir);
+Outcome measure_start(const Options& options, const std::string& dir);
+Outcome measure_trimming(const Options& options, const std::string& dir);
+Outcome measure_rotation(const Options& options, const std::string& dir);
 Outcome count_system_calls(const Options& options, const std::string& dir);
 
 namespace {
 
 const TableMaker TABLES[] = {
-    {"log-path", true, measure_log_path},
+    {"log-path", true, measure_log_path},  {"floor", true, measure_floor_calls},
+    {"memory", true, measure_memory},      {"start", true, measure_start},
+    {"trim", true, measure_trimming},      {"rotate", true, measure_rotation},
     {"strace", false, count_system_calls},
 };
 
