@@ -89,6 +89,21 @@ bool BenchService::request(const std::string& line, const std::string& reply) {
     return answer == reply;
 }
 
+bool BenchService::enable_iq() {
+    // The capture begins with the log.
+    if (!request("ENABLE_IQ WCDMA WCDMA") || !request("DISABLE_LOG WCDMA") ||
+        !request("ENABLE_LOG WCDMA")) {
+        return false;
+    }
+    for (int waited = 0; !m_handset.iq_memory().in_use(); ++waited) {
+        if (waited >= START_TIMEOUT_MS) {
+            return fail("start the capture in", m_handset.root());
+        }
+        sleep_ms(1);
+    }
+    return true;
+}
+
 double BenchService::cpu() const {
     return process_cpu(m_process.pid());
 }

@@ -47,6 +47,8 @@ public:
     // Sends a request; says so when the reply is another one.
     bool request(const std::string& line, const std::string& reply = "OK");
     bool connect();
+    // Has the I/Q samples of the modem cp_wcdma saved from now on.
+    bool enable_iq();
 
     double cpu() const;  // seconds since its start, of all threads
     // True when the log files hold what they must after size bytes: all but what may still be

@@ -3,6 +3,7 @@
 #ifndef BENCH_COMMON_H_
 #define BENCH_COMMON_H_
 
+#include <sched.h>
 #include <signal.h>
 #include <stdint.h>
 #include <time.h>
@@ -24,8 +25,19 @@ double read_clock(clockid_t clock);
 double now();      // of the steady clock
 double own_cpu();  // CPU time of the calling thread
 void sleep_ms(int ms);
-// Lets this process, and those that it starts, run on the present CPU only.
+// Lets the calling thread, and what it starts, run on the present CPU only.
 void stay_on_this_cpu();
+// Lets them run on all CPUs as long as the object lives.
+class AllCpus {
+public:
+    AllCpus();
+    ~AllCpus();
+    AllCpus(const AllCpus&) = delete;
+    AllCpus& operator=(const AllCpus&) = delete;
+
+private:
+    cpu_set_t m_before;
+};
 
 // Says what failed with errno's text; false.
 bool fail(const std::string& what, const std::string& name);
