@@ -4,11 +4,17 @@
 
 #include <string.h>
 
+#include <algorithm>
+
 namespace {
 
 constexpr uint8_t FLAG = 0x7E;
 constexpr uint8_t ESCAPE = 0x7D;
 constexpr uint8_t ESCAPE_XOR = 0x20;
+
+bool is_special(uint8_t byte) {
+    return byte == FLAG || byte == ESCAPE;
+}
 
 }  // namespace
 
@@ -17,12 +23,18 @@ void DiagFrameParser::init() {
     m_len = 0;
 }
 
-void DiagFrameParser::append(uint8_t byte) {
-    if (m_len < MAX_FRAME) {
-        m_frame[m_len++] = byte;
+void DiagFrameParser::append(const uint8_t* bytes, size_t len) {
+    if (m_len + len <= MAX_FRAME) {
+        memcpy(m_frame + m_len, bytes, len);
+        m_len += static_cast<uint32_t>(len);
     } else {
         m_len = MAX_FRAME + 1;
     }
+}
+
+void DiagFrameParser::append_escaped(uint8_t byte) {
+    byte ^= ESCAPE_XOR;
+    append(&byte, 1);
 }
 
 bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame, size_t& frame_len,
@@ -46,18 +58,23 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
                 break;
             case ESCAPE_PENDING:
                 m_state = IN_FRAME;
-                append(data[pos++] ^ ESCAPE_XOR);
+                append_escaped(data[pos++]);
                 break;
             case IN_FRAME: {
-                const uint8_t byte = data[pos++];
-                if (byte == ESCAPE) {
+                const size_t plain = pos;
+                while (pos < len && !is_special(data[pos])) {
+                    ++pos;
+                }
+                append(data + plain, pos - plain);
+                if (pos == len) {
+                    break;
+                }
+                if (data[pos++] == ESCAPE) {
                     if (pos == len) {
                         m_state = ESCAPE_PENDING;
                     } else {
-                        append(data[pos++] ^ ESCAPE_XOR);
+                        append_escaped(data[pos++]);
                     }
-                } else if (byte != FLAG) {
-                    append(byte);
                 } else {
                     const size_t body_len = m_len;
                     init();
@@ -80,7 +97,7 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
 size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {
     size_t n = 0;
     for (size_t i = 0; i < len; ++i) {
-        if (src[i] == FLAG || src[i] == ESCAPE) {
+        if (is_special(src[i])) {
             dst[n++] = ESCAPE;
             dst[n++] = src[i] ^ ESCAPE_XOR;
         } else {
@@ -88,6 +105,10 @@ size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {
         }
     }
     return n;
+}
+
+size_t DiagFrameParser::escaped_size(const uint8_t* src, size_t len) {
+    return len + static_cast<size_t>(std::count_if(src, src + len, is_special));
 }
 
 void DiagFrameParser::frame(uint8_t type, uint8_t sub_type, const uint8_t* payload,

@@ -36,6 +36,9 @@ public:
     // Escapes len bytes to dst, which has room for twice as many; the bytes written.
     static size_t escape(const uint8_t* src, size_t len, uint8_t* dst);
 
+    // The bytes that escape() would write.
+    static size_t escaped_size(const uint8_t* src, size_t len);
+
     // Builds a whole frame in a new buffer, which the caller frees with delete[].
     static void frame(uint8_t type, uint8_t sub_type, const uint8_t* payload, size_t payload_len,
                       uint8_t*& buf, size_t& len);
@@ -48,7 +51,8 @@ private:
         IN_FRAME = 3
     };
 
-    void append(uint8_t byte);
+    void append(const uint8_t* bytes, size_t len);
+    void append_escaped(uint8_t byte);
 
     State m_state;
     uint8_t m_frame[MAX_FRAME];

@@ -149,7 +149,7 @@ private:
                 continue;
             }
             const uint64_t end = m_in.offset() + used;
-            const uint64_t size = DiagFrameParser::escape(body, len, m_raw) + 2;
+            const uint64_t size = DiagFrameParser::escaped_size(body, len) + 2;
             if (take_frame(end > size ? end - size : 0, body, len)) {
                 m_report.other -= std::min(m_report.other, size);
             } else {
@@ -296,7 +296,6 @@ private:
     FileReport& m_report;
     bool m_stop = false;
     DiagFrameParser m_parser;
-    uint8_t m_raw[2 * DiagFrameParser::MAX_FRAME];
 };
 
 }  // namespace
