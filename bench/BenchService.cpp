@@ -13,6 +13,12 @@
 #include "bench/process_figures.h"
 #include "sim/LogCollector.h"
 
+namespace {
+
+constexpr double STEADY_S = 6.5;
+
+}  // namespace
+
 BenchService::BenchService(const Options& options, const std::string& dir, const Setup& setup)
     : m_program(options.service), m_setup(setup) {
     m_made = m_handset.create(dir + "/h", {FILE_MIB, setup.quota_mib, 250, true});
@@ -48,11 +54,18 @@ bool BenchService::start(const std::vector<std::string>& wrapper) {
     if (!m_process.start(args[0], m_handset, {args.begin() + 1, args.end()})) {
         return fail("start", args[0]);
     }
+    m_started = now();
     m_log_device = open_writer(m_handset.cps()[0]->log.path(), m_process);
     if (m_log_device < 0) {
         fputs(m_process.log_text().c_str(), stderr);
     }
     return m_log_device >= 0;
+}
+
+void BenchService::wait_steady() const {
+    while (now() - m_started < STEADY_S && !g_interrupted) {
+        sleep_ms(100);
+    }
 }
 
 bool BenchService::kill() {

@@ -37,6 +37,9 @@ public:
 
     // Starts it, also below a wrapper, and waits until it has opened the first log device.
     bool start(const std::vector<std::string>& wrapper = {});
+    // Waits until it no longer watches whether its supervisors' connections last, which takes a
+    // timer and so a look at the clock in each pass.
+    void wait_steady() const;
     // Kills it: true when that is what it ended by. Its cost() is known then.
     bool kill();
 
@@ -70,6 +73,7 @@ private:
     ServiceProcess m_process;
     SimControlClient m_client;
     int m_log_device = -1;
+    double m_started = 0;
     bool m_made = false;
 };
 

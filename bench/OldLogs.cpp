@@ -38,3 +38,11 @@ std::string OldLogs::path(unsigned index, unsigned added) const {
     return m_set_dir + "/" + m_cp + "/" + std::to_string(m_files - 1 - index + added) + "-" + m_cp +
            "-" + stamp + ".log";
 }
+
+std::vector<std::string> OldLogs::paths(unsigned added) const {
+    std::vector<std::string> all;
+    for (unsigned i = 0; i < m_files; ++i) {
+        all.push_back(path(i, added));
+    }
+    return all;
+}

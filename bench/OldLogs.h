@@ -7,6 +7,7 @@
 #include <stdint.h>
 
 #include <string>
+#include <vector>
 
 class OldLogs {
 public:
@@ -20,6 +21,8 @@ public:
     // The file, 0 for the oldest, whose number is one less for each younger one; with another
     // number when it has been renamed since.
     std::string path(unsigned index, unsigned added = 0) const;
+    // Of all files, the oldest first.
+    std::vector<std::string> paths(unsigned added = 0) const;
 
 private:
     const std::string m_set_dir;

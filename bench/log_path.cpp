@@ -26,7 +26,6 @@
 namespace {
 
 constexpr double GOAL = 1.05;  // CPU of the service relative to the floor
-constexpr double STEADY_S = 6.5;
 const char SERVICE[] = "kestmodem";
 
 struct Figures {
@@ -69,7 +68,6 @@ bool run_all(const Options& options, const std::string& dir, size_t block,
     if (!service.start()) {
         return false;
     }
-    const double start = now();
     for (auto program = programs.rbegin(); program != programs.rend(); ++program) {
         const LogRun run = program->run(dir, options.mib, block);
         if (!run.ok) {
@@ -77,10 +75,7 @@ bool run_all(const Options& options, const std::string& dir, size_t block,
         }
         add(figures[program->name], run, options.mib);
     }
-    // A supervisor's connection has to prove itself first, with a timer that runs.
-    while (now() - start < STEADY_S) {
-        sleep_ms(100);
-    }
+    service.wait_steady();
     const LogRun run = run_service(options, service, block);
     if (run.ok) {
         add(figures[SERVICE], run, options.mib);

@@ -33,13 +33,17 @@ std::string set_name(time_t time) {
 
 bool run_rename(const std::string& dir, unsigned files, Figures& figures) {
     const OldLogs logs(dir + "/r", set_name(0), "cp_gnss", files, 4096);
-    const double before = own_cpu();
+    double cpu = 0;
     for (unsigned rotation = 0; rotation < ROTATIONS; ++rotation) {
+        const std::vector<std::string> from = logs.paths(rotation);
+        const std::vector<std::string> to = logs.paths(rotation + 1);
+        const double before = own_cpu();
         for (unsigned i = 0; i < files; ++i) {
-            rename(logs.path(i, rotation).c_str(), logs.path(i, rotation + 1).c_str());
+            rename(from[i].c_str(), to[i].c_str());
         }
+        cpu += own_cpu() - before;
     }
-    figures.rename_ms.add((own_cpu() - before) * 1e3 / ROTATIONS);
+    figures.rename_ms.add(cpu * 1e3 / ROTATIONS);
     return logs.made();
 }
 

@@ -22,9 +22,10 @@ struct Figures {
 
 bool run_unlink(const std::string& dir, unsigned files, Figures& figures) {
     const OldLogs logs(dir + "/u", SET, "cp_gnss", files, MIB);
+    const std::vector<std::string> paths = logs.paths();
     const double before = own_cpu();
-    for (unsigned i = 0; i < logs.files(); ++i) {
-        unlink(logs.path(i).c_str());
+    for (const std::string& path : paths) {
+        unlink(path.c_str());
     }
     figures.unlink_us.add((own_cpu() - before) * 1e6 / files);
     return logs.made();

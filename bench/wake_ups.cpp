@@ -13,8 +13,7 @@
 
 namespace {
 
-constexpr double RATE = 100000;   // bytes a second
-constexpr double STEADY_S = 6.5;  // a supervisor's new connection has a timer that long
+constexpr double RATE = 100000;  // bytes a second
 
 double wake_ups(const ChildProcess& program) {
     return static_cast<double>(process_status(program.pid(), "voluntary_ctxt_switches"));
@@ -63,7 +62,7 @@ Outcome measure_wake_ups(const Options& options, const std::string& dir) {
         return NOT_MEASURED;
     }
     const int cat_device = open_writer(fifo, cat);
-    sleep_ms(static_cast<int>(STEADY_S * 1000));
+    service.wait_steady();
     Table table("Wake-ups a second, log of 100 kB/s",
                 {"bytes a write", "writes a second", "kestmodem", "cat", "kestmodem: CPU ms a s"});
     bool fed = cat_device >= 0;
