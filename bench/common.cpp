@@ -4,6 +4,7 @@
 
 #include <errno.h>
 #include <poll.h>
+#include <sched.h>
 #include <stdio.h>
 #include <string.h>
 
@@ -32,17 +33,6 @@ void stay_on_this_cpu() {
     CPU_ZERO(&one);
     CPU_SET(sched_getcpu(), &one);
     sched_setaffinity(0, sizeof(one), &one);
-}
-
-AllCpus::AllCpus() {
-    sched_getaffinity(0, sizeof(m_before), &m_before);
-    cpu_set_t all;
-    memset(&all, 0xff, sizeof(all));  // the kernel leaves out what there is not
-    sched_setaffinity(0, sizeof(all), &all);
-}
-
-AllCpus::~AllCpus() {
-    sched_setaffinity(0, sizeof(m_before), &m_before);
 }
 
 bool fail(const std::string& what, const std::string& name) {

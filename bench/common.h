@@ -3,7 +3,6 @@
 #ifndef BENCH_COMMON_H_
 #define BENCH_COMMON_H_
 
-#include <sched.h>
 #include <signal.h>
 #include <stdint.h>
 #include <time.h>
@@ -27,17 +26,6 @@ double own_cpu();  // CPU time of the calling thread
 void sleep_ms(int ms);
 // Lets the calling thread, and what it starts, run on the present CPU only.
 void stay_on_this_cpu();
-// Lets them run on all CPUs as long as the object lives.
-class AllCpus {
-public:
-    AllCpus();
-    ~AllCpus();
-    AllCpus(const AllCpus&) = delete;
-    AllCpus& operator=(const AllCpus&) = delete;
-
-private:
-    cpu_set_t m_before;
-};
 
 // Says what failed with errno's text; false.
 bool fail(const std::string& what, const std::string& name);

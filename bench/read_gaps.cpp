@@ -7,6 +7,7 @@
 #include <atomic>
 #include <thread>
 
+#include "bench/AllCpus.h"
 #include "bench/BenchService.h"
 #include "bench/OldLogs.h"
 #include "bench/Options.h"

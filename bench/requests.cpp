@@ -5,6 +5,7 @@
 #include <atomic>
 #include <thread>
 
+#include "bench/AllCpus.h"
 #include "bench/BenchService.h"
 #include "bench/EchoServer.h"
 #include "bench/Options.h"
