@@ -45,9 +45,10 @@ void remove_oldest(const std::string& dir, uint64_t fed_mib) {
 // What the files take on the file system; holes do not count.
 uint64_t bytes_kept(const std::string& dir) {
     uint64_t bytes = 0;
-    for (const auto& entry : fs::recursive_directory_iterator(dir)) {
+    std::error_code error;
+    for (const auto& entry : fs::recursive_directory_iterator(dir, error)) {
         struct stat st;
-        if (entry.is_regular_file() && stat(entry.path().c_str(), &st) == 0) {
+        if (lstat(entry.path().c_str(), &st) == 0 && S_ISREG(st.st_mode)) {
             bytes += static_cast<uint64_t>(st.st_blocks) * 512;
         }
     }

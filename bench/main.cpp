@@ -22,6 +22,12 @@ const char USAGE[] =
 #include "usage.txt"
     ;
 
+#ifdef __clang__
+const char COMPILER[] = __VERSION__;  // names itself
+#else
+const char COMPILER[] = "g++ " __VERSION__;
+#endif
+
 void on_signal(int /*signo*/) {
     g_interrupted = 1;
 }
@@ -49,7 +55,7 @@ void print_machine(const Options& options) {
            sysconf(_SC_NPROCESSORS_ONLN));
     printf("| memory | %s |\n", kernel_value("/proc/meminfo", "MemTotal").c_str());
     printf("| kernel | %s %s, %s |\n", system.sysname, system.release, system.machine);
-    printf("| compiler | %s |\n", __VERSION__);
+    printf("| compiler | %s |\n", COMPILER);
     printf("| logs on | %s, file system type %#lx |\n", options.dir.c_str(),
            static_cast<unsigned long>(info.f_type));
     printf("| load at the start | %.2f %.2f %.2f |\n", load[0], load[1], load[2]);
