@@ -52,9 +52,7 @@ void* WcdmaIqManager::save_thread(void* param) {
         pfd.fd = manager->m_thread_sock;
         pfd.events = POLLIN;
         pfd.revents = 0;
-        if (poll(&pfd, 1, -1) < 0) {
-            wait_after_failed_poll(errno);  // and reads all the same: a command may be there
-        }
+        poll(&pfd, 1, -1);  // after a failure it reads all the same: a command may be there
         switch (manager->next_command()) {
             case IQST_QUIT:
                 running = false;
@@ -66,6 +64,7 @@ void* WcdmaIqManager::save_thread(void* param) {
                 running = manager->process_save();
                 break;
             default:
+                usleep(POLL_FAILED_WAIT_US);  // the poll failed or promised too much
                 break;
         }
     }
