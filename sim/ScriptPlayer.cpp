@@ -137,7 +137,7 @@ bool ScriptPlayer::put_in_order() {
         !wait_until([&] { return m_modem_supervisor.connected() && m_wcn_supervisor.connected(); },
                     "the service connects to the supervisors") ||
         !m_client.connect(root, m_patience_ms) || !m_settler.connect(root, m_patience_ms) ||
-        m_client.request("GET_LOG_OVERWRITE", m_patience_ms).empty() || !settle() ||
+        m_client.request("DISABLE_IQ WCDMA WCDMA", m_patience_ms).empty() || !settle() ||
         // What the old connections have sent is carried out before they end.
         !wait_until(
             [&] {

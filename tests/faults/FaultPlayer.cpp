@@ -135,8 +135,10 @@ bool FaultPlayer::control_socket_missing() const {
 bool FaultPlayer::play_second_round(ScriptResult* result) {
     m_patience_ms = LONG_PATIENCE_MS;
     m_outcome.clear();
+    // What could not be saved is saved with the next setting.
+    const std::string setting = "SET_SD_MAX_SIZE " + std::to_string(m_sizes.sd);
     if (!play_lines(AGAIN) || m_settler.request("FLUSH", m_patience_ms) != "OK" ||
-        !count_log_bytes(result)) {
+        m_settler.request(setting, m_patience_ms) != "OK" || !count_log_bytes(result)) {
         return false;
     }
     m_patience_ms = PATIENCE_MS;
@@ -178,6 +180,7 @@ bool FaultPlayer::read_cp_dir(const std::string& dir, const std::string& cp, siz
         }
     }
     std::string text;
+    bool good = true;
     DspLogCheck chunks;
     for (const auto& [key, path] : files) {
         std::string content = read_text_file(path);
@@ -185,14 +188,17 @@ bool FaultPlayer::read_cp_dir(const std::string& dir, const std::string& cp, siz
             content.erase(0, TIME_RECORD_SIZE);
         }
         text += content;
+        good = good && (cp == "agdsp" || in_order(content, m_fed[cp]));
         chunks.add_file(path);
     }
     if (cp == "agdsp") {
         text.assign(chunks.data(DspLogCheck::LOG).begin(), chunks.data(DspLogCheck::LOG).end());
     }
     *bytes += text.size();
-    return in_order(text, m_fed[cp]) || fail("not the bytes that were fed, in their order:\n" +
-                                             show_log_root(dir, "") + show_bytes_line(m_fed[cp]));
+    // When renaming goes on to fail, nothing tells the order of two files of one second.
+    good = good && (in_order(text, m_fed[cp]) || m_plan->failed > 1);
+    return good || fail("not the bytes that were fed, in their order:\n" + show_log_root(dir, "") +
+                        show_bytes_line(m_fed[cp]));
 }
 
 // Not one line is missing or has lost its end.

@@ -170,7 +170,7 @@ void Campaign::play(const std::string& script) {
             if (m_options.is_short) {
                 // One in so many of what the long form does, at small and larger N in turn.
                 if (++m_choice % 7 == 0 && !over()) {
-                    run(script, clean, kind, 1 + static_cast<int>(m_choice / 7 % 4) * 3, always);
+                    run(script, clean, kind, 1 + static_cast<int>(m_choice / 7 % 4) * 2, always);
                 }
                 continue;
             }
