@@ -6,9 +6,9 @@
 #include <filesystem>
 #include <regex>
 
-#include "sim/DspLogCheck.h"
 #include "sim/byte_text.h"
 #include "sim/files.h"
+#include "sim/logged_bytes.h"
 #include "sim/tree_text.h"
 
 namespace fs = std::filesystem;
@@ -21,8 +21,6 @@ const int ROUNDS = 2;  // a machine under load can make a step of the second rou
 const int MAX_IDLE_PASSES = 400;
 // The staging buffer and the block that fills it.
 const size_t MAX_LOSS = 65536 + 32768;
-const char TIME_RECORD[] = "xV4\x12";
-const size_t TIME_RECORD_SIZE = 16;
 
 // Whether text comes about from whole when pieces of it are left out.
 bool in_order(const std::string& text, const std::string& whole) {
@@ -172,27 +170,12 @@ bool FaultPlayer::count_log_bytes(ScriptResult* result) {
 }
 
 bool FaultPlayer::read_cp_dir(const std::string& dir, const std::string& cp, size_t* bytes) {
-    std::map<std::pair<long, std::string>, std::string> files;  // oldest, highest number, first
-    for (const auto& entry : fs::directory_iterator(dir)) {
-        const std::string name = entry.path().filename().string();
-        if (isdigit(static_cast<unsigned char>(name[0])) != 0) {
-            files[{-stol(name), name}] = entry.path().string();
-        }
-    }
+    const std::vector<std::string> files = logged_bytes(dir);
     std::string text;
     bool good = true;
-    DspLogCheck chunks;
-    for (const auto& [key, path] : files) {
-        std::string content = read_text_file(path);
-        if (content.compare(0, 4, TIME_RECORD) == 0) {
-            content.erase(0, TIME_RECORD_SIZE);
-        }
-        text += content;
-        good = good && (cp == "agdsp" || in_order(content, m_fed[cp]));
-        chunks.add_file(path);
-    }
-    if (cp == "agdsp") {
-        text.assign(chunks.data(DspLogCheck::LOG).begin(), chunks.data(DspLogCheck::LOG).end());
+    for (const std::string& file : files) {
+        text += file;
+        good = good && in_order(file, m_fed[cp]);
     }
     *bytes += text.size();
     // When renaming goes on to fail, nothing tells the order of two files of one second.

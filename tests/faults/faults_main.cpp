@@ -13,6 +13,7 @@
 
 #include "faults/FaultPlayer.h"
 #include "sim/SharedFile.h"
+#include "sim/fault_kinds.h"
 #include "sim/files.h"
 
 namespace {
@@ -20,61 +21,6 @@ namespace {
 const char USAGE[] =
     "usage: faults KIND|all N|all once|always|both SECONDS|short SCRIPT...\n"
     "For scripts/faults and ctest: scripts/faults --help tells what it is all about.\n";
-
-const struct Kind {
-    const char* name;
-    faults::Call call;
-    int error;
-} KINDS[] = {
-    {"open", faults::OPEN, EMFILE},
-    {"open-full", faults::OPEN, ENOSPC},
-    {"open-gone", faults::OPEN, ENOENT},
-    {"read", faults::READ, EIO},
-    {"read-short", faults::READ, CUT_SHORT},
-    {"read-interrupted", faults::READ, EINTR},
-    {"read-again", faults::READ, EAGAIN},
-    {"write", faults::WRITE, ENOSPC},
-    {"write-short", faults::WRITE, CUT_SHORT},
-    {"write-interrupted", faults::WRITE, EINTR},
-    {"writev", faults::WRITEV, ENOSPC},
-    {"writev-short", faults::WRITEV, CUT_SHORT},
-    {"writev-broken", faults::WRITEV, EIO},
-    {"pwrite", faults::PWRITE, ENOSPC},
-    {"ftruncate", faults::FTRUNCATE, EIO},
-    {"lseek", faults::LSEEK, EIO},
-    {"close", faults::CLOSE, EIO},
-    {"rename", faults::RENAME, EIO},
-    {"unlink", faults::UNLINK, EROFS},
-    {"mkdir", faults::MKDIR, ENOSPC},
-    {"rmdir", faults::RMDIR, EROFS},
-    {"opendir", faults::OPENDIR, EMFILE},
-    {"readdir", faults::READDIR, EIO},
-    {"stat", faults::STAT, EACCES},
-    {"lstat", faults::LSTAT, EIO},
-    {"fstat", faults::FSTAT, EIO},
-    {"fstatat", faults::FSTATAT, EIO},
-    {"access", faults::ACCESS, EIO},
-    {"fcntl", faults::FCNTL, EBADF},
-    {"fdopen", faults::FDOPEN, ENOMEM},
-    {"socket", faults::SOCKET, EMFILE},
-    {"socketpair", faults::SOCKETPAIR, ENFILE},
-    {"bind", faults::BIND, EADDRINUSE},
-    {"listen", faults::LISTEN, EADDRINUSE},
-    {"accept", faults::ACCEPT4, EMFILE},
-    {"accept-aborted", faults::ACCEPT4, ECONNABORTED},
-    {"connect", faults::CONNECT, ECONNREFUSED},
-    {"connect-again", faults::CONNECT, EAGAIN},
-    {"poll", faults::POLL, ENOMEM},
-    {"poll-interrupted", faults::POLL, EINTR},
-    {"pthread_create", faults::PTHREAD_CREATE, EAGAIN},
-    {"mmap", faults::MMAP, ENOMEM},
-    {"munmap", faults::MUNMAP, EINVAL},
-    {"ioctl", faults::IOCTL, EIO},
-    {"system", faults::SYSTEM, ENOMEM},
-    {"usleep", faults::USLEEP, EINTR},
-    {"time", faults::TIME, EFAULT},
-    {"clock_gettime", faults::CLOCK_GETTIME, EINVAL},
-};
 
 // Of a kind in a script: more say nothing new.
 const unsigned MAX_FAILURES = 2;
@@ -106,7 +52,7 @@ private:
         const auto passed = std::chrono::steady_clock::now() - m_start;
         return std::chrono::duration<double>(passed).count() > m_options.seconds;
     }
-    void plan(const Kind& kind, int first, bool always) {
+    void plan(const FaultKind& kind, int first, bool always) {
         memset(static_cast<void*>(m_plan), 0, sizeof *m_plan);
         m_plan->call = kind.call;
         m_plan->error = kind.error;
@@ -116,7 +62,7 @@ private:
         m_plan->last = first == 0 ? 0 : always ? first + more : first;
     }
     // Whether the fault came about.
-    bool run(const std::string& script, const ScriptResult& clean, const Kind& kind, int n,
+    bool run(const std::string& script, const ScriptResult& clean, const FaultKind& kind, int n,
              bool always);
 
     const Options m_options;
@@ -127,8 +73,8 @@ private:
     const std::chrono::steady_clock::time_point m_start = std::chrono::steady_clock::now();
 };
 
-bool Campaign::run(const std::string& script, const ScriptResult& clean, const Kind& kind, int n,
-                   bool always) {
+bool Campaign::run(const std::string& script, const ScriptResult& clean, const FaultKind& kind,
+                   int n, bool always) {
     plan(kind, n, always);
     FaultPlayer player(m_program, m_plan);
     bool hit = false;
@@ -150,7 +96,7 @@ bool Campaign::run(const std::string& script, const ScriptResult& clean, const K
 
 void Campaign::play(const std::string& script) {
     const Totals before = m_totals;
-    plan(KINDS[0], 0, false);
+    plan(FAULT_KINDS[0], 0, false);
     FaultPlayer player(m_program, m_plan);
     ScriptResult clean;
     if (!player.play_untouched(script, &clean)) {
@@ -159,7 +105,7 @@ void Campaign::play(const std::string& script) {
         return;
     }
     m_choice = static_cast<unsigned>(script.size());
-    for (const Kind& kind : KINDS) {
+    for (const FaultKind& kind : FAULT_KINDS) {
         if (m_options.kind != "all" && m_options.kind != kind.name) {
             continue;
         }
@@ -193,7 +139,7 @@ void Campaign::play(const std::string& script) {
 
 int main(int argc, char** argv) {
     if (argc < 6) {
-        for (const Kind& kind : KINDS) {
+        for (const FaultKind& kind : FAULT_KINDS) {
             puts(kind.name);
         }
         fputs(USAGE, stderr);

@@ -219,23 +219,13 @@ bool play_everything(const std::string& program, double seconds) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    unsigned kills = 500;
-    unsigned seed = 1;
-    double seconds = 300;
-    for (int i = 1; i < argc; i += 2) {
-        const std::string option = argv[i];
-        const char* value = i + 1 < argc ? argv[i + 1] : "";
-        if (option == "--kills" && *value) {
-            kills = static_cast<unsigned>(atoi(value));
-        } else if (option == "--seconds" && *value) {
-            seconds = atof(value);
-        } else if (option == "--seed" && *value) {
-            seed = static_cast<unsigned>(atoi(value));
-        } else {
-            fprintf(stderr, "usage: soak [--kills N] [--seconds S] [--seed N]\n");
-            return 2;
-        }
+    if (argc != 4) {
+        fputs("usage: soak KILLS SECONDS SEED; see scripts/soak --help\n", stderr);
+        return 2;
     }
+    const auto kills = static_cast<unsigned>(atoi(argv[1]));
+    const double seconds = atof(argv[2]);
+    const auto seed = static_cast<unsigned>(atoi(argv[3]));
     signal(SIGPIPE, SIG_IGN);
     setvbuf(stdout, nullptr, _IOLBF, 0);
     const std::string program =
