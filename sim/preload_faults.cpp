@@ -227,12 +227,18 @@ Function* next_symbol(const char* name) {
 
 // Under other names, as the headers declare some of them otherwise.
 #define DEFINE(NAME, name, bits, result, params, args)                      \
-    extern "C" result kest_##name params __asm__(#name);                    \
+    extern "C" result kest_##name params __asm__(#name bits);               \
     extern "C" result kest_##name params {                                  \
-        static auto* const real = next_symbol<result params>(#name);        \
+        static auto* const real = next_symbol<result params>(#name bits);   \
         const void* caller = __builtin_return_address(0);                   \
         return pass_on<faults::NAME, result>(caller, real, ARGUMENTS args); \
-    }                                                                       \
-    extern "C" result kest_##name##64 params __asm__(#name "64") __attribute__((alias(#name)));
+    }
 #define ARGUMENTS(...) __VA_ARGS__
 KEST_CALLS(DEFINE, DEFINE)
+
+// Where an off_t has 64 bits anyway, the calls have two names.
+#ifndef _FILE_OFFSET_BITS
+#define ALIAS(NAME, name, bits, result, params, args) \
+    extern "C" result kest_##name##64 params __asm__(#name "64") __attribute__((alias(#name)));
+KEST_CALLS(ALIAS, ALIAS)
+#endif
