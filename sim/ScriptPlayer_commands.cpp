@@ -223,7 +223,7 @@ bool ScriptPlayer::capture_iq(const std::string& args) {
         return fail("no iq_mem or no bytes");
     }
     const unsigned released = iq.released();
-    if (!wait_until([&] { return iq.in_use(); }, "the I/Q memory is in use") ||
+    if (!wait_until([&] { return iq.in_use() && !iq.filled(); }, "the I/Q memory is in use") ||
         !iq.announce_bytes(bytes)) {
         return fail("the I/Q memory takes no buffer of this size now");
     }
