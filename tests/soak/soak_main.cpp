@@ -40,7 +40,7 @@ bool check_streams(LogCollector& logs, const SimHandset& handset, const Deaths& 
     bool good = true;
     for (const auto& cp : handset.cps()) {
         const StreamCheck::Result r = logs.check(*cp);
-        printf("  %-9s %s\n", cp->name.c_str(), r.text().c_str());
+        printf("  %-9s %s\n", cp->name.c_str(), r.text().substr(6).c_str());
         if (r.doubled > 0 || r.foreign > 0 || r.misordered > 0 || r.kept == 0 ||
             r.tail >= StreamCheck::BUFFER_SIZE) {
             good = complain(cp->name + ": bytes without an explanation");
