@@ -96,15 +96,22 @@ bool Campaign::run(const std::string& script, const ScriptResult& clean, const F
 
 void Campaign::play(const std::string& script) {
     const Totals before = m_totals;
-    plan(FAULT_KINDS[0], 0, false);
-    FaultPlayer player(m_program, m_plan);
     ScriptResult clean;
-    if (!player.play_untouched(script, &clean)) {
-        printf("FAILED without a fault: %s\n", player.error().c_str());
-        ++m_totals.failures;
-        return;
+    // Twice the same: a machine under load can be too slow for a time-out.
+    for (bool same = false; !same;) {
+        const ScriptResult before_that = clean;
+        clean = ScriptResult();
+        plan(FAULT_KINDS[0], 0, false);
+        FaultPlayer player(m_program, m_plan);
+        if (!player.play_untouched(script, &clean)) {
+            printf("FAILED without a fault: %s\n", player.error().c_str());
+            ++m_totals.failures;
+            return;
+        }
+        same = clean.dialogue == before_that.dialogue && clean.records == before_that.records &&
+               clean.descriptors == before_that.descriptors;
     }
-    m_choice = static_cast<unsigned>(script.size());
+    m_choice = static_cast<unsigned>(std::filesystem::path(script).stem().string().size());
     for (const FaultKind& kind : FAULT_KINDS) {
         if (m_options.kind != "all" && m_options.kind != kind.name) {
             continue;
