@@ -6,11 +6,14 @@
 #include <fcntl.h>
 #include <signal.h>
 #include <stdio.h>
+#include <stdlib.h>
 #include <string.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
+
+#include <filesystem>
 
 #include "sim/files.h"
 
@@ -139,6 +142,24 @@ std::string ChildProcess::status_text() const {
     }
     const int status = WEXITSTATUS(m_status);
     return "exit status " + std::to_string(status) + (status == 127 ? ", could not be run" : "");
+}
+
+std::vector<std::string> ChildProcess::descriptors() const {
+    std::vector<std::string> names;
+    std::error_code ec;
+    const std::string dir = "/proc/" + std::to_string(m_pid) + "/fd";
+    for (std::filesystem::directory_iterator it(dir, ec), end; !ec && it != end; it.increment(ec)) {
+        std::error_code closed;
+        names.push_back(std::filesystem::read_symlink(it->path(), closed).string());
+    }
+    return names;
+}
+
+size_t ChildProcess::rss_kb() const {
+    static const char NAME[] = "VmRSS:";
+    const std::string status = proc_file(m_pid, "status");
+    const size_t at = status.find(NAME);
+    return at == std::string::npos ? 0 : strtoul(&status[at + sizeof NAME], nullptr, 10);
 }
 
 std::string ChildProcess::run_state() const {

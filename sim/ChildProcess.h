@@ -50,6 +50,9 @@ public:
     int status() const { return m_status; }  // as waitpid gives it, once it has ended
     std::string status_text() const;         // "exit status 2", "ended by signal 15"
     const Cost& cost() const { return m_cost; }
+    // What it has open, as the kernel names it, and its resident memory.
+    std::vector<std::string> descriptors() const;
+    size_t rss_kb() const;
     // Changes whenever the program has been on a CPU.
     std::string run_state() const;
 

@@ -15,6 +15,8 @@
 namespace {
 
 const int STEP_MS = 1;
+const int SOCKETS = 5;             // of the service: the server's, two clients, two supervisors
+const int LEAST_PATIENCE_MS = 50;  // once much has failed
 
 const size_t LOG_LINES = 20;
 const char INTERNAL_LOGS[] = "data/modem_log";
@@ -25,19 +27,21 @@ const char SD_LOGS[] = "storage/sdcard0/modem_log";
 struct ScriptPlayer::CommandRow {
     const char* word;
     Command run;
+    Round last = AGAIN;  // FIRST: only for the handset as it is made
 };
 
 const ScriptPlayer::CommandRow ScriptPlayer::COMMANDS[] = {
-    {"configure", &ScriptPlayer::configure},
-    {"cp", &ScriptPlayer::add_cp},
+    {"configure", &ScriptPlayer::configure, FIRST},
+    {"cp", &ScriptPlayer::add_cp, FIRST},
     {"property", &ScriptPlayer::set_property},
-    {"file", &ScriptPlayer::write_file},
+    {"file", &ScriptPlayer::write_file, FIRST},
     {"time", &ScriptPlayer::set_time},
-    {"start", &ScriptPlayer::start},
+    {"start", &ScriptPlayer::start, FIRST},
     {"log", &ScriptPlayer::feed_log},
     {"queue", &ScriptPlayer::queue_log},
     {"pcm", &ScriptPlayer::feed_pcm},
     {"dsp-crash", &ScriptPlayer::crash_dsp},
+    {"iq", &ScriptPlayer::capture_iq},
     {"diag", &ScriptPlayer::send_diag},
     {"diag-request", &ScriptPlayer::await_diag_request},
     {"supervisor", &ScriptPlayer::tell_by_supervisor},
@@ -59,6 +63,11 @@ ScriptPlayer::~ScriptPlayer() {
 }
 
 bool ScriptPlayer::play(const std::string& script_file) {
+    return read(script_file) && play_lines(FIRST) &&
+           (finish() || fail(script_file + ": " + m_error));
+}
+
+bool ScriptPlayer::read(const std::string& script_file) {
     std::ifstream script(script_file);
     if (!script) {
         return fail("cannot read " + script_file + ": " + strerror(errno));
@@ -72,17 +81,26 @@ bool ScriptPlayer::play(const std::string& script_file) {
             line.back() = ' ';  // it goes on in the next line
             continue;
         }
-        if (!play_line(line)) {
-            m_error = script_file + ":" + std::to_string(number) + ": " + m_error + "\n" +
-                      m_service.last_log_lines(LOG_LINES);
-            return false;
-        }
+        m_lines.push_back({script_file + ":" + std::to_string(number), line});
         line.clear();
     }
-    return finish() || fail(script_file + ": " + m_error);
+    return true;
 }
 
-bool ScriptPlayer::play_line(const std::string& line) {
+bool ScriptPlayer::play_lines(Round round, bool patient) {
+    for (const Line& line : m_lines) {
+        if (play_line(line.text, round)) {
+            continue;
+        }
+        if (patient) {
+            return fail(line.place + ": " + m_error + "\n" + m_service.last_log_lines(LOG_LINES));
+        }
+        m_patience_ms = std::max(m_patience_ms / 2, LEAST_PATIENCE_MS);
+    }
+    return true;
+}
+
+bool ScriptPlayer::play_line(const std::string& line, Round round) {
     std::string args = line;
     const std::string word = take_script_word(&args);
     if (word.empty() || word[0] == '#') {
@@ -91,8 +109,9 @@ bool ScriptPlayer::play_line(const std::string& line) {
     for (const CommandRow& row : COMMANDS) {
         if (word == row.word) {
             const bool has_root = !m_handset.root().empty();
-            return (row.run == &ScriptPlayer::configure || has_root || make_handset()) &&
-                   (this->*row.run)(args) && settle();
+            return round > row.last ||
+                   ((row.run == &ScriptPlayer::configure || has_root || make_handset()) &&
+                    (this->*row.run)(args) && settle());
         }
     }
     return fail("unknown command " + word);
@@ -104,8 +123,58 @@ bool ScriptPlayer::make_handset() {
 
 // What the service has read it also deals with before it answers a request.
 bool ScriptPlayer::settle() {
-    return !m_settler.connected() || !m_settler.request("GET_LOG_OVERWRITE", PATIENCE_MS).empty() ||
+    return !m_settler.connected() ||
+           !m_settler.request("GET_LOG_OVERWRITE", m_patience_ms).empty() ||
            fail("the service does not answer");
+}
+
+// Puts everything around the service in order.
+bool ScriptPlayer::put_in_order() {
+    const std::string& root = m_handset.root();
+    m_client.disconnect();
+    m_settler.disconnect();
+    if (!m_handset.remove_sd() || !set_time("1456824000") ||
+        !wait_until([&] { return m_modem_supervisor.connected() && m_wcn_supervisor.connected(); },
+                    "the service connects to the supervisors") ||
+        !m_client.connect(root, m_patience_ms) || !m_settler.connect(root, m_patience_ms) ||
+        m_client.request("DISABLE_IQ WCDMA WCDMA", m_patience_ms).empty() || !settle() ||
+        // What the old connections have sent is carried out before they end.
+        !wait_until(
+            [&] {
+                const auto open = m_service.descriptors();
+                return std::count_if(open.begin(), open.end(), [](const std::string& name) {
+                           return name.compare(0, 7, "socket:") == 0;
+                       }) == SOCKETS;
+            },
+            "the service drops the clients that left")) {
+        return fail("connections: " + m_error);
+    }
+    for (const auto& cp : m_handset.cps()) {
+        if (cp->modem) {
+            cp->diag.discard();
+            cp->diag.read_request(0, 0);
+        }
+    }
+    if (!m_modem_supervisor.send("Modem Alive") || !m_wcn_supervisor.send("WCN-EXTERNAL-ALIVE")) {
+        return fail("no supervisor");
+    }
+    for (const auto& [name, word] : std::map<std::string, std::string>{
+             {"cp_wcdma", "WCDMA"}, {"cp_gnss", "GNSS"}, {"agdsp", "AG-DSP"}}) {
+        // The DSP's other devices are only opened when its log is started.
+        if (name == "agdsp" && m_handset.audio_dsp().exists()) {
+            m_settler.request("DISABLE_LOG " + word, m_patience_ms);
+        }
+        if (m_settler.request("GET_LOG_STATE " + word, m_patience_ms) == "OK OFF") {
+            m_settler.request("ENABLE_LOG " + word, m_patience_ms);
+        }
+    }
+    return wait_until(
+               [&] {
+                   return std::all_of(m_handset.cps().begin(), m_handset.cps().end(),
+                                      [](const auto& cp) { return cp->log.pending() == 0; });
+               },
+               "the service reads the log devices") &&
+           (m_settler.request("FLUSH", m_patience_ms) == "OK" || fail("FLUSH"));
 }
 
 // What the service has not written yet when the script ends is lost with it.
@@ -130,7 +199,7 @@ bool ScriptPlayer::wait_until(const std::function<bool()>& condition, const std:
         if (!m_service.alive()) {
             return fail("the service does not run");
         }
-        if (waited_ms >= PATIENCE_MS) {
+        if (waited_ms >= m_patience_ms) {
             return fail("did not come about: " + what);
         }
         usleep(STEP_MS * 1000);

@@ -9,7 +9,9 @@
 #define SIM_SCRIPTPLAYER_H_
 
 #include <functional>
+#include <map>
 #include <string>
+#include <vector>
 
 #include "sim/ServiceProcess.h"
 #include "sim/SimControlClient.h"
@@ -28,13 +30,22 @@ public:
     // Plays the whole script, once for each object. False with error() set: what failed in
     // which line, and the end of the service's log.
     bool play(const std::string& script_file);
+    // In steps: reads the script, and plays its lines as often as wanted. Again: without what
+    // makes and starts the handset. Patient: the first line that fails is the last one. Otherwise
+    // what comes behind it is given less and less time.
+    bool read(const std::string& script_file);
+    enum Round { FIRST, AGAIN };
+    bool play_lines(Round round, bool patient = true);
+    // Everything around the service is as it is before a round, and the service has come to
+    // rest: all that was logged is on the media.
+    bool put_in_order();
 
     // What came of it, as text without times.
     const std::string& outcome() const { return m_outcome; }
     const std::string& error() const { return m_error; }
     const std::string& root() const { return m_handset.root(); }
 
-private:
+protected:
     // For anything to come about; no loaded machine misses it.
     static constexpr int PATIENCE_MS = 60000;
 
@@ -42,7 +53,7 @@ private:
     struct CommandRow;
     static const CommandRow COMMANDS[];
 
-    bool play_line(const std::string& line);
+    bool play_line(const std::string& line, Round round);
     // The commands; args is the rest of the line.
     bool configure(const std::string& args);
     bool add_cp(const std::string& args);
@@ -54,6 +65,7 @@ private:
     bool queue_log(const std::string& args);
     bool feed_pcm(const std::string& args);
     bool crash_dsp(const std::string& args);
+    bool capture_iq(const std::string& args);
     bool send_diag(const std::string& args);
     bool await_diag_request(const std::string& args);
     bool tell_by_supervisor(const std::string& args);
@@ -72,13 +84,23 @@ private:
     // The modem's diag device; null with error() set.
     SimDiagDevice* diag_device(const std::string& cp_name);
     bool bytes_of(const std::string& text, std::string* bytes);
-    bool feed(SimLogDevice& device, const std::string& bytes, bool until_read);
+    bool feed(SimLogDevice& device, const std::string& bytes, bool until_read,
+              std::string* fed = nullptr);
+    bool feed_cp(const std::string& args, bool until_read);
     bool wait_until(const std::function<bool()>& condition, const std::string& what);
     bool fail(const std::string& reason);
     void tell(const std::string& line) { m_outcome += line + "\n"; }
 
+    struct Line {
+        std::string place;  // for messages
+        std::string text;
+    };
+
     const std::string m_program;
     const bool m_keep_root;
+    int m_patience_ms = PATIENCE_MS;
+    std::vector<Line> m_lines;
+    std::map<std::string, std::string> m_fed;  // all that a CP has logged
     SimSizes m_sizes;
     SimHandset m_handset;
     ServiceProcess m_service;

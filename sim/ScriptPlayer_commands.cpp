@@ -67,8 +67,9 @@ bool ScriptPlayer::configure(const std::string& args) {
 }
 
 bool ScriptPlayer::add_cp(const std::string& name) {
-    const bool added =
-        name == "agdsp" ? m_handset.add_audio_dsp() : m_handset.add_cp(name) != nullptr;
+    const bool added = name == "agdsp"    ? m_handset.add_audio_dsp()
+                       : name == "iq_mem" ? m_handset.add_iq_memory()
+                                          : m_handset.add_cp(name) != nullptr;
     return added || fail(m_handset.error());
 }
 
@@ -107,8 +108,9 @@ bool ScriptPlayer::set_time(const std::string& args) {
     if (!parse_number(args, &seconds) || seconds == 0) {
         return fail("neither seconds since 1970 nor gone: " + args);
     }
-    m_handset.time_service().set_time(seconds);
-    return true;
+    TimeService& service = m_handset.time_service();
+    service.set_time(seconds);
+    return service.running() || service.start(m_handset.root()) || fail("no time service");
 }
 
 bool ScriptPlayer::start(const std::string&) {
@@ -152,11 +154,15 @@ SimDiagDevice* ScriptPlayer::diag_device(const std::string& cp_name) {
     return &cp->diag;
 }
 
-bool ScriptPlayer::feed(SimLogDevice& device, const std::string& bytes, bool until_read) {
+bool ScriptPlayer::feed(SimLogDevice& device, const std::string& bytes, bool until_read,
+                        std::string* fed) {
     for (size_t done = 0; done < bytes.size();) {
         const ssize_t n = device.feed(&bytes[done], std::min(BLOCK, bytes.size() - done));
         if (n <= 0) {
             return fail("the device is full");
+        }
+        if (fed) {
+            fed->append(bytes, done, static_cast<size_t>(n));
         }
         done += static_cast<size_t>(n);
         if (until_read &&
@@ -168,17 +174,22 @@ bool ScriptPlayer::feed(SimLogDevice& device, const std::string& bytes, bool unt
 }
 
 bool ScriptPlayer::feed_log(const std::string& args) {
-    std::string text = args;
-    std::string bytes;
-    SimLogDevice* device = log_device(take_script_word(&text));
-    return device && bytes_of(text, &bytes) && feed(*device, bytes, true);
+    return feed_cp(args, true);
 }
 
 bool ScriptPlayer::queue_log(const std::string& args) {
+    return feed_cp(args, false);
+}
+
+bool ScriptPlayer::feed_cp(const std::string& args, bool until_read) {
     std::string text = args;
     std::string bytes;
-    SimLogDevice* device = log_device(take_script_word(&text));
-    return device && bytes_of(text, &bytes) && feed(*device, bytes, false);
+    const std::string cp_name = take_script_word(&text);
+    SimLogDevice* device = log_device(cp_name);
+    if (!device || !bytes_of(text, &bytes)) {
+        return false;
+    }
+    return feed(*device, bytes, until_read, &m_fed[cp_name]);
 }
 
 bool ScriptPlayer::feed_pcm(const std::string& args) {
@@ -205,6 +216,20 @@ bool ScriptPlayer::crash_dsp(const std::string& args) {
     return wait_until([&] { return dsp.dumps_taken() > taken; }, "the service takes the dump");
 }
 
+bool ScriptPlayer::capture_iq(const std::string& args) {
+    SimIqDevice& iq = m_handset.iq_memory();
+    std::string bytes;
+    if (!iq.exists() || !bytes_of(args, &bytes)) {
+        return fail("no iq_mem or no bytes");
+    }
+    const unsigned released = iq.released();
+    if (!wait_until([&] { return iq.in_use() && !iq.filled(); }, "the I/Q memory is in use") ||
+        !iq.announce_bytes(bytes)) {
+        return fail("the I/Q memory takes no buffer of this size now");
+    }
+    return wait_until([&] { return iq.released() > released; }, "the service saves the buffer");
+}
+
 bool ScriptPlayer::send_diag(const std::string& args) {
     std::string text = args;
     std::string bytes;
@@ -212,7 +237,7 @@ bool ScriptPlayer::send_diag(const std::string& args) {
     if (!device || !bytes_of(text, &bytes)) {
         return false;
     }
-    return device->write_reply(bytes.data(), bytes.size(), PATIENCE_MS) ||
+    return device->write_reply(bytes.data(), bytes.size(), m_patience_ms) ||
            fail("the service does not read the diag device");
 }
 
@@ -227,7 +252,7 @@ bool ScriptPlayer::await_diag_request(const std::string& args) {
     if (!parse_number(text, &count)) {
         return fail("not a number of bytes: " + text);
     }
-    const std::vector<uint8_t> bytes = device->read_request(count, PATIENCE_MS);
+    const std::vector<uint8_t> bytes = device->read_request(count, m_patience_ms);
     tell("diag device of " + cp_name + ": " +
          show_bytes_line(std::string(bytes.begin(), bytes.end())));
     return bytes.size() >= count || fail("fewer bytes on the diag device");
@@ -270,7 +295,7 @@ bool ScriptPlayer::client_send(const std::string& args) {
 
 bool ScriptPlayer::client_reply(const std::string&) {
     std::string line;
-    if (!m_client.reply(&line, PATIENCE_MS)) {
+    if (!m_client.reply(&line, m_patience_ms)) {
         return fail("no reply");
     }
     tell("service: " + line);
@@ -279,7 +304,7 @@ bool ScriptPlayer::client_reply(const std::string&) {
 
 bool ScriptPlayer::client_notice(const std::string&) {
     std::string line;
-    if (!m_client.notification(&line, PATIENCE_MS)) {
+    if (!m_client.notification(&line, m_patience_ms)) {
         return fail("no notification");
     }
     tell("service: " + line);

@@ -13,11 +13,11 @@
 
 namespace {
 
-// "NAME=added", with what the variable holds already behind it.
-std::string extended_variable(const std::string& name, const std::string& added,
-                              const char* separator) {
+// "NAME=added", with what the variable holds already in front of it: a library that somebody
+// preloads has the calls first.
+std::string extended_variable(const std::string& name, const std::string& added) {
     const char* old = getenv(name.c_str());
-    return name + "=" + added + (old && *old ? separator + std::string(old) : "");
+    return name + "=" + (old && *old ? old + std::string(":") : "") + added;
 }
 
 }  // namespace
@@ -46,9 +46,9 @@ bool ServiceProcess::start(const std::string& program, const SimHandset& handset
         // LD_PRELOAD separates at blanks and colons, which the path may have; a descriptor
         // that the service inherits has neither.
         const std::string inherited = "/proc/self/fd/" + std::to_string(library);
-        env.push_back(extended_variable("LD_PRELOAD", inherited, ":"));
+        env.push_back(extended_variable("LD_PRELOAD", inherited));
         // A build with the address sanitizer wants its own library in front.
-        env.push_back(extended_variable("ASAN_OPTIONS", "verify_asan_link_order=0", ":"));
+        env.push_back(extended_variable("ASAN_OPTIONS", "verify_asan_link_order=0"));
     }
     start.inherited = library;
     const bool started = ChildProcess::start(start);

@@ -57,6 +57,14 @@ bool SimIqDevice::announce(uint32_t offset, uint32_t len) {
     return m_node.feed(&ready, 1) == 1;
 }
 
+bool SimIqDevice::announce_bytes(const std::string& bytes) {
+    if (filled() || bytes.size() > IQ_MEMORY_SIZE) {
+        return false;
+    }
+    memcpy(m_memory.data(), bytes.data(), bytes.size());
+    return announce(0, static_cast<uint32_t>(bytes.size()));
+}
+
 bool SimIqDevice::fill(uint32_t offset, uint32_t len, uint32_t seed) {
     if (filled()) {
         return false;

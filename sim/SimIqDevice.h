@@ -31,6 +31,8 @@ public:
     void write_samples(uint32_t offset, uint32_t len, uint32_t seed);
     // The part is ready to be saved. False while the service has not released the last one.
     bool announce(uint32_t offset, uint32_t len);
+    // A buffer of these bytes, at the start of the memory.
+    bool announce_bytes(const std::string& bytes);
     // Both.
     bool fill(uint32_t offset, uint32_t len, uint32_t seed);
     // Whether the file holds exactly the samples of this seed.

@@ -57,6 +57,7 @@ StreamCheck::Result StreamCheck::result(uint64_t fed, uint64_t unread) const {
         if (p.start > covered) {
             r.first_lost = r.lost == 0 ? covered : r.first_lost;
             r.lost += p.start - covered;
+            r.gaps.push_back({covered, p.start});
         } else if (p.start < covered) {
             r.first_doubled = r.doubled == 0 ? p.start : r.first_doubled;
             r.doubled += std::min(end, covered) - p.start;

@@ -19,7 +19,12 @@ public:
     static constexpr size_t RECORD_SIZE = 16;       // time record at the head of a modem file
     static constexpr uint64_t BUFFER_SIZE = 65536;  // of the service, for each log file
 
+    struct Gap {
+        uint64_t start;
+        uint64_t end;
+    };
     struct Result {
+        std::vector<Gap> gaps;  // what is lost, in order
         uint64_t fed = 0;
         uint64_t kept = 0;     // bytes of the stream in files that are there
         uint64_t trimmed = 0;  // bytes of the stream in files that were deleted

@@ -27,6 +27,7 @@ public:
     bool start(const std::string& root);
     // The service is gone: nobody listens any more. start() brings it back.
     void stop();
+    bool running() const { return m_listen >= 0; }
 
     // Answer after this many milliseconds; 0 as soon as asked.
     void set_delay(int ms) { m_delay_ms = ms; }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The scenes of the demo, each a function that plays on the stage in its own words: what
 // is done, what is seen, what is checked. A scene leaves everything as it found it, so
-// that scenes can be taken out, put in and moved in the list (Demo.cpp).
+// that scenes can be taken out, put in and moved in the list (Demo.cpp), and played again.
 #ifndef SIM_SCENES_SCENES_H_
 #define SIM_SCENES_SCENES_H_
 

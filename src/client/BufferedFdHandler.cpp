@@ -18,9 +18,9 @@ void BufferedFdHandler::process(int /*events*/) {
     } else if (n > 0) {
         m_data_len += static_cast<size_t>(n);
         process_data();
-    } else if (errno == EAGAIN) {
+    } else if (errno == EAGAIN || errno == EINTR) {
         note_idle("connection");
-    } else if (errno != EINTR) {
+    } else {
         process_conn_error(errno);
     }
 }

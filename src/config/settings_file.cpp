@@ -117,6 +117,12 @@ bool is_cut_default(const char* path, const char* default_path, off_t unit) {
     return cut;
 }
 
+// A default that cannot be read does not even begin the copy.
+bool is_empty(const char* path) {
+    struct stat st;
+    return lstat(path, &st) == 0 && S_ISREG(st.st_mode) && st.st_size == 0;
+}
+
 }  // namespace
 
 int put_settings(const char* path, const String8& text) {
@@ -142,7 +148,7 @@ void copy_default_settings(const char* default_path, const char* path) {
     }
     // What could not be opened for the copy is not the copy's to delete.
     const int error = errno;
-    if (is_cut_default(path, default_path, 1) && unlink(path) == 0) {
+    if ((is_empty(path) || is_cut_default(path, default_path, 1)) && unlink(path) == 0) {
         errno = error;
         err_log("incomplete copy %s deleted", path);
     }

@@ -2,7 +2,10 @@
 
 #include "core/Multiplexer.h"
 
+#include <errno.h>
+
 #include "core/FdHandler.h"
+#include "core/poll_error.h"
 
 size_t Multiplexer::find(const android::Vector<PollEntry>& entries, const FdHandler* h) {
     size_t i = 0;
@@ -141,7 +144,11 @@ void Multiplexer::run_once() {
         timeout = -1;
     }
     const int ready = poll(m_poll_fds, static_cast<nfds_t>(m_poll_num), timeout);
+    const int error = errno;
     m_timer_mgr.process_timers();
+    if (ready < 0) {
+        wait_after_failed_poll(error);
+    }
     if (ready <= 0) {
         return;
     }

@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "core/log.h"
+#include "core/poll_error.h"
 #include "iq/WcdmaIqManager.h"
 
 namespace {
@@ -25,11 +26,17 @@ IqStorRespHandler::IqStorRespHandler(int fd, LogController* ctrl, Multiplexer* m
 void IqStorRespHandler::process(int /*events*/) {
     uint8_t response;
     ssize_t n;
+    bool answered = false;
     while ((n = read(m_fd, &response, 1)) > 0) {
+        answered = true;
         m_manager->process_stor_response(response);
     }
     if (n == 0 || (errno != EAGAIN && errno != EINTR)) {
         m_manager->process_thread_lost();  // destroys this
+    } else if (answered) {
+        note_alive();
+    } else {
+        note_idle("I/Q saving thread");
     }
 }
 
@@ -64,6 +71,7 @@ int IqStorRespHandler::wait_response() {
         if (n == 0 || (errno != EAGAIN && errno != EINTR)) {
             return -1;
         }
+        wait_after_failed_poll(errno);
     }
 }
 

@@ -8,6 +8,7 @@
 
 #include "core/SavedErrno.h"
 #include "core/log.h"
+#include "core/poll_error.h"
 #include "iq/IqStorRespHandler.h"
 #include "iq/WcdmaIqManager.h"
 #include "iq/iq_mem.h"
@@ -17,8 +18,6 @@ namespace {
 // Between two chunks the thread looks for a command.
 constexpr uint32_t CHUNK_SIZE = 10u << 20;
 constexpr int NO_COMMAND = -1;
-// A poll that fails is not tried again at once.
-constexpr unsigned int POLL_FAILED_WAIT_US = 100000;
 
 }  // namespace
 
@@ -53,9 +52,7 @@ void* WcdmaIqManager::save_thread(void* param) {
         pfd.fd = manager->m_thread_sock;
         pfd.events = POLLIN;
         pfd.revents = 0;
-        if (poll(&pfd, 1, -1) < 0 && errno != EINTR) {
-            usleep(POLL_FAILED_WAIT_US);  // and reads all the same: a command may be there
-        }
+        poll(&pfd, 1, -1);  // after a failure it reads all the same: a command may be there
         switch (manager->next_command()) {
             case IQST_QUIT:
                 running = false;
@@ -67,6 +64,7 @@ void* WcdmaIqManager::save_thread(void* param) {
                 running = manager->process_save();
                 break;
             default:
+                usleep(POLL_FAILED_WAIT_US);  // the poll failed or promised too much
                 break;
         }
     }

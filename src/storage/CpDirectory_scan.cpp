@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The part of CpDirectory that finds out what is on the medium.
 #include <errno.h>
+#include <string.h>
 #include <sys/stat.h>
 
 #include <algorithm>
@@ -72,7 +73,14 @@ void CpDirectory::insert_scanned(LogFile** files, size_t num) {
         if (a->time() < b->time() || b->time() < a->time()) {
             return a->time() < b->time();
         }
-        return number(a) > number(b);
+        if (number(a) != number(b)) {
+            return number(a) > number(b);
+        }
+        // Of two log files with one number the older was set aside: "-1" stands in front of
+        // its ".log".
+        const bool logs = a->type() == LT_LOG && b->type() == LT_LOG;
+        return logs ? strcmp(a->name().string(), b->name().string()) < 0
+                    : a->type() != LT_LOG && b->type() == LT_LOG;
     });
     // Unknown files each go ahead of those found before.
     std::reverse(files, std::find_if(files, files + num,

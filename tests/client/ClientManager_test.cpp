@@ -74,6 +74,13 @@ TEST_F(ClientManagerTest, NoDescriptorsLeft) {
     faults::reset();
     talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
     EXPECT_EQ(manager->idle_wakeups(), 0u);
+    // So does a connection whose every read is interrupted.
+    ASSERT_TRUE(client.say("GET_LOG_FILE_SIZE\n"));
+    faults::fail(faults::READ, 1, EINTR, faults::FOREVER);
+    const int reads = faults::calls(faults::READ);
+    pass(15);
+    EXPECT_EQ(faults::calls(faults::READ) - reads, 10);
+    faults::reset();
 }
 
 TEST_F(ClientManagerTest, NameThatIsTaken) {

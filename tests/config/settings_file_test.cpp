@@ -156,6 +156,13 @@ TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
     EXPECT_TRUE(refused("22") && unlink(file.c_str()) == 0) << "a FIFO, which stays";
     ASSERT_EQ(symlink("/proc/self/mem", file.c_str()), 0);
     EXPECT_TRUE(refused("5")) << "a read error is no end";
+    // A default that cannot be read: it left an empty file, that is, settings without streams.
+    unlink(file.c_str());
+    faults::only_on("");
+    faults::fail(faults::READ, 1, EIO, faults::FOREVER);
+    EXPECT_TRUE(refused("2"));
+    EXPECT_FALSE(root.exists("kest_modem.conf"));
+    faults::reset();
 }
 
 }  // namespace

@@ -115,6 +115,8 @@ TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
         30, [](void* n) { ++*static_cast<int*>(n); }, &fired);
     poll_error = EINTR;
     LogCapture log;
+    std::vector<useconds_t> pauses;
+    faults::instead.usleep = [&](useconds_t us) { return pauses.push_back(us), 0; };
     mux.run_once();
     EXPECT_EQ(waited, 30);
     EXPECT_EQ(fired, 0);
@@ -124,6 +126,11 @@ TEST_F(MultiplexerTest, FailedPollRunsTimersButNoHandlers) {
     EXPECT_EQ(fired, 1);
     EXPECT_EQ(probe->calls, ONE_INPUT);
     EXPECT_EQ(log.text(), "");
+    // Only after a signal it is tried again at once.
+    EXPECT_TRUE(pauses.empty());
+    poll_error = ENOMEM;
+    mux.run_once();
+    EXPECT_EQ(pauses, std::vector<useconds_t>(1, 100000));
 }
 
 TEST_F(MultiplexerTest, TimersAndThenHandlersMayDestroyHandlers) {

@@ -27,15 +27,16 @@ struct Script {
     int refused_cmd = -1;        // this command to the thread is not taken
     bool no_threads = false;
     bool impatient = false;     // no poll of the loop's thread waits for longer than 1 ms
-    int pair[2];                // the connection to the thread: the loop's end, the thread's
+    int pair[2] = {-1, -1};     // the connection to the thread: the loop's end, the thread's
     size_t gate_at = SIZE_MAX;  // at this step the thread waits at the gate
     // Without a lock, which would put the threads in order.
     std::atomic<bool> shut{false}, reached{false};
     std::atomic<int> saved_sent{0};
     std::atomic<bool> no_polls[2]{{false}, {false}};  // of the thread, of the loop
-    std::atomic<int> failed_polls{0};
-    std::atomic<time_t> time{1456823700};  // 2016-03-01 09:15:00
-    std::atomic<int> tick{1};              // every call of time() is so much later
+    std::atomic<bool> no_reads[2]{{false}, {false}};  // likewise, from the other one
+    std::atomic<int> failures{0};                     // of these
+    std::atomic<time_t> time{1456823700};             // 2016-03-01 09:15:00
+    std::atomic<int> tick{1};                         // every call of time() is so much later
 
     void pass(size_t step) {
         for (; step == gate_at && shut.load(std::memory_order_relaxed); usleep(200)) {
@@ -87,7 +88,7 @@ ssize_t scripted_write(Script& script, int fd, const void* data, size_t len) {
 int scripted_poll(Script& script, struct pollfd* fds, nfds_t num, int timeout) {
     const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
     if (script.no_polls[in_main]) {
-        ++script.failed_polls;
+        ++script.failures;
         errno = ENOMEM;
         return -1;
     }
@@ -100,6 +101,15 @@ void follow(Script& script) {
     };
     faults::instead.poll = [&script](struct pollfd* fds, nfds_t num, int timeout) {
         return scripted_poll(script, fds, num, timeout);
+    };
+    faults::instead.read = [&script](int fd, void* data, size_t len) {
+        const bool in_main = fd == script.pair[0];
+        if ((!in_main && fd != script.pair[1]) || !script.no_reads[in_main]) {
+            return real::read(fd, data, len);
+        }
+        ++script.failures;
+        errno = EAGAIN;
+        return ssize_t{-1};
     };
     faults::instead.time = [&script](time_t* result) {
         const time_t now = script.time += script.tick;
@@ -358,10 +368,31 @@ TEST_F(WcdmaIqManagerTest, AThreadThatCannotPollNeitherSpinsNorIsStuck) {
     const int64_t begin = monotonic_ms();
     ASSERT_TRUE(save("one"));
     ASSERT_TRUE(save("two"));
-    EXPECT_TRUE(wait_until([&] { return script.failed_polls >= 6; }));
+    EXPECT_TRUE(wait_until([&] { return script.failures >= 9; }));
     EXPECT_GE(monotonic_ms() - begin, 500);
     EXPECT_EQ(iq->stop(), 0);
     EXPECT_EQ(newest(), "two");
+}
+
+// Both ends of a connection that is ready and gives nothing.
+TEST_F(WcdmaIqManagerTest, AConnectionThatGivesNothingIsLeftAlone) {
+    boot_clock::freeze();
+    ASSERT_EQ(start(), 0);
+    script.no_reads[0] = true;
+    const int64_t begin = monotonic_ms();
+    ASSERT_TRUE(begin_save("one"));
+    EXPECT_TRUE(wait_until([&] { return script.failures >= 6; }));
+    EXPECT_GE(monotonic_ms() - begin, 500);
+    script.no_reads[1] = true;
+    script.no_reads[0] = false;
+    ASSERT_TRUE(wait_until([&] { return script.saved_sent == 1; }));
+    script.failures = 0;
+    pass(15);
+    EXPECT_EQ(script.failures, 10);
+    script.no_reads[1] = false;
+    boot_clock::advance(3000);
+    EXPECT_TRUE(saved(1));
+    EXPECT_EQ(newest(), "one");
 }
 
 // It made thousands of empty files a second.

@@ -47,17 +47,20 @@ protected:
     }
 };
 
-// Kinds that share a second: the logs by falling number, whatever stands between them.
+// Kinds that share a second: the logs by falling number, whatever stands between them. Of one
+// number, what was set aside is older.
 // Unknown files lead, each ahead of the ones found before.
 TEST_F(CpDirectoryTest, ScanOrder) {
     const std::string early = "smsg_2016-03-01_09-59-59.log", late = "a_2016-03-01_10-00-01.dmp",
-                      next_hour = log_name(41, "11-00-00"), dump = "mini_dump_2016-03-01_10-00-00.";
+                      next_hour = log_name(41, "11-00-00"), aside = log_name(0, "10-00-00-1"),
+                      aside_later = log_name(0, "10-00-00-2"),
+                      dump = "mini_dump_2016-03-01_10-00-00.";
     for (int i = 0; i < 40; ++i) {
         m_root.write_file(DIR_REL + log_name((i * 7) % 40), "x");
         m_root.write_file(DIR_REL + dump + std::to_string(i), "x");
         m_root.write_file(DIR_REL + "u" + std::to_string(i), "x");
     }
-    for (const std::string& name : {early, late, next_hour}) {
+    for (const std::string& name : {early, late, next_hour, aside, aside_later}) {
         m_root.write_file(DIR_REL + name, "x");
     }
     put(DIR_REL + "a.version", (1ull << 32) + 1);
@@ -71,18 +74,19 @@ TEST_F(CpDirectoryTest, ScanOrder) {
     }
     closedir(dir);
     expected.push_back(early);
-    for (int number = 39; number >= 0; --number) {
+    for (int number = 39; number > 0; --number) {
         expected.push_back(log_name(number));
     }
-    expected.insert(expected.end(), {late, next_hour, "a.version"});
+    expected.insert(expected.end(),
+                    {aside, aside_later, log_name(0), late, next_hour, "a.version"});
     ASSERT_NO_FATAL_FAILURE(start());
     Names names = file_names(*m_dir);
-    EXPECT_EQ(names.size(), 124u);
+    EXPECT_EQ(names.size(), 126u);
     names.erase(std::remove_if(names.begin(), names.end(),
                                [&](const std::string& name) { return name.find(dump) == 0; }),
                 names.end());
     EXPECT_EQ(names, expected);
-    EXPECT_EQ(m_dir->size(), (1ull << 32) + 124);
+    EXPECT_EQ(m_dir->size(), (1ull << 32) + 126);
 }
 
 // A walk along the list for every file would compare two million times.

@@ -8,7 +8,6 @@
 
 #include <algorithm>
 #include <atomic>
-#include <type_traits>
 
 namespace {
 
@@ -56,15 +55,6 @@ bool fails(faults::Call call, First first, Rest... /*rest*/) {
     fault.hit = true;
     errno = fault.error;
     return true;
-}
-
-template <typename Result>
-Result failure() {
-    if constexpr (std::is_pointer_v<Result>) {
-        return reinterpret_cast<Result>(-1);
-    } else {
-        return static_cast<Result>(-1);
-    }
 }
 
 // The bytes of a transfer that are left when it is to be short.
@@ -187,7 +177,7 @@ void fail() {
 #define WRAP(usual, NAME, name, result, params, args)                               \
     extern "C" result __wrap_##name params {                                        \
         if (fails(faults::NAME, ARGUMENTS args)) {                                  \
-            return failure<result>();                                               \
+            return faults::failure<result>();                                       \
         }                                                                           \
         return faults::instead.name ? faults::instead.name args : usual::name args; \
     }                                                                               \
