@@ -60,7 +60,7 @@ std::string without_root(const char* text) {
     trace("killed");
     world().service_dies();
     ledger::excuse_kill();
-    _exit(LIFE_KILLED);
+    end_life(LIFE_KILLED);
 }
 
 // What every call of the service begins with: 0, the errno to fail with, or SHORT_COUNT.
@@ -243,6 +243,18 @@ void trace(const char* format, ...) {
     }
 }
 
+#if defined(KEST_COVERAGE)
+extern "C" void __gcov_dump();
+#endif
+
+void end_life(LifeEnd end) {
+    const Outside outside;
+#if defined(KEST_COVERAGE)
+    __gcov_dump();  // what this process counted
+#endif
+    _exit(end);
+}
+
 void fail_run(const char* failure_class, const char* format, ...) {
     const Outside outside;
     snprintf(g_state->failure_class, sizeof(g_state->failure_class), "%s", failure_class);
@@ -254,7 +266,7 @@ void fail_run(const char* failure_class, const char* format, ...) {
     if (getenv("SIMULATION_ABORT")) {
         abort();  // a stack trace is wanted
     }
-    _exit(LIFE_FAILED);
+    end_life(LIFE_FAILED);
 }
 
 #define REAL(result, name, ...) extern "C" result __real_##name(__VA_ARGS__)

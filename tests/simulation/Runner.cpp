@@ -64,7 +64,7 @@ void live(const std::string& root, const Plan& plan) {
             // Whoever starts it does so again, some time later.
             trace("start failed");
             world.pass_without_service(RESTART_NS);
-            _exit(g_plan_over ? LIFE_OVER : LIFE_KILLED);
+            end_life(g_plan_over ? LIFE_OVER : LIFE_KILLED);
         }
         g_state->starting = false;
         while (!g_plan_over) {
@@ -104,7 +104,7 @@ RunResult run_plan(const Plan& plan, int trace_fd) {
         const pid_t child = fork();
         if (child == 0) {
             live(root, plan);
-            _exit(LIFE_OVER);
+            end_life(LIFE_OVER);
         }
         waitpid(child, &status, 0);
     } while (WIFEXITED(status) && WEXITSTATUS(status) == LIFE_KILLED);
