@@ -85,26 +85,4 @@ TEST_F(DeviceFileHandlerTest, ReportsFailuresButForRepeatsAndEndsInARest) {
     EXPECT_EQ(log.count(path + " return 0 ["), 4u) << "and the end of the file, once more";
 }
 
-// It stays open, and what it cannot give is no failure.
-TEST_F(DeviceFileHandlerTest, BorrowedDevice) {
-    int fds[2];
-    ASSERT_EQ(pipe2(fds, O_CLOEXEC | O_NONBLOCK), 0);
-    const size_t before = open_descriptors();
-    {
-        Recorder idle(fds[0], 100, nullptr, &mux);
-        Recorder unreadable(fds[1], 100, nullptr, &mux);
-        idle.process(POLLIN);
-        EXPECT_EQ(log.text(), "");
-        EXPECT_EQ(idle.idle_wakeups(), 1u);
-        unreadable.process(POLLIN);
-        unreadable.process(POLLIN);
-        EXPECT_EQ(log.count(": read  error [9(Bad file descriptor)]"), 1u);
-        ASSERT_EQ(idle.add_events(POLLIN | POLLOUT), 0);
-    }
-    EXPECT_EQ(Filler::free_slots(mux), Multiplexer::MAX_HANDLERS);
-    EXPECT_EQ(open_descriptors(), before);
-    close(fds[0]);
-    close(fds[1]);
-}
-
 }  // namespace

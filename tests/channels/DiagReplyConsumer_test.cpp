@@ -52,48 +52,6 @@ protected:
     std::unique_ptr<Client> client;
 };
 
-TEST_F(DiagReplyTest, EveryAnswerOfTheCp) {
-    for (const Kind& kind : KINDS) {
-        const std::string data = pattern_bytes(20000, 5) + "\x7e\x7d\x7e";
-        const auto reply = [&](int sub_type, const std::string& payload = "") {
-            return frame(kind.type, sub_type, payload);
-        };
-        const std::string other = frame(kind.type ^ 1, 1) + frame(kind.type ^ 1, 'd', "no") +
-                                  frame(0x98, 0x64, "log") + raw_frame("short") + "noise";
-        const struct {
-            const char* what;
-            std::string bytes;
-            std::string result;
-            std::string file;
-        } cases[] = {
-            {"data", reply('d', data) + reply('d') + reply('d', data) + reply(1), "OK\n",
-             data + data},
-            {"nothing", reply(1), "OK\n", ""},
-            {"too much", reply('d', "x") + reply(1, "ignored") + reply('d', "late"), "OK\n", "x"},
-            {"others between", other + reply('d', "a") + other + reply('d', "b") + other + reply(1),
-             "OK\n", "ab"},
-            {"not served", reply('d', "a") + reply(0, "why"), kind.not_served, NONE},
-            {"unknown", reply('d', "a") + reply(2), "ERROR 3\n", NONE},
-        };
-        ASSERT_NO_FATAL_FAILURE(begin(kind.type == 0x3A));
-        Client other_client;
-        ASSERT_EQ(ask(other_client, "FLUSH\n", "OK\n"), "OK\n");
-        const auto before = resources();
-        for (const auto& c : cases) {
-            SCOPED_TRACE(kind.request + c.what);
-            ASSERT_TRUE(request(kind));
-            EXPECT_EQ(ask(other_client, kind.request, "ERROR 4\n"), "ERROR 4\n");
-            ASSERT_TRUE(supply(diag_dev, c.bytes));
-            EXPECT_EQ(hear(*client, c.result), c.result);
-            EXPECT_EQ(modem()->state(), CWS_WORKING);
-            EXPECT_TRUE(result_file(kind) == c.file);
-        }
-        EXPECT_EQ(resources(), before);
-        EXPECT_TRUE(both_log("<end>"));
-        end_service();
-    }
-}
-
 TEST_F(DiagReplyTest, AResultThatCannotBeStored) {
     const Kind& kind = KINDS[0];
     const std::string block = frame(kind.type, 'd', std::string(32000, 'x'));

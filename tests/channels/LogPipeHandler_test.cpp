@@ -62,58 +62,6 @@ TEST_F(LogPipeHandlerTest, ReopensADeviceThatFailedOrWasMissing) {
     EXPECT_EQ(open_descriptors(), before + 1) << "the FIFO of this test";
 }
 
-// A storage that fails, or nothing there to read, changes nothing about the device.
-TEST_F(LogPipeHandlerTest, GoesOnAfterAStorageFailure) {
-    const Fifo fifo(root.path("gnss"));
-    ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
-    gnss = ctrl->get_cp(CT_GNSS);
-    ASSERT_EQ(fcntl(gnss->fd(), F_SETFL, O_NONBLOCK | O_APPEND), 0);
-    gnss->process(0);
-    EXPECT_EQ(root.tree("data"), std::vector<std::string>{});
-    remove_tree("data/modem_log");
-    root.write_file("data/modem_log", "in the way");
-    ASSERT_TRUE(feed(fifo, "lost"));
-    EXPECT_EQ(log.count("void LogPipeHandler::process(int): CP cp_gnss save log error ["), 1u);
-    remove_tree("data/modem_log");
-    ASSERT_TRUE(feed(fifo, "kept"));
-    gnss->flush();
-    EXPECT_EQ(content("cp_gnss"), "kept");
-    EXPECT_TRUE(fcntl(gnss->fd(), F_GETFL) & O_APPEND) << "not opened again";
-}
-
-// Both are ready for ever: they took a whole core. The memory has no byte at its start.
-TEST_F(LogPipeHandlerTest, DeviceThatGivesNothingIsLeftAlone) {
-    boot_clock::freeze();
-    const struct {
-        const char* device;
-        size_t lines;  // of each wake-up
-    } cases[] = {{"/dev/null", 1}, {"/proc/self/mem", 0}};
-    for (const auto& c : cases) {
-        const std::string name = root.path("gnss");
-        ASSERT_EQ(symlink(c.device, name.c_str()), 0);
-        ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
-        gnss = ctrl->get_cp(CT_GNSS);
-        for (size_t wakeups : {10u, 11u}) {
-            pass(15);
-            EXPECT_EQ(log.count("read returns 0"), wakeups * c.lines);
-            boot_clock::advance(3000);
-        }
-        EXPECT_EQ(log.count("log device of cp_gnss gave nothing 10 times in a row"), 1u);
-        // A CP that has come up deserves a fresh start; so does one whose log is switched on.
-        gnss->process_alive();
-        pass(15);
-        EXPECT_EQ(log.count("read returns 0"), 21 * c.lines);
-        ASSERT_EQ(unlink(name.c_str()), 0);
-        const Fifo fifo(name);
-        gnss->stop();
-        gnss->start();
-        EXPECT_TRUE(feed(fifo, "data")) << c.device;
-        EXPECT_EQ(gnss->idle_wakeups(), 0u);
-        end_service();
-        ASSERT_EQ(unlink(name.c_str()), 0);
-    }
-}
-
 // No timer can be made then: the device stayed closed for good.
 TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
     boot_clock::fail();
@@ -156,23 +104,6 @@ TEST_F(LogPipeHandlerTest, WhatHeadsALogFileAndItsDirectory) {
     gnss->stop();
     EXPECT_EQ(content("cp_gnss", record), "data");
     EXPECT_EQ(files("cp_gnss"), Files{});
-}
-
-TEST_F(LogPipeHandlerTest, OpensOnceWhenTheCpIsAlive) {
-    const Fifo fifo(root.path("gnss"));
-    ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
-    gnss = ctrl->get_cp(CT_GNSS);
-    gnss->process_assert(false);
-    gnss->stop();
-    gnss->start();
-    EXPECT_EQ(gnss->fd(), -1) << "not before it is alive";
-    gnss->process_alive();
-    const int device = gnss->fd();
-    gnss->process_alive();
-    EXPECT_EQ(gnss->fd(), device) << "not opened twice";
-    ASSERT_TRUE(feed(fifo, "x"));
-    gnss->process_assert(false);
-    EXPECT_EQ(content("cp_gnss"), "x") << "nothing stays staged while the CP is down";
 }
 
 }  // namespace

@@ -22,48 +22,6 @@ protected:
     std::string dir_of(const std::string& path) const { return path.substr(0, path.rfind('/')); }
 };
 
-TEST_F(ModemDumpTest, KeepsEveryByteAndOnlyTheMarkerEndsIt) {
-    const std::string header(8, '\x11');
-    const std::string decoys =
-        raw_frame(header + END_TEXT + "!") + raw_frame(header + "!" + END_TEXT) +
-        raw_frame(header + END_TEXT.substr(0, 20)) + raw_frame(END_TEXT) +
-        raw_frame(header + "\nmodem_memdump_Finish") + raw_frame(header + END_TEXT + '\0') +
-        END_TEXT + header + END_TEXT + "\x7e";  // without an opening flag: opens the next frame
-    const std::string memory = pattern_bytes(300000, 1) + "\x7e\x7e";
-    boot_modem(false);
-    ASSERT_TRUE(begin_dump());
-    ASSERT_TRUE(supply(diag_dev, memory));
-    ASSERT_TRUE(supply(diag_dev, "\x7e" + decoys));
-    EXPECT_EQ(modem()->state(), CWS_DUMP);
-    // The card that comes and goes during a dump to the internal medium changes nothing.
-    for (bool card : {true, false}) {
-        set_card(card);
-        ASSERT_TRUE(both_log(card ? "<on the card>" : "<without it>"));
-        EXPECT_EQ(modem()->state(), CWS_DUMP);
-    }
-    EXPECT_EQ(log_files(root, "sd/modem_log", "cp_wcdma").size(), 1u);
-    // Split, the marker counts, too; what follows it in its chunk belongs to the file.
-    ASSERT_TRUE(supply(diag_dev, end_marker().substr(0, 20)));
-    EXPECT_EQ(modem()->state(), CWS_DUMP);
-    ASSERT_TRUE(supply(diag_dev, end_marker().substr(20) + "rest"));
-    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
-    EXPECT_TRUE(files() == (Files{{"data:" + DUMP_NAME + ".dmp",
-                                   memory + "\x7e" + decoys + end_marker() + "rest"}}));
-    modem()->process_alive();
-    EXPECT_TRUE(both_log("<after>"));
-    EXPECT_EQ(logged("cp_wcdma", "finish"), 0u);
-    // A dump that has ended does not mind the card any more: it is gone, memory and all.
-    mallopt(M_PERTURB, 0xa5);
-    set_card(true);
-    ASSERT_TRUE(both_log("<card>"));
-    ASSERT_TRUE(begin_dump());
-    ASSERT_TRUE(supply(diag_dev, end_marker()));
-    set_card(false);
-    modem()->process_alive();
-    EXPECT_TRUE(both_log("<no card>"));
-    mallopt(M_PERTURB, 0);
-}
-
 // Two modems fall silent: one after some data, one without an answer.
 TEST_F(ModemDumpTest, SilentModemsAreCopiedFromTheKernel) {
     Pty td_dev;

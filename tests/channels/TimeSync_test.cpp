@@ -86,69 +86,11 @@ protected:
     const pthread_t main = pthread_self();
 };
 
-TEST_F(TimeSyncTest, TheTimeServiceMayFailInEveryWay) {
-    const std::string reply("\1\2\3\4abcdefgh");
-    const std::string record = TAG + reply;
-    const char NO_SERVER[] = "save_timestamp(LogFile*): connect CP time sync server error [111(";
-    const char NO_INFO[] = "save_timestamp(LogFile*): can not read time info [";
-    const struct {
-        const char* what;
-        std::string reply;  // none: the service never answers
-        int missed;         // attempts to connect before it listens
-        std::string head;
-        const char* message;
-        int waited;
-    } cases[] = {
-        {"more than 12 bytes", reply + "more", 0, record, "", 1000},
-        {"absent", "", 10, "", NO_SERVER, -1},
-        {"late in both", "", 5, "", NO_INFO, 500},
-        {"listening late", reply, 9, record, "", 100},
-        {"11 bytes", reply.substr(0, 11), 0, "", NO_INFO, 1000},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.what);
-        std::unique_ptr<TimeServer> server;
-        SimSupervisor silent;  // never looks at its connections
-        loop = Record();
-        loop.answers = !c.reply.empty();
-        loop.on_sleep = [&] {
-            if (loop.slept == static_cast<useconds_t>(c.missed) * 100000) {
-                if (c.reply.empty()) {
-                    EXPECT_TRUE(silent.start("cp_time_sync_server", root.root()));
-                } else {
-                    server = std::make_unique<TimeServer>(c.reply);
-                }
-            }
-        };
-        loop.on_sleep();
-        EXPECT_EQ(start_file(), c.head + "log");
-        EXPECT_EQ(log.count("save_timestamp"), *c.message ? 1u : 0u) << log.text();
-        EXPECT_TRUE(log.has(c.message));
-        EXPECT_EQ(loop.slept, static_cast<useconds_t>(c.missed) * 100000);
-        EXPECT_EQ(loop.waited, c.waited);
-    }
-}
-
 // It would wait for ever.
 TEST_F(TimeSyncTest, HangingServicesDoNotBlockTheLoop) {
     FullService time_service("cp_time_sync_server"), modemd("modemd"), wcnd("external_wcn_kest");
     EXPECT_EQ(start_file(), "log");
     EXPECT_TRUE(log.has("connect CP time sync server error [11(")) << log.text();
-}
-
-TEST_F(TimeSyncTest, RecordAddsTheZoneModulo32Bits) {
-    const struct {
-        const char* tz;
-        std::string seconds, local;
-    } cases[] = {
-        {"XXX-8", std::string("\x40\x42\x0f\0", 4), std::string("\xc0\xb2\x0f\0", 4)},  // 1000000
-        {"XXX+1", std::string(4, '\0'), "\xf0\xf1\xff\xff"},
-    };
-    for (const auto& c : cases) {
-        const TimeServer server(c.seconds + "abcdefgh");
-        set_zone(c.tz);
-        EXPECT_EQ(start_file(), TAG + c.local + "abcdefghlog") << c.tz;
-    }
 }
 
 TEST_F(TimeSyncTest, ZoneIsTheDifferenceOfTheHoursFoldedAtMidnight) {

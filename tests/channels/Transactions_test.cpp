@@ -19,8 +19,6 @@ const Transaction RINGBUF = {
 const Transaction SLEEP_LOG = {
     false, "SAVE_SLEEP_LOG WCDMA\n", 0x3B, "_sleeplog_",
     "LogFile* CpSleepLogConsumer::open_file(): open sleep log file cp_wcdma_sleeplog"};
-const std::string START = "CP_DUMP_START WCDMA\n";
-const std::string END = "CP_DUMP_END WCDMA\n";
 
 class TransactionsTest : public FaultFixture {
 protected:
@@ -73,65 +71,6 @@ TEST_F(TransactionsTest, OneThatCannotStartLeavesNothingBehind) {
             EXPECT_TRUE(both_log("<again>"));
             EXPECT_TRUE(!c.unheard || diag_dev.received().empty());
             EXPECT_EQ(resources(), before);
-            end_service();
-        }
-    }
-}
-
-TEST_F(TransactionsTest, WhateverComesBetweenEveryoneIsAnsweredAndTheChannelLogsAgain) {
-    const auto reset = [&](const char* value) {
-        root.set_prop("persist.sys.vexa.modemreset", value);
-    };
-    const struct {
-        const char* what;
-        std::function<void()> interrupt;
-        const Transaction& transaction;
-        CpWorkState state;  // afterwards
-        std::string lines;  // that the subscriber has heard then
-    } cases[] = {
-        {"stop", [&] { modem()->stop(); }, DUMP, CWS_NOT_WORKING, START + END},
-        {"stop", [&] { modem()->stop(); }, RINGBUF, CWS_WORKING, ""},
-        {"assert", [&] { modem()->process_assert(false); }, DUMP, CWS_DUMP, START},
-        {"assert", [&] { modem()->process_assert(false); }, RINGBUF, CWS_DUMP, START},
-        {"assert of a CP that is reset",
-         [&] { reset("1"), modem()->process_assert(false), reset(""); }, SLEEP_LOG, CWS_NOT_WORKING,
-         ""},
-        {"alive", [&] { modem()->process_alive(); }, DUMP, CWS_WORKING, START + END},
-        {"alive", [&] { modem()->process_alive(); }, SLEEP_LOG, CWS_WORKING, ""},
-    };
-    for (const bool one_device : {false, true}) {
-        for (const auto& c : cases) {
-            SCOPED_TRACE(std::string(c.what) + " while " + c.transaction.file);
-            boot_modem(one_device);
-            ASSERT_TRUE(both_log("<start>"));
-            Client client;
-            Client subscriber;
-            ASSERT_EQ(ask(subscriber, "SUBSCRIBE WCDMA DUMP\n", "OK\n"), "OK\n");
-            ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
-            const auto before = resources();
-            ASSERT_TRUE(begin(c.transaction, client));
-            c.interrupt();
-            EXPECT_EQ(modem()->state(), c.state);
-            EXPECT_EQ(hear(subscriber, c.lines), c.lines);
-            if (!c.transaction.dump) {
-                EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
-            }
-            EXPECT_EQ(root.find("_memory_").size(), c.lines.empty() ? 0u : 1u);
-
-            // And back to normal, from whatever state.
-            if (!modem()->enabled()) {
-                modem()->start();
-            }
-            modem()->process_alive();
-            EXPECT_TRUE(both_log("<again>"));
-            const std::string end = c.lines == START ? END : "";
-            EXPECT_EQ(hear(subscriber, end), end);
-            EXPECT_EQ(resources(), before);
-            // The next one works and only it is answered.
-            ASSERT_TRUE(begin(RINGBUF, client));
-            ASSERT_TRUE(supply(diag_dev, frame(0x3A, 1)));
-            EXPECT_EQ(hear(client, "OK\n"), "OK\n");
-            EXPECT_EQ(client.heard() + subscriber.heard(), "");
             end_service();
         }
     }
@@ -202,21 +141,6 @@ TEST_F(TransactionsTest, ALoopWithoutRoomServesTransactions) {
         fillers.clear();
         end_service();
     }
-}
-
-// A try to open the log device that falls into a transaction is made up for afterwards.
-TEST_F(TransactionsTest, ALogDeviceThatIsMissingAtTheStartIsOpenedAfterATransaction) {
-    boot_modem(false);
-    modem()->stop();
-    modem()->set_dev_paths("/nowhere", diag_dev.path().c_str());
-    modem()->start();
-    modem()->set_dev_paths(log_dev->path().c_str(), diag_dev.path().c_str());
-    Client client;
-    ASSERT_TRUE(begin(RINGBUF, client));
-    run_clock(3100);
-    EXPECT_EQ(hear(client, "ERROR 3\n"), "ERROR 3\n");
-    ASSERT_GE(modem()->fd(), 0);
-    EXPECT_TRUE(both_log("<again>"));
 }
 
 }  // namespace

@@ -11,8 +11,6 @@
 
 namespace {
 
-const std::string ON = DEFAULTS + "stream\tcp_wcn\ton\t1\t1\n";
-
 class SettingsFileTest : public ConfigFixture {
 protected:
     SettingsFileTest() {
@@ -36,77 +34,11 @@ protected:
     }
     ~SettingsFileTest() override { faults::instead = {}; }
 
-    // A start with this text in the settings file finds the stream, on or off, and has
-    // nothing to say.
-    void expect_whole(const std::string& text) {
-        root.write_file("moment.conf", text);
-        LogConfig config(root.path("moment.conf").c_str());
-        log.clear();
-        EXPECT_EQ(read(config), 0);
-        EXPECT_TRUE(log.text().empty() && config.find_stream(CT_WCN)) << log.text() << text;
-    }
-
     // Called before each call that changes the file. False: it fails.
     std::function<bool()> before_change = [] { return true; };
     size_t most = SIZE_MAX;  // bytes that one write takes
     size_t room = SIZE_MAX;  // bytes that fit into the file
 };
-
-TEST_F(SettingsFileTest, KillsAndFaultsLeaveTheOldSettingsOrTheNew) {
-    most = 4096;  // a kill between two pages is a moment of its own
-    const std::string line = "stream cp_wcn off 1 1";
-    std::string commented = line;
-    while (commented.size() < 10000) {
-        commented += "\n# settings\n";
-    }
-    for (const std::string& old : {DEFAULTS + line + "    \n", commented, line}) {
-        for (int failing = 1; failing < 8; ++failing) {
-            SCOPED_TRACE(std::to_string(old.size()) + ", fault " + std::to_string(failing));
-            root.write_file("kest_modem.conf", old);
-            LogConfig config(file.c_str());
-            ASSERT_EQ(read(config), 0);
-            config.set_stream(CT_WCN, true);
-            std::vector<std::string> moments;
-            before_change = [&] {
-                moments.push_back(root.read_file("kest_modem.conf"));
-                return static_cast<int>(moments.size()) != failing;
-            };
-            const int result = config.save();
-            before_change = [] { return true; };
-            EXPECT_EQ(result, static_cast<int>(moments.size()) < failing ? 0 : -1);
-            EXPECT_EQ(config.dirty(), result < 0);
-            moments.push_back(root.read_file("kest_modem.conf"));
-            EXPECT_TRUE(failing > 1 || moments.back() == old);
-            for (const std::string& moment : moments) {
-                expect_whole(moment);
-            }
-            EXPECT_EQ(config.save(), 0);
-            EXPECT_EQ(root.read_file("kest_modem.conf"), ON);
-        }
-    }
-}
-
-TEST_F(SettingsFileTest, AFullMediumLeavesTheFileAsItWas) {
-    const mode_t mask = umask(0);
-    for (const std::string old : {"stream cp_wcn on 1 1\n", ""}) {  // "": it was deleted
-        LogConfig config(file.c_str());
-        root.write_file("kest_modem.conf", old);
-        ASSERT_EQ(read(config), 0);
-        unlink(old.empty() ? file.c_str() : "");
-        room = 30;
-        EXPECT_EQ(config.save(), -1);
-        EXPECT_EQ(root.read_file("kest_modem.conf"), old);
-        EXPECT_TRUE(config.dirty()) << "pending, though nothing was changed";
-        room = SIZE_MAX;
-        EXPECT_EQ(config.save(), 0);
-        EXPECT_EQ(root.read_file("kest_modem.conf"), old.empty() ? DEFAULTS : ON);
-    }
-    umask(mask);
-    struct stat st;
-    EXPECT_TRUE(stat(file.c_str(), &st) == 0 && (st.st_mode & 07777) == 0644);
-    LogConfig homeless((file + "/below_a_file").c_str());
-    EXPECT_TRUE(homeless.save() == -1 && homeless.dirty());
-}
 
 TEST_F(SettingsFileTest, TheDefaultReplacesWhatIsMissingEmptyOrAnUnfinishedCopy) {
     const std::string whole = "stream cp_wcn on 1 2\n" + std::string(5000, '#');

@@ -126,44 +126,6 @@ TEST_F(ControlOperationsTest, ActOnTheRunningObjectsAndTheFile) {
     }
 }
 
-TEST_F(ControlOperationsTest, WhatChangesNothingLeavesTheFile) {
-    ASSERT_NO_FATAL_FAILURE(start());
-    LogController* c = ctrl.get();
-    const struct {
-        const char* operation;
-        int result, expected;
-    } cases[] = {
-        {"file size", c->set_log_file_size(4), 0},
-        {"data size", c->set_data_part_size(30), 0},
-        {"card size", c->set_sd_size(300), 0},
-        {"overwrite", c->set_log_overwrite(false), 0},
-        {"no mini dumps", c->disable_md(), 0},
-        {"external mini dumps", c->set_md_int_stor(false), 0},
-        {"on", turn(true, CT_WCDMA, CT_TD, CT_WANMODEM), 0},
-        {"off", turn(false, CT_WCN, CT_5MODE), 0},
-        {"mini dump", c->save_mini_dump_on_request(), -1},
-        {"I/Q on", c->enable_wcdma_iq(CT_TD), -7},
-        {"I/Q off", c->disable_wcdma_iq(CT_TD), -7},
-    };
-    for (const auto& test : cases) {
-        EXPECT_EQ(test.result, test.expected) << test.operation;
-    }
-    EXPECT_EQ(file(), TYPED);
-    EXPECT_EQ(state(), INITIAL);
-    EXPECT_TRUE(files().empty());
-    EXPECT_EQ(c->enable_wcdma_iq(CT_WCN), 0);
-    EXPECT_EQ(c->disable_wcdma_iq(CT_WCN), -1) << "of a CP that is off";
-    EXPECT_EQ(file(), changed(SAVED, "\n\n\n", "\n\niq cp_wcn WCDMA\n\n"));
-    ASSERT_NO_FATAL_FAILURE(start());
-    root.set_prop("ro.modem.wcn.diag", "");
-    EXPECT_EQ(turn(true, CT_WCN), 0);
-    EXPECT_TRUE(
-        log.has("int LogController::enable_log(const CpType*, size_t): Can not get "
-                "log/diag path for cp_wcn ["));
-    EXPECT_EQ(state(), INITIAL);
-    EXPECT_EQ(file(), SAVED) << "written all the same";
-}
-
 TEST_F(ControlOperationsTest, ReloadAppliesTheOtherLoggersStreams) {
     const std::string begin = "int LogController::reload_kest_conf(): ";
     const std::string path = "data/local/tmp/kest/kest.conf";
@@ -208,31 +170,6 @@ TEST_F(ControlOperationsTest, ReloadAppliesTheOtherLoggersStreams) {
     EXPECT_EQ(ctrl->reload_kest_conf(), -1);
     EXPECT_TRUE(log.has(begin + "load kest.conf failed [2("));
     EXPECT_EQ(enabled(), "wcdma gnss ");
-}
-
-TEST_F(ControlOperationsTest, FlushAndClear) {
-    ASSERT_NO_FATAL_FAILURE(start());
-    ASSERT_TRUE(supply(*log_dev, "<staged>"));
-    EXPECT_EQ(logged("cp_wcdma", "<staged>"), 0u);
-    EXPECT_EQ(ctrl->flush(), 0);
-    EXPECT_EQ(logged("cp_wcdma", "<staged>"), 1u);
-    root.write_file("data/modem_log/modem_db.gz", "library");
-    const auto tree = [&] { return root.tree("data/modem_log"); };
-
-    Client client;
-    for (const char* busy : {"", "SAVE_RINGBUF WCDMA\n", "SAVE_SLEEP_LOG WCDMA\n"}) {
-        ASSERT_TRUE(*busy ? client.say(busy) : begin_dump());
-        ASSERT_TRUE(pump([&] { return modem()->state() != CWS_WORKING; }));
-        const std::vector<std::string> before = tree();
-        EXPECT_EQ(ctrl->clear_log(), -2);
-        EXPECT_EQ(tree(), before);
-        modem()->process_alive();
-    }
-    EXPECT_EQ(ctrl->clear_log(), 0);
-    EXPECT_EQ(tree(), std::vector<std::string>{"modem_db.gz"});
-    EXPECT_EQ(ctrl->stor_mgr().get_media(MT_INTERNAL)->size(), 0u);
-    EXPECT_TRUE(both_log("<after>"));
-    EXPECT_EQ(tree().size(), 3u);
 }
 
 }  // namespace

@@ -54,25 +54,6 @@ protected:
 
 }  // namespace
 
-TEST(TimerArithmetic, SumDifferenceAndOrder) {
-    const struct {
-        struct timespec a, b;
-        int64_t difference_ms;  // a - b
-    } cases[] = {
-        {{5, 1999999}, {5, 0}, 1},
-        {{6, 0}, {5, 999999999}, 1},  // -999 ms of the nanoseconds, cut towards zero
-        {{5, 250000000}, {8, 500000000}, -3250},
-        {{2000000000, 0}, {-2000000000, 0}, 4000000000000},
-        {TimerManager::add_ms({5, 500000000}, 500), {6, 0}, 0},
-        {TimerManager::add_ms({5, 999999999}, 1), {6, 999999}, 0},
-        {TimerManager::add_ms({5, 900000000}, 4294967295u), {5, 899000000}, 0},  // as signed: -1
-    };
-    for (const auto& c : cases) {
-        EXPECT_EQ(TimerManager::diff_ms(c.a, c.b), c.difference_ms) << c.a.tv_nsec;
-        EXPECT_EQ(TimerManager::is_earlier(c.a, c.b), c.difference_ms < 0) << c.a.tv_nsec;
-    }
-}
-
 // Of timers after 10, 20, 20 and 40 ms one is changed.
 TEST_F(TimerManagerTest, CancelAndRearm) {
     const unsigned int periods[] = {10, 20, 20, 40};

@@ -395,49 +395,6 @@ TEST_F(WcdmaIqManagerTest, AConnectionThatGivesNothingIsLeftAlone) {
     EXPECT_EQ(newest(), "one");
 }
 
-// It made thousands of empty files a second.
-TEST_F(WcdmaIqManagerTest, ADeviceThatGivesNothingIsLeftAlone) {
-    boot_clock::freeze();
-    script.impatient = true;
-    ASSERT_EQ(start(), 0);
-    for (int i = 0; i < 40; ++i) {
-        fill(i == 9 || i == 19 ? "counts afresh" : "");
-    }
-    ASSERT_TRUE(saved(20));
-    const auto take_thread = [&] {
-        script.no_threads = true;
-        disconnect();
-    };
-    const auto take_medium = [&] {
-        remove_tree("data/modem_log");
-        root.write_file("data/modem_log", "");
-    };
-    // Each comes on top of those before it.
-    const std::function<void()> faults[] = {[] {}, [&] { device.hang_up(); },
-                                            [&] { script.refused_cmd = IQST_SAVE; }, take_medium,
-                                            take_thread};
-    for (const auto& begin : faults) {
-        SCOPED_TRACE(&begin - faults);
-        EXPECT_EQ(iq->pause() + iq->resume(), 0);
-        EXPECT_EQ(iq->idle_wakeups(), 0u);
-        log.clear();
-        begin();
-        size_t done = released();
-        for (const unsigned int tries : {10u, 1u, 1u}) {
-            done += tries;
-            EXPECT_TRUE(pump([&] { return released() == done; }) && iq->resting());
-            pump_once(mux());
-            pump_once(mux());
-            EXPECT_TRUE(waits() && released() == done);
-            boot_clock::advance(3000);
-        }
-        EXPECT_EQ(log.count("the I/Q memory device gave nothing 10 times in a row"), 1u);
-    }
-    script.no_threads = false;
-    EXPECT_EQ(iq->stop() + start(), 0) << "which does not wait for the device";
-    EXPECT_EQ(iq->idle_wakeups(), 0u);
-}
-
 TEST_F(WcdmaIqManagerTest, BuffersWaitForTheResumeOnly) {
     script.tick = 0;
     EXPECT_EQ(iq->pause() + iq->resume(), -2) << "not started";

@@ -113,32 +113,6 @@ TEST_F(Properties, OnlyARegularFileIsRead) {
     EXPECT_EQ(open_descriptors(), before);
 }
 
-// Many changes fall into one tick of the file system's clock, so neither size nor
-// times nor the inode tell them apart.
-TEST_F(Properties, EveryChangeIsSeenByTheNextRead) {
-    m_root.write_file("default.prop", "k=0000\n");
-    ASSERT_EQ(get("k"), "0000");
-    for (int i = 1000; i < 1500; ++i) {
-        overwrite(m_root, 2, std::to_string(i));
-        ASSERT_EQ(get("k"), std::to_string(i));
-    }
-    for (int i = 0; i < 200; ++i) {
-        ASSERT_EQ(unlink(m_root.path("default.prop").c_str()), 0);
-        ASSERT_EQ(get("k"), "DEFAULT");
-        m_root.write_file("default.prop", "k=made\n");
-        ASSERT_EQ(get("k"), "made");
-    }
-}
-
-TEST_F(Properties, AFileThatCannotBeReadForAMomentKeepsItsValues) {
-    m_root.write_file("default.prop", "k=old\n");
-    ASSERT_EQ(get("k"), "old");
-    m_root.write_file("default.prop", "k=newer\n");
-    faults::fail(faults::OPEN, 1, EMFILE);
-    EXPECT_EQ(get("k"), "old");
-    EXPECT_EQ(get("k"), "newer");
-}
-
 TEST_F(Properties, SteadyStateCostsOneStat) {
     m_root.write_file("default.prop", "k=value that is longer than a short string\n");
     ASSERT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));

@@ -51,50 +51,6 @@ protected:
     std::unique_ptr<ModemStateHandler> modem{new ModemStateHandler(ctrl.get(), &loop, SUPERVISOR)};
 };
 
-// One line a read, in which the text stays as it is.
-TEST_F(CpStateHandlerTest, MessagesAreLoggedAndBecomeEventsOfTheCp) {
-    connect(*modem);
-    const std::string full(256, 'x');
-    const struct {
-        std::string message, logged;
-        CpWorkState state;
-    } CASES[] = {
-        {"Modem Assert", "12 bytes: Modem Assert", CWS_NOT_WORKING},
-        {"Modem Alive\n", "12 bytes: Modem Alive\\x0a", CWS_WORKING},
-        {"Modem Blocked", "13 bytes: Modem Blocked", CWS_NOT_WORKING},
-        {"Modem Al", "8 bytes: Modem Al", CWS_NOT_WORKING},
-        {"ive", "3 bytes: ive", CWS_NOT_WORKING},  // reads are never combined
-        {std::string("a\0Modem Alive", 13), "13 bytes: a", CWS_WORKING},
-        // The order of the patterns decides, not that of the message.
-        {"Modem Alive Modem Assert", "24 bytes: Modem Alive Modem Assert", CWS_NOT_WORKING},
-        {"Modem Blocked Modem Alive", "25 bytes: Modem Blocked Modem Alive", CWS_WORKING},
-        {"modem assert", "12 bytes: modem assert", CWS_WORKING},
-        {"WCN-EXTERNAL-DUMP", "17 bytes: WCN-EXTERNAL-DUMP", CWS_WORKING},
-        {"a\nE/KESTCP(1): b\r\n", "18 bytes: a\\x0aE/KESTCP(1): b\\x0d\\x0a", CWS_WORKING},
-        {"%s%n\t\\\x1b[2J\xff\x7f", "12 bytes: %s%n\t\\\\x1b[2J\xff\\x7f", CWS_WORKING},
-        {full, "256 bytes: " + full, CWS_WORKING},
-    };
-    for (const auto& c : CASES) {
-        EXPECT_EQ(say(c.message, c.logged), c.state) << c.message;
-    }
-    // Longer than the buffer: a pattern in the second read.
-    say(full + "xxxModem Assert", "256 bytes: " + full);
-    EXPECT_TRUE(pump_until(loop, [&] { return log.has("15 bytes: xxxModem Assert\n"); }));
-    EXPECT_EQ(state(CT_WCDMA), CWS_NOT_WORKING);
-
-    modem.reset();
-    ExtWcnStateHandler wcn(ctrl.get(), &loop, SUPERVISOR);
-    connect(wcn);
-    CpType type = CT_GNSS;
-    EXPECT_EQ(wcn.parse_notify(reinterpret_cast<const uint8_t*>("x"), 1, type),
-              CpStateHandler::CE_NONE);
-    EXPECT_EQ(type, CT_GNSS);
-    say("Modem Assert WCN-EXTERNAL-DUMP", "30 bytes: Modem Assert WCN-EXTERNAL-DUMP");
-    EXPECT_EQ(state(CT_WCN), CWS_NOT_WORKING);
-    say("WCN-EXTERNAL-DUMP WCN-EXTERNAL-ALIVE", "36 bytes: WCN-EXTERNAL-DUMP WCN-EXTERNAL-ALIVE");
-    EXPECT_EQ(state(CT_WCN), CWS_WORKING);
-}
-
 // No supervisor, or no room in the loop: it tries again later.
 TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     boot_clock::freeze();

@@ -26,32 +26,6 @@ protected:
     }
 };
 
-// Files can be made on the card, but nothing can be written to them.
-TEST_F(FailingMediumTest, CardTakesNoData) {
-    const std::string block(70000, 'x');  // more than is staged
-    plug_card();
-    EXPECT_EQ(lost_of(3, block), 0);
-    faults::fail(faults::WRITE, 1, EIO, 2);  // a block's and that of the probe
-    EXPECT_EQ(lost_of(1, block), 1);
-    EXPECT_EQ(lost_of(1, block), 0);
-    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
-    EXPECT_EQ(lost_of(1, block), 0);
-    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
-}
-
-// The place of a card in use is empty, though it counts as mounted; then it is back.
-TEST_F(FailingMediumTest, CardIsGoneWhileItCountsAsMounted) {
-    plug_card();
-    EXPECT_EQ(lost_of(1, "x"), 0);
-    ASSERT_EQ(rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()), 0);
-    EXPECT_EQ(lost_of(20, "x"), 1);
-    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
-    ASSERT_EQ(rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()), 0);
-    remove_tree(m_root.path("sd/modem_log").c_str());
-    EXPECT_EQ(lost_of(1, "x"), 0);
-    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
-}
-
 // What the service itself runs short of is no fault of the card.
 TEST_F(FailingMediumTest, WantOfDescriptorsKeepsTheCard) {
     plug_card();

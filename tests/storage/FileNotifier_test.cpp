@@ -15,7 +15,6 @@
 
 #include "core/Multiplexer.h"
 #include "core/system_paths.h"
-#include "storage/copy_file.h"
 #include "support/TestRoot.h"
 #include "support/faults.h"
 
@@ -68,39 +67,6 @@ TEST(FileNotifier, CallsBackWhileOpenAndReadable) {
     FileNotifier missing(nullptr, &mux, PATH_AGDSP_MEM);
     EXPECT_TRUE(missing.open() == -1 && errno == ENOENT && missing.fd() == -1);
     close(device);
-}
-
-TEST(CopyFile, CopiesOrFails) {
-    TestRoot root;
-    LogCapture log;
-    auto copy = [&](const std::string& src, const std::string& dst) {
-        return copy_file(root.path(src).c_str(), root.path(dst).c_str());
-    };
-    const size_t descriptors = open_descriptors();
-    std::string content;
-    for (size_t len : {0u, 32768u, 100000u}) {
-        content = pattern_bytes(len, 3);
-        root.write_file("data/src", content);
-        root.write_file("data/dst", std::string(50000, 'x'));  // truncated first
-        EXPECT_EQ(copy("data/src", "data/dst"), 0) << len;
-        EXPECT_EQ(root.read_file("data/dst"), content) << len;
-    }
-    // Errors of reading and writing end the copy silently.
-    EXPECT_EQ(copy_file("/proc/self/mem", root.path("data/new").c_str()), -1);
-    EXPECT_EQ(errno, EIO);
-    faults::shorten(faults::WRITE, 5);
-    EXPECT_EQ(copy("data/src", "data/new"), -1);
-    EXPECT_EQ(errno, ENOSPC);
-    EXPECT_EQ(root.read_file("data/new"), content.substr(0, 5));
-    EXPECT_EQ(log.text(), "");
-    // Those of opening are logged.
-    EXPECT_EQ(copy("data/none", "data/dst"), -1);
-    EXPECT_EQ(root.read_file("data/dst"), content);
-    EXPECT_TRUE(log.has("int copy_file(const char*, const char*): open source file " +
-                        root.path("data/none") + " failed [2(No such file or directory)]\n"));
-    EXPECT_EQ(copy("data/src", "data/dst/below"), -1);
-    EXPECT_TRUE(log.has("open dest file " + root.path("data/dst/below") + " failed [20("));
-    EXPECT_EQ(open_descriptors(), descriptors);
 }
 
 }  // namespace

@@ -24,52 +24,6 @@ protected:
     std::string content() const { return m_root.read_file(REL + "f"); }
 };
 
-// 65,536 bytes leave the stage with one call. Whatever a short or failing one leaves, the file
-// in the end holds exactly the bytes taken, and the next write works.
-TEST_F(LogFileTest, StagedShortAndFailingWrites) {
-    constexpr size_t ALL = SIZE_MAX;
-    const struct {
-        size_t staged;
-        size_t len;
-        faults::Call call;  // NUM_CALLS: none
-        int error;
-        size_t moved;  // bytes that the call transfers
-        ssize_t result;
-    } cases[] = {
-        {0, 65535, faults::NUM_CALLS, 0, 0, 65535}, {1, 65534, faults::NUM_CALLS, 0, 0, 65534},
-        {65535, 0, faults::NUM_CALLS, 0, 0, 0},     {0, 65536, faults::WRITE, 0, ALL, 65536},
-        {1, 65535, faults::WRITEV, 0, ALL, 65535},  {65000, 1000, faults::WRITEV, 0, 64999, 0},
-        {65000, 1000, faults::WRITEV, 0, 65000, 0}, {65000, 1000, faults::WRITEV, 0, 65001, 1},
-        {0, 70000, faults::WRITE, ENOSPC, 0, -2},   {10, 70000, faults::WRITEV, EIO, 0, -1}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(std::to_string(c.staged) + "+" + std::to_string(c.len));
-        LogCapture log;
-        const std::string data = pattern_bytes(c.staged + c.len, 2);
-        LogFile* file = make();
-        EXPECT_EQ(file->write(data.data(), c.staged), static_cast<ssize_t>(c.staged));
-        faults::reset();
-        if (c.error) {
-            faults::fail(c.call, 1, c.error);
-        } else if (c.call != faults::NUM_CALLS) {
-            faults::shorten(c.call, c.moved);
-        }
-        EXPECT_EQ(file->write(data.data() + c.staged, c.len), c.result);
-        EXPECT_EQ(faults::calls(faults::WRITE), c.call == faults::WRITE ? 1 : 0);
-        EXPECT_EQ(faults::calls(faults::WRITEV), c.call == faults::WRITEV ? 1 : 0);
-        EXPECT_EQ(log.count("write(const void*, size_t): write file failed [" +
-                            std::to_string(c.error) + "("),
-                  c.error ? 1u : 0u);
-        const size_t taken = c.staged + (c.error ? 0 : static_cast<size_t>(c.result));
-        EXPECT_EQ(file->size(), taken);
-        EXPECT_EQ(content().size(), std::min(c.moved, data.size()));
-        EXPECT_EQ(file->write("next", 4), 4);
-        EXPECT_EQ(file->close(), 0);
-        EXPECT_EQ(file->close(), 0);
-        EXPECT_EQ(content(), data.substr(0, taken) + "next");
-        m_dir->remove_file(file);
-    }
-}
-
 TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
     LogFile* file = make();
     const std::string data = pattern_bytes(1000, 5);

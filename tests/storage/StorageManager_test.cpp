@@ -80,46 +80,6 @@ TEST_F(StorageManagerTest, Transitions) {
     }
 }
 
-// A dump may still lie on a card that is not in use any more.
-TEST_F(StorageManagerTest, PullingACardThatWasInUseIsTold) {
-    plug_card();
-    m_mgr.check_media_change();
-    EXPECT_TRUE(m_mgr.creation_failed(&external(), EROFS));
-    faults::only_on("/sd/");
-    faults::fail(faults::OPEN, 1, EROFS, 100);
-    m_mgr.check_media_change();
-    ASSERT_EQ(m_mgr.media_type(), MT_INTERNAL);
-    pull_card();
-    EXPECT_FALSE(m_mgr.check_media_change());
-    EXPECT_FALSE(m_mgr.check_media_change());
-    EXPECT_EQ(m_events, "EIU");
-}
-
-TEST_F(StorageManagerTest, CardStateAndClearAll) {
-    m_root.set_prop("init.svc.fuse_sdcard0", "running ");
-    EXPECT_FALSE(m_mgr.is_sd_mounted());
-    plug_card();
-    m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp/f", "1");
-    EXPECT_TRUE(m_mgr.check_media_change());
-    m_mgr.clear_all();
-    EXPECT_EQ(m_root.list("sd/modem_log"), Names{});
-    EXPECT_EQ(m_mgr.media_type(), MT_NONE);
-    EXPECT_TRUE(m_mgr.check_media_change());
-    EXPECT_EQ(m_events, "EE");
-}
-
-TEST_F(StorageManagerTest, WhatClearAllCouldNotDeleteStillCounts) {
-    plug_card();
-    m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp/f", "1");
-    ASSERT_TRUE(m_mgr.check_media_change());
-    ASSERT_EQ(rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()), 0);
-    m_mgr.clear_all();
-    ASSERT_EQ(rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()), 0);
-    ASSERT_TRUE(m_mgr.check_media_change());
-    ASSERT_NE(m_mgr.get_media(MT_EXTERNAL)->prepare_cur_set(), nullptr);
-    EXPECT_EQ(m_mgr.get_media(MT_EXTERNAL)->size(), 1u);
-}
-
 typedef std::function<void()> Listener;
 
 void call(void* listener) {
