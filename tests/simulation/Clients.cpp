@@ -91,6 +91,8 @@ const Request REQUESTS[] = {
 constexpr uint64_t REQUEST_COUNT = sizeof(REQUESTS) / sizeof(REQUESTS[0]);
 // The transactions' own limit is 33 seconds; a queue of them and a dump may come before.
 constexpr int64_t MAX_WAIT_NS = int64_t{300} * 1000000000;
+// 20 pieces of a modem's dump may come 2.5 seconds apart. The external chip's dump has no limit.
+constexpr int64_t MAX_DUMP_NS = int64_t{120} * 1000000000;
 
 const Request& request_of(uint64_t index) {
     return REQUESTS[index % REQUEST_COUNT];
@@ -261,9 +263,6 @@ void Clients::ask(Client& client, uint64_t index) {
             stream.logged.uncertain = true;
         }
     }
-    if (strncmp(request.text, "SUBSCRIBE WC", 12) == 0) {
-        client.subscribed = true;
-    }
     const Setting* const asked = asked_by(request);
     client.asked.push_back({index, g_state->boot_ns, contested, asked ? *asked : Setting()});
     ++g_state->counters.requests;
@@ -381,16 +380,13 @@ void Clients::take_notice(Client& client, const std::string& line) {
     const bool start = line.compare(0, 14, "CP_DUMP_START ") == 0;
     const std::string cp = line.substr(start ? 14 : 12);
     const unsigned stream = cp == "WCDMA" ? ST_WCDMA : ST_WCN;
-    int& open = client.dumps[stream];
-    open += start ? 1 : -1;
+    Dump& dump = client.dumps[stream];
     ++g_state->counters.dumps;
     // A client that subscribed during a dump hears its end only.
-    if (open > 1 || open < -1) {
-        fail_run("notice", "'%s', %d dumps are open", line.c_str(), open);
+    if (start ? dump.open : !dump.open && dump.heard) {
+        fail_run("notice", "'%s', a dump is %s", line.c_str(), dump.open ? "open" : "not open");
     }
-    if (open < 0) {
-        open = 0;
-    }
+    dump = {true, start, g_state->boot_ns};
 }
 
 unsigned Clients::connected_count() const {
@@ -410,9 +406,23 @@ void Clients::check_waiting() const {
         return;
     }
     for (const Client& client : m_clients) {
+        const Dump& dump = client.dumps[ST_WCDMA];
+        if (dump.open && g_state->boot_ns - dump.since > MAX_DUMP_NS && !g_state->reply_lost) {
+            fail_run("notice", "a modem dump that a client was told of does not end");
+        }
         if (!client.asked.empty() && client.rest.empty() &&
             g_state->boot_ns - client.asked.front().at > MAX_WAIT_NS && !g_state->fault_seen) {
             fail_run("reply", "'%s' is not answered", request_of(client.asked.front().index).text);
+        }
+    }
+}
+
+void Clients::check_dumps_told(unsigned number) const {
+    for (unsigned stream : {ST_WCDMA, ST_WCN}) {
+        const Dump& dump = m_clients[number].dumps[stream];
+        if (!dump.heard || dump.open) {
+            fail_run("notice", "dump of stream %u: its %s was not told", stream,
+                     dump.heard ? "end" : "start");
         }
     }
 }

@@ -31,6 +31,8 @@ public:
     void pump();
     // Nobody waits for an answer longer than is promised.
     void check_waiting() const;
+    // This client, which subscribed to both, was told of a dump of each, from start to end.
+    void check_dumps_told(unsigned client) const;
     // A call failed: what was being changed may not have been.
     void mark_uncertain();
     bool waiting() const;
@@ -46,13 +48,18 @@ private:
         bool contested;  // its value may have been changed by others meanwhile
         Setting expected;
     };
+    // What a client was told of the dumps of a stream's CP.
+    struct Dump {
+        bool heard = false;
+        bool open = false;
+        int64_t since = 0;
+    };
     struct Client {
         int fd = -1;
         std::string rest;  // of a request sent in pieces
         std::string received;
         std::deque<Asked> asked;
-        bool subscribed = false;
-        int dumps[STREAM_COUNT] = {};  // started and not ended
+        Dump dumps[STREAM_COUNT];
     };
 
     unsigned connected_count() const;

@@ -162,6 +162,13 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     for (const char* request : REQUESTS) {
         plan.push_back({now += 100, EV_REQUEST, 0, Clients::request_named(request)});
     }
+    for (const char* request : {"SUBSCRIBE WCDMA DUMP", "SUBSCRIBE WCN DUMP"}) {
+        plan.push_back({now += 100, EV_REQUEST, 1, Clients::request_named(request)});
+    }
+    for (uint64_t what : {SUP_ASSERT, SUP_ALIVE}) {
+        plan.push_back({now += 30000, EV_SUPERVISOR, 0, what});
+        plan.push_back({now, EV_SUPERVISOR, 1, what});
+    }
     now += 700000;  // a card that failed rests for up to ten minutes
     for (unsigned round = 0; round < rounds; ++round) {
         for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
@@ -170,7 +177,7 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
         now += 5000;
     }
     plan.push_back({now, EV_REQUEST, 0, Clients::request_named("FLUSH")});
-    plan.push_back({now + 1000, EV_CHECK, 1, 0});
+    plan.push_back({now + 1000, EV_CHECK, 2, 0});
 }
 
 std::string to_text(const Event& event) {

@@ -477,7 +477,10 @@ void World::act(const Event& event) {
             calm();
             break;
         case EV_CHECK:
-            check(event.a == 1);
+            check(event.a == 1 || event.a == 2);
+            if (event.a == 2) {
+                m_clients.check_dumps_told(1);
+            }
             break;
         case EV_KIND_COUNT:
             break;
