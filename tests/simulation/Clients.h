@@ -18,7 +18,10 @@ public:
 
     explicit Clients(const std::string& root) : m_root(root) {}
 
-    // The index of a request; it must be one of the table.
+    // The requests of the table: their indices are 0 to this, without it.
+    static uint64_t request_count();
+    static std::string request_text(uint64_t index);
+    // It must be one of the table.
     static uint64_t request_named(const char* text);
 
     // Sends a request, connecting first if need be. in_pieces: the last bytes wait for

@@ -2,13 +2,15 @@
 
 #include "simulation/Plan.h"
 
-#include <string.h>
+#include <errno.h>
+#include <stdlib.h>
 
+#include <algorithm>
 #include <sstream>
 
+#include "simulation/Calls.h"
 #include "simulation/Chance.h"
 #include "simulation/Clients.h"
-#include "simulation/State.h"
 
 namespace {
 
@@ -39,6 +41,10 @@ const Weight WEIGHTS[] = {
     {EV_FAULT, 40, WEATHER_FAULTS},        {EV_NO_FAULTS, 15, WEATHER_FAULTS},
     {EV_CALM, 8, WEATHER_FAULTS},          {EV_KILL, 10, WEATHER_STORM},
 };
+
+bool is_request(EventKind kind) {
+    return kind == EV_REQUEST || kind == EV_PIECES;
+}
 
 EventKind pick_kind(Chance& chance, Weather weather) {
     unsigned total = 0;
@@ -92,6 +98,17 @@ uint64_t feed_size(Chance& chance) {
     }
 }
 
+// The error, how many calls go well before, and how many fail.
+uint64_t fault_size(Chance& chance, uint64_t call) {
+    static const int ERRORS[] = {EIO, ENOSPC, EMFILE, ENFILE, EINTR, EAGAIN, ENOMEM, EROFS, 0, EIO};
+    int error = chance.pick(ERRORS);
+    if (error == 0 && call != CALL_WRITE && call != CALL_READ) {
+        error = EIO;
+    }
+    return static_cast<uint64_t>(error) + PLAN_SKIP * chance.below(20) +
+           PLAN_TIMES * (chance.one_in(5) ? 200 : 1 + chance.below(3));
+}
+
 Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
     Event event = {at_ms, pick_kind(chance, weather), chance.next() >> 16, chance.next() >> 16};
     switch (event.kind) {
@@ -123,6 +140,15 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
         case EV_SUPERVISOR:
             event.a %= 2;
             event.b = chance.one_in(2) ? uint64_t{SUP_ALIVE} : chance.below(SUP_COUNT);
+            break;
+        case EV_REQUEST:
+        case EV_PIECES:
+            event.a = chance.below(8);
+            event.b = chance.below(Clients::request_count());
+            break;
+        case EV_FAULT:
+            event.a = chance.below(CALL_COUNT) + PLAN_PLACE * chance.below(PLACE_COUNT);
+            event.b = fault_size(chance, event.a % PLAN_PLACE);
             break;
         case EV_KILL:
             event.a = chance.one_in(2) ? chance.below(300) : chance.below(10);
@@ -182,8 +208,12 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
 
 std::string to_text(const Event& event) {
     std::ostringstream text;
-    text << event.at_ms << ' ' << NAMES[event.kind] << ' ' << static_cast<int64_t>(event.a) << ' '
-         << event.b;
+    text << event.at_ms << ' ' << NAMES[event.kind] << ' ' << static_cast<int64_t>(event.a) << ' ';
+    if (is_request(event.kind)) {
+        text << Clients::request_text(event.b);
+    } else {
+        text << event.b;
+    }
     return text.str();
 }
 
@@ -195,15 +225,18 @@ bool add_line(Plan& plan, const std::string& line) {
     uint64_t at_ms;
     std::string name;
     int64_t a;
-    uint64_t b;
-    if (!(text >> at_ms >> name >> a >> b)) {
+    if (!(text >> at_ms >> name >> a)) {
         return false;
     }
-    for (int kind = 0; kind < EV_KIND_COUNT; ++kind) {
-        if (name == NAMES[kind]) {
-            plan.push_back({at_ms, static_cast<EventKind>(kind), static_cast<uint64_t>(a), b});
-            return true;
-        }
+    const char* const* const found = std::find(NAMES, NAMES + EV_KIND_COUNT, name);
+    const EventKind kind = static_cast<EventKind>(found - NAMES);
+    std::string rest;
+    std::getline(text >> std::ws, rest);
+    if (kind == EV_KIND_COUNT || rest.empty()) {
+        return false;
     }
-    return false;
+    const uint64_t b = is_request(kind) ? Clients::request_named(rest.c_str())
+                                        : strtoull(rest.c_str(), nullptr, 10);
+    plan.push_back({at_ms, kind, static_cast<uint64_t>(a), b});
+    return true;
 }

@@ -517,20 +517,15 @@ void World::act_on_supervisor(uint64_t which, uint64_t what) {
 }
 
 void World::add_fault(const Event& event) {
-    static const int ERRORS[] = {EIO, ENOSPC, EMFILE, ENFILE, EINTR, EAGAIN, ENOMEM, EROFS, 0, EIO};
-    Chance chance(event.b, event.a);
     for (FaultRule& rule : g_state->faults) {
         if (rule.active) {
             continue;
         }
-        rule.call = static_cast<uint8_t>(event.a % CALL_COUNT);
-        rule.place = static_cast<uint8_t>(event.a / CALL_COUNT % PLACE_COUNT);
-        rule.error = chance.pick(ERRORS);
-        rule.skip = static_cast<uint32_t>(chance.below(20));
-        rule.times = static_cast<uint32_t>(chance.one_in(5) ? 200 : 1 + chance.below(3));
-        if (rule.call != CALL_WRITE && rule.call != CALL_READ && rule.error == 0) {
-            rule.error = EIO;
-        }
+        rule.call = static_cast<uint8_t>(event.a % PLAN_PLACE);
+        rule.place = static_cast<uint8_t>(event.a / PLAN_PLACE);
+        rule.error = static_cast<int>(event.b % PLAN_SKIP);
+        rule.skip = static_cast<uint32_t>(event.b % PLAN_TIMES / PLAN_SKIP);
+        rule.times = static_cast<uint32_t>(event.b / PLAN_TIMES);
         rule.active = true;
         return;
     }
