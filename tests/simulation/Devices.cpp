@@ -84,20 +84,25 @@ int Devices::open(const std::string& path) {
     return -1;
 }
 
-int Devices::open_end(End& end, FdClass cls, unsigned stream) {
-    drop(end);
+int Devices::open_pair(FdClass cls, int* peer) {
     int pair[2];
     if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0, pair) < 0) {
         fail_run("simulation", "no socket pair: %s", strerror(errno));
     }
     // The number has to be the same each time: the lowest free one is the service's.
-    end.fd = std::min(pair[0], pair[1]);
-    end.peer = std::max(pair[0], pair[1]);
+    const int fd = std::min(pair[0], pair[1]);
+    *peer = std::max(pair[0], pair[1]);
+    g_fds[fd] = FdInfo();
+    g_fds[fd].cls = cls;
+    g_fds[fd].place = PLACE_DEVICE;
+    return fd;
+}
+
+int Devices::open_end(End& end, FdClass cls, unsigned stream) {
+    drop(end);
+    end.fd = open_pair(cls, &end.peer);
     end.sent = g_state->streams[stream].consumed;
-    FdInfo& info = g_fds[end.fd] = FdInfo();
-    info.cls = cls;
-    info.place = PLACE_DEVICE;
-    info.stream = stream;
+    g_fds[end.fd].stream = stream;
     return end.fd;
 }
 

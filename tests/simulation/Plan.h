@@ -32,6 +32,7 @@ enum EventKind {
     EV_TIME_SERVICE,    // a: how it answers
     EV_DIAG,            // a: stream, b: how its diag device answers
     EV_PROPERTY,        // a: which, b: value
+    EV_IQ,              // an I/Q buffer is filled; a: place and pace of its saving, b: bytes
     EV_FAULT,           // a: call and place, b: error, skipped calls and failing ones
     EV_NO_FAULTS,       // calls do not fail any more
     EV_KILL,            // a: so many calls from now

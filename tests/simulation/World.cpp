@@ -38,6 +38,7 @@ const char CONFIG[] =
     "data_log_size 12\n"
     "sd_log_size 20\n"
     "log_overwrite enable\n"
+    "iq\tcp_wcdma\tWCDMA\n"
     "\n"
     "#Type\tName\tState\tSize\tLevel\n"
     "stream\tcp_wcdma\ton\t1\t1\n"
@@ -116,6 +117,7 @@ bool World::is_loops_own(const void* fds) const {
 }
 
 void World::pump() {
+    m_thread.lead(true);
     m_devices.pump();
     m_peers.pump();
     m_clients.pump();
@@ -125,11 +127,11 @@ void World::pump() {
     }
 }
 
-void World::pass_ends(int ready) {
+void World::pass_ends(bool idle) {
     g_state->fault_in_step = false;
     g_state->pass_calls = g_state->counters.calls;
     ++g_state->counters.passes;
-    m_idle_passes = ready ? m_idle_passes + 1 : 0;
+    m_idle_passes = idle ? m_idle_passes + 1 : 0;
 }
 
 void World::pass_without_service(int64_t ns) {
@@ -172,7 +174,7 @@ int World::wait(struct pollfd* fds, nfds_t count, int timeout, bool loops_own) {
         const int ready = poll(fds, count, 0);
         if (ready != 0 || state.boot_ns >= deadline) {
             if (loops_own) {
-                pass_ends(ready);
+                pass_ends(ready != 0 || timeout == 0);
                 if (m_idle_passes > MAX_IDLE_PASSES) {
                     spins(fds, count);
                 }
@@ -180,7 +182,7 @@ int World::wait(struct pollfd* fds, nfds_t count, int timeout, bool loops_own) {
             return ready;
         }
         m_clients.service_rests();
-        next = std::min({next, deadline, m_devices.next_due(),
+        next = std::min({next, deadline, m_devices.next_due(), m_thread.next_due(),
                          state.card_told_ns ? state.card_told_ns : INT64_MAX});
         if (next == INT64_MAX) {
             fail_run("hang", "waits for ever");
@@ -232,18 +234,24 @@ void World::file_opened(const char* path, Place place, FdInfo& info, int fd) con
     info.generation = g_state->card_generation;
     info.opened_in_calm =
         g_state->calm_ns != 0 && g_state->boot_ns - g_state->calm_ns > CALM_AFTER_NS;
-    if (Media::is_log_name(name) && info.stream < STREAM_COUNT) {
-        info.cls = FD_LOG_FILE;
-    }
     struct stat st;
     if (fstat(fd, &st) == 0) {
         info.inode = st.st_ino;
+    }
+    if (Media::is_log_name(name) && info.stream < STREAM_COUNT) {
+        info.cls = FD_LOG_FILE;
+    } else if (Media::is_capture_name(name)) {
+        info.cls = FD_IQ_FILE;
+        if (st.st_size != 0) {
+            fail_run("iq", "%s, for a new buffer, has bytes already", path);
+        }
     }
 }
 
 int World::open_device(const char* path) {
     const bool in_root = strncmp(path, m_root.c_str(), m_root.size()) == 0;
-    return m_devices.open(in_root ? path + m_root.size() : path);
+    const std::string name = in_root ? path + m_root.size() : path;
+    return name == "/dev/iq_mem" ? m_iq.open() : m_devices.open(name);
 }
 
 void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len) {
@@ -318,7 +326,9 @@ void World::set_times(const char* path, struct stat& st) const {
 }
 
 void World::message(const std::string& text) {
-    trace("says %.*s", static_cast<int>(std::min<size_t>(text.size(), 400)), text.c_str());
+    // An address is not the same each time.
+    const size_t end = std::min<size_t>(text.find("mapped to "), 400);
+    trace("says %s", text.substr(0, end).c_str());
     if (text.find("dump complete") != std::string::npos) {
         check_saved(ST_WCDMA, "_memory_");
     }
@@ -339,7 +349,7 @@ void World::message(const std::string& text) {
 }
 
 // Whether the medium in use is above its quota and may not delete anything.
-bool World::refusal_is_due() const {
+bool World::refusal_is_due() {
     const MediaStorage* const media = m_controller->stor_mgr().get_media_stor();
     if (!media) {
         return false;
@@ -349,9 +359,14 @@ bool World::refusal_is_due() const {
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
     // A request that was sent may not have been read.
     const bool known = !quota.uncertain && !overwrite.uncertain && !m_clients.waiting();
-    return m_media.must_refuse(card ? MED_CARD : MED_DATA,
-                               known ? uint64_t{quota.value} << 20 : media->quota(),
-                               known ? overwrite.value != 0 : media->overwrite());
+    if (m_media.must_refuse(card ? MED_CARD : MED_DATA,
+                            known ? uint64_t{quota.value} << 20 : media->quota(),
+                            known ? overwrite.value != 0 : media->overwrite())) {
+        return true;
+    }
+    // What others deleted is noticed at one refused write in so many.
+    constexpr unsigned WRITES_A_RECOUNT = 16;
+    return media->size() > media->quota() && ++m_refused_since_deletion < WRITES_A_RECOUNT;
 }
 
 // ---- Events
@@ -421,6 +436,7 @@ void World::act(const Event& event) {
             break;
         case EV_DELETE:
             m_media.remove_something(event.a, chance);
+            m_refused_since_deletion = 0;
             break;
         case EV_STRANGER:
             m_media.make_something(event.a, chance);
@@ -462,6 +478,10 @@ void World::act(const Event& event) {
             }
             write_props();
             break;
+        case EV_IQ:
+            m_thread.set_pace(event.a);
+            m_iq.fill(event.a, event.b);
+            break;
         case EV_FAULT:
             add_fault(event);
             break;
@@ -479,6 +499,7 @@ void World::act(const Event& event) {
         case EV_CHECK:
             check(event.a == 1 || event.a == 2);
             if (event.a == 2) {
+                IqDevice::check_saved();
                 m_clients.check_dumps_told(1);
             }
             break;
@@ -540,6 +561,8 @@ void World::calm() {
         m_clients.leave(client);
     }
     state.fault_seen = state.reply_lost = false;
+    state.kill_at = 0;
+    m_thread.set_pace(0);
     state.calm_ns = state.boot_ns;
     state.card_told_ns = 0;
     m_media.insert_card(false);
@@ -576,6 +599,9 @@ void World::check(bool last) {
     m_media.check_bytes();
     if (last) {
         check_quota();
+        for (const std::string& capture : m_media.captures()) {
+            IqDevice::check_file(capture);
+        }
         ledger::check_settled();
     }
 }
@@ -612,7 +638,7 @@ void World::check_settings() const {
 void World::check_quota() const {
     const Setting& quota = g_state->settings[SET_CARD_MB];
     const Media::Seen seen = m_media.look(MED_CARD);
-    const uint64_t limit = uint64_t{quota.value} << 20;
+    const uint64_t limit = std::max(uint64_t{quota.value} << 20, seen.spared);
     if (!quota.uncertain && quota.value && seen.bytes > limit + 32768 &&
         m_controller->stor_mgr().media_type() == MT_EXTERNAL) {
         fail_run(
@@ -623,7 +649,7 @@ void World::check_quota() const {
 }
 
 void World::check_descriptors() const {
-    unsigned count[FD_OTHER + 1] = {};
+    unsigned count[FD_CLASS_COUNT] = {};
     unsigned devices[STREAM_COUNT] = {};
     for (const FdInfo& info : g_fds) {
         ++count[info.cls];
@@ -631,9 +657,9 @@ void World::check_descriptors() const {
             ++devices[info.stream];
         }
     }
-    const unsigned most[FD_OTHER + 1] = {MAX_FDS, STREAM_COUNT, 1, 2, STREAM_COUNT, 3, 0, 1, 3, 2,
-                                         0};
-    for (unsigned cls = FD_LOG_DEVICE; cls <= FD_OTHER; ++cls) {
+    const unsigned most[FD_CLASS_COUNT] = {
+        MAX_FDS, STREAM_COUNT, 1, 2, STREAM_COUNT, 3, 0, 1, 3, 2, 0, 1, 1, 2};
+    for (unsigned cls = FD_LOG_DEVICE; cls < FD_CLASS_COUNT; ++cls) {
         if (count[cls] > most[cls]) {
             fail_run("leak", "%u descriptors of class %u", count[cls], cls);
         }
@@ -680,7 +706,12 @@ void World::check_totals() const {
                      static_cast<unsigned long long>(sum));
         }
         const bool external = type == MT_EXTERNAL;
-        const uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
+        uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
+        for (const FdInfo& info : g_fds) {
+            // What the thread has written is counted when it is done.
+            const bool on_it = info.place == (external ? PLACE_CARD : PLACE_DATA);
+            there -= info.cls == FD_IQ_FILE && on_it && !info.removed ? info.position : 0;
+        }
         const bool known = !external || (g_state->card_in && media->scanned());
         if (known && (sum < there || sum > there + (STREAM_COUNT + 2) * 65536)) {
             fail_run("total", "medium %d: %llu, on the medium %llu", type,
