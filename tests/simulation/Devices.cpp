@@ -13,6 +13,7 @@
 #include "sim/DiagFrame.h"
 #include "simulation/Chance.h"
 #include "simulation/CodedStream.h"
+#include "simulation/World.h"
 
 namespace {
 
@@ -20,8 +21,6 @@ const char* const LOG_PATHS[STREAM_COUNT] = {"/sim/wcdma_log", "/sim/wcn", "/sim
                                              "/dev/audio_dsp_log"};
 const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", ""};
 const char* const QUIET_PATHS[] = {"/dev/audio_dsp_pcm", "/dev/audio_dsp_mem"};
-
-constexpr int64_t NS_PER_MS = 1000000;
 
 enum Answers : uint8_t { WELL, WELL_TOO, SLOWLY, REFUSING, WRONGLY, NEVER, CUT_OFF, ANSWERS_COUNT };
 

@@ -22,6 +22,10 @@
 
 class LogController;
 
+constexpr int64_t NS_PER_MS = 1000000;
+constexpr int64_t START_NS = int64_t{100} * 1000000000;
+const char* const ZONES[] = {"UTC0", "CET-1", "XST+9:30", "NZST-12"};
+
 class World {
 public:
     // Makes the handset's files at the root, for the first life.
