@@ -4,6 +4,8 @@
 
 #include <limits.h>
 
+#include <algorithm>
+
 #include "core/list_find.h"
 #include "core/log.h"
 
@@ -125,7 +127,8 @@ int TimerManager::get_timeout(int* ms) {
         return -1;
     }
     const struct timespec& due = (*m_timers.begin())->due;
-    const int64_t left = is_earlier(now, due) ? diff_ms(due, now) : 0;
+    // Within the last millisecond the loop must not ask again and again until it is over.
+    const int64_t left = is_earlier(now, due) ? std::max<int64_t>(diff_ms(due, now), 1) : 0;
     *ms = left > INT_MAX ? INT_MAX : static_cast<int>(left);
     return 0;
 }

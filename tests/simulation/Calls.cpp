@@ -10,6 +10,7 @@
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
+#include <sys/mman.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/uio.h>
@@ -21,12 +22,15 @@
 #include <vector>
 
 #include "simulation/Ledger.h"
+#include "simulation/SavingThread.h"
 #include "simulation/World.h"
 
 FdInfo g_fds[MAX_FDS];
 State* g_state;
-bool g_inside;
+__thread bool g_inside;
 bool g_plan_over;
+
+extern "C" ssize_t __real_write(int fd, const void* data, size_t len);
 
 namespace {
 
@@ -37,9 +41,9 @@ constexpr uint64_t MAX_CALLS_A_PASS = 200000;
 constexpr int SHORT_COUNT = -1;  // a call shall do less than it was asked for
 
 const char* const CALL_NAMES[CALL_COUNT + 1] = {
-    "open",   "read",    "write",  "close",   "stat",    "access",   "rename",
-    "unlink", "mkdir",   "rmdir",  "opendir", "readdir", "truncate", "system",
-    "socket", "connect", "accept", "fcntl",   "poll",    "other"};
+    "open",   "read",  "write",   "close",   "stat",     "access", "rename", "unlink",
+    "mkdir",  "rmdir", "opendir", "readdir", "truncate", "system", "socket", "connect",
+    "accept", "fcntl", "poll",    "mmap",    "ioctl",    "thread", "other"};
 const char* const PLACE_NAMES[PLACE_COUNT] = {"any",   "data",   "card",   "settings",
                                               "props", "device", "socket", "other"};
 
@@ -66,6 +70,12 @@ std::string without_root(const char* text) {
 // What every call of the service begins with: 0, the errno to fail with, or SHORT_COUNT.
 int begin(Call call, Place place) {
     State& state = *g_state;
+    if (SavingThread::here()) {
+        ++state.counters.thread_steps;
+        world().thread().stop_before_call();
+    } else {
+        world().thread().lead(false);
+    }
     ++state.counters.calls;
     state.boot_ns += 1000;
     if (state.kill_at && state.counters.calls >= state.kill_at) {
@@ -163,22 +173,14 @@ FdInfo& remember_fd(int fd, FdClass cls, Place place) {
     return g_fds[fd];
 }
 
-// A write of the service into a log tree, as far as the medium takes it.
-ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault) {
-    FdInfo& info = g_fds[fd];
+// How many of the bytes a medium takes now; -1 with errno when it takes none.
+ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
     State& state = *g_state;
     if (info.place == PLACE_CARD && (!state.card_in || info.generation != state.card_generation)) {
         state.fault_in_step = true;
-        const Outside outside;
         ledger::excuse_all();
         return failed(EIO);
     }
-    std::vector<uint8_t> bytes;
-    for (int i = 0; i < count; ++i) {
-        const uint8_t* const data = static_cast<const uint8_t*>(pieces[i].iov_base);
-        bytes.insert(bytes.end(), data, data + pieces[i].iov_len);
-    }
-    size_t len = bytes.size();
     if (fault == SHORT_COUNT && len > 1) {
         len = 1 + state.counters.calls % (len - 1);
     }
@@ -196,12 +198,52 @@ ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault
             room -= len;
         }
     }
+    return static_cast<ssize_t>(len);
+}
+
+// A write of the service into a log tree, as far as the medium takes it.
+ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault) {
+    FdInfo& info = g_fds[fd];
     const Outside outside;
-    const ssize_t n = write(fd, bytes.data(), len);
-    if (n > 0 && info.cls == FD_LOG_FILE) {
-        ledger::file_written(info, bytes.data(), static_cast<size_t>(n));
+    std::vector<uint8_t> joined;
+    const uint8_t* data = static_cast<const uint8_t*>(pieces[0].iov_base);
+    size_t len = pieces[0].iov_len;
+    if (count > 1) {
+        for (int i = 0; i < count; ++i) {
+            const uint8_t* const piece = static_cast<const uint8_t*>(pieces[i].iov_base);
+            joined.insert(joined.end(), piece, piece + pieces[i].iov_len);
+        }
+        data = joined.data();
+        len = joined.size();
     }
-    trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
+    ssize_t n = taken_by_medium(info, len, fault);
+    if (n > 0) {
+        n = write(fd, data, static_cast<size_t>(n));
+    }
+    if (n > 0 && info.cls == FD_LOG_FILE) {
+        ledger::file_written(info, data, static_cast<size_t>(n));
+    }
+    if (info.cls == FD_IQ_FILE) {
+        const int error = errno;
+        IqDevice::written(data, n);
+        info.position += n > 0 ? static_cast<uint64_t>(n) : 0;
+        errno = error;
+    }
+    if (n >= 0) {
+        trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
+    }
+    return n;
+}
+
+// A command to the saving thread, or its response.
+ssize_t write_to_thread(int fd, uint8_t byte) {
+    const ssize_t n = __real_write(fd, &byte, 1);
+    if (SavingThread::here()) {
+        IqDevice::responds(byte);
+    } else {
+        IqDevice::commanded(byte);
+        world().thread().wake();
+    }
     return n;
 }
 
@@ -303,6 +345,10 @@ WRAPPED(int, usleep, useconds_t us) {
         return __real_usleep(us);
     }
     begin(CALL_COUNT, PLACE_OTHER);
+    if (SavingThread::here()) {
+        world().thread().stop_before_call(int64_t{us} * 1000);
+        return 0;
+    }
     g_state->boot_ns += int64_t{us} * 1000;
     const Outside outside;
     world().pump();
@@ -322,9 +368,16 @@ WRAPPED(int, poll, struct pollfd* fds, nfds_t count, int timeout) {
     const bool loops_own = world().is_loops_own(fds);
     if (const int error = begin(CALL_POLL, PLACE_ANY)) {
         if (loops_own) {
-            world().pass_ends(0);
+            world().pass_ends(false);
         }
         return failed(error == SHORT_COUNT ? EINTR : error);
+    }
+    if (SavingThread::here()) {
+        int ready;
+        while ((ready = __real_poll(fds, count, 0)) == 0) {
+            world().thread().rest();
+        }
+        return ready;
     }
     const Outside outside;
     return world().wait(fds, count, timeout, loops_own);
@@ -418,7 +471,16 @@ WRAPPED(ssize_t, write, int fd, const void* data, size_t len) {
     }
     const int fault = begin(CALL_WRITE, place_of_fd(fd));
     if (fault > 0) {
+        if (g_fds[fd].cls == FD_IQ_FILE) {
+            IqDevice::written(nullptr, -1);
+        }
         return failed(fault);
+    }
+    if (g_fds[fd].cls == FD_THREAD) {
+        return write_to_thread(fd, *static_cast<const uint8_t*>(data));
+    }
+    if (SavingThread::here() && g_fds[fd].cls != FD_IQ_FILE) {
+        fail_run("thread", "it writes to a descriptor of class %d", g_fds[fd].cls);
     }
     if (on_medium(g_fds[fd].place)) {
         const struct iovec piece = {const_cast<void*>(data), len};
@@ -478,7 +540,70 @@ WRAPPED(int, fclose, FILE* file) {
 }
 
 WRAPPED(int, ioctl, int fd, unsigned long request, unsigned long argument) {
-    return g_inside ? 0 : __real_ioctl(fd, request, argument);
+    if (!g_inside) {
+        return __real_ioctl(fd, request, argument);
+    }
+    const int fault = begin(CALL_IOCTL, place_of_fd(fd));
+    if (fault > 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
+        return fault > 0 ? failed(fault) : 0;
+    }
+    const Outside outside;
+    return world().iq().control(request, argument);
+}
+
+WRAPPED(void*, mmap, void* address, size_t len, int protection, int flags, int fd, off_t offset) {
+    if (!g_inside || fd < 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
+        return __real_mmap(address, len, protection, flags, fd, offset);
+    }
+    if (const int fault = begin(CALL_MMAP, PLACE_DEVICE)) {
+        failed(fault == SHORT_COUNT ? ENOMEM : fault);
+        return MAP_FAILED;
+    }
+    const Outside outside;
+    return IqDevice::map(len, protection, flags);
+}
+
+// ---- The saving thread
+
+WRAPPED(int, pthread_create, pthread_t* id, const pthread_attr_t* attributes,
+        void* (*routine)(void*), void* param) {
+    if (!g_inside) {
+        return __real_pthread_create(id, attributes, routine, param);
+    }
+    const int fault = begin(CALL_THREAD, PLACE_OTHER);
+    return fault ? EAGAIN : world().thread().create(id, routine, param);
+}
+
+WRAPPED(int, pthread_join, pthread_t id, void** result) {
+    if (!g_inside) {
+        return __real_pthread_join(id, result);
+    }
+    begin(CALL_COUNT, PLACE_OTHER);
+    return world().thread().join(id);
+}
+
+WRAPPED(int, socketpair, int domain, int type, int protocol, int* pair) {
+    const int fault = g_inside ? begin(CALL_SOCKET, PLACE_OTHER) : 0;
+    if (fault > 0) {
+        return failed(fault);
+    }
+    const int result = __real_socketpair(domain, type, protocol, pair);
+    if (g_inside && result == 0) {
+        remember_fd(pair[0], FD_THREAD, PLACE_OTHER);
+        remember_fd(pair[1], FD_THREAD, PLACE_OTHER);
+    }
+    return result;
+}
+
+WRAPPED(int, shutdown, int fd, int how) {
+    if (g_inside) {
+        begin(CALL_COUNT, PLACE_OTHER);
+    }
+    const int result = __real_shutdown(fd, how);
+    if (g_inside && !SavingThread::here()) {
+        world().thread().wake();
+    }
+    return result;
 }
 
 // ---- Names

@@ -34,6 +34,9 @@ enum Call : uint8_t {
     CALL_ACCEPT,
     CALL_FCNTL,
     CALL_POLL,
+    CALL_MMAP,
+    CALL_IOCTL,
+    CALL_THREAD,
     CALL_COUNT
 };
 
@@ -60,7 +63,11 @@ enum FdClass : uint8_t {
     FD_SERVER,
     FD_CLIENT,
     FD_CONNECTION,  // to a supervisor or the time service
-    FD_OTHER
+    FD_OTHER,
+    FD_IQ_DEVICE,
+    FD_IQ_FILE,
+    FD_THREAD,  // an end of the connection to the saving thread
+    FD_CLASS_COUNT
 };
 
 // What the simulation knows of a descriptor that the service has open.
@@ -84,8 +91,8 @@ struct FdInfo {
 constexpr int MAX_FDS = 1024;
 extern FdInfo g_fds[MAX_FDS];
 extern State* g_state;
-extern bool g_inside;     // the service is running, not the simulation
-extern bool g_plan_over;  // the loop shall not be run once more
+extern __thread bool g_inside;  // the service is running, not the simulation
+extern bool g_plan_over;        // the loop shall not be run once more
 
 // While it exists, calls are the simulation's own.
 class Outside {

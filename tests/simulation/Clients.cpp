@@ -10,6 +10,8 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <vector>
+
 #include "simulation/Calls.h"
 #include "simulation/World.h"
 
@@ -23,77 +25,77 @@ enum Kind {
     GETS,         // OK and the setting
     SETS_STREAM,  // OK; switches the logging of a stream
     GETS_STREAM,
-    SAVES,  // OK or an error, when the transaction ends
-    NOTHING
+    SAVES  // OK or an error, when the transaction ends
 };
 
 struct Request {
-    const char* text;
+    std::string text;
     Kind kind;
     unsigned what;  // setting, stream or error
     unsigned argument;
 };
 
-// FLUSH is the first: REQUEST_FLUSH.
-const Request REQUESTS[] = {
-    {"FLUSH", DOES, 0, 0},
-    {"GET_LOG_FILE_SIZE", GETS, SET_FILE_MB, 0},
-    {"GET_DATA_MAX_SIZE", GETS, SET_DATA_MB, 0},
-    {"GET_SD_MAX_SIZE", GETS, SET_CARD_MB, 0},
-    {"GET_LOG_OVERWRITE", GETS, SET_OVERWRITE, 0},
-    {"GET_MD_STOR_POS", GETS, SET_MD_INTERNAL, 0},
-    {"SET_LOG_FILE_SIZE 1", SETS, SET_FILE_MB, 1},
-    {"SET_LOG_FILE_SIZE 2", SETS, SET_FILE_MB, 2},
-    {"SET_DATA_MAX_SIZE 0", SETS, SET_DATA_MB, 0},
-    {"SET_DATA_MAX_SIZE 4", SETS, SET_DATA_MB, 4},
-    {"SET_DATA_MAX_SIZE\t12", SETS, SET_DATA_MB, 12},
-    {"SET_SD_MAX_SIZE 4", SETS, SET_CARD_MB, 4},
-    {"SET_SD_MAX_SIZE 14", SETS, SET_CARD_MB, 14},
-    {"ENABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 1},
-    {"ENABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 1},
-    {"DISABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 0},
-    {"SET_MD_STOR_POS INTERNAL", SETS, SET_MD_INTERNAL, 1},
-    {"SET_MD_STOR_POS EXTERNAL", SETS, SET_MD_INTERNAL, 0},
-    {"ENABLE_MD", DOES, 0, 0},
-    {"DISABLE_MD", DOES, 0, 0},
-    {"MINI_DUMP", WRONG, 3, 0},
-    {"ENABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 1},
-    {"ENABLE_LOG WCN", SETS_STREAM, ST_WCN, 1},
-    {"ENABLE_LOG GNSS", SETS_STREAM, ST_GNSS, 1},
-    {"ENABLE_LOG AG-DSP", SETS_STREAM, ST_DSP, 1},
-    {"ENABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 1},
-    {"ENABLE_LOG WCN", SETS_STREAM, ST_WCN, 1},
-    {"DISABLE_LOG WCDMA", SETS_STREAM, ST_WCDMA, 0},
-    {"DISABLE_LOG WCN", SETS_STREAM, ST_WCN, 0},
-    {"DISABLE_LOG GNSS", SETS_STREAM, ST_GNSS, 0},
-    {"DISABLE_LOG AG-DSP", SETS_STREAM, ST_DSP, 0},
-    {"GET_LOG_STATE WCDMA", GETS_STREAM, ST_WCDMA, 0},
-    {"GET_LOG_STATE WCN", GETS_STREAM, ST_WCN, 0},
-    {"GET_LOG_STATE GNSS", GETS_STREAM, ST_GNSS, 0},
-    {"GET_LOG_STATE AG-DSP", GETS_STREAM, ST_DSP, 0},
-    {"GET_LOG_STATE NONE", WRONG, 9, 0},
-    {"kestctl clear", MAY, 0, 0},
-    {"kestctl reload", MAY, 0, 0},
-    {"SAVE_RINGBUF WCDMA", SAVES, ST_WCDMA, 0},
-    {"SAVE_RINGBUF WCN", SAVES, ST_WCN, 0},
-    {"SAVE_SLEEP_LOG WCDMA", SAVES, ST_WCDMA, 0},
-    {"SAVE_SLEEP_LOG WCN", SAVES, ST_WCN, 0},
-    {"SAVE_RINGBUF GNSS", SAVES, ST_GNSS, 0},
-    {"SUBSCRIBE WCDMA DUMP", DOES, 0, 0},
-    {"SUBSCRIBE WCN DUMP", DOES, 0, 0},
-    {"UNSUBSCRIBE GNSS DUMP", DOES, 0, 0},
-    {"NONSENSE", WRONG, 1, 0},
-    {"kestctl", WRONG, 1, 0},
-    {"SET_LOG_FILE_SIZE ten", WRONG, 2, 0},
-    {"FLUSH now", WRONG, 1, 0},
-    {"", NOTHING, 0, 0},
-};
-constexpr uint64_t REQUEST_COUNT = sizeof(REQUESTS) / sizeof(REQUESTS[0]);
+const char* const STREAM_NAMES[STREAM_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
+
+std::vector<Request> make_requests() {
+    std::vector<Request> requests = {
+        {"FLUSH", DOES, 0, 0},
+        {"GET_LOG_FILE_SIZE", GETS, SET_FILE_MB, 0},
+        {"GET_DATA_MAX_SIZE", GETS, SET_DATA_MB, 0},
+        {"GET_SD_MAX_SIZE", GETS, SET_CARD_MB, 0},
+        {"GET_LOG_OVERWRITE", GETS, SET_OVERWRITE, 0},
+        {"GET_MD_STOR_POS", GETS, SET_MD_INTERNAL, 0},
+        {"SET_LOG_FILE_SIZE 1", SETS, SET_FILE_MB, 1},
+        {"SET_LOG_FILE_SIZE 2", SETS, SET_FILE_MB, 2},
+        {"SET_DATA_MAX_SIZE 0", SETS, SET_DATA_MB, 0},
+        {"SET_DATA_MAX_SIZE 4", SETS, SET_DATA_MB, 4},
+        {"SET_DATA_MAX_SIZE\t12", SETS, SET_DATA_MB, 12},
+        {"SET_SD_MAX_SIZE 4", SETS, SET_CARD_MB, 4},
+        {"SET_SD_MAX_SIZE 14", SETS, SET_CARD_MB, 14},
+        {"ENABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 1},
+        {"DISABLE_LOG_OVERWRITE", SETS, SET_OVERWRITE, 0},
+        {"SET_MD_STOR_POS INTERNAL", SETS, SET_MD_INTERNAL, 1},
+        {"SET_MD_STOR_POS EXTERNAL", SETS, SET_MD_INTERNAL, 0},
+        {"ENABLE_MD", DOES, 0, 0},
+        {"DISABLE_MD", DOES, 0, 0},
+        {"MINI_DUMP", WRONG, 3, 0},
+        {"GET_LOG_STATE NONE", WRONG, 9, 0},
+        {"kestctl clear", MAY, 0, 0},
+        {"kestctl reload", MAY, 0, 0},
+        {"ENABLE_IQ WCDMA WCDMA", DOES, 0, 0},
+        {"ENABLE_IQ WCDMA GSM", WRONG, 2, 0},
+        {"DISABLE_IQ WCDMA", MAY, 0, 0},
+        {"SUBSCRIBE WCDMA DUMP", DOES, 0, 0},
+        {"SUBSCRIBE WCN DUMP", DOES, 0, 0},
+        {"UNSUBSCRIBE GNSS DUMP", DOES, 0, 0},
+        {"NONSENSE", WRONG, 1, 0},
+        {"kestctl", WRONG, 1, 0},
+        {"SET_LOG_FILE_SIZE ten", WRONG, 2, 0},
+        {"FLUSH now", WRONG, 1, 0},
+    };
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        const std::string name = STREAM_NAMES[stream];
+        // As often as it is switched off and looked at, so that most streams flow.
+        requests.push_back({"ENABLE_LOG " + name, SETS_STREAM, stream, 1});
+        requests.push_back({"ENABLE_LOG " + name, SETS_STREAM, stream, 1});
+        requests.push_back({"DISABLE_LOG " + name, SETS_STREAM, stream, 0});
+        requests.push_back({"GET_LOG_STATE " + name, GETS_STREAM, stream, 0});
+        if (stream != ST_DSP) {
+            requests.push_back({"SAVE_RINGBUF " + name, SAVES, stream, 0});
+            requests.push_back({"SAVE_SLEEP_LOG " + name, SAVES, stream, 0});
+        }
+    }
+    return requests;
+}
+
+const std::vector<Request> REQUESTS = make_requests();
 // The transactions' own limit is 33 seconds; a queue of them and a dump may come before.
 constexpr int64_t MAX_WAIT_NS = int64_t{300} * 1000000000;
+// 20 pieces of a modem's dump may come 2.5 seconds apart. The external chip's dump has no limit.
+constexpr int64_t MAX_DUMP_NS = int64_t{120} * 1000000000;
 
 const Request& request_of(uint64_t index) {
-    return REQUESTS[index % REQUEST_COUNT];
+    return REQUESTS[index % REQUESTS.size()];
 }
 
 std::string value_text(unsigned which, unsigned value) {
@@ -176,20 +178,27 @@ bool acceptable(const Request& request, const std::string& line, const Setting& 
         case GETS_STREAM:
             return (line == "OK ON" || line == "OK OFF") &&
                    agrees(*asked_by(request), line == "OK ON", expected, contested);
-        case NOTHING:
-            break;
     }
     return false;
 }
 
 }  // namespace
 
+uint64_t Clients::request_count() {
+    return REQUESTS.size();
+}
+
+std::string Clients::request_text(uint64_t index) {
+    return request_of(index).text;
+}
+
 uint64_t Clients::request_named(const char* text) {
-    uint64_t index = 0;
-    while (strcmp(REQUESTS[index].text, text) != 0) {
-        ++index;
+    for (uint64_t index = 0; index < REQUESTS.size(); ++index) {
+        if (REQUESTS[index].text == text) {
+            return index;
+        }
     }
-    return index;
+    fail_run("simulation", "no request '%s' is known", text);
 }
 
 bool Clients::connected(Client& client) {
@@ -237,9 +246,6 @@ bool Clients::saves(const Client& client) {
 
 void Clients::ask(Client& client, uint64_t index) {
     const Request& request = request_of(index);
-    if (request.kind == NOTHING) {
-        return;
-    }
     bool contested = m_ghosts;
     for (Client& other : m_clients) {
         if (&other != &client && !other.asked.empty()) {
@@ -256,13 +262,10 @@ void Clients::ask(Client& client, uint64_t index) {
             g_state->save_failed = false;
         }
     }
-    if (strcmp(request.text, "kestctl reload") == 0) {
+    if (request.text == "kestctl reload") {
         for (StreamState& stream : g_state->streams) {
             stream.logged.uncertain = true;
         }
-    }
-    if (strncmp(request.text, "SUBSCRIBE WC", 12) == 0) {
-        client.subscribed = true;
     }
     const Setting* const asked = asked_by(request);
     client.asked.push_back({index, g_state->boot_ns, contested, asked ? *asked : Setting()});
@@ -281,9 +284,8 @@ void Clients::request(unsigned number, uint64_t index, bool in_pieces) {
     if (saves(client) || !connected(client) || !client.rest.empty()) {
         return;
     }
-    std::string text =
-        std::string(request_of(index).text) + (index % 3 ? "\n" : std::string(1, '\0'));
-    trace("client %u: %s", number % COUNT, request_of(index).text);
+    std::string text = request_of(index).text + (number < COUNT ? "\n" : std::string(1, '\0'));
+    trace("client %u: %s", number % COUNT, request_of(index).text.c_str());
     ask(client, index);
     if (in_pieces) {
         client.rest = text.substr(text.size() / 2);
@@ -359,7 +361,7 @@ void Clients::take_line(Client& client, const std::string& line) {
     if (client.asked.empty()) {
         fail_run("reply", "'%s' answers no request", line.c_str());
     }
-    const char* request;
+    std::string request;
     do {
         const Asked asked = client.asked.front();
         client.asked.pop_front();
@@ -367,30 +369,27 @@ void Clients::take_line(Client& client, const std::string& line) {
         const Request& done = request_of(asked.index);
         if (acceptable(done, line, asked.expected, asked.contested)) {
             if (done.kind == SAVES && line == "OK") {
-                world().check_saved(done.what, strncmp(done.text, "SAVE_RINGBUF", 12) == 0
+                world().check_saved(done.what, done.text.compare(0, 12, "SAVE_RINGBUF") == 0
                                                    ? "_ringbuf_"
                                                    : "_sleeplog_");
             }
             return;
         }
     } while (g_state->reply_lost && !client.asked.empty());
-    fail_run("reply", "'%s' is answered '%s'", request, line.c_str());
+    fail_run("reply", "'%s' is answered '%s'", request.c_str(), line.c_str());
 }
 
 void Clients::take_notice(Client& client, const std::string& line) {
     const bool start = line.compare(0, 14, "CP_DUMP_START ") == 0;
     const std::string cp = line.substr(start ? 14 : 12);
     const unsigned stream = cp == "WCDMA" ? ST_WCDMA : ST_WCN;
-    int& open = client.dumps[stream];
-    open += start ? 1 : -1;
+    Dump& dump = client.dumps[stream];
     ++g_state->counters.dumps;
     // A client that subscribed during a dump hears its end only.
-    if (open > 1 || open < -1) {
-        fail_run("notice", "'%s', %d dumps are open", line.c_str(), open);
+    if (start ? dump.open : !dump.open && dump.heard) {
+        fail_run("notice", "'%s', a dump is %s", line.c_str(), dump.open ? "open" : "not open");
     }
-    if (open < 0) {
-        open = 0;
-    }
+    dump = {true, start, g_state->boot_ns};
 }
 
 unsigned Clients::connected_count() const {
@@ -410,9 +409,24 @@ void Clients::check_waiting() const {
         return;
     }
     for (const Client& client : m_clients) {
+        const Dump& dump = client.dumps[ST_WCDMA];
+        if (dump.open && g_state->boot_ns - dump.since > MAX_DUMP_NS && !g_state->reply_lost) {
+            fail_run("notice", "a modem dump that a client was told of does not end");
+        }
         if (!client.asked.empty() && client.rest.empty() &&
             g_state->boot_ns - client.asked.front().at > MAX_WAIT_NS && !g_state->fault_seen) {
-            fail_run("reply", "'%s' is not answered", request_of(client.asked.front().index).text);
+            fail_run("reply", "'%s' is not answered",
+                     request_of(client.asked.front().index).text.c_str());
+        }
+    }
+}
+
+void Clients::check_dumps_told(unsigned number) const {
+    for (unsigned stream : {ST_WCDMA, ST_WCN}) {
+        const Dump& dump = m_clients[number].dumps[stream];
+        if (!dump.heard || dump.open) {
+            fail_run("notice", "dump of stream %u: its %s was not told", stream,
+                     dump.heard ? "end" : "start");
         }
     }
 }

@@ -18,7 +18,10 @@ public:
 
     explicit Clients(const std::string& root) : m_root(root) {}
 
-    // The index of a request; it must be one of the table.
+    // The requests of the table: their indices are 0 to this, without it.
+    static uint64_t request_count();
+    static std::string request_text(uint64_t index);
+    // It must be one of the table.
     static uint64_t request_named(const char* text);
 
     // Sends a request, connecting first if need be. in_pieces: the last bytes wait for
@@ -31,6 +34,8 @@ public:
     void pump();
     // Nobody waits for an answer longer than is promised.
     void check_waiting() const;
+    // This client, which subscribed to both, was told of a dump of each, from start to end.
+    void check_dumps_told(unsigned client) const;
     // A call failed: what was being changed may not have been.
     void mark_uncertain();
     bool waiting() const;
@@ -46,13 +51,18 @@ private:
         bool contested;  // its value may have been changed by others meanwhile
         Setting expected;
     };
+    // What a client was told of the dumps of a stream's CP.
+    struct Dump {
+        bool heard = false;
+        bool open = false;
+        int64_t since = 0;
+    };
     struct Client {
         int fd = -1;
         std::string rest;  // of a request sent in pieces
         std::string received;
         std::deque<Asked> asked;
-        bool subscribed = false;
-        int dumps[STREAM_COUNT] = {};  // started and not ended
+        Dump dumps[STREAM_COUNT];
     };
 
     unsigned connected_count() const;

@@ -13,6 +13,7 @@
 #include "sim/DiagFrame.h"
 #include "simulation/Chance.h"
 #include "simulation/CodedStream.h"
+#include "simulation/World.h"
 
 namespace {
 
@@ -20,8 +21,6 @@ const char* const LOG_PATHS[STREAM_COUNT] = {"/sim/wcdma_log", "/sim/wcn", "/sim
                                              "/dev/audio_dsp_log"};
 const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", ""};
 const char* const QUIET_PATHS[] = {"/dev/audio_dsp_pcm", "/dev/audio_dsp_mem"};
-
-constexpr int64_t NS_PER_MS = 1000000;
 
 enum Answers : uint8_t { WELL, WELL_TOO, SLOWLY, REFUSING, WRONGLY, NEVER, CUT_OFF, ANSWERS_COUNT };
 
@@ -84,20 +83,25 @@ int Devices::open(const std::string& path) {
     return -1;
 }
 
-int Devices::open_end(End& end, FdClass cls, unsigned stream) {
-    drop(end);
+int Devices::open_pair(FdClass cls, int* peer) {
     int pair[2];
     if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0, pair) < 0) {
         fail_run("simulation", "no socket pair: %s", strerror(errno));
     }
     // The number has to be the same each time: the lowest free one is the service's.
-    end.fd = std::min(pair[0], pair[1]);
-    end.peer = std::max(pair[0], pair[1]);
+    const int fd = std::min(pair[0], pair[1]);
+    *peer = std::max(pair[0], pair[1]);
+    g_fds[fd] = FdInfo();
+    g_fds[fd].cls = cls;
+    g_fds[fd].place = PLACE_DEVICE;
+    return fd;
+}
+
+int Devices::open_end(End& end, FdClass cls, unsigned stream) {
+    drop(end);
+    end.fd = open_pair(cls, &end.peer);
     end.sent = g_state->streams[stream].consumed;
-    FdInfo& info = g_fds[end.fd] = FdInfo();
-    info.cls = cls;
-    info.place = PLACE_DEVICE;
-    info.stream = stream;
+    g_fds[end.fd].stream = stream;
     return end.fd;
 }
 

@@ -24,6 +24,8 @@ public:
     static const char* diag_path(unsigned stream);
     static bool is_device(const std::string& path);
 
+    // A device of that class, with the end that is ours: the service's descriptor.
+    static int open_pair(FdClass cls, int* peer);
     // The service opens a device: its descriptor, or -1 with errno.
     int open(const std::string& path);
     // Moves bytes and answers on, as far as the time has come.

@@ -6,11 +6,11 @@
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <fstream>
 #include <vector>
 
 #include "simulation/Calls.h"
 #include "simulation/CodedStream.h"
+#include "simulation/Media.h"
 #include "simulation/State.h"
 
 namespace {
@@ -54,7 +54,7 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
         size_t same = coded_stream::match(
             stream, s.written, data,
             static_cast<size_t>(std::min<uint64_t>(len, s.consumed - s.written)));
-        if (s.answers_logged > 0 && same < LOCATABLE && same < len) {
+        if (s.answers_logged > 0 && same < CHANCE && same < len) {
             same = 0;  // as good as chance
         }
         s.written += same;
@@ -83,6 +83,9 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
                      "%s: %zu bytes behind %llu are not the stream's: %02x %02x %02x %02x ...",
                      NAMES[stream], len, number(s.written), data[0], data[1], data[2], data[3]);
         }
+        if (position + CHANCE > s.consumed) {
+            break;  // not read yet
+        }
         if (position < s.written && s.written - position <= CHANCE && s.answers_seen) {
             s.written = position;  // the last bytes before were an answer's
             continue;
@@ -93,9 +96,9 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
         }
         gap(stream, position);
     }
-    if (s.written > s.consumed) {
-        fail_run("foreign", "%s: written up to %llu, read only up to %llu", NAMES[stream],
-                 number(s.written), number(s.consumed));
+    if (len > 0 || s.written > s.consumed) {
+        fail_run("foreign", "%s: %zu bytes behind %llu are written, read only up to %llu",
+                 NAMES[stream], len, number(s.written), number(s.consumed));
     }
     if (s.written > s.excuse_until) {
         s.excuse = 0;
@@ -154,17 +157,6 @@ size_t skip_record(FdInfo& file, const uint8_t* data, size_t len) {
                            : 0;
 }
 
-std::vector<uint8_t> content(const std::string& path) {
-    std::vector<uint8_t> bytes;
-    std::ifstream in(path, std::ios::binary | std::ios::ate);
-    if (in) {
-        bytes.resize(static_cast<size_t>(in.tellg()));
-        in.seekg(0);
-        in.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
-    }
-    return bytes;
-}
-
 // For how many bytes a header that begins there goes on until another one begins: 0 when it is
 // whole.
 size_t cut_header(const std::vector<uint8_t>& bytes, size_t at) {
@@ -212,7 +204,7 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
 
 // The stream's bytes of a whole log file.
 std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
-    std::vector<uint8_t> bytes = content(path);
+    std::vector<uint8_t> bytes = content_of(path);
     if (stream == ST_DSP) {
         return chunk_payload(bytes);
     }

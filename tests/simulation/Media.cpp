@@ -80,6 +80,21 @@ bool Media::is_log_name(const std::string& name) {
            name.compare(name.size() - 4, 4, ".log") == 0;
 }
 
+bool Media::is_capture_name(const std::string& name) {
+    return name.find("_wiq_") != std::string::npos;
+}
+
+std::vector<uint8_t> content_of(const std::string& path) {
+    std::vector<uint8_t> bytes;
+    std::ifstream in(path, std::ios::binary | std::ios::ate);
+    if (in) {
+        bytes.resize(static_cast<size_t>(in.tellg()));
+        in.seekg(0);
+        in.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
+    }
+    return bytes;
+}
+
 // ---- Cards
 
 void Media::pull_card() {
@@ -126,6 +141,15 @@ Media::Seen Media::look(MediumId medium) const {
     return look_at(log_root(medium));
 }
 
+std::vector<std::string> Media::captures() const {
+    std::vector<std::string> all;
+    for (const std::string& tree : trees()) {
+        const std::vector<std::string> more = look_at(tree).captures;
+        all.insert(all.end(), more.begin(), more.end());
+    }
+    return all;
+}
+
 Media::Seen Media::look_at(const std::string& tree) const {
     Seen seen;
     const std::vector<fs::path> sets = dirs(tree);
@@ -140,6 +164,10 @@ Media::Seen Media::look_at(const std::string& tree) const {
                 }
                 const uint64_t size = static_cast<uint64_t>(st.st_size);
                 seen.bytes += size;
+                if (is_capture_name(file.filename())) {
+                    seen.captures.push_back(file);
+                    seen.spared += size;
+                }
                 const unsigned stream = stream_of(file);
                 if (is_log_name(file.filename()) && stream < STREAM_COUNT) {
                     const uint64_t number = strtoull(file.filename().c_str(), nullptr, 10);

@@ -13,6 +13,9 @@
 #include "simulation/Chance.h"
 #include "simulation/State.h"
 
+// All bytes of a file.
+std::vector<uint8_t> content_of(const std::string& path);
+
 class Media {
 public:
     explicit Media(const std::string& root) : m_root(root) {}
@@ -27,8 +30,11 @@ public:
         std::vector<LogFileSeen> logs;
         uint64_t bytes = 0;   // of all files
         uint64_t spared = 0;  // of those that a quota does not delete, of the newest set
+        std::vector<std::string> captures;  // of I/Q buffers
     };
 
+    // The I/Q captures on all media.
+    std::vector<std::string> captures() const;
     std::string log_root(MediumId medium) const;
 
     void pull_card();
@@ -56,6 +62,7 @@ public:
     void check_names() const;
     // The stream whose directory this is part of, or STREAM_COUNT.
     static unsigned stream_of(const std::string& path);
+    static bool is_capture_name(const std::string& name);
     static bool is_log_name(const std::string& name);
 
 private:

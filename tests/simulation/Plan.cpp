@@ -2,13 +2,15 @@
 
 #include "simulation/Plan.h"
 
-#include <string.h>
+#include <errno.h>
+#include <stdlib.h>
 
+#include <algorithm>
 #include <sstream>
 
+#include "simulation/Calls.h"
 #include "simulation/Chance.h"
 #include "simulation/Clients.h"
-#include "simulation/State.h"
 
 namespace {
 
@@ -16,7 +18,7 @@ const char* const NAMES[EV_KIND_COUNT] = {
     "feed",   "device-fails", "device-gone", "device-back", "card-out", "card-in", "card-ro",
     "full",   "room",         "delete",      "stranger",    "clock",    "zone",    "request",
     "pieces", "flood",        "leave",       "supervisor",  "time",     "diag",    "property",
-    "fault",  "no-fault",     "kill",        "calm",        "check"};
+    "iq",     "fault",        "no-fault",    "kill",        "calm",     "check"};
 
 struct Weight {
     EventKind kind;
@@ -25,20 +27,38 @@ struct Weight {
 };
 
 const Weight WEIGHTS[] = {
-    {EV_FEED, 500, WEATHER_FAIR},          {EV_REQUEST, 100, WEATHER_FAIR},
-    {EV_PIECES, 10, WEATHER_FAIR},         {EV_FLOOD, 5, WEATHER_FAIR},
-    {EV_CLIENT_LEAVES, 15, WEATHER_FAIR},  {EV_SUPERVISOR, 40, WEATHER_FAIR},
-    {EV_TIME_SERVICE, 10, WEATHER_FAIR},   {EV_DIAG, 20, WEATHER_FAIR},
-    {EV_PROPERTY, 10, WEATHER_FAIR},       {EV_CHECK, 20, WEATHER_FAIR},
-    {EV_DEVICE_FAILS, 6, WEATHER_OUTSIDE}, {EV_DEVICE_GONE, 6, WEATHER_OUTSIDE},
-    {EV_DEVICE_BACK, 12, WEATHER_OUTSIDE}, {EV_CARD_OUT, 12, WEATHER_OUTSIDE},
-    {EV_CARD_IN, 24, WEATHER_OUTSIDE},     {EV_CARD_READ_ONLY, 5, WEATHER_OUTSIDE},
-    {EV_MEDIUM_FULL, 8, WEATHER_OUTSIDE},  {EV_MEDIUM_ROOM, 12, WEATHER_OUTSIDE},
-    {EV_DELETE, 20, WEATHER_OUTSIDE},      {EV_STRANGER, 10, WEATHER_OUTSIDE},
-    {EV_CLOCK, 10, WEATHER_OUTSIDE},       {EV_ZONE, 5, WEATHER_OUTSIDE},
-    {EV_FAULT, 40, WEATHER_FAULTS},        {EV_NO_FAULTS, 15, WEATHER_FAULTS},
-    {EV_CALM, 8, WEATHER_FAULTS},          {EV_KILL, 10, WEATHER_STORM},
+    {EV_FEED, 500, WEATHER_FAIR},
+    {EV_REQUEST, 100, WEATHER_FAIR},
+    {EV_PIECES, 10, WEATHER_FAIR},
+    {EV_FLOOD, 5, WEATHER_FAIR},
+    {EV_CLIENT_LEAVES, 15, WEATHER_FAIR},
+    {EV_SUPERVISOR, 40, WEATHER_FAIR},
+    {EV_TIME_SERVICE, 10, WEATHER_FAIR},
+    {EV_DIAG, 20, WEATHER_FAIR},
+    {EV_PROPERTY, 10, WEATHER_FAIR},
+    {EV_CHECK, 20, WEATHER_FAIR},
+    {EV_IQ, 25, WEATHER_FAIR},
+    {EV_DEVICE_FAILS, 6, WEATHER_OUTSIDE},
+    {EV_DEVICE_GONE, 6, WEATHER_OUTSIDE},
+    {EV_DEVICE_BACK, 12, WEATHER_OUTSIDE},
+    {EV_CARD_OUT, 12, WEATHER_OUTSIDE},
+    {EV_CARD_IN, 24, WEATHER_OUTSIDE},
+    {EV_CARD_READ_ONLY, 5, WEATHER_OUTSIDE},
+    {EV_MEDIUM_FULL, 8, WEATHER_OUTSIDE},
+    {EV_MEDIUM_ROOM, 12, WEATHER_OUTSIDE},
+    {EV_DELETE, 20, WEATHER_OUTSIDE},
+    {EV_STRANGER, 10, WEATHER_OUTSIDE},
+    {EV_CLOCK, 10, WEATHER_OUTSIDE},
+    {EV_ZONE, 5, WEATHER_OUTSIDE},
+    {EV_FAULT, 40, WEATHER_FAULTS},
+    {EV_NO_FAULTS, 15, WEATHER_FAULTS},
+    {EV_CALM, 8, WEATHER_FAULTS},
+    {EV_KILL, 10, WEATHER_STORM},
 };
+
+bool is_request(EventKind kind) {
+    return kind == EV_REQUEST || kind == EV_PIECES;
+}
 
 EventKind pick_kind(Chance& chance, Weather weather) {
     unsigned total = 0;
@@ -92,6 +112,32 @@ uint64_t feed_size(Chance& chance) {
     }
 }
 
+// The thread looks for a command behind each 10 MiB.
+uint64_t iq_size(Chance& chance) {
+    constexpr uint64_t CHUNK = 10 << 20;
+    switch (chance.below(12)) {
+        case 0:
+            return CHUNK + chance.below(3 * CHUNK / 2);
+        case 1:
+            return CHUNK - 1 + chance.below(3);
+        case 2:
+            return (100 << 20) + chance.below(uint64_t{1} << 31);
+        default:
+            return chance.below(300000);
+    }
+}
+
+// The error, how many calls go well before, and how many fail.
+uint64_t fault_size(Chance& chance, uint64_t call) {
+    static const int ERRORS[] = {EIO, ENOSPC, EMFILE, ENFILE, EINTR, EAGAIN, ENOMEM, EROFS, 0, EIO};
+    int error = chance.pick(ERRORS);
+    if (error == 0 && call != CALL_WRITE && call != CALL_READ) {
+        error = EIO;
+    }
+    return static_cast<uint64_t>(error) + PLAN_SKIP * chance.below(20) +
+           PLAN_TIMES * (chance.one_in(5) ? 200 : 1 + chance.below(3));
+}
+
 Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
     Event event = {at_ms, pick_kind(chance, weather), chance.next() >> 16, chance.next() >> 16};
     switch (event.kind) {
@@ -124,6 +170,18 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
             event.a %= 2;
             event.b = chance.one_in(2) ? uint64_t{SUP_ALIVE} : chance.below(SUP_COUNT);
             break;
+        case EV_IQ:
+            event.b = iq_size(chance);
+            break;
+        case EV_REQUEST:
+        case EV_PIECES:
+            event.a = chance.below(8);
+            event.b = chance.below(Clients::request_count());
+            break;
+        case EV_FAULT:
+            event.a = chance.below(CALL_COUNT) + PLAN_PLACE * chance.below(PLACE_COUNT);
+            event.b = fault_size(chance, event.a % PLAN_PLACE);
+            break;
         case EV_KILL:
             event.a = chance.one_in(2) ? chance.below(300) : chance.below(10);
             break;
@@ -150,9 +208,10 @@ Plan make_plan(uint64_t seed, Weather weather, size_t events) {
 
 void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     static const char* const REQUESTS[] = {
-        "ENABLE_LOG_OVERWRITE", "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12",
-        "SET_SD_MAX_SIZE 14",   "ENABLE_LOG WCDMA",    "ENABLE_LOG WCN",
-        "ENABLE_LOG GNSS",      "ENABLE_LOG AG-DSP",
+        "DISABLE_LOG WCDMA",   "ENABLE_IQ WCDMA WCDMA", "ENABLE_LOG_OVERWRITE",
+        "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12", "SET_SD_MAX_SIZE 14",
+        "ENABLE_LOG WCDMA",    "ENABLE_LOG WCN",        "ENABLE_LOG GNSS",
+        "ENABLE_LOG AG-DSP",
     };
     plan.push_back({at_ms, EV_CALM, 0, 0});
     // By then the supervisors are connected again.
@@ -162,7 +221,16 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     for (const char* request : REQUESTS) {
         plan.push_back({now += 100, EV_REQUEST, 0, Clients::request_named(request)});
     }
+    for (const char* request : {"SUBSCRIBE WCDMA DUMP", "SUBSCRIBE WCN DUMP"}) {
+        plan.push_back({now += 100, EV_REQUEST, 1, Clients::request_named(request)});
+    }
+    for (uint64_t what : {SUP_ASSERT, SUP_ALIVE}) {
+        plan.push_back({now += 30000, EV_SUPERVISOR, 0, what});
+        plan.push_back({now, EV_SUPERVISOR, 1, what});
+    }
     now += 700000;  // a card that failed rests for up to ten minutes
+    plan.push_back({now, EV_IQ, 1000, 200000});
+    now += 300000;  // with the thread as slow as it can be
     for (unsigned round = 0; round < rounds; ++round) {
         for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
             plan.push_back({now, EV_FEED, stream, round == 0 ? uint64_t{70000} : uint64_t{250000}});
@@ -170,13 +238,17 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
         now += 5000;
     }
     plan.push_back({now, EV_REQUEST, 0, Clients::request_named("FLUSH")});
-    plan.push_back({now + 1000, EV_CHECK, 1, 0});
+    plan.push_back({now + 1000, EV_CHECK, 2, 0});
 }
 
 std::string to_text(const Event& event) {
     std::ostringstream text;
-    text << event.at_ms << ' ' << NAMES[event.kind] << ' ' << static_cast<int64_t>(event.a) << ' '
-         << event.b;
+    text << event.at_ms << ' ' << NAMES[event.kind] << ' ' << static_cast<int64_t>(event.a) << ' ';
+    if (is_request(event.kind)) {
+        text << Clients::request_text(event.b);
+    } else {
+        text << event.b;
+    }
     return text.str();
 }
 
@@ -188,15 +260,18 @@ bool add_line(Plan& plan, const std::string& line) {
     uint64_t at_ms;
     std::string name;
     int64_t a;
-    uint64_t b;
-    if (!(text >> at_ms >> name >> a >> b)) {
+    if (!(text >> at_ms >> name >> a)) {
         return false;
     }
-    for (int kind = 0; kind < EV_KIND_COUNT; ++kind) {
-        if (name == NAMES[kind]) {
-            plan.push_back({at_ms, static_cast<EventKind>(kind), static_cast<uint64_t>(a), b});
-            return true;
-        }
+    const char* const* const found = std::find(NAMES, NAMES + EV_KIND_COUNT, name);
+    const EventKind kind = static_cast<EventKind>(found - NAMES);
+    std::string rest;
+    std::getline(text >> std::ws, rest);
+    if (kind == EV_KIND_COUNT || rest.empty()) {
+        return false;
     }
-    return false;
+    const uint64_t b = is_request(kind) ? Clients::request_named(rest.c_str())
+                                        : strtoull(rest.c_str(), nullptr, 10);
+    plan.push_back({at_ms, kind, static_cast<uint64_t>(a), b});
+    return true;
 }

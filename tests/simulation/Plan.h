@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // What happens to the service in one run, event by event. A plan is made from a seed, or read
-// from a text: one event a line, its time in virtual milliseconds, its name and two numbers.
+// from a text: one event a line, its time in virtual milliseconds, its name and two numbers, or a
+// number and the text of a request.
 #ifndef SIMULATION_PLAN_H_
 #define SIMULATION_PLAN_H_
 
@@ -23,7 +24,7 @@ enum EventKind {
     EV_STRANGER,        // a: what somebody else makes, b: where
     EV_CLOCK,           // a: seconds, as a two's complement
     EV_ZONE,            // a: which
-    EV_REQUEST,         // a: client, b: request
+    EV_REQUEST,         // a: client (and from 4 on with the other terminator), b: request
     EV_PIECES,          // the same, in two pieces
     EV_FLOOD,           // a: client, b: requests from here on, ten of them in one write
     EV_CLIENT_LEAVES,   // a: client
@@ -31,11 +32,12 @@ enum EventKind {
     EV_TIME_SERVICE,    // a: how it answers
     EV_DIAG,            // a: stream, b: how its diag device answers
     EV_PROPERTY,        // a: which, b: value
-    EV_FAULT,           // a: call and place, b: error, how soon and how often
+    EV_IQ,              // an I/Q buffer is filled; a: place and pace of its saving, b: bytes
+    EV_FAULT,           // a: call and place, b: error, skipped calls and failing ones
     EV_NO_FAULTS,       // calls do not fail any more
     EV_KILL,            // a: so many calls from now
     EV_CALM,            // everything is in order again
-    EV_CHECK,           // what is on the media and what the service holds is compared
+    EV_CHECK,           // media and lists are compared; a: 1: at the end, 2: and dumps were told
     EV_KIND_COUNT
 };
 
@@ -50,6 +52,11 @@ enum SupervisorDoes {
     SUP_BACK,
     SUP_COUNT
 };
+
+// What the parts of a fault's two numbers are multiplied with; the call and the error with 1.
+constexpr uint64_t PLAN_PLACE = 100;
+constexpr uint64_t PLAN_SKIP = 1000;
+constexpr uint64_t PLAN_TIMES = 1000000;
 
 struct Event {
     uint64_t at_ms;

@@ -56,6 +56,18 @@ struct FaultRule {
     uint32_t times;  // UINT32_MAX: from now on
 };
 
+// The I/Q memory device and the buffer that it reported last.
+struct IqState {
+    bool in_use;
+    bool filled;
+    bool taken;   // the service asked where it is
+    bool failed;  // a write of it
+    uint32_t offset;
+    uint32_t len;
+    uint32_t saved;
+    int command;  // the loop's last one to the thread
+};
+
 constexpr size_t MAX_FAULTS = 8;
 
 struct Counters {
@@ -69,6 +81,8 @@ struct Counters {
     uint64_t dumps;
     uint64_t passes;
     uint64_t checks;
+    uint64_t iq_bytes;
+    uint64_t thread_steps;
 };
 
 struct State {
@@ -83,6 +97,7 @@ struct State {
     uint32_t lives;
 
     StreamState streams[STREAM_COUNT];
+    IqState iq;
     bool card_in;
     bool card_read_only;
     uint32_t card;                // number of the card in the slot, or of the last one

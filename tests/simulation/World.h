@@ -14,11 +14,17 @@
 #include "simulation/Calls.h"
 #include "simulation/Clients.h"
 #include "simulation/Devices.h"
+#include "simulation/IqDevice.h"
 #include "simulation/Media.h"
 #include "simulation/Peers.h"
 #include "simulation/Plan.h"
+#include "simulation/SavingThread.h"
 
 class LogController;
+
+constexpr int64_t NS_PER_MS = 1000000;
+constexpr int64_t START_NS = int64_t{100} * 1000000000;
+const char* const ZONES[] = {"UTC0", "CET-1", "XST+9:30", "NZST-12"};
 
 class World {
 public:
@@ -28,6 +34,8 @@ public:
     World(const std::string& root, const Plan& plan);
 
     const std::string& root() const { return m_root; }
+    IqDevice& iq() { return m_iq; }
+    SavingThread& thread() { return m_thread; }
     // The service whose loop runs; not owned.
     void attach(LogController* controller) { m_controller = controller; }
 
@@ -35,7 +43,8 @@ public:
 
     bool is_loops_own(const void* fds) const;
     int wait(struct pollfd* fds, nfds_t count, int timeout, bool loops_own);
-    void pass_ends(int ready);
+    // idle: the loop did not wait.
+    void pass_ends(bool idle);
     void pump();
     Place place_of(const char* path) const;
     void file_opened(const char* path, Place place, FdInfo& info, int fd) const;
@@ -73,16 +82,19 @@ private:
     void spins(const struct pollfd* fds, nfds_t count) const;
     void write_props() const;
     static void no_setting_is_certain();
-    bool refusal_is_due() const;
+    bool refusal_is_due();
 
     const std::string m_root;
     const Plan& m_plan;
     LogController* m_controller = nullptr;
     Devices m_devices;
+    IqDevice m_iq;
+    SavingThread m_thread;
     Peers m_peers;
     Clients m_clients;
     Media m_media;
     unsigned m_idle_passes = 0;
+    unsigned m_refused_since_deletion = UINT32_MAX / 2;
     unsigned m_last_stream = STREAM_COUNT;
 };
 

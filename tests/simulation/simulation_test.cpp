@@ -28,12 +28,14 @@ Plan read_plan(const std::filesystem::path& path) {
     return plan;
 }
 
-TEST(Simulation, ASeedRepeatsExactlyAlsoWithKills) {
+TEST(Simulation, ASeedRepeatsExactlyAlsoWithKillsAndTwoThreads) {
     const Plan plan = make_plan(3, WEATHER_STORM, 300);
     const RunResult first = run_plan(plan);
     const RunResult second = run_plan(plan);
     EXPECT_GT(first.counters.kills, 0u);
     EXPECT_GT(first.counters.faults, 0u);
+    EXPECT_GT(first.counters.thread_steps, 0u);
+    EXPECT_GT(first.counters.iq_bytes, 0u);
     EXPECT_EQ(second.digest, first.digest);
     EXPECT_EQ(second.counters.calls, first.counters.calls);
 }

@@ -1,0 +1,184 @@
+// SPDX-License-Identifier: Apache-2.0
+// The part of World that the service's calls ask: what a path is, what they may do.
+#include <string.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+
+#include "channels/LogPipeHandler.h"
+#include "control/LogController.h"
+#include "simulation/Ledger.h"
+#include "simulation/World.h"
+
+namespace {
+
+// So long after everything was put in order the service has found out.
+constexpr int64_t CALM_AFTER_NS = int64_t{65} * 1000000000;
+const CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN, CT_GNSS, CT_AGDSP};
+
+}  // namespace
+
+Place World::place_of(const char* path) const {
+    if (strncmp(path, m_root.c_str(), m_root.size()) != 0) {
+        return Devices::is_device(path) ? PLACE_DEVICE : PLACE_OTHER;
+    }
+    const std::string rest = path + m_root.size();
+    if (rest.compare(0, 15, "/data/modem_log") == 0) {
+        return PLACE_DATA;
+    }
+    if (rest.compare(0, 5, "/card") == 0) {
+        return PLACE_CARD;
+    }
+    if (rest.compare(0, 12, "/data/local/") == 0) {
+        return PLACE_SETTINGS;
+    }
+    if (rest == "/default.prop") {
+        return PLACE_PROPS;
+    }
+    return Devices::is_device(rest) ? PLACE_DEVICE : PLACE_OTHER;
+}
+
+void World::file_opened(const char* path, Place place, FdInfo& info, int fd) const {
+    if (place != PLACE_DATA && place != PLACE_CARD) {
+        return;
+    }
+    const char* const name = strrchr(path, '/') + 1;
+    info.cls = FD_TREE_FILE;
+    info.stream = Media::stream_of(path);
+    info.generation = g_state->card_generation;
+    info.opened_in_calm =
+        g_state->calm_ns != 0 && g_state->boot_ns - g_state->calm_ns > CALM_AFTER_NS;
+    struct stat st;
+    if (fstat(fd, &st) == 0) {
+        info.inode = st.st_ino;
+    }
+    if (Media::is_log_name(name) && info.stream < STREAM_COUNT) {
+        info.cls = FD_LOG_FILE;
+    } else if (Media::is_capture_name(name)) {
+        info.cls = FD_IQ_FILE;
+        if (st.st_size != 0) {
+            fail_run("iq", "%s, for a new buffer, has bytes already", path);
+        }
+    }
+}
+
+int World::open_device(const char* path) {
+    const bool in_root = strncmp(path, m_root.c_str(), m_root.size()) == 0;
+    const std::string name = in_root ? path + m_root.size() : path;
+    return name == "/dev/iq_mem" ? m_iq.open() : m_devices.open(name);
+}
+
+void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len) {
+    progress();
+    if (info.cls != FD_LOG_DEVICE) {
+        return;
+    }
+    m_last_stream = info.stream;
+    const LogPipeHandler* const channel = m_controller->get_cp(STREAM_TYPES[info.stream]);
+    const bool exchange = channel && channel->state() != CWS_WORKING;
+    const size_t logged = m_devices.log_bytes(info.stream, len);
+    if (logged < len) {
+        g_state->streams[info.stream].answers_logged += len - logged;
+        g_state->streams[info.stream].answers_seen = true;
+    }
+    if (logged > 0) {
+        ledger::consumed(info.stream, logged, exchange);
+        if (exchange) {
+            m_devices.spoil_answer(info.stream);
+        }
+    }
+}
+
+void World::service_deletes(const char* path, Place place) const {
+    if (place == PLACE_DATA || place == PLACE_CARD) {
+        m_media.book_removal(path);
+    }
+}
+
+int World::remove_by_shell(const char* command) {
+    static const char prefix[] = "rm -fr ";
+    if (strncmp(command, prefix, strlen(prefix)) != 0) {
+        fail_run("shell", "command '%s'", command);
+    }
+    std::string path;
+    bool quoted = false;
+    for (const char* p = command + strlen(prefix); *p; ++p) {
+        if (*p == '\'') {
+            quoted = !quoted;
+        } else if (*p == '\\' && !quoted && p[1]) {
+            path += *++p;
+        } else if (!quoted && strchr(" ;&|<>$`\"(){}\n", *p)) {
+            fail_run("shell", "command '%s'", command);
+        } else {
+            path += *p;
+        }
+    }
+    const Place place = place_of(path.c_str());
+    if (place != PLACE_DATA && place != PLACE_CARD) {
+        fail_run("shell", "removes '%s'", path.c_str());
+    }
+    if (place == PLACE_CARD && (!g_state->card_in || g_state->card_read_only)) {
+        return 256;
+    }
+    static const char pattern[] = "/[0-9]*";
+    const size_t len = strlen(pattern);
+    if (path.size() > len && path.compare(path.size() - len, len, pattern) == 0) {
+        m_media.remove_matching(path.substr(0, path.size() - len));
+    } else {
+        m_media.remove_all(path);
+    }
+    return 0;
+}
+
+void World::set_times(const char* path, struct stat& st) const {
+    if (path[0] && place_of(path) != PLACE_PROPS) {
+        return;
+    }
+    const int64_t ns = g_state->props_ns + g_state->wall_ns;
+    st.st_mtim.tv_sec = st.st_ctim.tv_sec = ns / 1000000000;
+    st.st_mtim.tv_nsec = st.st_ctim.tv_nsec = ns % 1000000000;
+}
+
+void World::message(const std::string& text) {
+    // An address is not the same each time.
+    const size_t end = std::min<size_t>(text.find("mapped to "), 400);
+    trace("says %s", text.substr(0, end).c_str());
+    if (text.find("dump complete") != std::string::npos) {
+        check_saved(ST_WCDMA, "_memory_");
+    }
+    if (text.find("save config") != std::string::npos) {
+        g_state->save_failed = true;
+    }
+    if (text.find("save log error") == std::string::npos &&
+        text.find("bytes lost") == std::string::npos) {
+        return;
+    }
+    if (m_last_stream == STREAM_COUNT) {
+        fail_run("lost", "a block lost of no stream: %s", text.c_str());
+    }
+    if (!g_state->fault_in_step && !refusal_is_due()) {
+        fail_run("refused", "nothing was in the way: %s", text.c_str());
+    }
+    ledger::excuse(m_last_stream);
+}
+
+// Whether the medium in use is above its quota and may not delete anything.
+bool World::refusal_is_due() {
+    const MediaStorage* const media = m_controller->stor_mgr().get_media_stor();
+    if (!media) {
+        return false;
+    }
+    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
+    const Setting& quota = g_state->settings[card ? SET_CARD_MB : SET_DATA_MB];
+    const Setting& overwrite = g_state->settings[SET_OVERWRITE];
+    // A request that was sent may not have been read.
+    const bool known = !quota.uncertain && !overwrite.uncertain && !m_clients.waiting();
+    if (m_media.must_refuse(card ? MED_CARD : MED_DATA,
+                            known ? uint64_t{quota.value} << 20 : media->quota(),
+                            known ? overwrite.value != 0 : media->overwrite())) {
+        return true;
+    }
+    // What others deleted is noticed at one refused write in so many.
+    constexpr unsigned WRITES_A_RECOUNT = 16;
+    return media->size() > media->quota() && ++m_refused_since_deletion < WRITES_A_RECOUNT;
+}

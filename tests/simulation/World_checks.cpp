@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: Apache-2.0
+// The part of World that compares what the service holds and has written with what it should.
+#include <fstream>
+
+#include "control/LogController.h"
+#include "simulation/Ledger.h"
+#include "simulation/World.h"
+#include "storage/CpDirectory.h"
+#include "storage/CpSetDirectory.h"
+#include "storage/LogFile.h"
+
+void World::check(bool last) {
+    if (!m_controller) {
+        if (last) {
+            fail_run("stopped", "the service does not start");
+        }
+        return;
+    }
+    ++g_state->counters.checks;
+    m_clients.check_waiting();
+    check_descriptors();
+    check_totals();
+    check_settings();
+    m_media.check_names();
+    m_media.check_bytes();
+    if (last) {
+        check_quota();
+        for (const std::string& capture : m_media.captures()) {
+            IqDevice::check_file(capture);
+        }
+        ledger::check_settled();
+    }
+}
+
+void World::check_saved(unsigned stream, const char* kind) const {
+    const std::string* const answer = m_devices.whole_answer(stream);
+    if (answer && !g_state->tampered && !g_state->faulted &&
+        !m_media.holds(stream, kind, *answer)) {
+        fail_run("answer", "no %s file has the %zu bytes that were answered", kind, answer->size());
+    }
+}
+
+// The settings file has what was set last.
+void World::check_settings() const {
+    static const char* const KEYS[] = {"log_file_size", "data_log_size", "sd_log_size"};
+    if (g_state->faulted || g_state->save_failed || !m_clients.quiet()) {
+        return;
+    }
+    std::ifstream in(m_root + "/data/local/tmp/kestmodem/kest_modem.conf");
+    for (std::string line; std::getline(in, line);) {
+        for (unsigned i = SET_FILE_MB; i <= SET_CARD_MB; ++i) {
+            const Setting& setting = g_state->settings[i];
+            const std::string key = std::string(KEYS[i]) + " ";
+            if (line.compare(0, key.size(), key) == 0 && !setting.uncertain &&
+                line.substr(key.size()) != std::to_string(setting.value)) {
+                fail_run("settings", "'%s' is in the file, %u was set", line.c_str(),
+                         setting.value);
+            }
+        }
+    }
+}
+
+// In the calm nothing keeps a card above its quota.
+void World::check_quota() const {
+    const Setting& quota = g_state->settings[SET_CARD_MB];
+    const Media::Seen seen = m_media.look(MED_CARD);
+    const uint64_t limit = std::max(uint64_t{quota.value} << 20, seen.spared);
+    if (!quota.uncertain && quota.value && seen.bytes > limit + 32768 &&
+        m_controller->stor_mgr().media_type() == MT_EXTERNAL) {
+        fail_run(
+            "quota", "%llu bytes on a card with a quota of %u MB; counted are %llu",
+            static_cast<unsigned long long>(seen.bytes), quota.value,
+            static_cast<unsigned long long>(m_controller->stor_mgr().get_media_stor()->size()));
+    }
+}
+
+void World::check_descriptors() const {
+    unsigned count[FD_CLASS_COUNT] = {};
+    unsigned devices[STREAM_COUNT] = {};
+    for (const FdInfo& info : g_fds) {
+        ++count[info.cls];
+        if (info.cls == FD_LOG_DEVICE || info.cls == FD_DIAG_DEVICE) {
+            ++devices[info.stream];
+        }
+    }
+    const unsigned most[FD_CLASS_COUNT] = {
+        MAX_FDS, STREAM_COUNT, 1, 2, STREAM_COUNT, 3, 0, 1, 3, 2, 0, 1, 1, 2};
+    for (unsigned cls = FD_LOG_DEVICE; cls < FD_CLASS_COUNT; ++cls) {
+        if (count[cls] > most[cls]) {
+            fail_run("leak", "%u descriptors of class %u", count[cls], cls);
+        }
+    }
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        if (devices[stream] > 2) {
+            fail_run("leak", "stream %u has %u open devices", stream, devices[stream]);
+        }
+    }
+}
+
+// What the service believes to have on a medium is what its lists hold.
+void World::check_totals() const {
+    for (MediaType type : {MT_INTERNAL, MT_EXTERNAL}) {
+        const MediaStorage* const media = m_controller->stor_mgr().get_media(type);
+        uint64_t sum = 0;
+        for (const CpSetDirectory* set : media->sets()) {
+            uint64_t of_set = 0;
+            for (const CpDirectory* dir : set->dirs()) {
+                uint64_t of_dir = 0;
+                for (const LogFile* file : dir->files()) {
+                    of_dir += file->counted();
+                }
+                if (of_dir != dir->size()) {
+                    fail_run("total", "directory %s: %llu, its files %llu", dir->path().string(),
+                             static_cast<unsigned long long>(dir->size()),
+                             static_cast<unsigned long long>(of_dir));
+                }
+                of_set += of_dir;
+            }
+            sum += set->size();
+            if (of_set != set->size() && !g_state->tampered && !g_state->faulted) {
+                fail_run("total", "set %s: %llu, its files %llu", set->path().string(),
+                         static_cast<unsigned long long>(set->size()),
+                         static_cast<unsigned long long>(of_set));
+            }
+        }
+        if (g_state->tampered || g_state->faulted) {
+            continue;
+        }
+        if (sum != media->size()) {
+            fail_run("total", "medium %d: %llu, its sets %llu", type,
+                     static_cast<unsigned long long>(media->size()),
+                     static_cast<unsigned long long>(sum));
+        }
+        const bool external = type == MT_EXTERNAL;
+        uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
+        for (const FdInfo& info : g_fds) {
+            // What the thread has written is counted when it is done.
+            const bool on_it = info.place == (external ? PLACE_CARD : PLACE_DATA);
+            there -= info.cls == FD_IQ_FILE && on_it && !info.removed ? info.position : 0;
+        }
+        const bool known = !external || (g_state->card_in && media->scanned());
+        if (known && (sum < there || sum > there + (STREAM_COUNT + 2) * 65536)) {
+            fail_run("total", "medium %d: %llu, on the medium %llu", type,
+                     static_cast<unsigned long long>(sum), static_cast<unsigned long long>(there));
+        }
+    }
+}
+
+void World::check_end() const {
+    for (int fd = 0; fd < MAX_FDS; ++fd) {
+        if (g_fds[fd].cls != FD_NONE) {
+            fail_run("leak", "descriptor %d of class %d is open at the end", fd, g_fds[fd].cls);
+        }
+    }
+}
