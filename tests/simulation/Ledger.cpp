@@ -279,6 +279,7 @@ void file_removed(const std::string& path, unsigned stream) {
     for (FdInfo& info : g_fds) {
         if (info.cls == FD_LOG_FILE && info.inode == st.st_ino) {
             info.removed = true;
+            excuse(stream);  // what is staged for it may go with it
         }
     }
 }
