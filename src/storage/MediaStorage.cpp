@@ -76,24 +76,24 @@ int MediaStorage::scan_sets() {
     std::sort(found.begin(), found.end(), [](const auto& a, const auto& b) {
         return strcmp(a->path().string(), b->path().string()) < 0;
     });
+    // One that is listed already (it was started before the medium was scanned) stays as it is.
+    // The list is not in order where the clock was set back between two sets.
+    const bool some_listed = !m_sets.empty();
     for (std::unique_ptr<CpSetDirectory>& set : found) {
-        insert_scanned(std::move(set));
+        if (!some_listed || !find_named(m_sets, &CpSetDirectory::path, set->path())) {
+            insert_scanned(std::move(set));
+        }
     }
     return result;
 }
 
-// Puts a scanned set in front of the first one whose path compares greater. A set
-// that is listed already (it was started before the medium was scanned) stays as it is.
+// Puts a scanned set in front of the first one whose path compares greater.
 void MediaStorage::insert_scanned(std::unique_ptr<CpSetDirectory> set) {
     android::List<CpSetDirectory*>::iterator it = m_sets.end();
     while (it != m_sets.begin()) {
         android::List<CpSetDirectory*>::iterator before = it;
         --before;
-        const int order = strcmp((*before)->path().string(), set->path().string());
-        if (order == 0) {
-            return;
-        }
-        if (order < 0) {
+        if (strcmp((*before)->path().string(), set->path().string()) < 0) {
             break;
         }
         it = before;

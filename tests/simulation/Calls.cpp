@@ -224,14 +224,12 @@ ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault
         ledger::file_written(info, data, static_cast<size_t>(n));
     }
     if (info.cls == FD_IQ_FILE) {
-        const int error = errno;
         IqDevice::written(data, n);
         info.position += n > 0 ? static_cast<uint64_t>(n) : 0;
-        errno = error;
     }
-    if (n >= 0) {
-        trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
-    }
+    const int error = errno;
+    trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
+    errno = error;
     return n;
 }
 
@@ -544,6 +542,9 @@ WRAPPED(int, ioctl, int fd, unsigned long request, unsigned long argument) {
         return __real_ioctl(fd, request, argument);
     }
     const int fault = begin(CALL_IOCTL, place_of_fd(fd));
+    if (fault > 0 && g_fds[fd].cls == FD_IQ_DEVICE) {
+        g_state->iq.taken = false;  // the driver goes on to report a buffer it could not release
+    }
     if (fault > 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
         return fault > 0 ? failed(fault) : 0;
     }

@@ -79,6 +79,8 @@ int IqDevice::control(unsigned long request, unsigned long argument) {
                          iq.filled ? "twice" : "too many");
             }
             iq.taken = true;
+            iq.failed = false;
+            iq.saved = 0;
             const IqBufInfo info = {iq.offset, iq.len};
             memcpy(reinterpret_cast<void*>(argument), &info, sizeof(info));
             return 0;

@@ -34,7 +34,8 @@ void gap(unsigned stream, uint64_t to) {
     StreamState& s = g_state->streams[stream];
     const uint64_t len = to - s.written;
     trace("lost %s %llu bytes at %llu", NAMES[stream], number(len), number(s.written));
-    if (s.written > s.excuse_until || len > s.excuse + s.unplaced) {
+    const uint64_t excused = s.written > s.excuse_until ? 0 : s.excuse;
+    if (len > excused + s.unplaced) {
         fail_run("lost", "%s: %llu bytes lost at %llu; explained are %llu up to %llu",
                  NAMES[stream], number(len), number(s.written), number(s.excuse),
                  number(s.excuse_until));
@@ -278,6 +279,7 @@ void file_removed(const std::string& path, unsigned stream) {
     for (FdInfo& info : g_fds) {
         if (info.cls == FD_LOG_FILE && info.inode == st.st_ino) {
             info.removed = true;
+            excuse(stream);  // what is staged for it may go with it
         }
     }
 }
