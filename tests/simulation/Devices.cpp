@@ -173,6 +173,7 @@ void Devices::pump_answers(End& end) {
         }
         if (n < static_cast<ssize_t>(piece.bytes.size())) {
             piece.bytes.erase(piece.bytes.begin(), piece.bytes.begin() + std::max<ssize_t>(n, 0));
+            piece.due = g_state->boot_ns + 10 * NS_PER_MS;  // the service does not read now
             return;
         }
         end.answers.pop_front();

@@ -256,7 +256,10 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
         }
         now += 5000;
     }
-    plan.push_back({now, EV_REQUEST, 0, Clients::request_named("FLUSH")});
+    // The parsing library comes with a start, if the log root is there by then.
+    for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA", "FLUSH"}) {
+        plan.push_back({now, EV_REQUEST, 0, Clients::request_named(request)});
+    }
     plan.push_back({now + 1000, EV_CHECK, 2, 0});
 }
 

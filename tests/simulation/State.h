@@ -77,7 +77,7 @@ struct IqState {
     uint32_t offset;
     uint32_t len;
     uint32_t saved;
-    int command;  // the loop's last one to the thread
+    uint32_t stops;  // that the loop asked for and the thread has not answered
 };
 
 constexpr size_t MAX_FAULTS = 8;
