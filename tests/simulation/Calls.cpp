@@ -447,8 +447,11 @@ WRAPPED(ssize_t, read, int fd, void* data, size_t len) {
     if (fault == SHORT_COUNT && len > 1) {
         len = 1 + g_state->counters.calls % std::min<size_t>(len - 1, 100);
     }
-    const ssize_t n = __real_read(fd, data, len);
+    ssize_t n = __real_read(fd, data, len);
     const int error = errno;
+    if (n < 0 && info.cls == FD_LOG_DEVICE && info.stream == ST_DUMP && Devices::dump_ends()) {
+        n = 0;
+    }
     if (n > 0) {
         const Outside outside;
         world().service_read(info, static_cast<const uint8_t*>(data), static_cast<size_t>(n));
@@ -544,6 +547,10 @@ WRAPPED(int, ioctl, int fd, unsigned long request, unsigned long argument) {
     const int fault = begin(CALL_IOCTL, place_of_fd(fd));
     if (fault > 0 && g_fds[fd].cls == FD_IQ_DEVICE) {
         g_state->iq.taken = false;  // the driver goes on to report a buffer it could not release
+    }
+    if (g_fds[fd].cls == FD_LOG_DEVICE) {
+        const Outside outside;
+        world().dump_confirmed(fd);
     }
     if (fault > 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
         return fault > 0 ? failed(fault) : 0;

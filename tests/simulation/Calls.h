@@ -56,7 +56,6 @@ enum FdClass : uint8_t {
     FD_NONE,
     FD_LOG_DEVICE,
     FD_DIAG_DEVICE,
-    FD_DSP_EXTRA,  // PCM and dump device of the audio DSP
     FD_LOG_FILE,
     FD_TREE_FILE,  // any other file in a log tree
     FD_DIR,

@@ -10,6 +10,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <utility>
 #include <vector>
 
 #include "simulation/Calls.h"
@@ -23,6 +24,7 @@ enum Kind {
     WRONG,        // the error of the argument
     SETS,         // OK; sets the setting to the argument
     GETS,         // OK and the setting
+    RELOADS,      // OK; switches the logging of streams as the other service's file says
     SETS_STREAM,  // OK; switches the logging of a stream
     GETS_STREAM,
     SAVES  // OK or an error, when the transaction ends
@@ -35,7 +37,7 @@ struct Request {
     unsigned argument;
 };
 
-const char* const STREAM_NAMES[STREAM_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
+const char* const STREAM_NAMES[CHANNEL_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
 
 std::vector<Request> make_requests() {
     std::vector<Request> requests = {
@@ -61,7 +63,7 @@ std::vector<Request> make_requests() {
         {"MINI_DUMP", WRONG, 3, 0},
         {"GET_LOG_STATE NONE", WRONG, 9, 0},
         {"kestctl clear", MAY, 0, 0},
-        {"kestctl reload", MAY, 0, 0},
+        {"kestctl reload", RELOADS, 0, 0},
         {"ENABLE_IQ WCDMA WCDMA", DOES, 0, 0},
         {"ENABLE_IQ WCDMA GSM", WRONG, 2, 0},
         {"DISABLE_IQ WCDMA", MAY, 0, 0},
@@ -73,7 +75,7 @@ std::vector<Request> make_requests() {
         {"SET_LOG_FILE_SIZE ten", WRONG, 2, 0},
         {"FLUSH now", WRONG, 1, 0},
     };
-    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+    for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
         const std::string name = STREAM_NAMES[stream];
         // As often as it is switched off and looked at, so that most streams flow.
         requests.push_back({"ENABLE_LOG " + name, SETS_STREAM, stream, 1});
@@ -120,15 +122,19 @@ bool is_error(const std::string& line, const char* codes) {
     return line.size() == 7 && line.compare(0, 6, "ERROR ") == 0 && strchr(codes, line[6]);
 }
 
-// What the request sets, or null.
-Setting* set_by(const Request& request) {
+// What the request sets, each with its new value.
+std::vector<std::pair<Setting*, unsigned>> set_by(const Request& request) {
+    const uint32_t conf = g_state->kest_conf;
     switch (request.kind) {
         case SETS:
-            return &g_state->settings[request.what];
+            return {{&g_state->settings[request.what], request.argument}};
         case SETS_STREAM:
-            return &g_state->streams[request.what].logged;
+            return {{&g_state->streams[request.what].logged, request.argument}};
+        case RELOADS:
+            return {{&g_state->streams[ST_WCDMA].logged, conf & KEST_ON && conf & KEST_MODEM},
+                    {&g_state->streams[ST_WCN].logged, conf & KEST_ON && conf & KEST_WCN}};
         default:
-            return nullptr;
+            return {};
     }
 }
 
@@ -164,6 +170,8 @@ bool acceptable(const Request& request, const std::string& line, const Setting& 
         case SETS:
         case SETS_STREAM:
             return line == "OK";
+        case RELOADS:
+            return line == "OK" || (g_state->faulted && is_error(line, "3"));
         case MAY:
             return line == "OK" || is_error(line, "34");
         case SAVES:
@@ -223,8 +231,8 @@ bool Clients::connected(Client& client) {
 
 void Clients::drop(Client& client) {
     for (const Asked& asked : client.asked) {
-        if (Setting* const setting = set_by(request_of(asked.index))) {
-            setting->uncertain = true;
+        for (const auto& set : set_by(request_of(asked.index))) {
+            set.first->uncertain = true;
         }
     }
     m_ghosts = m_ghosts || !client.asked.empty();
@@ -255,16 +263,10 @@ void Clients::ask(Client& client, uint64_t index) {
             }
         }
     }
-    if (Setting* const setting = set_by(request)) {
-        setting->value = request.argument;
-        setting->uncertain = contested;
+    for (const auto& set : set_by(request)) {
+        *set.first = {set.second, contested};
         if (request.kind == SETS) {
             g_state->save_failed = false;
-        }
-    }
-    if (request.text == "kestctl reload") {
-        for (StreamState& stream : g_state->streams) {
-            stream.logged.uncertain = true;
         }
     }
     const Setting* const asked = asked_by(request);
@@ -443,8 +445,8 @@ bool Clients::waiting() const {
 void Clients::mark_uncertain() {
     for (const Client& client : m_clients) {
         for (const Asked& asked : client.asked) {
-            if (Setting* const setting = set_by(request_of(asked.index))) {
-                setting->uncertain = true;
+            for (const auto& set : set_by(request_of(asked.index))) {
+                set.first->uncertain = true;
             }
         }
     }

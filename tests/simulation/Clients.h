@@ -62,7 +62,7 @@ private:
         std::string rest;  // of a request sent in pieces
         std::string received;
         std::deque<Asked> asked;
-        Dump dumps[STREAM_COUNT];
+        Dump dumps[CHANNEL_COUNT];
     };
 
     unsigned connected_count() const;

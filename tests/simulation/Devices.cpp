@@ -17,10 +17,10 @@
 
 namespace {
 
-const char* const LOG_PATHS[STREAM_COUNT] = {"/sim/wcdma_log", "/sim/wcn", "/sim/gnss",
-                                             "/dev/audio_dsp_log"};
-const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", ""};
-const char* const QUIET_PATHS[] = {"/dev/audio_dsp_pcm", "/dev/audio_dsp_mem"};
+const char* const LOG_PATHS[STREAM_COUNT] = {"/sim/wcdma_log",     "/sim/wcn",
+                                             "/sim/gnss",          "/dev/audio_dsp_log",
+                                             "/dev/audio_dsp_pcm", "/dev/audio_dsp_mem"};
+const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", "", "", ""};
 
 enum Answers : uint8_t { WELL, WELL_TOO, SLOWLY, REFUSING, WRONGLY, NEVER, CUT_OFF, ANSWERS_COUNT };
 
@@ -70,14 +70,6 @@ int Devices::open(const std::string& path) {
         }
         return open_end(log ? m_log[stream] : m_diag[stream], log ? FD_LOG_DEVICE : FD_DIAG_DEVICE,
                         stream);
-    }
-    for (const char* quiet : QUIET_PATHS) {
-        if (path == quiet) {
-            End end;
-            const int fd = open_end(end, FD_DSP_EXTRA, ST_DSP);
-            m_quiet.push_back(end.peer);
-            return fd;
-        }
     }
     errno = ENOENT;
     return -1;
@@ -181,6 +173,7 @@ void Devices::pump_answers(End& end) {
         }
         if (n < static_cast<ssize_t>(piece.bytes.size())) {
             piece.bytes.erase(piece.bytes.begin(), piece.bytes.begin() + std::max<ssize_t>(n, 0));
+            piece.due = g_state->boot_ns + 10 * NS_PER_MS;  // the service does not read now
             return;
         }
         end.answers.pop_front();
@@ -232,6 +225,17 @@ void Devices::take_requests(End& end, unsigned stream) {
             answer(end, stream, request.type, false);
         }
     }
+}
+
+void Devices::dump_confirmed(int fd) {
+    StreamState& s = g_state->streams[ST_DUMP];
+    trace("dump confirmed, %llu bytes unread", static_cast<unsigned long long>(s.fed - s.consumed));
+    g_state->dump_unconfirmed = false;
+    uint8_t bytes[4096];
+    while (recv(fd, bytes, sizeof(bytes), 0) > 0) {
+    }
+    s.fed = m_log[ST_DUMP].sent = s.consumed;
+    m_log[ST_DUMP].on_the_way.clear();
 }
 
 // Plans the whole answer at once.

@@ -34,6 +34,13 @@ public:
     int64_t next_due() const;
 
     void feed(unsigned stream, uint64_t bytes);
+    // The service has taken what it wants of the DSP's memory: the rest is dropped.
+    void dump_confirmed(int fd);
+    // Whether a read of it gives nothing: what was announced has been read.
+    static bool dump_ends() {
+        const StreamState& s = g_state->streams[ST_DUMP];
+        return s.fed == s.consumed && s.answers % 2 == 0;
+    }
     // Reads fail until the device is opened again.
     void fail(unsigned stream);
     void pull(unsigned stream);
@@ -76,7 +83,6 @@ private:
     End m_diag[STREAM_COUNT];
     std::string m_answer[STREAM_COUNT];
     bool m_whole[STREAM_COUNT] = {};
-    std::vector<int> m_quiet;  // ends that never give anything
 };
 
 #endif  // SIMULATION_DEVICES_H_

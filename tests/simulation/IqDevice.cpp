@@ -71,6 +71,7 @@ int IqDevice::control(unsigned long request, unsigned long argument) {
     switch (request) {
         case CMD_SET_IQ_CH_TYPE:
             iq.in_use = argument == 1;
+            iq.stops = 0;
             empty();
             return 0;
         case CMD_GET_IQ_BUF_INFO: {
@@ -99,8 +100,7 @@ void IqDevice::fill(uint64_t place, uint64_t len) {
     if (!iq.in_use || iq.filled) {
         return;
     }
-    iq = IqState();
-    iq.in_use = iq.filled = true;
+    iq.filled = true;
     iq.len = static_cast<uint32_t>(len);
     // One that is too long begins near the end of the memory, or of all numbers.
     iq.offset = static_cast<uint32_t>(len <= SAMPLES ? place % (SAMPLES - len + 1)
@@ -129,10 +129,14 @@ void IqDevice::written(const uint8_t* data, ssize_t n) {
     g_state->counters.iq_bytes += len;
 }
 
+void IqDevice::commanded(int command) {
+    g_state->iq.stops += command == IQST_STOP;
+}
+
 void IqDevice::responds(int response) {
-    const IqState& iq = g_state->iq;
+    IqState& iq = g_state->iq;
     trace("thread responds %d", response);
-    if (response == IQST_STOPPED && iq.command != IQST_STOP) {
+    if (response == IQST_STOPPED && iq.stops-- == 0) {
         fail_run("iq", "the thread stopped, which nobody asked for");
     }
     if (response == IQST_SAVED && iq.taken && !iq.failed && is_within(iq) && iq.saved != iq.len) {

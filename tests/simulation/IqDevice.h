@@ -33,7 +33,7 @@ public:
     static void written(const uint8_t* data, ssize_t n);
     // The thread told the loop what came of it; the loop sent a command.
     static void responds(int response);
-    static void commanded(int command) { g_state->iq.command = command; }
+    static void commanded(int command);
 
     // Samples and nothing else, one behind the other.
     static void check_file(const std::string& path);

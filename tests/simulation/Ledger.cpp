@@ -18,13 +18,15 @@ namespace {
 constexpr size_t RECORD_LEN = 16;
 const uint8_t RECORD_MAGIC[] = {0x78, 0x56, 0x34, 0x12};
 constexpr size_t CHUNK_HEADER_LEN = 20;
-constexpr uint8_t CHUNK_KIND_LOG = 0x40;
+// What the last byte of a chunk's header tells, by stream.
+constexpr uint8_t CHUNK_KINDS[STREAM_COUNT] = {0, 0, 0, 0x40, 0x43, 0x42};
 // Bytes of something else may go on like a stream by chance, but not more than these.
 constexpr uint64_t CHANCE = 8;
 // A slice of fewer bytes may hold no whole word of the stream.
 constexpr size_t LOCATABLE = 15;
 
-const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
+const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
+                                         "agdsp",    "DSP PCM", "DSP dump"};
 
 unsigned long long number(uint64_t n) {
     return n;
@@ -116,15 +118,20 @@ void take_chunks(FdInfo& file, const uint8_t* data, size_t len) {
         (file.payload_left > 0 || file.header_len > 0)) {
         // A full medium cut the last chunk off.
         trace("%s: chunk cut off", NAMES[file.stream]);
-        ++g_state->streams[file.stream].cuts;
+        for (unsigned stream : ledger::streams_in(file.stream)) {
+            ++g_state->streams[stream].cuts;
+        }
         file.payload_left = file.header_len = 0;
     }
     while (len > 0) {
         if (file.payload_left > 0) {
             const size_t n = std::min(len, file.payload_left);
-            if (file.header[19] == CHUNK_KIND_LOG) {
-                take(file.stream, data, n, file.removed);
+            const uint8_t* const kind =
+                std::find(CHUNK_KINDS + ST_DSP, std::end(CHUNK_KINDS), file.header[19]);
+            if (kind == std::end(CHUNK_KINDS)) {
+                fail_run("foreign", "agdsp: a chunk of kind %02x", file.header[19]);
             }
+            take(static_cast<unsigned>(kind - CHUNK_KINDS), data, n, file.removed);
             file.payload_left -= n;
             data += n;
             len -= n;
@@ -172,10 +179,11 @@ size_t cut_header(const std::vector<uint8_t>& bytes, size_t at) {
 // Whether a chunk begins there, be it one that a full medium cut off within its header.
 bool chunk_begins(const std::vector<uint8_t>& bytes, size_t at) {
     return bytes.size() - at >= 4 && memcmp(bytes.data() + at, "~~~~", 4) == 0 &&
-           (is_chunk_header(bytes.data() + at, bytes.size() - at) || cut_header(bytes, at) > 0);
+           (is_chunk_header(bytes.data() + at, bytes.size() - at) || cut_header(bytes, at) > 0 ||
+            bytes.size() - at < CHUNK_HEADER_LEN);
 }
 
-std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
+std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes, uint8_t kind) {
     std::vector<uint8_t> payload;
     for (size_t at = 0; at < bytes.size();) {
         if (!is_chunk_header(bytes.data() + at, bytes.size() - at)) {
@@ -187,7 +195,7 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
             continue;
         }
         const size_t len = static_cast<size_t>(bytes[at + 4] | bytes[at + 5] << 8) - 16;
-        const bool log = bytes[at + 19] == CHUNK_KIND_LOG;
+        const bool wanted = bytes[at + 19] == kind;
         const size_t from = at + CHUNK_HEADER_LEN;
         const size_t end = std::min(from + len, bytes.size());
         at = from;
@@ -195,7 +203,7 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
             const void* const flag = memchr(&bytes[at] + 1, '~', end - at - 1);
             at = flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - bytes.data()) : end;
         }
-        if (log) {
+        if (wanted) {
             payload.insert(payload.end(), bytes.begin() + static_cast<ptrdiff_t>(from),
                            bytes.begin() + static_cast<ptrdiff_t>(at));
         }
@@ -206,8 +214,8 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes) {
 // The stream's bytes of a whole log file.
 std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
     std::vector<uint8_t> bytes = content_of(path);
-    if (stream == ST_DSP) {
-        return chunk_payload(bytes);
+    if (CHUNK_KINDS[stream]) {
+        return chunk_payload(bytes, CHUNK_KINDS[stream]);
     }
     if (bytes.size() >= sizeof(RECORD_MAGIC) &&
         memcmp(bytes.data(), RECORD_MAGIC, sizeof(RECORD_MAGIC)) == 0) {
@@ -270,8 +278,15 @@ void file_written(FdInfo& file, const uint8_t* data, size_t len) {
     }
 }
 
-void file_removed(const std::string& path, unsigned stream) {
-    g_state->streams[stream].removed += stream_part(path, stream).size();
+std::vector<unsigned> streams_in(unsigned channel) {
+    return channel == ST_DSP ? std::vector<unsigned>{ST_DSP, ST_PCM, ST_DUMP}
+                             : std::vector<unsigned>{channel};
+}
+
+void file_removed(const std::string& path, unsigned channel) {
+    for (unsigned stream : streams_in(channel)) {
+        g_state->streams[stream].removed += stream_part(path, stream).size();
+    }
     struct stat st;
     if (stat(path.c_str(), &st) != 0) {
         return;
@@ -279,7 +294,9 @@ void file_removed(const std::string& path, unsigned stream) {
     for (FdInfo& info : g_fds) {
         if (info.cls == FD_LOG_FILE && info.inode == st.st_ino) {
             info.removed = true;
-            excuse(stream);  // what is staged for it may go with it
+            for (unsigned stream : streams_in(channel)) {
+                excuse(stream);  // what is staged for it may go with it
+            }
         }
     }
 }
@@ -292,11 +309,12 @@ void check_settled() {
             fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
                      number(open));
         }
-        if (s.logged.value && !s.logged.uncertain && s.fed != s.consumed) {
+        const Setting& logged = g_state->streams[std::min<unsigned>(stream, ST_DSP)].logged;
+        if (logged.value && !logged.uncertain && s.fed != s.consumed) {
             fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],
                      number(s.fed - s.consumed));
         }
-        if (s.logged.value && !s.logged.uncertain && open > 0) {
+        if (logged.value && !logged.uncertain && open > 0) {
             fail_run("stopped", "%s: the last bytes, in calm, are not in a file", NAMES[stream]);
         }
     }

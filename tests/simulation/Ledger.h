@@ -9,6 +9,7 @@
 #include <stdint.h>
 
 #include <string>
+#include <vector>
 
 struct FdInfo;
 
@@ -29,11 +30,13 @@ void consumed(unsigned stream, size_t len, bool diverted);
 // These bytes reached a log file.
 void file_written(FdInfo& file, const uint8_t* data, size_t len);
 // A log file is deleted; the rest of what its descriptor gets is deleted too.
-void file_removed(const std::string& path, unsigned stream);
+void file_removed(const std::string& path, unsigned channel);
 
 // Nothing may be outstanding when everything was calm and written out.
 void check_settled();
 
+// The streams whose bytes the log files of a channel hold.
+std::vector<unsigned> streams_in(unsigned channel);
 // The bytes of the stream in a log file on a medium. The whole file is checked: its bytes are
 // the stream's, in order.
 uint64_t stream_bytes(const std::string& path, unsigned stream);

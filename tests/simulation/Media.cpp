@@ -12,6 +12,8 @@
 #include <map>
 #include <set>
 
+#include "sim/SimModemImage.h"
+#include "sim/sha1.h"
 #include "simulation/Calls.h"
 #include "simulation/Ledger.h"
 #include "simulation/Plan.h"
@@ -20,7 +22,8 @@ namespace fs = std::filesystem;
 
 namespace {
 
-const char* const CP_NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
+const char* const CP_NAMES[CHANNEL_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
+constexpr size_t IMAGE_SIZE = 100000;
 const char* const HOSTILE_NAMES[] = {
     "it's; rm -rf x",      "-rf",    "$(id)", "9999-99-99-99-99-99",
     "2020-01-01-00-00-00", "a b\nc", "0",     "*"};
@@ -61,17 +64,18 @@ void make_text_file(const fs::path& path) {
 }  // namespace
 
 std::string Media::log_root(MediumId medium) const {
-    return m_root + (medium == MED_DATA ? "/data/modem_log" : "/card/modem_log");
+    return m_root + (medium == MED_DATA ? "/data" : "/card") +
+           (g_state->kest_layout ? "/kest/modem_log" : "/modem_log");
 }
 
 unsigned Media::stream_of(const std::string& path) {
     const std::string dir = fs::path(path).parent_path().filename();
-    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+    for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
         if (dir == CP_NAMES[stream]) {
             return stream;
         }
     }
-    return STREAM_COUNT;
+    return CHANNEL_COUNT;
 }
 
 bool Media::is_log_name(const std::string& name) {
@@ -128,9 +132,12 @@ void Media::insert_card(bool fresh) {
 }
 
 std::vector<std::string> Media::trees() const {
-    std::vector<std::string> all = {log_root(MED_DATA), log_root(MED_CARD)};
-    for (const fs::path& card : dirs(m_root + "/cards")) {
-        all.push_back(card.string() + "/modem_log");
+    std::vector<fs::path> media = dirs(m_root + "/cards");
+    media.insert(media.begin(), {m_root + "/data", m_root + "/card"});
+    std::vector<std::string> all;
+    for (const fs::path& medium : media) {
+        all.push_back(medium / "modem_log");
+        all.push_back(medium / "kest/modem_log");
     }
     return all;
 }
@@ -169,7 +176,7 @@ Media::Seen Media::look_at(const std::string& tree) const {
                     seen.spared += size;
                 }
                 const unsigned stream = stream_of(file);
-                if (is_log_name(file.filename()) && stream < STREAM_COUNT) {
+                if (is_log_name(file.filename()) && stream < CHANNEL_COUNT) {
                     const uint64_t number = strtoull(file.filename().c_str(), nullptr, 10);
                     seen.logs.push_back({file, stream, number, size});
                     sizes[number] = size;
@@ -203,7 +210,7 @@ bool Media::holds(unsigned stream, const char* kind, const std::string& content)
 
 bool Media::must_refuse(MediumId medium, uint64_t quota, bool overwrite) const {
     // What is staged counts and is not seen here.
-    constexpr uint64_t UNSEEN = STREAM_COUNT * 2 * 65536;
+    constexpr uint64_t UNSEEN = CHANNEL_COUNT * 2 * 65536;
     const Seen seen = look(medium);
     return quota != 0 && (overwrite ? seen.spared : seen.bytes) + UNSEEN >= quota;
 }
@@ -217,7 +224,7 @@ void Media::book_removal(const std::string& path) const {
         return;
     }
     const uint64_t size = static_cast<uint64_t>(st.st_size);
-    if (stream < STREAM_COUNT && is_log_name(fs::path(path).filename())) {
+    if (stream < CHANNEL_COUNT && is_log_name(fs::path(path).filename())) {
         ledger::file_removed(path, stream);
     }
     const bool card = path.compare(0, m_root.size() + 6, m_root + "/card/") == 0;
@@ -315,13 +322,33 @@ void Media::make_something(uint64_t what, Chance chance) {
     }
 }
 
+void Media::install_image(uint64_t number, uint64_t how) {
+    enum { GOOD, SHORT, FOREIGN, GONE };
+    std::vector<uint8_t> bytes = SimModemImage(IMAGE_SIZE, static_cast<uint32_t>(number)).bytes();
+    g_state->image = how % 4 == GOOD ? static_cast<uint32_t>(number) : 0;
+    if (how % 4 == SHORT) {
+        bytes.resize(number % bytes.size());
+    } else if (how % 4 == FOREIGN) {
+        bytes[number % 16] ^= 0x20;
+    }
+    const std::string path = m_root + "/image/w_modem";
+    unlink(path.c_str());
+    if (how % 4 != GONE) {
+        std::ofstream(path, std::ios::binary)
+            .write(reinterpret_cast<const char*>(bytes.data()),
+                   static_cast<std::streamsize>(bytes.size()));
+    }
+}
+
 // ---- Checks
 
 void Media::check_bytes() const {
     uint64_t there[STREAM_COUNT] = {};
     for (const std::string& tree : trees()) {
         for (const LogFileSeen& log : look_at(tree).logs) {
-            there[log.stream] += ledger::stream_bytes(log.path, log.stream);
+            for (unsigned stream : ledger::streams_in(log.stream)) {
+                there[stream] += ledger::stream_bytes(log.path, stream);
+            }
         }
     }
     for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
@@ -331,11 +358,35 @@ void Media::check_bytes() const {
         const uint64_t difference =
             there[stream] > expected ? there[stream] - expected : expected - there[stream];
         if (difference > 3 * s.cuts) {
-            fail_run("media", "%s: %llu bytes on the media, %llu written and %llu of them deleted",
-                     CP_NAMES[stream], static_cast<unsigned long long>(there[stream]),
+            fail_run("media",
+                     "stream %u: %llu bytes on the media, %llu written and %llu of them deleted",
+                     stream, static_cast<unsigned long long>(there[stream]),
                      static_cast<unsigned long long>(s.stored),
                      static_cast<unsigned long long>(s.removed));
         }
+    }
+}
+
+void Media::check_libraries(bool in_use) const {
+    bool found = false;
+    const SimModemImage image(IMAGE_SIZE, g_state->image);
+    for (const std::string& tree : trees()) {
+        const std::vector<uint8_t> library = content_of(tree + "/modem_db.gz");
+        const std::vector<uint8_t> digest = content_of(tree + "/sha1.txt");
+        std::string hex;
+        for (uint8_t byte : sha1(library.data(), library.size())) {
+            char digits[3];
+            snprintf(digits, sizeof(digits), "%02X", byte);
+            hex += digits;
+        }
+        if (!library.empty() && digest.size() == hex.size() &&
+            memcmp(digest.data(), hex.data(), hex.size()) != 0) {
+            fail_run("library", "the digest in %s is not the library's", tree.c_str());
+        }
+        found = found || image.saved_in(tree);
+    }
+    if (in_use && g_state->image && !found) {
+        fail_run("library", "no medium has that of the image");
     }
 }
 

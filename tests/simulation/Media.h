@@ -49,6 +49,8 @@ public:
 
     // Somebody else's hands. False when there was nothing to delete.
     bool remove_something(uint64_t what, Chance chance);
+    // The modem's firmware image becomes another one, or a broken one.
+    void install_image(uint64_t number, uint64_t how);
     void make_something(uint64_t what, Chance chance);
     // rm -fr, also of a pattern at the end. Log files that go are booked.
     void remove_all(const std::string& path);
@@ -59,8 +61,10 @@ public:
     // Compares the bytes that were written with those that are there, on every card, and the
     // names with their rules.
     void check_bytes() const;
+    // A digest beside a parsing library is its own. in_use: one medium has that of the image.
+    void check_libraries(bool in_use) const;
     void check_names() const;
-    // The stream whose directory this is part of, or STREAM_COUNT.
+    // The stream whose directory this is part of, or CHANNEL_COUNT.
     static unsigned stream_of(const std::string& path);
     static bool is_capture_name(const std::string& name);
     static bool is_log_name(const std::string& name);

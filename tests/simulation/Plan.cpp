@@ -15,10 +15,11 @@
 namespace {
 
 const char* const NAMES[EV_KIND_COUNT] = {
-    "feed",   "device-fails", "device-gone", "device-back", "card-out", "card-in", "card-ro",
-    "full",   "room",         "delete",      "stranger",    "clock",    "zone",    "request",
-    "pieces", "flood",        "leave",       "supervisor",  "time",     "diag",    "property",
-    "iq",     "fault",        "no-fault",    "kill",        "calm",     "check"};
+    "feed",    "device-fails", "device-gone", "device-back", "card-out", "card-in",
+    "card-ro", "full",         "room",        "delete",      "stranger", "clock",
+    "zone",    "request",      "pieces",      "flood",       "leave",    "supervisor",
+    "time",    "diag",         "property",    "iq",          "image",    "kest-conf",
+    "option",  "fault",        "no-fault",    "kill",        "calm",     "check"};
 
 struct Weight {
     EventKind kind;
@@ -38,6 +39,8 @@ const Weight WEIGHTS[] = {
     {EV_PROPERTY, 10, WEATHER_FAIR},
     {EV_CHECK, 20, WEATHER_FAIR},
     {EV_IQ, 25, WEATHER_FAIR},
+    {EV_IMAGE, 8, WEATHER_FAIR},
+    {EV_KEST_CONF, 8, WEATHER_FAIR},
     {EV_DEVICE_FAILS, 6, WEATHER_OUTSIDE},
     {EV_DEVICE_GONE, 6, WEATHER_OUTSIDE},
     {EV_DEVICE_BACK, 12, WEATHER_OUTSIDE},
@@ -54,6 +57,7 @@ const Weight WEIGHTS[] = {
     {EV_NO_FAULTS, 15, WEATHER_FAULTS},
     {EV_CALM, 8, WEATHER_FAULTS},
     {EV_KILL, 10, WEATHER_STORM},
+    {EV_OPTION, 3, WEATHER_STORM},
 };
 
 bool is_request(EventKind kind) {
@@ -143,6 +147,9 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
     switch (event.kind) {
         case EV_FEED:
             event.a %= STREAM_COUNT;
+            if (event.a == ST_DUMP && !chance.one_in(4)) {
+                event.a = ST_DSP;  // the DSP seldom crashes
+            }
             event.b = feed_size(chance);
             break;
         case EV_DEVICE_FAILS:
@@ -169,6 +176,14 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
         case EV_SUPERVISOR:
             event.a %= 2;
             event.b = chance.one_in(2) ? uint64_t{SUP_ALIVE} : chance.below(SUP_COUNT);
+            break;
+        case EV_IMAGE:
+            event.a = 1 + chance.below(100);
+            event.b = chance.below(8) < 4 ? 0 : chance.below(4);
+            break;
+        case EV_KEST_CONF:
+            event.a =
+                chance.one_in(3) ? chance.below(8) : uint64_t{KEST_ON | KEST_MODEM | KEST_WCN};
             break;
         case EV_IQ:
             event.b = iq_size(chance);
@@ -202,18 +217,22 @@ Plan make_plan(uint64_t seed, Weather weather, size_t events) {
         plan.push_back(make_event(now, weather, chance));
     }
     // Now and then so much that the quota of the card has to be kept in the calm.
+    if (seed % 5 == 0) {
+        plan.insert(plan.begin(), {0, EV_OPTION, 1, 0});
+    }
     append_end(plan, now, seed % 16 < WEATHER_COUNT ? 20 : 3);
     return plan;
 }
 
 void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     static const char* const REQUESTS[] = {
-        "DISABLE_LOG WCDMA",   "ENABLE_IQ WCDMA WCDMA", "ENABLE_LOG_OVERWRITE",
-        "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12", "SET_SD_MAX_SIZE 14",
-        "ENABLE_LOG WCDMA",    "ENABLE_LOG WCN",        "ENABLE_LOG GNSS",
-        "ENABLE_LOG AG-DSP",
+        "DISABLE_LOG WCDMA",    "DISABLE_LOG AG-DSP",  "ENABLE_IQ WCDMA WCDMA",
+        "ENABLE_LOG_OVERWRITE", "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12",
+        "SET_SD_MAX_SIZE 14",   "ENABLE_LOG WCDMA",    "ENABLE_LOG WCN",
+        "ENABLE_LOG GNSS",      "ENABLE_LOG AG-DSP",
     };
     plan.push_back({at_ms, EV_CALM, 0, 0});
+    plan.push_back({at_ms, EV_IMAGE, 200 + at_ms % 100, 0});
     // By then the supervisors are connected again.
     uint64_t now = at_ms + 60000;
     plan.push_back({now, EV_SUPERVISOR, 0, SUP_ALIVE});
@@ -237,7 +256,10 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
         }
         now += 5000;
     }
-    plan.push_back({now, EV_REQUEST, 0, Clients::request_named("FLUSH")});
+    // The parsing library comes with a start, if the log root is there by then.
+    for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA", "FLUSH"}) {
+        plan.push_back({now, EV_REQUEST, 0, Clients::request_named(request)});
+    }
     plan.push_back({now + 1000, EV_CHECK, 2, 0});
 }
 

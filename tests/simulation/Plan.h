@@ -33,6 +33,9 @@ enum EventKind {
     EV_DIAG,            // a: stream, b: how its diag device answers
     EV_PROPERTY,        // a: which, b: value
     EV_IQ,              // an I/Q buffer is filled; a: place and pace of its saving, b: bytes
+    EV_IMAGE,           // the modem's firmware image changes; a: its number, b: what it is like
+    EV_KEST_CONF,       // a: what the other service's file says from now on (KestConf)
+    EV_OPTION,          // a: from the next start on, with the option -s or without it
     EV_FAULT,           // a: call and place, b: error, skipped calls and failing ones
     EV_NO_FAULTS,       // calls do not fail any more
     EV_KILL,            // a: so many calls from now

@@ -48,6 +48,12 @@ void live(const std::string& root, const Plan& plan) {
     umask(0);
     alarm(MAX_SECONDS);
     signal(SIGPIPE, SIG_IGN);
+    // An option in front of all else holds from the first start on.
+    for (; g_state->next_event < plan.size() && plan[g_state->next_event].kind == EV_OPTION;
+         ++g_state->next_event) {
+        g_state->next_layout = plan[g_state->next_event].a % 2;
+    }
+    g_state->kest_layout = g_state->next_layout;
     World world(root, plan);
     set_world(&world);
     trace("life %u", g_state->lives);
@@ -55,11 +61,13 @@ void live(const std::string& root, const Plan& plan) {
         auto controller = std::make_unique<LogController>();
         world.attach(controller.get());
         char name[] = "kestmodem";
-        char* argv[] = {name, nullptr};
+        char option[] = "-s";
+        char* argv[] = {name, g_state->kest_layout ? option : nullptr, nullptr};
         g_state->starting = true;
         g_inside = true;
         LogConfig config(system_path(PATH_CONFIG_FILE).string());
-        if (config.read_config(1, argv) < 0 || controller->init(&config) < 0) {
+        if (config.read_config(g_state->kest_layout ? 2 : 1, argv) < 0 ||
+            controller->init(&config) < 0) {
             g_inside = false;
             if (!g_state->fault_in_step && !g_state->fault_seen) {
                 fail_run("start", "the service does not start");

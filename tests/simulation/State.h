@@ -8,7 +8,17 @@
 #include <stddef.h>
 #include <stdint.h>
 
-enum StreamId : unsigned { ST_WCDMA, ST_WCN, ST_GNSS, ST_DSP, STREAM_COUNT };
+// The log streams, one a channel, and what else goes into the log of the audio DSP.
+enum StreamId : unsigned {
+    ST_WCDMA,
+    ST_WCN,
+    ST_GNSS,
+    ST_DSP,
+    CHANNEL_COUNT,
+    ST_PCM = CHANNEL_COUNT,
+    ST_DUMP,
+    STREAM_COUNT
+};
 enum MediumId : unsigned { MED_DATA, MED_CARD, MEDIUM_COUNT };
 
 // The settings that clients can ask for, as they were set last.
@@ -47,6 +57,8 @@ struct StreamState {
     uint8_t answers;  // how the diag device answers
 };
 
+enum KestConf : uint32_t { KEST_ON = 1, KEST_MODEM = 2, KEST_WCN = 4 };
+
 struct FaultRule {
     bool active;
     uint8_t call;
@@ -65,7 +77,7 @@ struct IqState {
     uint32_t offset;
     uint32_t len;
     uint32_t saved;
-    int command;  // the loop's last one to the thread
+    uint32_t stops;  // that the loop asked for and the thread has not answered
 };
 
 constexpr size_t MAX_FAULTS = 8;
@@ -98,6 +110,11 @@ struct State {
 
     StreamState streams[STREAM_COUNT];
     IqState iq;
+    bool dump_unconfirmed;  // read from the DSP's dump device, which was not told so
+    uint32_t image;         // number of the modem's firmware image; 0: none, or a broken one
+    uint32_t kest_conf;     // which streams the other service's file switches on
+    bool kest_layout;       // the service runs with the option -s
+    bool next_layout;       // and does so from the next start on
     bool card_in;
     bool card_read_only;
     uint32_t card;                // number of the card in the slot, or of the last one

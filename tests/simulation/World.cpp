@@ -37,6 +37,7 @@ World::World(const std::string& root, const Plan& plan)
     setenv("TZ", ZONES[g_state->zone], 1);
     tzset();
     write_props();
+    write_kest_conf();
     g_state->pass_calls = g_state->counters.calls;
 }
 
@@ -149,6 +150,7 @@ void World::no_setting_is_certain() {
 
 // What was being changed may or may not be in the settings file.
 void World::service_dies() {
+    g_state->dump_unconfirmed = false;
     m_clients.mark_uncertain();
     if (g_state->save_failed || !m_clients.quiet()) {
         no_setting_is_certain();

@@ -50,6 +50,7 @@ public:
     void file_opened(const char* path, Place place, FdInfo& info, int fd) const;
     int open_device(const char* path);
     void service_read(const FdInfo& info, const uint8_t* data, size_t len);
+    void dump_confirmed(int fd);
     void reading_failed() { m_last_stream = STREAM_COUNT; }
     void service_deletes(const char* path, Place place) const;
     int remove_by_shell(const char* command);
@@ -81,6 +82,7 @@ private:
     void check_quota() const;
     void spins(const struct pollfd* fds, nfds_t count) const;
     void write_props() const;
+    void write_kest_conf() const;
     static void no_setting_is_certain();
     bool refusal_is_due();
 

@@ -14,7 +14,7 @@ namespace {
 
 // So long after everything was put in order the service has found out.
 constexpr int64_t CALM_AFTER_NS = int64_t{65} * 1000000000;
-const CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN, CT_GNSS, CT_AGDSP};
+const CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN, CT_GNSS, CT_AGDSP, CT_AGDSP, CT_AGDSP};
 
 }  // namespace
 
@@ -23,7 +23,7 @@ Place World::place_of(const char* path) const {
         return Devices::is_device(path) ? PLACE_DEVICE : PLACE_OTHER;
     }
     const std::string rest = path + m_root.size();
-    if (rest.compare(0, 15, "/data/modem_log") == 0) {
+    if (rest.compare(0, 15, "/data/modem_log") == 0 || rest.compare(0, 10, "/data/kest") == 0) {
         return PLACE_DATA;
     }
     if (rest.compare(0, 5, "/card") == 0) {
@@ -52,7 +52,7 @@ void World::file_opened(const char* path, Place place, FdInfo& info, int fd) con
     if (fstat(fd, &st) == 0) {
         info.inode = st.st_ino;
     }
-    if (Media::is_log_name(name) && info.stream < STREAM_COUNT) {
+    if (Media::is_log_name(name) && info.stream < CHANNEL_COUNT) {
         info.cls = FD_LOG_FILE;
     } else if (Media::is_capture_name(name)) {
         info.cls = FD_IQ_FILE;
@@ -74,6 +74,7 @@ void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len
         return;
     }
     m_last_stream = info.stream;
+    g_state->dump_unconfirmed = g_state->dump_unconfirmed || info.stream == ST_DUMP;
     const LogPipeHandler* const channel = m_controller->get_cp(STREAM_TYPES[info.stream]);
     const bool exchange = channel && channel->state() != CWS_WORKING;
     const size_t logged = m_devices.log_bytes(info.stream, len);
@@ -93,6 +94,16 @@ void World::service_deletes(const char* path, Place place) const {
     if (place == PLACE_DATA || place == PLACE_CARD) {
         m_media.book_removal(path);
     }
+}
+
+// All of a dump is read, unless something is in the way.
+void World::dump_confirmed(int fd) {
+    const StreamState& s = g_state->streams[ST_DUMP];
+    if (s.fed != s.consumed && !g_fds[fd].failed && !g_state->fault_in_step && !refusal_is_due()) {
+        fail_run("dump", "taken, with %llu bytes unread",
+                 static_cast<unsigned long long>(s.fed - s.consumed));
+    }
+    m_devices.dump_confirmed(fd);
 }
 
 int World::remove_by_shell(const char* command) {
@@ -149,8 +160,8 @@ void World::message(const std::string& text) {
     if (text.find("save config") != std::string::npos) {
         g_state->save_failed = true;
     }
-    if (text.find("save log error") == std::string::npos &&
-        text.find("bytes lost") == std::string::npos) {
+    const auto says = [&text](const char* words) { return text.find(words) != std::string::npos; };
+    if (!says("save log error") && !says("bytes lost") && !says("DSP dump error")) {
         return;
     }
     if (m_last_stream == STREAM_COUNT) {

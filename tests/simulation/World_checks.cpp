@@ -18,6 +18,10 @@ void World::check(bool last) {
     }
     ++g_state->counters.checks;
     m_clients.check_waiting();
+    if (g_state->dump_unconfirmed) {
+        fail_run("dump", "what was read of the DSP's memory is not confirmed");
+    }
+    m_media.check_libraries(last && g_state->streams[ST_WCDMA].logged.value);
     check_descriptors();
     check_totals();
     check_settings();
@@ -84,7 +88,7 @@ void World::check_descriptors() const {
         }
     }
     const unsigned most[FD_CLASS_COUNT] = {
-        MAX_FDS, STREAM_COUNT, 1, 2, STREAM_COUNT, 3, 0, 1, 3, 2, 0, 1, 1, 2};
+        MAX_FDS, STREAM_COUNT, 1, CHANNEL_COUNT, 3, 0, 1, 3, 2, 0, 1, 1, 2};
     for (unsigned cls = FD_LOG_DEVICE; cls < FD_CLASS_COUNT; ++cls) {
         if (count[cls] > most[cls]) {
             fail_run("leak", "%u descriptors of class %u", count[cls], cls);

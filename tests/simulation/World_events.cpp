@@ -93,6 +93,18 @@ void World::act(const Event& event) {
             }
             write_props();
             break;
+        case EV_IMAGE:
+            m_media.install_image(event.a, event.b);
+            break;
+        case EV_KEST_CONF:
+            if (m_clients.quiet()) {  // a reload on its way might see either
+                state.kest_conf = static_cast<uint32_t>(event.a);
+                write_kest_conf();
+            }
+            break;
+        case EV_OPTION:
+            state.next_layout = event.a % 2;
+            break;
         case EV_IQ:
             m_thread.set_pace(event.a);
             m_iq.fill(event.a, event.b);

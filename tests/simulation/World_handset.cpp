@@ -38,12 +38,10 @@ void make_dirs(const std::string& path) {
 
 void World::make_handset(const std::string& root) {
     for (const char* dir : {"/data/local/tmp/kestmodem", "/data/local/tmp/kest", "/system/etc",
-                            "/card", "/cards", "/proc/cpw", "/d/dipx"}) {
+                            "/card", "/cards", "/image", "/proc/cpw", "/d/dipx"}) {
         make_dirs(root + dir);
     }
     make_file(root + "/system/etc/kest_modem.conf", CONFIG);
-    make_file(root + "/data/local/tmp/kest/kest.conf",
-              "enable\nstream\tMODEM\ton\t1\t1\nstream\tWCN\ton\t1\t1\n");
     make_file(root + "/proc/cpw/mem", std::string(200000, 'm'));
     make_file(root + "/proc/cpw/mini_dump", std::string(3000, 'd'));
     for (const char* record : {"smsg", "sbuf", "sblock"}) {
@@ -53,6 +51,7 @@ void World::make_handset(const std::string& root) {
     state.boot_ns = START_NS;
     state.wall_ns = int64_t{1700000000} * 1000000000;
     state.card_in = true;
+    state.kest_conf = KEST_ON | KEST_MODEM | KEST_WCN;
     state.room[MED_DATA] = state.room[MED_CARD] = UINT64_MAX;
     const unsigned values[SETTING_COUNT] = {1, 12, 20, 1, 0};
     for (unsigned i = 0; i < SETTING_COUNT; ++i) {
@@ -61,6 +60,14 @@ void World::make_handset(const std::string& root) {
     for (StreamState& stream : state.streams) {
         stream.logged.value = 1;
     }
+}
+
+void World::write_kest_conf() const {
+    const uint32_t conf = g_state->kest_conf;
+    make_file(m_root + "/data/local/tmp/kest/kest.conf",
+              std::string(conf & KEST_ON ? "enable\n" : "disable\n") + "stream\tcp_wcdma\t" +
+                  (conf & KEST_MODEM ? "on" : "off") + "\t1\t1\nstream\tcp_wcn\t" +
+                  (conf & KEST_WCN ? "on" : "off") + "\t1\t1\nstream\tnobody\ton\n");
 }
 
 void World::write_props() const {
@@ -74,6 +81,7 @@ void World::write_props() const {
         "ro.modem.wcn.diag=/sim/wcn\n"
         "ro.modem.gnss.diag=/sim/gnss\n";
     text += std::string("init.svc.fuse_sdcard0=") + (mounted ? "running\n" : "stopped\n");
+    text += "ro.product.partitionpath=" + m_root + "/image/\npersist.modem.w.nvp=w_\n";
     text += "gsm.version.baseband=version" + std::to_string(state.version) + "\n";
     text += "persist.sys.vexa.modemreset=" + std::to_string(state.cp_reset[0]) + "\n";
     text += "persist.sys.vexa.wcnreset=" + std::to_string(state.cp_reset[1]) + "\n";
