@@ -29,7 +29,7 @@ Plan read_plan(const std::filesystem::path& path) {
 }
 
 TEST(Simulation, ASeedRepeatsExactlyAlsoWithKillsAndTwoThreads) {
-    const Plan plan = make_plan(3, WEATHER_STORM, 300);
+    const Plan plan = make_plan(11, WEATHER_STORM, 300);
     const RunResult first = run_plan(plan);
     const RunResult second = run_plan(plan);
     EXPECT_GT(first.counters.kills, 0u);
