@@ -4,8 +4,6 @@
 
 #include <limits.h>
 
-#include <algorithm>
-
 #include "core/list_find.h"
 #include "core/log.h"
 
@@ -127,8 +125,7 @@ int TimerManager::get_timeout(int* ms) {
         return -1;
     }
     const struct timespec& due = (*m_timers.begin())->due;
-    // Within the last millisecond the loop must not ask again and again until it is over.
-    const int64_t left = is_earlier(now, due) ? std::max<int64_t>(diff_ms(due, now), 1) : 0;
+    const int64_t left = is_earlier(now, due) ? diff_ms(due, now) : 0;
     *ms = left > INT_MAX ? INT_MAX : static_cast<int>(left);
     return 0;
 }
