@@ -143,12 +143,14 @@ bool is_unfinished_copy(const char* path, const char* default_path) {
 }
 
 void copy_default_settings(const char* default_path, const char* path) {
+    const bool was_empty = is_empty(path);
     if (copy_file(default_path, path) == 0) {
         return;
     }
     // What could not be opened for the copy is not the copy's to delete.
     const int error = errno;
-    if ((is_empty(path) || is_cut_default(path, default_path, 1)) && unlink(path) == 0) {
+    const bool emptied = !was_empty && is_empty(path);
+    if ((emptied || is_cut_default(path, default_path, 1)) && unlink(path) == 0) {
         errno = error;
         err_log("incomplete copy %s deleted", path);
     }

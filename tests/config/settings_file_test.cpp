@@ -95,6 +95,14 @@ TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
     EXPECT_TRUE(refused("2"));
     EXPECT_FALSE(root.exists("kest_modem.conf"));
     faults::reset();
+    // An empty file that was there before is no copy, though it could not be opened at first.
+    root.write_file("kest_modem.conf", "");
+    unlink(root.path("system/etc/kest_modem.conf").c_str());
+    faults::only_on(file.c_str());
+    faults::fail(faults::OPEN, 1, EMFILE, 2);
+    LogConfig config(file.c_str());
+    EXPECT_EQ(read(config), 0);
+    EXPECT_TRUE(root.exists("kest_modem.conf"));
 }
 
 }  // namespace
