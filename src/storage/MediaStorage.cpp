@@ -72,17 +72,19 @@ int MediaStorage::scan_sets() {
             found.push_back(std::move(set));
         }
     });
+    // One that is listed already (it was started before the medium was scanned) stays as it is.
+    // The list is not in order where the clock was set back between two sets.
+    found.erase(std::remove_if(found.begin(), found.end(),
+                               [this](const auto& set) {
+                                   return find_named(m_sets, &CpSetDirectory::path, set->path());
+                               }),
+                found.end());
     // Ascending order: each insertion finds its place at the end of the list at once.
     std::sort(found.begin(), found.end(), [](const auto& a, const auto& b) {
         return strcmp(a->path().string(), b->path().string()) < 0;
     });
-    // One that is listed already (it was started before the medium was scanned) stays as it is.
-    // The list is not in order where the clock was set back between two sets.
-    const bool some_listed = !m_sets.empty();
     for (std::unique_ptr<CpSetDirectory>& set : found) {
-        if (!some_listed || !find_named(m_sets, &CpSetDirectory::path, set->path())) {
-            insert_scanned(std::move(set));
-        }
+        insert_scanned(std::move(set));
     }
     return result;
 }
