@@ -217,6 +217,23 @@ TEST_F(KestctlTest, WatchPrintsAtOnceUntilInterrupted) {
         << out();
 }
 
+TEST_F(KestctlTest, WatchRunsACommandForEachEventInTheirOrder) {
+    // The text of the service reaches the command as its parameters, not as a command.
+    const std::string action = m_root.path("action"), said = m_root.path("said");
+    m_root.write_file("action", "#!/bin/sh\necho \"$#/$1/$2\" >>" + said + "\n[ \"$2\" = WCN ]\n");
+    ASSERT_EQ(chmod(action.c_str(), 0700), 0);
+    const Strings replies = {"OK\nCP_DUMP_START $(id); `id`\nCP_DUMP_END WCN\n"};
+    EXPECT_EQ(exchange("watch wcn --time --exec " + action, replies), 4);
+    EXPECT_EQ(m_root.read_file("said"), "2/CP_DUMP_START/$(id); `id`\n2/CP_DUMP_END/WCN\n");
+    EXPECT_EQ(err().find("kestctl: " + action + ": exit status 1\nkestctl: the service closed"), 0u)
+        << err();
+    struct tm time;
+    const char* const rest = strptime(out().c_str(), "%Y-%m-%dT%H:%M:%S%z", &time);
+    EXPECT_TRUE(rest && strncmp(rest, " CP_DUMP_START $(id)", 20) == 0) << out();
+    EXPECT_EQ(exchange("watch wcn --exec /nowhere", replies), 4);
+    EXPECT_NE(err().find("/nowhere: No such file"), std::string::npos) << err();
+}
+
 TEST_F(KestctlTest, StatusAndValuesForPeopleAndAsJson) {
     Strings replies(8, "OK ON\n");
     for (const char* value : {"10", "512", "0", "ENABLE", "INTERNAL"}) {
@@ -276,7 +293,8 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
         "flush now|enable-log|enable-log WCN CP|enable-log wcn WCN|"
         "enable-log WCDMA TD TDD-LTE FDD-LTE 5MODE WCN|get-log-state WCN TD|get-log-state WC|"
         "set-log-file-size|set-log-file-size 10MB|set-sd-max-size -1|set-sd-max-size 4294967296|"
-        "set-sd-max-size +1|set-md-stor-pos sd|enable-iq WCDMA GSM|enable-iq|raw";
+        "set-sd-max-size +1|flush --time|watch --exec= wcn|set-md-stor-pos sd|enable-iq WCDMA "
+        "GSM|enable-iq|raw";
     for (const std::string& args : split(wrong, '|')) {
         cases.push_back(split(args, ' '));
     }

@@ -12,8 +12,7 @@
 #include "client/RequestTable.h"
 #include "common/CommandLine.h"
 
-class ControlConnection;
-class Output;
+struct Session;
 
 // What one parameter may be.
 enum ParamKind : int {
@@ -40,7 +39,7 @@ struct Command {
     ReplyKind reply;
     // Gets the open connection and the parameters in the service's spelling. Prints the
     // result or what failed, and returns the exit status.
-    int (*run)(const Command&, const Args&, ControlConnection&, const Output&);
+    int (*run)(const Command&, const Args&, Session&);
     const char* help;  // one line
 
     std::string usage() const { return *params->usage ? name + " " + params->usage : name; }

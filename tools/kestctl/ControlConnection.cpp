@@ -41,7 +41,7 @@ int ControlConnection::open(double timeout) {
     m_waits_in_queue = true;
     for (;;) {
         m_fd = socket_local_client(SOCKET_CONTROL, ANDROID_SOCKET_NAMESPACE_ABSTRACT,
-                                   SOCK_STREAM | SOCK_NONBLOCK);
+                                   SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC);
         if (m_fd >= 0) {
             return ES_OK;
         }

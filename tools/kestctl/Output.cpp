@@ -3,6 +3,7 @@
 #include "kestctl/Output.h"
 
 #include <stdio.h>
+#include <time.h>
 
 #include <algorithm>
 
@@ -18,6 +19,16 @@ void print(const std::string& line) {
 
 std::string json_value(const std::string& value) {
     return is_number(value) ? value : json_string(value);
+}
+
+// "2026-03-01T09:15:00+0100"
+std::string time_now() {
+    const time_t now = time(nullptr);
+    struct tm local = {};
+    localtime_r(&now, &local);
+    char text[sizeof("2026-03-01T09:15:00+0100") + 16];
+    strftime(text, sizeof(text), "%FT%T%z", &local);
+    return text;
 }
 
 void print_rows(const char* prefix, const Output::Table& table) {
@@ -47,9 +58,15 @@ void Output::value(const std::string& value) const {
 }
 
 void Output::notification(const Notification& notification) const {
-    const std::string event = notification.start ? "DUMP_START" : "DUMP_END";
-    print(m_json ? "{\"event\":\"" + event + "\",\"cp\":" + json_string(notification.cp) + "}"
-                 : "CP_" + event + " " + escape_text(notification.cp));
+    const std::string time = m_timed ? time_now() : "";
+    if (!m_json) {
+        print((m_timed ? time + " " : "") + notification.event() + " " +
+              escape_text(notification.cp));
+        return;
+    }
+    const char* const event = notification.start ? "DUMP_START" : "DUMP_END";
+    print(std::string("{\"event\":\"") + event + "\",\"cp\":" + json_string(notification.cp) +
+          (m_timed ? ",\"time\":" + json_string(time) : "") + "}");
 }
 
 void Output::status(const Table& settings, const Table& logs, const Table& iqs) const {

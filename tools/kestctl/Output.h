@@ -13,7 +13,8 @@
 
 class Output {
 public:
-    explicit Output(bool json) : m_json(json) {}
+    // timed: notifications begin with the local time.
+    Output(bool json, bool timed) : m_json(json), m_timed(timed) {}
 
     // For a request without a result.
     void ok() const;
@@ -35,6 +36,7 @@ public:
 
 private:
     bool m_json;
+    bool m_timed;
 };
 
 #endif  // KESTCTL_OUTPUT_H_

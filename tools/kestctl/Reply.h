@@ -18,6 +18,9 @@ bool parse_reply(const std::string& line, Reply* reply);
 struct Notification {
     bool start = false;
     std::string cp;
+
+    // As the service spells it.
+    const char* event() const { return start ? "CP_DUMP_START" : "CP_DUMP_END"; }
 };
 
 bool parse_notification(const std::string& line, Notification* notification);

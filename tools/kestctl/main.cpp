@@ -6,9 +6,8 @@
 
 #include "common/CommandLine.h"
 #include "kestctl/Commands.h"
-#include "kestctl/ControlConnection.h"
 #include "kestctl/ExitStatus.h"
-#include "kestctl/Output.h"
+#include "kestctl/Session.h"
 
 namespace {
 
@@ -48,7 +47,9 @@ Syntax make_syntax() {
         "command [parameters]",
         "Controls the running service kestmodem.",
         {{"json", nullptr, nullptr, "print results and errors as JSON, one object per line"},
-         {"timeout", "SECONDS", nullptr, "wait that long (default 10, save-* 60; 0: no limit)"}},
+         {"timeout", "SECONDS", nullptr, "wait that long (default 10, save-* 60; 0: no limit)"},
+         {"time", nullptr, "watch", "print the time of each notification"},
+         {"exec", "COMMAND", "watch", "run COMMAND with each notification's two words"}},
         {},
         help_notes(),
         next_words,
@@ -73,13 +74,15 @@ int run(const CommandLine& line) {
     if (line.has("timeout") && !parse_timeout(seconds, &timeout)) {
         return line.usage_error("'" + seconds + "' is not a number of seconds up to 86400");
     }
-    const Output output(line.has("json"));
-    ControlConnection connection;
-    const int status = connection.open(timeout);
-    if (status != ES_OK) {
-        return output.failure(status, connection.failure());
+    if (line.has("exec") && line.value("exec", "").empty()) {
+        return line.usage_error("--exec needs a command");
     }
-    return command.run(command, args, connection, output);
+    Session session(Output(line.has("json"), line.has("time")), line.value("exec", ""));
+    const int status = session.connection.open(timeout);
+    if (status != ES_OK) {
+        return session.output.failure(status, session.connection.failure());
+    }
+    return command.run(command, args, session);
 }
 
 }  // namespace
