@@ -102,6 +102,42 @@ TEST_F(KestlogTest, AGoodTreeIsFineFromEveryDirectoryOfIt) {
     EXPECT_EQ(run("ls nowhere"), 2);
 }
 
+// A handset's root with both media, logs of the internal one from 09:00 to 09:20.
+TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
+    write("handset/data/" + MODEM + "1-cp_wcdma-2016-03-01_09-00-00.log", TIME_RECORD);
+    write("handset/data/" + MODEM_LOG, TIME_RECORD);
+    write("handset/data/" + MODEM + "cp_wcdma_memory_2016-03-01_09-20-00.mem", "x");
+    write("handset/storage/sdcard0/modem_log/2016-03-01-08-00-00/cp_wcn/cp_wcn.version", "x");
+    write("usb/kest/" + WCN + "0-cp_wcn-2016-02-29_23-59-59.log", "x");
+    const struct {
+        std::string args;
+        std::vector<std::string> media;
+        std::string files;
+    } CASES[] = {
+        {"handset", {"card", "internal"}, "4 files"},
+        {"--card usb handset", {"card", "internal"}, "4 files"},
+        {"handset usb", {"card", "internal", "usb"}, "5 files"},
+        {"handset/data handset handset/data/modem_log", {"handset card", "data"}, "4 files"},
+        {"handset --since 09:15:01", {"card", "internal"}, "2 files"},
+        {"handset --since 09:15 --until '2016-03-01 09:16'", {"card", "internal"}, "3 files"},
+        {"handset --until 2016-02-29", {"card", "internal"}, "1 files"},
+        {"handset --since -10m --until -5m", {"card", "internal"}, "3 files"},
+    };
+    for (const auto& c : CASES) {
+        EXPECT_EQ(run("ls --json " + c.args), 0) << m_err;
+        size_t at = 0;
+        for (const std::string& medium : c.media) {
+            at = m_out.find("\"medium\":\"" + medium + "\",\"cps\":", at);
+            EXPECT_NE(at, std::string::npos) << c.args << " " << medium << "\n" << m_out;
+        }
+        EXPECT_EQ(run("verify " + c.args), 0) << m_err;
+        EXPECT_TRUE(said(c.files + " checked, 0 damages, 0 notes")) << c.args << m_out;
+    }
+    EXPECT_EQ(run("verify handset handset/data/" + MODEM + " nowhere"), 2);
+    EXPECT_TRUE(said("4 files"));
+    EXPECT_EQ(run("ls --since noon handset"), 1);
+}
+
 TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
     const std::string good = THREE_CHUNKS;
     const struct {
@@ -278,14 +314,14 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
 }
 
 TEST_F(KestlogTest, WrongUsageAndHelp) {
-    for (const char* args :
-         {"", "fly", "ls", "ls a b", "ls ''", "--fly ls x", "ls --force x", "info --output d x"}) {
+    for (const char* args : {"", "fly", "ls", "info a b", "ls ''", "--fly ls x", "ls --force x",
+                             "info --output d x"}) {
         EXPECT_EQ(run(args), 1) << args;
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
     }
     EXPECT_EQ(run("--help"), 0);
     for (const char* line :
-         {"\n  ls ROOT ", "\n  info FILE ", "\n  split FILE ", "split: replace"}) {
+         {"\n  ls ROOT... ", "\n  info FILE ", "\n  split FILE ", "split: replace"}) {
         EXPECT_TRUE(said(line)) << line;
     }
     EXPECT_EQ(run("vrify ."), 1);

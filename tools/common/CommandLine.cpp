@@ -9,6 +9,7 @@
 #include <strings.h>
 
 #include <algorithm>
+#include <sstream>
 
 #include "common/text.h"
 
@@ -18,7 +19,7 @@ namespace {
 // completion scripts only, so --help does not list it.
 constexpr char COMPLETE_OPTION[] = "--complete";
 
-constexpr Option HELP = {"help", nullptr, nullptr, "print this text"};
+constexpr Option HELP = {"help", nullptr, nullptr, "print this text", 'h'};
 constexpr Option VERSION = {"version", nullptr, nullptr, "print the version"};
 
 std::vector<Option> all_options(const Syntax& syntax) {
@@ -29,7 +30,32 @@ std::vector<Option> all_options(const Syntax& syntax) {
 }
 
 std::string option_usage(const Option& option) {
-    return std::string("--") + option.name + (option.param ? std::string(" ") + option.param : "");
+    const std::string letter = option.letter ? std::string("-") + option.letter + ", " : "";
+    return letter + "--" + option.name + (option.param ? std::string(" ") + option.param : "");
+}
+
+Args option_commands(const Option& option) {
+    Args commands;
+    std::istringstream words(option.commands ? option.commands : "");
+    for (std::string word; words >> word;) {
+        commands.push_back(word);
+    }
+    return commands;
+}
+
+bool takes_option(const std::string& command, const Option& option) {
+    const Args commands = option_commands(option);
+    return commands.empty() ||
+           std::find(commands.begin(), commands.end(), command) != commands.end();
+}
+
+// "split, extract", or "" for an option that all take.
+std::string option_owners(const Option& option) {
+    std::string text;
+    for (const std::string& command : option_commands(option)) {
+        text += (text.empty() ? "" : ", ") + command;
+    }
+    return text;
 }
 
 // The number of letters to insert, remove or replace to turn one word into the other.
@@ -72,9 +98,9 @@ bool CommandLine::parse(int argc, char** argv) {
     m_command = name;
     m_params.assign(argv + optind + 1, argv + argc);
     for (const Option& option : m_syntax.options) {
-        if (option.command && has(option.name) && name != option.command) {
-            return end(usage_error(std::string("--") + option.name + " is for " + option.command +
-                                   " only"));
+        if (has(option.name) && !takes_option(name, option)) {
+            return end(usage_error(std::string("--") + option.name + " is for " +
+                                   option_owners(option) + " only"));
         }
     }
     return true;
@@ -84,16 +110,24 @@ bool CommandLine::read_options(int argc, char** argv) {
     const std::vector<Option> options = all_options(m_syntax);
     std::vector<struct option> known;
     known.reserve(options.size() + 1);
+    std::string letters;
     for (const Option& option : options) {
         known.push_back({option.name, option.param ? required_argument : no_argument, nullptr, 0});
+        if (option.letter) {
+            letters += std::string(1, option.letter) + (option.param ? ":" : "");
+        }
     }
     known.push_back({nullptr, 0, nullptr, 0});
     int index = 0;
-    for (int opt; (opt = getopt_long(argc, argv, "h", known.data(), &index)) != -1;) {
+    for (int opt; (opt = getopt_long(argc, argv, letters.c_str(), known.data(), &index)) != -1;) {
         if (opt == '?') {
             return end(usage_error(""));  // getopt_long has printed why
         }
-        const std::string name = opt == 'h' ? HELP.name : options[static_cast<size_t>(index)].name;
+        const auto found = opt == 0
+                               ? options.begin() + index
+                               : std::find_if(options.begin(), options.end(),
+                                              [opt](const Option& o) { return o.letter == opt; });
+        const std::string name = found->name;
         if (name == HELP.name) {
             print_help();
             return end(0);
@@ -172,8 +206,9 @@ void CommandLine::print_help() const {
     printf("usage: %s [options] %s\n%s\n\nOptions:\n", m_syntax.program.c_str(),
            m_syntax.operands.c_str(), m_syntax.purpose.c_str());
     for (const Option& option : options) {
-        printf("  %-*s %s%s%s\n", width, option_usage(option).c_str(),
-               option.command ? option.command : "", option.command ? ": " : "", option.help);
+        const std::string owners = option_owners(option);
+        printf("  %-*s %s%s%s\n", width, option_usage(option).c_str(), owners.c_str(),
+               owners.empty() ? "" : ": ", option.help);
     }
     printf("\nCommands:\n");
     for (const Syntax::Command& command : m_syntax.commands) {
@@ -195,18 +230,19 @@ void CommandLine::print_completions(const Args& words) const {
     Args args;  // the command and its parameters, without options
     for (size_t i = 0; i + 1 < words.size(); ++i) {
         const bool takes_param = std::any_of(options.begin(), options.end(), [&](const Option& o) {
-            return o.param && words[i] == std::string("--") + o.name;
+            return o.param && (words[i] == std::string("--") + o.name ||
+                               (o.letter && words[i] == std::string("-") + o.letter));
         });
         if (takes_param && ++i + 1 == words.size()) {
             return;  // the option's parameter is being typed
         }
-        if (!takes_param && words[i].compare(0, 1, "-") != 0) {
+        if (!takes_param && (words[i] == "-" || words[i].compare(0, 1, "-") != 0)) {
             args.push_back(words[i]);
         }
     }
     if (typed.compare(0, 1, "-") == 0) {
         for (const Option& option : options) {
-            if (!option.command || args.empty() || args[0] == option.command) {
+            if (args.empty() || takes_option(args[0], option)) {
                 offer(std::string("--") + option.name);
             }
         }

@@ -13,9 +13,10 @@ typedef std::vector<std::string> Args;
 
 struct Option {
     const char* name;
-    const char* param;    // null without one
-    const char* command;  // the only one that takes it, or null
+    const char* param;     // null without one
+    const char* commands;  // the only ones that take it, separated by spaces, or null
     const char* help;
+    char letter = 0;  // the short option, or 0
 };
 
 struct Syntax {

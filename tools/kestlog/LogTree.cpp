@@ -15,6 +15,11 @@
 
 namespace {
 
+// Where a handset's root has its card: the mount point that the simulated handset uses, too.
+constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
+constexpr char INTERNAL[] = "internal";
+constexpr char CARD[] = "card";
+
 bool is_dir(const std::string& path) {
     struct stat st;
     return stat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
@@ -40,7 +45,7 @@ bool older(const TreeFile& a, const TreeFile& b) {
 bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
     DIR* dir = opendir(path.c_str());
     if (!dir) {
-        failures.push_back(path + ": " + strerror(errno));
+        failures.push_back(shown(path) + ": " + strerror(errno));
         return false;
     }
     while (const struct dirent* entry = readdir(dir)) {
@@ -49,10 +54,10 @@ bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
             continue;
         }
         if (is_foreign_name(entry->d_name)) {
-            foreign.push_back(path + "/" + entry->d_name);
+            foreign.push_back(shown(path) + "/" + entry->d_name);
         } else if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
             entries->push_back({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
-                                static_cast<uint64_t>(st.st_size)});
+                                static_cast<uint64_t>(st.st_size), st.st_mtime});
         }
     }
     closedir(dir);
@@ -61,22 +66,75 @@ bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
     return true;
 }
 
-bool LogTree::read(const std::string& path) {
+std::string LogTree::shown(const std::string& path) const {
+    const std::string& prefix = m_alias.first;
+    return !prefix.empty() && path.compare(0, prefix.size(), prefix) == 0
+               ? m_alias.second + path.substr(prefix.size())
+               : path;
+}
+
+std::shared_ptr<const TreeDir> LogTree::tree_dir(const std::string& path) const {
+    return std::make_shared<TreeDir>(TreeDir{path + "/", shown(path) + "/"});
+}
+
+bool LogTree::first_visit(const std::string& path) {
+    struct stat st;
+    return stat(path.c_str(), &st) < 0 || m_visited.insert({st.st_dev, st.st_ino}).second;
+}
+
+bool LogTree::add(const std::string& path, Files files) {
+    struct stat st;
+    m_medium = base_name(path);
+    if (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode)) {
+        if (files == DIRECTORIES_ONLY) {
+            return false;
+        }
+        const size_t slash = path.rfind('/') + 1;
+        const std::string dir = path.substr(0, slash);
+        const FileName name(path.substr(slash));
+        sets.push_back({"", path, m_medium, {}, {{name.cp, path, {}}}});
+        sets.back().cps[0].files.push_back({name, std::make_shared<TreeDir>(TreeDir{dir, dir}),
+                                            static_cast<uint64_t>(st.st_size), st.st_mtime});
+        return true;
+    }
+    return add_media(path) || add_directory(path);
+}
+
+bool LogTree::add_card(const std::string& path) {
+    m_card_given = true;
+    return add_medium(path, CARD);
+}
+
+// What a handset's root or a medium's top directory holds. False when path is neither.
+bool LogTree::add_media(const std::string& path) {
+    // Further handsets have their names before those of their media.
+    const std::string name = m_medium;
+    const std::string handset = m_roots++ ? name + " " : "";
+    const bool medium = add_medium(path, name);
+    const bool internal = add_medium(path + PATH_DATA_PARTITION, handset + INTERNAL);
+    const bool card = !m_card_given && add_medium(path + CARD_IN_ROOT, handset + CARD);
+    return medium || internal || card;
+}
+
+bool LogTree::add_medium(const std::string& path, const std::string& name) {
     bool found = false;
     for (const char* below : {DIR_MODEM_LOG, DIR_KEST DIR_MODEM_LOG}) {
         if (is_dir(path + below)) {
+            m_medium = name;
             read_root(path + below);
             found = true;
         }
     }
-    if (found) {
-        return true;
-    }
+    return found;
+}
+
+bool LogTree::add_directory(const std::string& path) {
     std::vector<Entry> entries;
+    const size_t foreign_before = foreign.size();
     if (!list_dir(path, &entries)) {
         return true;
     }
-    foreign.clear();  // the directory is read again below
+    foreign.resize(foreign_before);  // the directory is read again below
     // The directory's own name shows what it is or, in a renamed copy, the names inside it.
     const std::string name = base_name(path);
     LogTime time;
@@ -96,7 +154,7 @@ bool LogTree::read(const std::string& path) {
     } else if (parse_set_name(name, &time) || any(is_cp)) {
         read_set(path, name);
     } else if (cp_type_of(name) != CT_UNKNOWN || any(is_ours)) {
-        sets.push_back({"", path, {}});
+        sets.push_back({"", shown(path), m_medium, {}, {}});
         read_cp(path, name, &sets.back());
     } else {
         return false;
@@ -106,43 +164,56 @@ bool LogTree::read(const std::string& path) {
 
 void LogTree::read_root(const std::string& path) {
     std::vector<Entry> entries;
+    if (!first_visit(path)) {
+        return;
+    }
     list_dir(path, &entries);
+    const std::shared_ptr<const TreeDir> dir = tree_dir(path);
     for (const Entry& entry : entries) {
         const std::string full = path + "/" + entry.name;
         LogTime time;
         if (entry.dir && parse_set_name(entry.name, &time)) {
             read_set(full, entry.name);
         } else if (entry.file && (entry.name == DATABASE_NAME || entry.name == DIGEST_NAME)) {
-            root_files.push_back({FileName(entry.name), full, entry.size});
+            root_files.push_back({FileName(entry.name), dir, entry.size, entry.modified});
         } else {
-            strays.push_back(full);
+            strays.push_back(shown(full));
         }
     }
 }
 
 void LogTree::read_set(const std::string& path, const std::string& name) {
     std::vector<Entry> entries;
+    if (!first_visit(path)) {
+        return;
+    }
     list_dir(path, &entries);
-    sets.push_back({name, path, {}});
+    sets.push_back({name, shown(path), m_medium, {}, {}});
+    parse_set_name(name, &sets.back().time);
     for (const Entry& entry : entries) {
         if (entry.dir && cp_type_of(entry.name) != CT_UNKNOWN) {
             read_cp(path + "/" + entry.name, entry.name, &sets.back());
         } else {
-            strays.push_back(path + "/" + entry.name);
+            strays.push_back(shown(path + "/" + entry.name));
         }
     }
 }
 
 void LogTree::read_cp(const std::string& path, const std::string& name, TreeSet* set) {
     std::vector<Entry> entries;
+    if (!first_visit(path)) {
+        return;
+    }
     list_dir(path, &entries);
-    set->cps.push_back({name, path, {}});
+    set->cps.push_back({name, shown(path), {}});
     std::vector<TreeFile>& files = set->cps.back().files;
+    files.reserve(entries.size());
+    const std::shared_ptr<const TreeDir> dir = tree_dir(path);
     for (const Entry& entry : entries) {
         if (entry.file) {
-            files.push_back({FileName(entry.name), path + "/" + entry.name, entry.size});
+            files.push_back({FileName(entry.name), dir, entry.size, entry.modified});
         } else {
-            strays.push_back(path + "/" + entry.name);
+            strays.push_back(shown(path + "/" + entry.name));
         }
     }
     std::sort(files.begin(), files.end(), older);

@@ -1,41 +1,89 @@
 // SPDX-License-Identifier: Apache-2.0
-// The directories of a log tree: log roots contain sets, sets contain CP directories, and
-// those contain files. Links are listed as strays and never followed.
+// The directories of log trees: log roots contain sets, sets contain CP directories, and
+// those contain files. Any number of ROOTs is read into one tree. Links are listed as strays
+// and never followed.
 #ifndef KESTLOG_LOGTREE_H_
 #define KESTLOG_LOGTREE_H_
 
+#include <stdint.h>
+#include <sys/types.h>
+#include <time.h>
+
+#include <memory>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "kestlog/FileName.h"
 
+// A directory with files of the tree. Both end with "/".
+struct TreeDir {
+    std::string path;   // where to open the files
+    std::string shown;  // the same for humans: a path in an archive begins with its name
+};
+
 struct TreeFile {
     FileName name;
-    std::string path;
+    std::shared_ptr<const TreeDir> dir;
     uint64_t size;
+    time_t modified;
+    // Of a log file: the time of the next newer one or, of the newest, when it was written to
+    // last. Of any other the time in its name.
+    LogTime end{};
+    // Of a log file: the numbers between it and the next newer one (down to 0 from the newest)
+    // that are missing. They count from first_missing up.
+    uint32_t missing = 0;
+    uint32_t first_missing = 0;
+    bool doubled = false;     // a log file beside it has the same number
+    bool set_aside = false;   // but one of the two was set aside, as it is allowed to be
+    bool disordered = false;  // by its number it is older than a log file with an earlier time
+
+    std::string path() const { return dir->path + name.text; }
+    std::string shown() const { return dir->shown + name.text; }
 };
 
 struct TreeCp {
     std::string name;
-    std::string path;
+    std::string shown;            // its path for humans
     std::vector<TreeFile> files;  // by time, oldest first
 };
 
 struct TreeSet {
-    std::string name;  // "" when only a CP directory was given
-    std::string path;
+    std::string name;    // "" when only a CP directory or a file was given
+    std::string shown;   // its path for humans
+    std::string medium;  // for humans: "internal", "card" or what the ROOT is called
+    LogTime time;        // of its name or, without one, of its first file
     std::vector<TreeCp> cps;
 };
 
-struct LogTree {
-    // Reads the directory at path: a medium's top directory, a log root, a set or a CP
-    // directory. False when it is not one of them. What cannot be read goes to failures.
-    bool read(const std::string& path);
+// "numbers 3 to 5 are missing".
+std::string missing_text(const TreeFile& log);
+
+class LogTree {
+public:
+    enum Files { DIRECTORIES_ONLY, FILES_TOO };
+
+    // Adds what is at path: a handset's root, a medium's top directory, a log root, a set or a
+    // CP directory; with FILES_TOO also a single file of any name. False when it is not one of
+    // them. What cannot be read goes to failures. Nothing is added twice.
+    bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
+    // Adds a medium's top directory under this name in place of its own. With it a handset's
+    // root does not take the card that it has itself.
+    bool add_card(const std::string& path);
+    // Sorts the sets and finds the ends and the missing numbers of all log files. Called once,
+    // when everything has been added.
+    void finish();
+    // Leaves out the files that ended before since or began after until. A time that is not set
+    // does not count; nor does a file without a time. Sets and CPs stay.
+    void cut(const LogTime& since, const LogTime& until);
+    // The newest time in the tree: of a name or of the last write to a log file.
+    LogTime newest() const;
 
     std::vector<TreeFile> root_files;  // in the log roots themselves
     std::vector<TreeSet> sets;         // oldest first
-    std::vector<std::string> strays;   // paths of what does not belong there
-    std::vector<std::string> foreign;  // paths of what a PC left there
+    std::vector<std::string> strays;   // paths for humans of what does not belong there
+    std::vector<std::string> foreign;  // the same of what a PC left there
     std::vector<std::string> failures;
 
 private:
@@ -44,14 +92,27 @@ private:
         bool dir;
         bool file;
         uint64_t size;
+        time_t modified;
     };
 
     // Lists a directory by name, without foreign entries. False, with an entry in failures,
     // when it cannot be read.
     bool list_dir(const std::string& path, std::vector<Entry>* entries);
+    std::shared_ptr<const TreeDir> tree_dir(const std::string& path) const;
+    std::string shown(const std::string& path) const;
+    bool first_visit(const std::string& path);
+    bool add_media(const std::string& path);
+    bool add_medium(const std::string& path, const std::string& name);
+    bool add_directory(const std::string& path);
     void read_root(const std::string& path);
     void read_set(const std::string& path, const std::string& name);
     void read_cp(const std::string& path, const std::string& name, TreeSet* set);
+
+    std::string m_medium;                         // of what is being added
+    std::pair<std::string, std::string> m_alias;  // the prefix of paths, and what is shown for it
+    std::set<std::pair<dev_t, ino_t>> m_visited;
+    bool m_card_given = false;
+    size_t m_roots = 0;
 };
 
 #endif  // KESTLOG_LOGTREE_H_

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
+#include "common/CommandLine.h"
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
@@ -97,7 +98,8 @@ void add_findings(Facts* facts, bool json, const FileReport& report) {
 
 }  // namespace
 
-int run_info(const std::string& path, const Settings& settings) {
+int run_info(const CommandLine& line) {
+    const std::string path = line.params()[0];
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
@@ -105,7 +107,7 @@ int run_info(const std::string& path, const Settings& settings) {
     const FileName name(file_part(path));
     FileReport report;
     scan_file(in, name, nullptr, &report);
-    Facts facts(settings.json);
+    Facts facts(line.has("json"));
     facts.add("file", path);
     facts.add("kind", std::string(name.kind));
     if (!name.cp.empty()) {
@@ -120,20 +122,21 @@ int run_info(const std::string& path, const Settings& settings) {
     facts.add("size", in.size());
     add_content(&facts, name, report);
     facts.add("damaged", report.damaged);
-    add_findings(&facts, settings.json, report);
-    if (settings.json) {
+    add_findings(&facts, line.has("json"), report);
+    if (line.has("json")) {
         print_json(facts.object());
     }
     return scan_status(in, path, report);
 }
 
-int run_frames(const std::string& path, const Settings& settings) {
+int run_frames(const CommandLine& line) {
+    const std::string path = line.params()[0];
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
     }
     FileReport report;
-    const bool json = settings.json;
+    const bool json = line.has("json");
     const PieceVisitor print = [json](const Piece& piece) {
         if (!json) {
             printf("%10llu  seq %-10u type 0x%02x 0x%02x  %5zu bytes%s%s%s\n",

@@ -7,9 +7,8 @@
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
-#include "kestlog/ExitStatus.h"
-#include "kestlog/LogTree.h"
 #include "kestlog/Report.h"
+#include "kestlog/TreeInput.h"
 
 namespace {
 
@@ -32,7 +31,7 @@ struct Sum {
 void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* cp,
                const Sum& sum) {
     if (json) {
-        Json object = {{"set", json_text(set.name)}};
+        Json object = {{"set", json_text(set.name)}, {"medium", json_text(set.medium)}};
         if (cp) {
             object["cp"] = json_text(cp->name);
         } else {
@@ -45,7 +44,7 @@ void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* 
         print_json(object);
         return;
     }
-    const std::string name = cp ? cp->name : set.name.empty() ? set.path : set.name;
+    const std::string name = cp ? cp->name : set.name.empty() ? set.shown : set.name;
     printf("%s%-*s %12llu bytes  %4llu files  %s to %s\n", indent, cp ? 22 : 24,
            escape_text(name).c_str(), static_cast<unsigned long long>(sum.size),
            static_cast<unsigned long long>(sum.files), time_text(sum.first).c_str(),
@@ -56,7 +55,9 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
     if (json) {
         Json object;
         if (set) {
-            object = {{"set", json_text(set->name)}, {"cp", json_text(cp->name)}};
+            object = {{"set", json_text(set->name)},
+                      {"medium", json_text(set->medium)},
+                      {"cp", json_text(cp->name)}};
         }
         object["file"] = json_text(file.name.text);
         object["kind"] = file.name.kind;
@@ -74,13 +75,15 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
 
 }  // namespace
 
-int run_ls(const std::string& path, const Settings& settings) {
+int run_ls(const CommandLine& line) {
     LogTree tree;
-    if (!tree.read(path)) {
-        return failure(ES_UNREADABLE, path + ": not a log tree");
+    int status;
+    if (!open_tree(line, &tree, &status)) {
+        return status;
     }
+    const bool json = line.has("json");
     for (const TreeFile& file : tree.root_files) {
-        print_file(settings.json, nullptr, nullptr, file);
+        print_file(json, nullptr, nullptr, file);
     }
     for (const TreeSet& set : tree.sets) {
         Sum sum;
@@ -89,20 +92,17 @@ int run_ls(const std::string& path, const Settings& settings) {
                 sum.add(file);
             }
         }
-        print_sum(settings.json, "", set, nullptr, sum);
+        print_sum(json, "", set, nullptr, sum);
         for (const TreeCp& cp : set.cps) {
             Sum cp_sum;
             for (const TreeFile& file : cp.files) {
                 cp_sum.add(file);
             }
-            print_sum(settings.json, "  ", set, &cp, cp_sum);
+            print_sum(json, "  ", set, &cp, cp_sum);
             for (const TreeFile& file : cp.files) {
-                print_file(settings.json, &set, &cp, file);
+                print_file(json, &set, &cp, file);
             }
         }
     }
-    for (const std::string& words : tree.failures) {
-        failure(ES_UNREADABLE, words);
-    }
-    return tree.failures.empty() ? ES_OK : ES_UNREADABLE;
+    return tell_failures(tree);
 }

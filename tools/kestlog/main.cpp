@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog: reads and checks what the service writes.
+#include <stdint.h>
 #include <stdio.h>
 
 #include <algorithm>
@@ -10,44 +11,63 @@
 
 namespace {
 
+constexpr size_t ANY = SIZE_MAX;
+
 struct Command {
     const char* name;
-    const char* param;  // every command takes one
+    const char* params;
+    size_t min, max;  // number of parameters
     // Prints everything; returns the exit status.
-    int (*run)(const std::string& path, const Settings&);
+    int (*run)(const CommandLine& line);
     const char* help;
 };
 
 // clang-format off
 constexpr Command COMMANDS[] = {
-    {"ls",     "ROOT", run_ls,     "list sets, CPs and files with sizes and time spans"},
-    {"info",   "FILE", run_info,   "print what a file is, its time record, frames and damage"},
-    {"verify", "ROOT", run_verify, "check names, numbers, headers and frames of all files"},
-    {"frames", "FILE", run_frames, "list the frames, or the chunks of an audio DSP log"},
-    {"split",  "FILE", run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+    {"ls",     "ROOT...", 1, ANY, run_ls,     "list sets, CPs and files with sizes and time spans"},
+    {"info",   "FILE",    1, 1,   run_info,   "print what a file is, its time record, frames and damage"},
+    {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
+    {"frames", "FILE",    1, 1,   run_frames, "list the frames, or the chunks of an audio DSP log"},
+    {"split",  "FILE",    1, 1,   run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+};
+
+// The commands that take a ROOT.
+constexpr char TREES[] = "ls verify";
+
+constexpr Option OPTIONS[] = {
+    {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
+    {"card",         "DIR",   TREES,   "the card of the handset whose root is given"},
+    {"since",        "T",     TREES,   "leave out files that end before T"},
+    {"until",        "T",     TREES,   "leave out files that begin after T"},
+    {"output",       "DIR",   "split", "write the files to DIR instead of the current directory", 'o'},
+    {"force",        nullptr, "split", "replace files that exist"},
 };
 // clang-format on
+
+constexpr char NOTES[] =
+    "ROOT is a handset's root, a medium's top directory, its modem_log, a set or a CP's\n"
+    "directory.\n"
+    "T is a local time of the handset, \"2016-03-01 09:15:00\", \"2016-03-01\" or \"09:15\", or\n"
+    "what lies before the newest time in the ROOTs: \"-10m\", \"-2h\".\n"
+    "\nExit status:\n"
+    "  0  no damage\n"
+    "  1  wrong usage\n"
+    "  2  something could not be read\n"
+    "  3  damage found\n"
+    "  4  the output could not be written, or already exists\n";
 
 Syntax make_syntax() {
     Syntax syntax = {
         "kestlog",
-        "command ROOT|FILE",
+        "command ROOT...|FILE...",
         "Reads and checks what the service kestmodem writes.",
-        {{"json", nullptr, nullptr, "print results as JSON, one object per line"},
-         {"output", "DIR", "split", "write the files to DIR instead of the current directory"},
-         {"force", nullptr, "split", "replace files that exist"}},
+        {std::begin(OPTIONS), std::end(OPTIONS)},
         {},
-        "ROOT is a medium's top directory, its modem_log, a set or a CP's directory.\n"
-        "\nExit status:\n"
-        "  0  no damage\n"
-        "  1  wrong usage\n"
-        "  2  something could not be read\n"
-        "  3  damage found\n"
-        "  4  the output could not be written, or already exists\n",
+        NOTES,
         nullptr,
     };
     for (const Command& command : COMMANDS) {
-        const std::string usage = std::string(command.name) + " " + command.param;
+        const std::string usage = std::string(command.name) + " " + command.params;
         syntax.commands.push_back({command.name, usage, command.help});
     }
     return syntax;
@@ -57,11 +77,17 @@ int run(const CommandLine& line) {
     const Command& command =
         *std::find_if(std::begin(COMMANDS), std::end(COMMANDS),
                       [&line](const Command& each) { return line.command() == each.name; });
-    if (line.params().size() != 1 || line.params()[0].empty()) {
-        return line.usage_error(line.command() + " takes one " + command.param);
+    const Args& params = line.params();
+    if (params.size() < command.min) {
+        return line.usage_error("a parameter is missing");
     }
-    const Settings settings = {line.has("json"), line.has("force"), line.value("output", ".")};
-    return command.run(line.params()[0], settings);
+    if (params.size() > command.max) {
+        return line.usage_error("too many parameters");
+    }
+    if (std::find(params.begin(), params.end(), "") != params.end()) {
+        return line.usage_error("a parameter is empty");
+    }
+    return command.run(line);
 }
 
 }  // namespace

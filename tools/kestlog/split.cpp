@@ -8,6 +8,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include "common/CommandLine.h"
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
@@ -83,7 +84,8 @@ void print_result(bool json, const std::string& path, const Part (&parts)[CK_NUM
 
 }  // namespace
 
-int run_split(const std::string& path, const Settings& settings) {
+int run_split(const CommandLine& line) {
+    const std::string path = line.params()[0];
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
@@ -98,8 +100,8 @@ int run_split(const std::string& path, const Settings& settings) {
     }
     Part parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {
-        parts[i].path = settings.output + "/" + stem + "." + CHUNK_KINDS[i] + ".bin";
-        if (!parts[i].open(settings.force)) {
+        parts[i].path = line.value("output", ".") + "/" + stem + "." + CHUNK_KINDS[i] + ".bin";
+        if (!parts[i].open(line.has("force"))) {
             return give_up(parts, parts[i], errno);
         }
     }
@@ -129,7 +131,7 @@ int run_split(const std::string& path, const Settings& settings) {
             return failure(ES_OUTPUT, part.path + ": " + strerror(errno));
         }
     }
-    print_result(settings.json, path, parts, report);
+    print_result(line.has("json"), path, parts, report);
     tell_damage(path, report);
     return scan_status(in, path, report);
 }

@@ -10,8 +10,8 @@
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
-#include "kestlog/LogTree.h"
 #include "kestlog/Report.h"
+#include "kestlog/TreeInput.h"
 
 namespace {
 
@@ -80,12 +80,12 @@ private:
     // In each log root the database and its digest must both be there, or neither.
     void parsing_database(const std::vector<TreeFile>& files) {
         for (const TreeFile& file : files) {
-            const std::string dir = file.path.substr(0, file.path.rfind('/') + 1);
+            const std::string dir = file.dir->shown;
             const std::string other =
                 dir + (file.name.text == DIGEST_NAME ? DATABASE_NAME : DIGEST_NAME);
             if (std::none_of(files.begin(), files.end(),
-                             [&](const TreeFile& f) { return f.path == other; })) {
-                find(file.path, {true, "pair", "without " + file_part(other), -1});
+                             [&](const TreeFile& f) { return f.shown() == other; })) {
+                find(file.shown(), {true, "pair", "without " + file_part(other), -1});
             }
         }
     }
@@ -95,74 +95,52 @@ private:
         for (const TreeFile& file : cp.files) {
             const FileName& name = file.name;
             if (name.type == LT_UNKNOWN) {
-                find(file.path, {true, "name", "not a file name the service creates", -1});
+                find(file.shown(), {true, "name", "not a file name the service creates", -1});
             } else if (type != CT_UNKNOWN && name.cp_type != CT_UNKNOWN && name.cp_type != type) {
-                find(file.path, {true, "name", "the name belongs to another CP", -1});
+                find(file.shown(), {true, "name", "the name belongs to another CP", -1});
             }
         }
     }
 
-    // The newest log file has number 0, and each older one the next number.
     void numbers(const TreeCp& cp) {
-        std::vector<const TreeFile*> logs;
-        for (const TreeFile& file : cp.files) {
-            if (file.name.is_log()) {
-                logs.push_back(&file);
+        for (const TreeFile& log : cp.files) {
+            if (log.doubled) {
+                find(log.shown(), {!log.set_aside, "double", "two log files with this number", -1});
+            }
+            if (log.missing) {
+                find(log.shown(), {false, "gap", missing_text(log), -1});
+            }
+            if (log.disordered) {
+                find(log.shown(),
+                     {false, "order", "newer than a log file with a lower number", -1});
             }
         }
-        std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
-            return a->name.number < b->name.number;
-        });
-        uint64_t due = 0;
-        const TreeFile* newer = nullptr;
-        for (const TreeFile* log : logs) {
-            const uint32_t number = log->name.number;
-            if (newer && newer->name.number == number) {
-                // A file that was set aside keeps its number until the next renumbering.
-                const bool damage = !log->name.aside && !newer->name.aside;
-                find(log->path, {damage, "double", "two log files with this number", -1});
-            } else if (number != due) {
-                // Trimming may delete the file that has just been closed.
-                find(log->path, {false, "gap", missing(due, number - 1), -1});
-            }
-            if (newer && newer->name.number < number && newer->name.time < log->name.time) {
-                find(log->path, {false, "order", "newer than a log file with a lower number", -1});
-            }
-            due = static_cast<uint64_t>(number) + 1;
-            newer = log;
-        }
-    }
-
-    static std::string missing(uint64_t first, uint64_t last) {
-        return first == last ? "number " + std::to_string(first) + " is missing"
-                             : "numbers " + std::to_string(first) + " to " + std::to_string(last) +
-                                   " are missing";
     }
 
     void content(const TreeFile& file) {
         ++m_files;
         LogReader in;
-        if (!in.open(file.path, false)) {
+        if (!in.open(file.path(), false)) {
             if (errno == ENOENT) {
                 // The service may rename and trim files while they are checked.
-                find(file.path,
+                find(file.shown(),
                      {false, "gone", "gone or renamed since the directory was read", -1});
             } else {
-                unreadable(file.path + ": " + strerror(errno));
+                unreadable(file.shown() + ": " + strerror(errno));
             }
             return;
         }
         FileReport report;
         scan_file(in, file.name, nullptr, &report);
         if (in.error()) {
-            unreadable(file.path + ": " + strerror(in.error()));
+            unreadable(file.shown() + ": " + strerror(in.error()));
         }
         for (const Finding& finding : report.findings) {
-            find(file.path, finding);
+            find(file.shown(), finding);
         }
         if (report.more_findings) {
-            find(file.path, {report.damaged, "more",
-                             std::to_string(report.more_findings) + " more findings", -1});
+            find(file.shown(), {report.damaged, "more",
+                                std::to_string(report.more_findings) + " more findings", -1});
         }
     }
 
@@ -175,12 +153,13 @@ private:
 
 }  // namespace
 
-int run_verify(const std::string& path, const Settings& settings) {
+int run_verify(const CommandLine& line) {
     LogTree tree;
-    if (!tree.read(path)) {
-        return failure(ES_UNREADABLE, path + ": not a log tree");
+    int status;
+    if (!open_tree(line, &tree, &status)) {
+        return status;
     }
-    Verifier verifier(settings.json);
+    Verifier verifier(line.has("json"));
     verifier.tree(tree);
     return verifier.finish();
 }

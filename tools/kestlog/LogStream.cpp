@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/LogStream.h"
+
+#include <algorithm>
+#include <map>
+
+namespace {
+
+struct Place {
+    LogTime time;  // never earlier than that of an older file in the same directory
+    StreamFile file;
+};
+
+void add_directory(const TreeSet& set, const TreeCp& cp, std::vector<Place>* places) {
+    std::vector<const TreeFile*> logs;
+    for (const TreeFile& file : cp.files) {
+        if (file.name.is_log()) {
+            logs.push_back(&file);
+        }
+    }
+    std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
+        return a->name.number > b->name.number;
+    });
+    LogTime time;
+    for (const TreeFile* log : logs) {
+        time = std::max(time, log->name.time);
+        places->push_back({time, {&set, log}});
+    }
+}
+
+}  // namespace
+
+std::vector<LogStream> log_streams(const LogTree& tree) {
+    std::map<std::string, std::vector<Place>> cps;
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            add_directory(set, cp, &cps[cp.name]);
+        }
+    }
+    std::vector<LogStream> streams;
+    for (auto& [cp, places] : cps) {
+        std::stable_sort(places.begin(), places.end(),
+                         [](const Place& a, const Place& b) { return a.time < b.time; });
+        LogStream stream = {cp, {}};
+        for (const Place& place : places) {
+            stream.files.push_back(place.file);
+        }
+        if (!places.empty()) {
+            streams.push_back(stream);
+        }
+    }
+    return streams;
+}

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+// The order, ends and missing numbers of the files in a tree, once it has been read.
+#include <algorithm>
+
+#include "kestlog/LogTree.h"
+
+namespace {
+
+LogTime local_time(time_t seconds) {
+    struct tm t;
+    return localtime_r(&seconds, &t) ? LogTime::from_tm(t) : LogTime();
+}
+
+// The newest log file has number 0, and each older one the next number.
+void find_missing(std::vector<TreeFile>* files) {
+    std::vector<TreeFile*> logs;
+    for (TreeFile& file : *files) {
+        file.end = file.name.time;
+        if (file.name.is_log()) {
+            logs.push_back(&file);
+        }
+    }
+    std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
+        return a->name.number < b->name.number;
+    });
+    uint32_t due = 0;
+    const TreeFile* newer = nullptr;
+    for (TreeFile* log : logs) {
+        const uint32_t number = log->name.number;
+        if (newer && newer->name.number == number) {
+            // A file that was set aside keeps its number until the next renumbering.
+            log->doubled = true;
+            log->set_aside = log->name.aside || newer->name.aside;
+        } else {
+            // Trimming may delete the file that has just been closed.
+            log->first_missing = due;
+            log->missing = number - due;
+        }
+        log->disordered = newer && newer->name.number < number && newer->name.time < log->name.time;
+        log->end = std::max(log->name.time, newer ? newer->name.time : local_time(log->modified));
+        due = number + 1;
+        newer = log;
+    }
+}
+
+}  // namespace
+
+std::string missing_text(const TreeFile& log) {
+    const std::string first = std::to_string(log.first_missing);
+    return log.missing == 1
+               ? "number " + first + " is missing"
+               : "numbers " + first + " to " + std::to_string(log.name.number - 1) + " are missing";
+}
+
+void LogTree::finish() {
+    for (TreeSet& set : sets) {
+        LogTime first;
+        for (TreeCp& cp : set.cps) {
+            find_missing(&cp.files);
+            for (const TreeFile& file : cp.files) {
+                if (has_time(file.name.time)) {
+                    first = has_time(first) ? std::min(first, file.name.time) : file.name.time;
+                }
+            }
+        }
+        set.time = has_time(set.time) ? set.time : first;
+    }
+    std::stable_sort(sets.begin(), sets.end(),
+                     [](const TreeSet& a, const TreeSet& b) { return a.time < b.time; });
+}
+
+void LogTree::cut(const LogTime& since, const LogTime& until) {
+    const auto outside = [&](const TreeFile& file) {
+        return has_time(file.name.time) && ((has_time(since) && file.end < since) ||
+                                            (has_time(until) && until < file.name.time));
+    };
+    for (TreeSet& set : sets) {
+        for (TreeCp& cp : set.cps) {
+            cp.files.erase(std::remove_if(cp.files.begin(), cp.files.end(), outside),
+                           cp.files.end());
+        }
+    }
+}
+
+LogTime LogTree::newest() const {
+    LogTime last;
+    for (const TreeSet& set : sets) {
+        last = std::max(last, set.time);
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                last = std::max(last, file.end);
+            }
+        }
+    }
+    return last;
+}
