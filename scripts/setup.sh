@@ -3,6 +3,10 @@
 # Sourced by the other scripts, with the checkout as the current directory: what they need,
 # and builds that show their progress in one line.
 
+# The libraries of kestlog; without one of them it is left out of a build.
+# shellcheck disable=SC2034
+kest_reader_libraries=(nlohmann-json3-dev libarchive-dev)
+
 # Whether there is what a Debian package brings. Looks for the tool itself, so that it also
 # tells on a system that has no such package.
 kest_has() {
@@ -15,6 +19,7 @@ kest_has() {
         apache2-utils) command -v rotatelogs >/dev/null ;;
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
+        libarchive-dev) kest_includes archive.h ;;
         libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;
         sanitizers) kest_links c++ address,undefined main && kest_links c++ thread main ;;
         *) command -v "$1" >/dev/null ;;

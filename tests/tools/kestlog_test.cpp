@@ -138,6 +138,64 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
     EXPECT_EQ(run("ls --since noon handset"), 1);
 }
 
+TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
+    write_good_tree();
+    m_root.make_dir("temp");
+    const std::string packers[] = {"tar cf a.tar modem_log", "tar cjf a.tbz2 modem_log",
+                                   "tar czf a.tgz --transform 's,^,some/card/,' modem_log",
+                                   "python3 -m zipfile -c a.zip modem_log",
+                                   "tar cf a.cp.tar -C " + WCN + " ."};
+    for (const std::string& packer : packers) {
+        ASSERT_EQ(system(("cd " + m_root.root() + " && " + packer).c_str()), 0) << packer;
+    }
+    setenv("TMPDIR", m_root.path("temp").c_str(), 1);
+    for (const char* args : {"a.tar", "a.tbz2", "a.tgz", "a.zip", "- <a.tgz"}) {
+        EXPECT_EQ(run(std::string("verify ") + args), 0) << args << m_err << m_out;
+        EXPECT_TRUE(said("18 files checked, 0 damages, 0 notes\n")) << args;
+    }
+    EXPECT_EQ(run("ls --json a.cp.tar"), 0) << m_err;
+    EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,")) << m_out;
+
+    // Nothing of a hostile one gets out, the rest of it is read.
+    ASSERT_EQ(symlink("/", m_root.path(SET + "link").c_str()), 0);
+    ASSERT_EQ(mkfifo(m_root.path(SET + "fifo").c_str(), 0600), 0);
+    write("out", "x");
+    ASSERT_EQ(system(("cd " + m_root.root() + " && tar cPf bad.tar modem_log --transform " +
+                      "'s,^out,../../evil,' out --transform 's,^a.tar,/tmp/evil,' a.tar && " +
+                      "tar rf bad.tar " + WCN_LOG + " && head -c -1000 a.tgz >short.tgz")
+                         .c_str()),
+              0);
+    EXPECT_EQ(run("verify bad.tar"), 3);
+    for (const std::string& said_so : std::vector<std::string>{
+             "bad.tar/../../evil: left out: its name leads out of the archive\n",
+             "bad.tar//tmp/evil: left out: its name leads out of the archive\n",
+             WCN_LOG + ": left out: another entry has this name\n"}) {
+        EXPECT_NE(m_err.find(said_so), std::string::npos) << said_so << m_err;
+    }
+    EXPECT_TRUE(said("bad.tar/" + SET + "link: damage: does not belong here\n")) << m_out;
+    EXPECT_TRUE(said("18 files checked, 2 damages")) << m_out;
+    EXPECT_EQ(run("verify short.tgz"), 2) << m_out;
+    EXPECT_EQ(run("ls --unpack-limit 1 a.tar"), 0) << m_err;
+    write(WCN + "big", std::string(1100000, 'x'));
+    ASSERT_EQ(system(("cd " + m_root.root() + " && tar cf big.tar modem_log").c_str()), 0);
+    EXPECT_EQ(run("ls --unpack-limit 1 big.tar"), 2);
+    EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos) << m_err;
+    EXPECT_FALSE(m_root.exists("evil"));
+    EXPECT_TRUE(m_root.list("temp").empty());
+
+    // It waits for an archive from a pipe when it is ended.
+    ASSERT_EQ(mkfifo(m_root.path("pipe").c_str(), 0600), 0);
+    for (const std::string signal : {"INT", "TERM", "KILL"}) {
+        const std::string script = "env --default-signal=INT '" KESTLOG
+                                   "' ls - <>pipe & "
+                                   "until ls temp | grep -q kestlog; do :; done; kill -" +
+                                   signal + " $!";
+        EXPECT_EQ(system(("cd " + m_root.root() + "; " + script).c_str()), 0);
+        EXPECT_TRUE(wait_until([&] { return m_root.list("temp").empty(); })) << signal;
+    }
+    unsetenv("TMPDIR");
+}
+
 TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
     const std::string good = THREE_CHUNKS;
     const struct {

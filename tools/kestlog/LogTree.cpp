@@ -12,6 +12,7 @@
 #include <algorithm>
 
 #include "core/system_paths.h"
+#include "kestlog/Archive.h"
 
 namespace {
 
@@ -32,12 +33,15 @@ std::string base_name(const std::string& path) {
     return full.substr(full.rfind('/') + 1);
 }
 
-bool older(const TreeFile& a, const TreeFile& b) {
-    if (a.name.time < b.name.time || b.name.time < a.name.time) {
-        return a.name.time < b.name.time;
+// The CP of that name in the set, which may be new.
+TreeCp* cp_of(TreeSet* set, const std::string& name, const std::string& dir) {
+    for (TreeCp& cp : set->cps) {
+        if (cp.name == name) {
+            return &cp;
+        }
     }
-    return a.name.number != b.name.number ? a.name.number > b.name.number
-                                          : a.name.text < b.name.text;
+    set->cps.push_back({name, dir.substr(0, dir.size() - 1), {}});
+    return &set->cps.back();
 }
 
 }  // namespace
@@ -85,8 +89,11 @@ bool LogTree::first_visit(const std::string& path) {
 bool LogTree::add(const std::string& path, Files files) {
     struct stat st;
     m_medium = base_name(path);
-    if (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode)) {
-        if (files == DIRECTORIES_ONLY) {
+    if (path == "-" || (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode))) {
+        if (add_archive(path)) {
+            return true;
+        }
+        if (files == DIRECTORIES_ONLY || path == "-") {
             return false;
         }
         const size_t slash = path.rfind('/') + 1;
@@ -97,11 +104,56 @@ bool LogTree::add(const std::string& path, Files files) {
                                             static_cast<uint64_t>(st.st_size), st.st_mtime});
         return true;
     }
+    m_alias = {};
     return add_media(path) || add_directory(path);
+}
+
+bool LogTree::add_archive(const std::string& path) {
+    struct stat st;
+    const std::string name = path.substr(path.rfind('/') + 1);
+    // A file of the service is none, and what is no file could wait for ever.
+    if (path != "-" &&
+        (FileName(name).exact || stat(path.c_str(), &st) < 0 || !S_ISREG(st.st_mode))) {
+        return false;
+    }
+    if (!m_unpacked) {
+        m_unpacked = std::make_unique<TempDir>();
+        if (!m_unpacked->create()) {
+            failures.push_back(TempDir::parent() + ": " + strerror(errno));
+        }
+    }
+    std::string dir = m_unpacked->path() + "/" + std::to_string(m_archives++);
+    if (m_unpacked->path().empty() || mkdir(dir.c_str(), 0700) < 0) {
+        return false;
+    }
+    const Unpacked unpacked = unpack_archive(path, dir, m_unpack_limit);
+    if (!unpacked.is_archive) {
+        return false;
+    }
+    failures.insert(failures.end(), unpacked.failures.begin(), unpacked.failures.end());
+    for (const std::string& stray : unpacked.strays) {
+        // Elsewhere, as among a handset's devices, they do not matter.
+        if (("/" + stray).find(DIR_MODEM_LOG "/") != std::string::npos) {
+            strays.push_back(path + "/" + stray);
+        }
+    }
+    m_medium = name;
+    m_alias = {dir, path};
+    // It may have been packed together with the directories above it.
+    while (!add_media(dir) && !add_directory(dir)) {
+        std::vector<Entry> entries;
+        list_dir(dir, &entries);
+        if (entries.size() != 1 || !entries[0].dir) {
+            return false;
+        }
+        dir += "/" + entries[0].name;
+    }
+    return true;
 }
 
 bool LogTree::add_card(const std::string& path) {
     m_card_given = true;
+    m_alias = {};
     return add_medium(path, CARD);
 }
 
@@ -205,16 +257,18 @@ void LogTree::read_cp(const std::string& path, const std::string& name, TreeSet*
         return;
     }
     list_dir(path, &entries);
-    set->cps.push_back({name, shown(path), {}});
-    std::vector<TreeFile>& files = set->cps.back().files;
-    files.reserve(entries.size());
     const std::shared_ptr<const TreeDir> dir = tree_dir(path);
+    const bool renamed = cp_type_of(name) == CT_UNKNOWN;
+    TreeCp* cp = renamed ? nullptr : cp_of(set, name, dir->shown);
     for (const Entry& entry : entries) {
-        if (entry.file) {
-            files.push_back({FileName(entry.name), dir, entry.size, entry.modified});
-        } else {
-            strays.push_back(shown(path + "/" + entry.name));
+        const FileName file(entry.name);
+        if (!entry.file) {
+            strays.push_back(dir->shown + entry.name);
+            continue;
         }
+        if (renamed) {
+            cp = cp_of(set, file.cp.empty() ? name : file.cp, dir->shown);
+        }
+        cp->files.push_back({file, dir, entry.size, entry.modified});
     }
-    std::sort(files.begin(), files.end(), older);
 }

@@ -16,6 +16,7 @@
 #include <vector>
 
 #include "kestlog/FileName.h"
+#include "kestlog/TempDir.h"
 
 // A directory with files of the tree. Both end with "/".
 struct TreeDir {
@@ -65,12 +66,15 @@ public:
     enum Files { DIRECTORIES_ONLY, FILES_TOO };
 
     // Adds what is at path: a handset's root, a medium's top directory, a log root, a set or a
-    // CP directory; with FILES_TOO also a single file of any name. False when it is not one of
-    // them. What cannot be read goes to failures. Nothing is added twice.
+    // CP directory, or an archive of one of them ("-": on standard input), which is unpacked;
+    // with FILES_TOO also a single file of any name. False when it is not one of them. What
+    // cannot be read goes to failures. Nothing is added twice.
     bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
     // Adds a medium's top directory under this name in place of its own. With it a handset's
     // root does not take the card that it has itself.
     bool add_card(const std::string& path);
+    // The most bytes that each archive may take; 0 for what is free.
+    void limit_archives(uint64_t bytes) { m_unpack_limit = bytes; }
     // Sorts the sets and finds the ends and the missing numbers of all log files. Called once,
     // when everything has been added.
     void finish();
@@ -101,11 +105,13 @@ private:
     std::shared_ptr<const TreeDir> tree_dir(const std::string& path) const;
     std::string shown(const std::string& path) const;
     bool first_visit(const std::string& path);
+    bool add_archive(const std::string& path);
     bool add_media(const std::string& path);
     bool add_medium(const std::string& path, const std::string& name);
     bool add_directory(const std::string& path);
     void read_root(const std::string& path);
     void read_set(const std::string& path, const std::string& name);
+    // The directory of a CP or, under another name, of files that may be from several CPs.
     void read_cp(const std::string& path, const std::string& name, TreeSet* set);
 
     std::string m_medium;                         // of what is being added
@@ -113,6 +119,9 @@ private:
     std::set<std::pair<dev_t, ino_t>> m_visited;
     bool m_card_given = false;
     size_t m_roots = 0;
+    size_t m_archives = 0;
+    uint64_t m_unpack_limit = 0;
+    std::unique_ptr<TempDir> m_unpacked;  // with a directory for each archive
 };
 
 #endif  // KESTLOG_LOGTREE_H_

@@ -11,6 +11,14 @@ LogTime local_time(time_t seconds) {
     return localtime_r(&seconds, &t) ? LogTime::from_tm(t) : LogTime();
 }
 
+bool older(const TreeFile& a, const TreeFile& b) {
+    if (a.name.time < b.name.time || b.name.time < a.name.time) {
+        return a.name.time < b.name.time;
+    }
+    return a.name.number != b.name.number ? a.name.number > b.name.number
+                                          : a.name.text < b.name.text;
+}
+
 // The newest log file has number 0, and each older one the next number.
 void find_missing(std::vector<TreeFile>* files) {
     std::vector<TreeFile*> logs;
@@ -56,6 +64,7 @@ void LogTree::finish() {
     for (TreeSet& set : sets) {
         LogTime first;
         for (TreeCp& cp : set.cps) {
+            std::sort(cp.files.begin(), cp.files.end(), older);
             find_missing(&cp.files);
             for (const TreeFile& file : cp.files) {
                 if (has_time(file.name.time)) {

@@ -13,6 +13,8 @@
 
 namespace {
 
+constexpr char DIGITS[] = "0123456789";
+
 struct TimeForm {
     const char* format;
     bool day;  // the text gives the day
@@ -35,7 +37,7 @@ constexpr struct { char letter; int64_t seconds; } UNITS[] = {
 
 // "-10m".
 bool parse_age(const std::string& text, int64_t* seconds) {
-    const size_t digits = text.find_first_not_of("0123456789", 1);
+    const size_t digits = text.find_first_not_of(DIGITS, 1);
     if (text[0] != '-' || digits == 1 || digits > 10 || digits + 1 != text.size()) {
         return false;
     }
@@ -106,6 +108,12 @@ bool open_tree(const CommandLine& line, LogTree* tree, int* status, LogTree::Fil
 
 bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* status,
                LogTree::Files files) {
+    const std::string limit = line.value("unpack-limit", "0");
+    if (limit.empty() || limit.size() > 9 || limit.find_first_not_of(DIGITS) != std::string::npos) {
+        *status = line.usage_error("--unpack-limit: '" + limit + "' is not a number of MiB");
+        return false;
+    }
+    tree->limit_archives(std::stoull(limit) * 1024 * 1024);
     const std::string card = line.value("card", "");
     if (line.has("card") && !tree->add_card(card)) {
         *status = failure(ES_UNREADABLE, card + ": holds no logs");

@@ -39,6 +39,7 @@ constexpr Option OPTIONS[] = {
     {"card",         "DIR",   TREES,   "the card of the handset whose root is given"},
     {"since",        "T",     TREES,   "leave out files that end before T"},
     {"until",        "T",     TREES,   "leave out files that begin after T"},
+    {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},
     {"output",       "DIR",   "split", "write the files to DIR instead of the current directory", 'o'},
     {"force",        nullptr, "split", "replace files that exist"},
 };
@@ -46,7 +47,7 @@ constexpr Option OPTIONS[] = {
 
 constexpr char NOTES[] =
     "ROOT is a handset's root, a medium's top directory, its modem_log, a set or a CP's\n"
-    "directory.\n"
+    "directory, or a tar or zip of one of them (- for standard input).\n"
     "T is a local time of the handset, \"2016-03-01 09:15:00\", \"2016-03-01\" or \"09:15\", or\n"
     "what lies before the newest time in the ROOTs: \"-10m\", \"-2h\".\n"
     "\nExit status:\n"

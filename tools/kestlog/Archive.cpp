@@ -1,0 +1,216 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/Archive.h"
+
+#include <archive.h>
+#include <archive_entry.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <sys/statvfs.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <sstream>
+
+namespace {
+
+constexpr size_t BLOCK = 256 * 1024;
+constexpr uint64_t MIB = 1024 * 1024;
+constexpr uint64_t MAX_ENTRIES = 1000 * 1000;
+
+// The parts of an entry's name; empty when it leads out of the directory.
+std::vector<std::string> safe_parts(const std::string& name) {
+    std::vector<std::string> parts;
+    std::istringstream in(name);
+    if (name[0] == '/') {
+        return {};
+    }
+    for (std::string part; std::getline(in, part, '/');) {
+        if (part == "..") {
+            return {};
+        }
+        if (!part.empty() && part != ".") {
+            parts.push_back(part);
+        }
+    }
+    return parts;
+}
+
+class Unpacker {
+public:
+    Unpacker(const std::string& name, const std::string& dir, uint64_t limit)
+        : m_name(name), m_dir(dir), m_limit(limit), m_in(archive_read_new()) {
+        struct statvfs fs;
+        if (m_limit == 0 && statvfs(dir.c_str(), &fs) == 0) {
+            m_limit = static_cast<uint64_t>(fs.f_bavail) * fs.f_frsize / 10 * 9;
+        }
+        // None of those that run another program.
+        archive_read_support_filter_gzip(m_in);
+        archive_read_support_filter_bzip2(m_in);
+        archive_read_support_filter_xz(m_in);
+        archive_read_support_filter_lzma(m_in);
+        archive_read_support_filter_zstd(m_in);
+        archive_read_support_filter_lz4(m_in);
+        archive_read_support_filter_compress(m_in);
+        archive_read_support_format_tar(m_in);
+        archive_read_support_format_zip(m_in);
+    }
+    ~Unpacker() { archive_read_free(m_in); }
+    Unpacker(const Unpacker&) = delete;
+    Unpacker& operator=(const Unpacker&) = delete;
+
+    Unpacked run() {
+        struct archive_entry* entry;
+        const int opened = m_name == "-" ? archive_read_open_fd(m_in, STDIN_FILENO, BLOCK)
+                                         : archive_read_open_filename(m_in, m_name.c_str(), BLOCK);
+        if (opened != ARCHIVE_OK) {
+            return m_result;
+        }
+        for (int got; !m_full && (got = archive_read_next_header(m_in, &entry)) != ARCHIVE_EOF;) {
+            if (got == ARCHIVE_FATAL) {
+                fail("", archive_error_string(m_in));
+                break;
+            }
+            if (got == ARCHIVE_RETRY) {
+                continue;
+            }
+            m_result.is_archive = true;
+            if (++m_entries > MAX_ENTRIES) {
+                fail("", "more than " + std::to_string(MAX_ENTRIES) +
+                             " entries; the rest is left "
+                             "out");
+                break;
+            }
+            take(entry);
+        }
+        if (m_more) {
+            m_result.failures.push_back(m_name + ": " + std::to_string(m_more) +
+                                        " more entries are left out or damaged");
+        }
+        return m_result;
+    }
+
+private:
+    // entry: its name, or "" for the archive itself.
+    void fail(const std::string& entry, const std::string& reason) {
+        if (m_result.failures.size() == Unpacked::MAX_LINES && !entry.empty()) {
+            ++m_more;
+        } else {
+            m_result.failures.push_back(m_name + (entry.empty() ? "" : "/" + entry) + ": " +
+                                        reason);
+        }
+    }
+
+    void take(struct archive_entry* entry) {
+        // Null when the locale cannot hold it.
+        const char* text = archive_entry_pathname(entry);
+        text = text ? text : archive_entry_pathname_utf8(entry);
+        if (!text || !*text) {
+            return fail("?", "left out: its name cannot be read");
+        }
+        const std::string name = text;
+        const std::vector<std::string> parts = safe_parts(name);
+        const bool is_dir = archive_entry_filetype(entry) == AE_IFDIR;
+        if (parts.empty()) {
+            if (name.find_first_not_of("./") != std::string::npos || !is_dir) {
+                fail(name, "left out: its name leads out of the archive");
+            }
+            return;
+        }
+        if (archive_entry_hardlink(entry) || archive_entry_symlink(entry) ||
+            (archive_entry_filetype(entry) != AE_IFREG && !is_dir)) {
+            if (m_result.strays.size() < MAX_ENTRIES) {
+                m_result.strays.push_back(name);
+            }
+            return;
+        }
+        std::string path = m_dir;
+        for (size_t i = 0; i < parts.size(); ++i) {
+            path += "/" + parts[i];
+            if ((i + 1 < parts.size() || is_dir) && mkdir(path.c_str(), 0700) < 0 &&
+                errno != EEXIST) {
+                return fail(name, std::string("left out: ") + strerror(errno));
+            }
+        }
+        if (!is_dir) {
+            write_file(entry, name, path);
+        }
+    }
+
+    void write_file(struct archive_entry* entry, const std::string& name, const std::string& path) {
+        const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
+        if (fd < 0) {
+            return fail(name, errno == EEXIST ? "left out: another entry has this name"
+                                              : std::string("left out: ") + strerror(errno));
+        }
+        const uint64_t size = copy_data(fd, name);
+        m_used += size;
+        const struct timespec times[2] = {{0, UTIME_OMIT}, {archive_entry_mtime(entry), 0}};
+        futimens(fd, times);
+        close(fd);
+    }
+
+    // The size that the file got.
+    uint64_t copy_data(int fd, const std::string& name) {
+        uint64_t size = 0;
+        const void* data;
+        size_t len;
+        la_int64_t offset;
+        for (int got; (got = archive_read_data_block(m_in, &data, &len, &offset)) != ARCHIVE_EOF;) {
+            if (got == ARCHIVE_FATAL || got == ARCHIVE_FAILED) {
+                fail(name, std::string("cut off: ") + archive_error_string(m_in));
+                return size;
+            }
+            // A hole counts, too: what reads the file reads it.
+            const uint64_t end = static_cast<uint64_t>(offset) + len;
+            if (offset < 0 || end > m_limit || m_used + end > m_limit) {
+                m_full = true;
+                fail("", "unpacked it is larger than the " + std::to_string(m_limit / MIB) +
+                             " MiB that it may take in " + m_dir.substr(0, m_dir.rfind('/')) +
+                             "; choose another directory by TMPDIR or see --unpack-limit");
+                return size;
+            }
+            if (!write_at(fd, static_cast<const char*>(data), len, offset)) {
+                fail(name, std::string("cut off: ") + strerror(errno));
+                m_full = errno == ENOSPC;
+                return size;
+            }
+            size = std::max(size, end);
+        }
+        return size;
+    }
+
+    static bool write_at(int fd, const char* data, size_t len, off_t offset) {
+        while (len > 0) {
+            const ssize_t n = pwrite(fd, data, len, offset);
+            if (n < 0 && errno == EINTR) {
+                continue;
+            }
+            if (n < 0) {
+                return false;
+            }
+            data += n;
+            offset += n;
+            len -= static_cast<size_t>(n);
+        }
+        return true;
+    }
+
+    const std::string m_name;
+    const std::string m_dir;
+    uint64_t m_limit;
+    struct archive* m_in;
+    Unpacked m_result;
+    uint64_t m_entries = 0;
+    uint64_t m_used = 0;
+    uint64_t m_more = 0;
+    bool m_full = false;
+};
+
+}  // namespace
+
+Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit) {
+    return Unpacker(path, dir, limit).run();
+}

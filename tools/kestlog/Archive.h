@@ -1,0 +1,26 @@
+// SPDX-License-Identifier: Apache-2.0
+// Unpacks a tar (compressed or not) or zip of logs from anyone. Nothing is written outside the
+// given directory, nothing is executable, and it takes no more room than it may.
+#ifndef KESTLOG_ARCHIVE_H_
+#define KESTLOG_ARCHIVE_H_
+
+#include <stdint.h>
+
+#include <string>
+#include <vector>
+
+struct Unpacked {
+    bool is_archive = false;
+    // A line for each entry that was left out or is damaged: the first MAX_LINES.
+    std::vector<std::string> failures;
+    // Names of links and devices, which are left out.
+    std::vector<std::string> strays;
+
+    static constexpr size_t MAX_LINES = 20;
+};
+
+// Unpacks the file at path, or standard input for "-", into an existing empty directory. limit:
+// the most bytes of all files, or 0 for what is free there less a tenth.
+Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit);
+
+#endif  // KESTLOG_ARCHIVE_H_
