@@ -2,6 +2,7 @@
 // Runs the real kestlog over good trees and over a table of damages.
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <signal.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -314,6 +315,53 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_TRUE(said("\"len\":8,\"payload\":0,\"intact\":true,\"kind\":\"pcm\"}\n")) << m_out;
     EXPECT_EQ(run("frames " + WCN_LOG + " >/dev/full 2>/dev/null; echo $?"), 0);
     EXPECT_EQ(m_out, "4\n");
+    // Who reads the output may stop: no word, and the end that the signal means.
+    EXPECT_EQ(system(("cd " + m_root.root() + "; (trap '' PIPE; '" KESTLOG "' frames --hex " +
+                      WCN_LOG + " 2>err; echo $? >status) | head -1 >out")
+                         .c_str()),
+              0);
+    EXPECT_EQ(m_root.read_file("status"), std::to_string(128 + SIGPIPE) + "\n");
+    EXPECT_EQ(m_root.read_file("err"), "");
+}
+
+TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
+    write_good_tree();
+    write(WCN_LOG, frame("one", 0x9d, 1) + frame("~two", 3, 1) + frame("three", 3, 2));
+    write(WCN + "1-cp_wcn-2016-03-01_09-00-00.log", frame("zero", 3, 2));
+    const std::string both = WCN + "1-cp_wcn-2016-03-01_09-00-00.log " + WCN_LOG;
+    const struct {
+        std::string args;
+        std::vector<std::string> payloads;  // their beginning as hexadecimal text
+    } CASES[] = {
+        {WCN_LOG, {"6f6e65", "7e74776f", "7468726565"}},
+        {"--type 3 " + both, {"7a65726f", "7e74776f", "7468726565"}},
+        {"--type 0x03 --sub-type 2 " + both, {"7a65726f", "7468726565"}},
+        {"--limit 2 " + both, {"7a65726f", "6f6e65"}},
+        {"--since 09:15 --until 2016-03-02 " + both, {"6f6e65", "7e74776f", "7468726565"}},
+        {"--until 09:14 " + both, {"7a65726f"}},
+        {"--type 3 - <" + WCN_LOG, {"7e74776f", "7468726565"}},
+    };
+    for (const auto& c : CASES) {
+        EXPECT_EQ(run("frames --json --hex " + c.args), 0) << m_err;
+        size_t at = 0;
+        for (const std::string& payload : c.payloads) {
+            at = m_out.find("\"data\":\"" + payload + "\"", at);
+            EXPECT_NE(at, std::string::npos) << c.args << "\n" << m_out;
+        }
+        EXPECT_EQ(occurrences(m_out, "\n"), c.payloads.size()) << c.args;
+    }
+    EXPECT_EQ(run("frames --hex " + both), 0);
+    EXPECT_TRUE(said(WCN_LOG + ":\n"));
+    EXPECT_TRUE(said("\n    000000  7e 74 77 6f                                      ~two\n"));
+    ASSERT_EQ(system(("cat " + m_root.path(DSP_LOG) + " | (cd " + m_root.root() +
+                      "; '" KESTLOG "' info - >o; cat " + DSP_LOG +
+                      " | '" KESTLOG "' split -) >/dev/null")
+                         .c_str()),
+              0);
+    EXPECT_NE(m_root.read_file("o").find("size            1067\n"), std::string::npos);
+    EXPECT_EQ(m_root.read_file("stdin.dump.bin"), LOG_DATA);
+    EXPECT_EQ(run("info " + both + " gone"), 2);
+    EXPECT_EQ(occurrences(m_out, "kind            log\n"), 2u) << m_out;
 }
 
 TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
@@ -367,19 +415,22 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     EXPECT_EQ(m_out, "3 files checked, 0 damages, 0 notes\n");
     EXPECT_EQ(run("ls data"), 0);
     EXPECT_TRUE(said("  cp_gnss                         300 bytes     3 files  2")) << m_out;
+    EXPECT_EQ(run("ls --tree data"), 0);
+    EXPECT_EQ(m_out.find("data\n`-- 2"), 0u) << m_out;
+    EXPECT_TRUE(said("\n    `-- cp_gnss\n        |-- 2-cp_gnss-2")) << m_out;
     EXPECT_EQ(run("ls --json data"), 0);
     EXPECT_LT(m_out.find("\"kind\":\"log\",\"number\":2,"), m_out.find("\"number\":0,")) << m_out;
 }
 
 TEST_F(KestlogTest, WrongUsageAndHelp) {
-    for (const char* args : {"", "fly", "ls", "info a b", "ls ''", "--fly ls x", "ls --force x",
-                             "info --output d x"}) {
+    for (const char* args : {"", "fly", "ls", "frames --type x a", "frames --limit -1 a", "ls ''",
+                             "--fly ls x", "ls --force x", "info --output d x"}) {
         EXPECT_EQ(run(args), 1) << args;
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
     }
     EXPECT_EQ(run("--help"), 0);
     for (const char* line :
-         {"\n  ls ROOT... ", "\n  info FILE ", "\n  split FILE ", "split: replace"}) {
+         {"\n  ls ROOT... ", "\n  info FILE... ", "\n  split FILE... ", "split: replace"}) {
         EXPECT_TRUE(said(line)) << line;
     }
     EXPECT_EQ(run("vrify ."), 1);

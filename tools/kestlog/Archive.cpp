@@ -14,6 +14,9 @@
 #include <algorithm>
 #include <sstream>
 
+#include "kestlog/Progress.h"
+#include "kestlog/Report.h"
+
 namespace {
 
 constexpr size_t BLOCK = 256 * 1024;
@@ -178,6 +181,9 @@ private:
                 return size;
             }
             size = std::max(size, end);
+            const int64_t packed = archive_filter_bytes(m_in, -1);
+            Progress::advance(static_cast<uint64_t>(packed - m_packed));
+            m_packed = packed;
         }
         return size;
     }
@@ -206,11 +212,13 @@ private:
     uint64_t m_entries = 0;
     uint64_t m_used = 0;
     uint64_t m_more = 0;
+    int64_t m_packed = 0;  // bytes of the archive itself so far
     bool m_full = false;
 };
 
 }  // namespace
 
 Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit) {
+    const Progress progress(path == "-" ? 0 : total_size({path}));
     return Unpacker(path, dir, limit).run();
 }

@@ -94,7 +94,9 @@ private:
     int64_t here() const { return static_cast<int64_t>(m_in.offset()); }
 
     void check_version() {
-        if (m_in.size() >= PROPERTY_VALUE_MAX) {
+        size_t got;
+        m_in.peek(PROPERTY_VALUE_MAX, got);
+        if (got >= PROPERTY_VALUE_MAX) {
             m_report.add(true, "version", "the version record is too long");
         }
     }
@@ -135,7 +137,8 @@ private:
 
     void scan_frames() {
         uint64_t first_broken = 0;
-        m_report.other += m_in.size() - m_in.offset();
+        uint64_t framed = 0;
+        const uint64_t start = m_in.offset();
         for (size_t got; !m_stop;) {
             const uint8_t* data = m_in.peek(1, got);
             if (got == 0) {
@@ -151,7 +154,7 @@ private:
             const uint64_t end = m_in.offset() + used;
             const uint64_t size = DiagFrameParser::escaped_size(body, len) + 2;
             if (take_frame(end > size ? end - size : 0, body, len)) {
-                m_report.other -= std::min(m_report.other, size);
+                framed += size;
             } else {
                 first_broken = m_report.broken++ ? first_broken : end - size;
                 // The flag that ended these bytes may begin a frame.
@@ -160,6 +163,8 @@ private:
             }
             m_in.skip(used);
         }
+        const uint64_t all = m_in.offset() - start;
+        m_report.other += all - std::min(all, framed);
         if (!m_name.framed_dump || m_stop) {
             return;
         }

@@ -10,6 +10,8 @@
 
 #include <algorithm>
 
+#include "kestlog/Progress.h"
+
 LogReader::~LogReader() {
     if (m_fd >= 0) {
         close(m_fd);
@@ -18,19 +20,35 @@ LogReader::~LogReader() {
 
 bool LogReader::open(const std::string& path, bool follow) {
     // Non-blocking: opening a FIFO must not wait for a writer.
-    m_fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (follow ? 0 : O_NOFOLLOW));
+    m_fd =
+        follow && path == "-"
+            ? fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, 0)
+            : ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (follow ? 0 : O_NOFOLLOW));
     struct stat st;
     if (m_fd < 0 || fstat(m_fd, &st) < 0) {
         return false;
     }
-    if (!S_ISREG(st.st_mode)) {
+    m_piped = follow && (S_ISFIFO(st.st_mode) || S_ISSOCK(st.st_mode) || path == "-") &&
+              !S_ISREG(st.st_mode);
+    if (S_ISDIR(st.st_mode) || !(S_ISREG(st.st_mode) || m_piped)) {
         errno = S_ISDIR(st.st_mode) ? EISDIR : EINVAL;
         return false;
     }
-    m_size = m_left = static_cast<uint64_t>(st.st_size);
+    if (m_piped && path != "-") {
+        fcntl(m_fd, F_SETFL, 0);  // its writer may be slow
+    }
+    const off_t start = m_piped ? 0 : std::max<off_t>(lseek(m_fd, 0, SEEK_CUR), 0);
+    m_size = static_cast<uint64_t>(std::max<off_t>(st.st_size - start, 0));
+    m_left = m_piped ? UINT64_MAX : m_size;
     m_modified = st.st_mtime;
     m_window.resize(WINDOW);
     return true;
+}
+
+void LogReader::drain() {
+    for (size_t got; peek(1, got), got > 0;) {
+        skip(got);
+    }
 }
 
 const uint8_t* LogReader::peek(size_t want, size_t& got) {
@@ -51,6 +69,7 @@ const uint8_t* LogReader::peek(size_t want, size_t& got) {
             }
             m_end += static_cast<size_t>(n);
             m_left -= static_cast<uint64_t>(n);
+            Progress::advance(static_cast<uint64_t>(n));
         }
     }
     got = m_end - m_start;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Reads a file of any size from start to end through a window of fixed size. Reads no further
-// than the size at opening, so that it also ends on a file that is being written.
+// Reads a file of any size, or a pipe, from start to end through a window of fixed size. Reads no
+// further than the size at opening, so that it also ends on a file that is being written.
 #ifndef KESTLOG_LOGREADER_H_
 #define KESTLOG_LOGREADER_H_
 
@@ -21,10 +21,14 @@ public:
     LogReader(const LogReader&) = delete;
     LogReader& operator=(const LogReader&) = delete;
 
-    // Opens a regular file. Follows a link only when follow is true. False, with errno, on failure.
+    // Opens a regular file. When follow is true, links are followed, pipes are read to their end,
+    // and "-" is standard input. False, with errno, on failure.
     bool open(const std::string& path, bool follow);
 
-    uint64_t size() const { return m_size; }
+    // Of the file or, of a pipe, what has been read so far.
+    uint64_t size() const { return m_piped ? m_offset + (m_end - m_start) : m_size; }
+    // Skips all that is left.
+    void drain();
     time_t modified() const { return m_modified; }
     uint64_t offset() const { return m_offset; }  // of the next byte
     int error() const { return m_error; }         // errno of a failed read, else 0
@@ -38,6 +42,7 @@ public:
 private:
     int m_fd = -1;
     int m_error = 0;
+    bool m_piped = false;
     uint64_t m_size = 0;
     uint64_t m_left = 0;  // not yet read
     uint64_t m_offset = 0;

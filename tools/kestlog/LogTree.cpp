@@ -96,16 +96,22 @@ bool LogTree::add(const std::string& path, Files files) {
         if (files == DIRECTORIES_ONLY || path == "-") {
             return false;
         }
-        const size_t slash = path.rfind('/') + 1;
-        const std::string dir = path.substr(0, slash);
-        const FileName name(path.substr(slash));
-        sets.push_back({"", path, m_medium, {}, {{name.cp, path, {}}}});
-        sets.back().cps[0].files.push_back({name, std::make_shared<TreeDir>(TreeDir{dir, dir}),
-                                            static_cast<uint64_t>(st.st_size), st.st_mtime});
+        add_file(path);
         return true;
     }
     m_alias = {};
     return add_media(path) || add_directory(path);
+}
+
+void LogTree::add_file(const std::string& path) {
+    struct stat st = {};
+    stat(path.c_str(), &st);
+    const size_t slash = path.rfind('/') + 1;
+    const std::string dir = path.substr(0, slash);
+    const FileName name(path.substr(slash));
+    sets.push_back({"", path, m_medium, {}, {{name.cp, path, {}}}});
+    sets.back().cps[0].files.push_back({name, std::make_shared<TreeDir>(TreeDir{dir, dir}),
+                                        static_cast<uint64_t>(st.st_size), st.st_mtime});
 }
 
 bool LogTree::add_archive(const std::string& path) {

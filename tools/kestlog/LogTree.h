@@ -70,6 +70,8 @@ public:
     // with FILES_TOO also a single file of any name. False when it is not one of them. What
     // cannot be read goes to failures. Nothing is added twice.
     bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
+    // Adds a single file of any name, as a set of its own; it need not be there.
+    void add_file(const std::string& path);
     // Adds a medium's top directory under this name in place of its own. With it a handset's
     // root does not take the card that it has itself.
     bool add_card(const std::string& path);
@@ -83,6 +85,8 @@ public:
     void cut(const LogTime& since, const LogTime& until);
     // The newest time in the tree: of a name or of the last write to a log file.
     LogTime newest() const;
+    // The bytes of all files.
+    uint64_t size() const;
 
     std::vector<TreeFile> root_files;  // in the log roots themselves
     std::vector<TreeSet> sets;         // oldest first

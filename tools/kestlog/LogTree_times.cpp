@@ -103,3 +103,18 @@ LogTime LogTree::newest() const {
     }
     return last;
 }
+
+uint64_t LogTree::size() const {
+    uint64_t bytes = 0;
+    for (const TreeFile& file : root_files) {
+        bytes += file.size;
+    }
+    for (const TreeSet& set : sets) {
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                bytes += file.size;
+            }
+        }
+    }
+    return bytes;
+}

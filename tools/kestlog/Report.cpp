@@ -5,11 +5,14 @@
 #include <errno.h>
 #include <stdio.h>
 #include <string.h>
+#include <sys/stat.h>
 
+#include <algorithm>
 #include <nlohmann/json.hpp>
 
 #include "common/text.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/Progress.h"
 
 std::string json_text(const std::string& text) {
     std::string utf8;
@@ -26,6 +29,7 @@ std::string json_text(const std::string& text) {
 }
 
 void print_json(const Json& json) {
+    Progress::clear();
     printf("%s\n", json.dump(-1, ' ', true).c_str());
 }
 
@@ -44,12 +48,35 @@ std::string finding_text(const Finding& finding) {
 }
 
 int failure(int status, const std::string& words) {
+    Progress::clear();
     fprintf(stderr, "kestlog: %s\n", escape_text(words).c_str());
     return status;
 }
 
 int open_input(LogReader& in, const std::string& path) {
     return in.open(path, true) ? ES_OK : failure(ES_UNREADABLE, path + ": " + strerror(errno));
+}
+
+int for_each_file(const CommandLine& line,
+                  int (*run)(const CommandLine& line, const std::string& path)) {
+    int status = ES_OK;
+    const Progress progress(total_size(line.params()));
+    for (const std::string& path : line.params()) {
+        status = std::max(status, run(line, path));
+    }
+    return status;
+}
+
+uint64_t total_size(const Args& paths) {
+    uint64_t total = 0;
+    for (const std::string& path : paths) {
+        struct stat st;
+        if (stat(path.c_str(), &st) < 0 || !S_ISREG(st.st_mode)) {
+            return 0;
+        }
+        total += static_cast<uint64_t>(st.st_size);
+    }
+    return total;
 }
 
 void tell_damage(const std::string& path, const FileReport& report) {

@@ -7,6 +7,7 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
+#include "common/CommandLine.h"
 #include "kestlog/FileScan.h"
 #include "kestlog/LogReader.h"
 
@@ -29,6 +30,13 @@ int failure(int status, const std::string& words);
 
 // Opens the input file of a command. 0, or the exit status after printing the reason.
 int open_input(LogReader& in, const std::string& path);
+
+// Runs a command for each of the FILEs of the line; the largest of the statuses.
+int for_each_file(const CommandLine& line,
+                  int (*run)(const CommandLine& line, const std::string& path));
+
+// The size of all the files, or 0 when one is no file.
+uint64_t total_size(const Args& paths);
 
 // Prints the damage on standard error.
 void tell_damage(const std::string& path, const FileReport& report);

@@ -8,6 +8,8 @@
 #include <time.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
 
@@ -50,14 +52,26 @@ bool parse_age(const std::string& text, int64_t* seconds) {
     return false;
 }
 
-bool read_limit(const CommandLine& line, const char* option, const LogTime& newest, bool end,
-                LogTime* time, int* status) {
+bool read_time(const CommandLine& line, const char* option, const LogTime& newest, bool end,
+               LogTime* time, int* status) {
     if (!line.has(option) || parse_time(line.value(option, ""), newest, end, time)) {
         return true;
     }
     *status = line.usage_error("--" + std::string(option) + ": '" + line.value(option, "") +
                                "' is not a time");
     return false;
+}
+
+// Applies --since and --until to a tree that is complete.
+bool cut_tree(const CommandLine& line, LogTree* tree, int* status) {
+    LogTime since, until;
+    const LogTime newest = tree->newest();
+    if (!read_time(line, "since", newest, false, &since, status) ||
+        !read_time(line, "until", newest, true, &until, status)) {
+        return false;
+    }
+    tree->cut(since, until);
+    return true;
 }
 
 }  // namespace
@@ -128,17 +142,33 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
         }
     }
     tree->finish();
-    LogTime since, until;
-    const LogTime newest = tree->newest();
-    if (!read_limit(line, "since", newest, false, &since, status) ||
-        !read_limit(line, "until", newest, true, &until, status)) {
+    if (!cut_tree(line, tree, status)) {
         return false;
     }
-    tree->cut(since, until);
     if (!any) {
         *status = tell_failures(*tree);
     }
     return any;
+}
+
+bool select_files(const CommandLine& line, Args* files, int* status) {
+    LogTree tree;
+    for (const std::string& path : line.params()) {
+        tree.add_file(path);
+    }
+    tree.finish();
+    if (!cut_tree(line, &tree, status)) {
+        return false;
+    }
+    for (const std::string& path : line.params()) {
+        const auto holds = [&path](const TreeSet& set) {
+            return set.shown == path && !set.cps[0].files.empty();
+        };
+        if (std::any_of(tree.sets.begin(), tree.sets.end(), holds)) {
+            files->push_back(path);
+        }
+    }
+    return true;
 }
 
 int tell_failures(const LogTree& tree) {

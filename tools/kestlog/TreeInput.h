@@ -15,6 +15,10 @@ bool open_tree(const CommandLine& line, LogTree* tree, int* status,
 bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* status,
                LogTree::Files files = LogTree::DIRECTORIES_ONLY);
 
+// The FILEs of the line that --since and --until leave, in the same order; "-" always stays.
+// False, after printing why, when the command must end with *status.
+bool select_files(const CommandLine& line, Args* files, int* status);
+
 // Prints the failures of the tree; ES_OK without one, else ES_UNREADABLE.
 int tell_failures(const LogTree& tree);
 

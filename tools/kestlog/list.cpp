@@ -73,6 +73,57 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
            file.name.kind, escape_text(file.name.text).c_str());
 }
 
+// What stands on a line of the tree, and what hangs below it.
+struct Branch {
+    std::string text;
+    std::vector<Branch> below;
+};
+
+void print_branch(const Branch& branch, const std::string& margin) {
+    for (const Branch& each : branch.below) {
+        const bool last = &each == &branch.below.back();
+        printf("%s%s %s\n", margin.c_str(), last ? "`--" : "|--", escape_text(each.text).c_str());
+        print_branch(each, margin + (last ? "    " : "|   "));
+    }
+}
+
+std::string file_line(const TreeFile& file) {
+    return file.name.text + "  " + std::to_string(file.size);
+}
+
+// By media, which a list is not: there the sets of all media are in the order of their times.
+void print_tree(const LogTree& tree) {
+    Branch root;
+    std::vector<std::string> done;
+    for (const TreeFile& file : tree.root_files) {
+        printf("%s  %llu\n", escape_text(file.shown()).c_str(),
+               static_cast<unsigned long long>(file.size));
+    }
+    for (const TreeSet& first : tree.sets) {
+        if (std::find(done.begin(), done.end(), first.medium) != done.end()) {
+            continue;
+        }
+        done.push_back(first.medium);
+        Branch medium;
+        for (const TreeSet& set : tree.sets) {
+            if (set.medium != first.medium) {
+                continue;
+            }
+            Branch cps = {set.name.empty() ? set.shown : set.name, {}};
+            for (const TreeCp& cp : set.cps) {
+                Branch files = {cp.name, {}};
+                for (const TreeFile& file : cp.files) {
+                    files.below.push_back({file_line(file), {}});
+                }
+                cps.below.push_back(files);
+            }
+            medium.below.push_back(cps);
+        }
+        printf("%s\n", escape_text(first.medium).c_str());
+        print_branch(medium, "");
+    }
+}
+
 }  // namespace
 
 int run_ls(const CommandLine& line) {
@@ -82,6 +133,10 @@ int run_ls(const CommandLine& line) {
         return status;
     }
     const bool json = line.has("json");
+    if (line.has("tree") && !json) {
+        print_tree(tree);
+        return tell_failures(tree);
+    }
     for (const TreeFile& file : tree.root_files) {
         print_file(json, nullptr, nullptr, file);
     }

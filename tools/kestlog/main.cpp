@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog: reads and checks what the service writes.
+#include <signal.h>
 #include <stdint.h>
 #include <stdio.h>
 
@@ -25,21 +26,28 @@ struct Command {
 // clang-format off
 constexpr Command COMMANDS[] = {
     {"ls",     "ROOT...", 1, ANY, run_ls,     "list sets, CPs and files with sizes and time spans"},
-    {"info",   "FILE",    1, 1,   run_info,   "print what a file is, its time record, frames and damage"},
+    {"info",   "FILE...", 1, ANY, run_info,   "print what a file is, its time record, frames and damage"},
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
-    {"frames", "FILE",    1, 1,   run_frames, "list the frames, or the chunks of an audio DSP log"},
-    {"split",  "FILE",    1, 1,   run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+    {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
+    {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
 };
 
 // The commands that take a ROOT.
 constexpr char TREES[] = "ls verify";
+// Those and the commands for which files are chosen by their time.
+constexpr char TIMES[] = "ls verify frames";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
     {"card",         "DIR",   TREES,   "the card of the handset whose root is given"},
-    {"since",        "T",     TREES,   "leave out files that end before T"},
-    {"until",        "T",     TREES,   "leave out files that begin after T"},
+    {"since",        "T",     TIMES,   "leave out files that end before T"},
+    {"until",        "T",     TIMES,   "leave out files that begin after T"},
     {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},
+    {"tree",         nullptr, "ls",    "draw the directories as a tree"},
+    {"type",         "N",     "frames", "only frames of this type: 0x9d, 157"},
+    {"sub-type",     "N",     "frames", "only frames of this sub-type"},
+    {"limit",        "N",     "frames", "stop after that many"},
+    {"hex",          nullptr, "frames", "print the payload, too"},
     {"output",       "DIR",   "split", "write the files to DIR instead of the current directory", 'o'},
     {"force",        nullptr, "split", "replace files that exist"},
 };
@@ -48,6 +56,7 @@ constexpr Option OPTIONS[] = {
 constexpr char NOTES[] =
     "ROOT is a handset's root, a medium's top directory, its modem_log, a set or a CP's\n"
     "directory, or a tar or zip of one of them (- for standard input).\n"
+    "FILE may be - for standard input.\n"
     "T is a local time of the handset, \"2016-03-01 09:15:00\", \"2016-03-01\" or \"09:15\", or\n"
     "what lies before the newest time in the ROOTs: \"-10m\", \"-2h\".\n"
     "\nExit status:\n"
@@ -94,6 +103,8 @@ int run(const CommandLine& line) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    // A reader of the output that has had enough ends the program without a word.
+    signal(SIGPIPE, SIG_DFL);
     const Syntax syntax = make_syntax();
     CommandLine line(syntax);
     const int status = line.parse(argc, argv) ? run(line) : line.status();

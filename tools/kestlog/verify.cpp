@@ -10,6 +10,7 @@
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/TreeInput.h"
 
@@ -68,6 +69,7 @@ private:
             object["path"] = json_text(path);
             print_json(object);
         } else {
+            Progress::clear();
             printf("%s: %s\n", escape_text(path).c_str(), finding_text(finding).c_str());
         }
     }
@@ -159,6 +161,7 @@ int run_verify(const CommandLine& line) {
     if (!open_tree(line, &tree, &status)) {
         return status;
     }
+    const Progress progress(tree.size());
     Verifier verifier(line.has("json"));
     verifier.tree(tree);
     return verifier.finish();

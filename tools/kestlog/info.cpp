@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// kestlog info and kestlog frames.
+// kestlog info.
 #include <stdio.h>
 
 #include <algorithm>
@@ -96,10 +96,7 @@ void add_findings(Facts* facts, bool json, const FileReport& report) {
     }
 }
 
-}  // namespace
-
-int run_info(const CommandLine& line) {
-    const std::string path = line.params()[0];
+int info(const CommandLine& line, const std::string& path) {
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
@@ -107,6 +104,7 @@ int run_info(const CommandLine& line) {
     const FileName name(file_part(path));
     FileReport report;
     scan_file(in, name, nullptr, &report);
+    in.drain();  // the size of a pipe shows at its end
     Facts facts(line.has("json"));
     facts.add("file", path);
     facts.add("kind", std::string(name.kind));
@@ -123,39 +121,16 @@ int run_info(const CommandLine& line) {
     add_content(&facts, name, report);
     facts.add("damaged", report.damaged);
     add_findings(&facts, line.has("json"), report);
-    if (line.has("json")) {
+    if (!line.has("json")) {
+        printf("%s", line.params().size() > 1 ? "\n" : "");
+    } else {
         print_json(facts.object());
     }
     return scan_status(in, path, report);
 }
 
-int run_frames(const CommandLine& line) {
-    const std::string path = line.params()[0];
-    LogReader in;
-    if (const int status = open_input(in, path)) {
-        return status;
-    }
-    FileReport report;
-    const bool json = line.has("json");
-    const PieceVisitor print = [json](const Piece& piece) {
-        if (!json) {
-            printf("%10llu  seq %-10u type 0x%02x 0x%02x  %5zu bytes%s%s%s\n",
-                   static_cast<unsigned long long>(piece.offset), piece.seq_num, piece.type,
-                   piece.sub_type, piece.data_len, piece.kind ? "  " : "",
-                   piece.kind ? piece.kind : "", piece.intact ? "" : "  wrong length");
-            return ferror(stdout) == 0;
-        }
-        Json object = {{"offset", piece.offset}, {"seq", piece.seq_num},
-                       {"type", piece.type},     {"sub_type", piece.sub_type},
-                       {"len", piece.len_field}, {"payload", piece.data_len},
-                       {"intact", piece.intact}};
-        if (piece.kind) {
-            object["kind"] = piece.kind;
-        }
-        print_json(object);
-        return ferror(stdout) == 0;
-    };
-    scan_file(in, FileName(file_part(path)), print, &report);
-    tell_damage(path, report);
-    return scan_status(in, path, report);
+}  // namespace
+
+int run_info(const CommandLine& line) {
+    return for_each_file(line, info);
 }
