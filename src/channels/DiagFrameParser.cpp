@@ -4,8 +4,6 @@
 
 #include <string.h>
 
-#include <algorithm>
-
 namespace {
 
 constexpr uint8_t FLAG = 0x7E;
@@ -21,6 +19,7 @@ bool is_special(uint8_t byte) {
 void DiagFrameParser::init() {
     m_state = HUNTING;
     m_len = 0;
+    m_body_raw = 0;
 }
 
 void DiagFrameParser::append(const uint8_t* bytes, size_t len) {
@@ -37,6 +36,27 @@ void DiagFrameParser::append_escaped(uint8_t byte) {
     append(&byte, 1);
 }
 
+// Decodes bytes of a body that has no flag in it; the bytes used, which is all but a last
+// escape that is taken with the next input.
+size_t DiagFrameParser::take_body(const uint8_t* data, size_t len) {
+    size_t pos = 0;
+    while (pos < len) {
+        const void* const found = memchr(data + pos, ESCAPE, len - pos);
+        const size_t plain =
+            found ? static_cast<size_t>(static_cast<const uint8_t*>(found) - data) : len;
+        append(data + pos, plain - pos);
+        if (!found) {
+            break;
+        }
+        if (plain + 1 == len) {
+            return plain;
+        }
+        append_escaped(data[plain + 1]);
+        pos = plain + 2;
+    }
+    return len;
+}
+
 bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame, size_t& frame_len,
                                size_t& consumed) {
     frame = nullptr;
@@ -44,11 +64,16 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
     size_t pos = 0;
     while (pos < len) {
         switch (m_state) {
-            case HUNTING:
-                if (data[pos++] == FLAG) {
-                    m_state = AFTER_FLAG;
+            case HUNTING: {
+                const void* const flag = memchr(data + pos, FLAG, len - pos);
+                if (!flag) {
+                    consumed = len;
+                    return false;
                 }
+                pos = static_cast<size_t>(static_cast<const uint8_t*>(flag) - data) + 1;
+                m_state = AFTER_FLAG;
                 break;
+            }
             case AFTER_FLAG:
                 if (data[pos] == FLAG) {
                     ++pos;
@@ -59,24 +84,22 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
             case ESCAPE_PENDING:
                 m_state = IN_FRAME;
                 append_escaped(data[pos++]);
+                ++m_body_raw;
                 break;
             case IN_FRAME: {
-                const size_t plain = pos;
-                while (pos < len && !is_special(data[pos])) {
-                    ++pos;
-                }
-                append(data + plain, pos - plain);
-                if (pos == len) {
-                    break;
-                }
-                if (data[pos++] == ESCAPE) {
-                    if (pos == len) {
-                        m_state = ESCAPE_PENDING;
-                    } else {
-                        append_escaped(data[pos++]);
-                    }
-                } else {
+                const void* const flag = memchr(data + pos, FLAG, len - pos);
+                const size_t end =
+                    flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - data) : len;
+                const size_t used = take_body(data + pos, end - pos);
+                const bool escape = used < end - pos;
+                m_body_raw += end - pos;
+                pos = end;
+                if (escape) {
+                    m_state = ESCAPE_PENDING;  // what follows is no flag, whatever it is
+                } else if (flag) {
                     const size_t body_len = m_len;
+                    m_raw_size = m_body_raw + 2;
+                    ++pos;
                     init();
                     if (body_len > MAX_FRAME) {
                         break;
@@ -105,10 +128,6 @@ size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {
         }
     }
     return n;
-}
-
-size_t DiagFrameParser::escaped_size(const uint8_t* src, size_t len) {
-    return len + static_cast<size_t>(std::count_if(src, src + len, is_special));
 }
 
 void DiagFrameParser::frame(uint8_t type, uint8_t sub_type, const uint8_t* payload,

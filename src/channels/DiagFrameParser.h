@@ -33,11 +33,11 @@ public:
     bool unescape(const uint8_t* data, size_t len, uint8_t*& frame, size_t& frame_len,
                   size_t& consumed);
 
+    // The bytes that the last frame took before it was decoded, both flags included.
+    size_t raw_size() const { return m_raw_size; }
+
     // Escapes len bytes to dst, which has room for twice as many; the bytes written.
     static size_t escape(const uint8_t* src, size_t len, uint8_t* dst);
-
-    // The bytes that escape() would write.
-    static size_t escaped_size(const uint8_t* src, size_t len);
 
     // Builds a whole frame in a new buffer, which the caller frees with delete[].
     static void frame(uint8_t type, uint8_t sub_type, const uint8_t* payload, size_t payload_len,
@@ -53,10 +53,13 @@ private:
 
     void append(const uint8_t* bytes, size_t len);
     void append_escaped(uint8_t byte);
+    size_t take_body(const uint8_t* data, size_t len);
 
     State m_state;
     uint8_t m_frame[MAX_FRAME];
-    uint32_t m_len;  // above MAX_FRAME: too long, to be dropped
+    uint32_t m_len;     // above MAX_FRAME: too long, to be dropped
+    size_t m_body_raw;  // of the frame in progress, without its flags
+    size_t m_raw_size = 0;
 };
 
 #endif  // CHANNELS_DIAGFRAMEPARSER_H_

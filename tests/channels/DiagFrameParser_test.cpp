@@ -27,6 +27,7 @@ protected:
                 size_t len = 99;
                 if (parser->unescape(data + pos, piece.size() - pos, frame, len, used)) {
                     EXPECT_EQ(piece[pos + used - 1], '\x7e');
+                    raw_size = parser->raw_size();
                     frames.emplace_back(reinterpret_cast<char*>(frame), len);
                 } else {
                     EXPECT_EQ(frame, nullptr);
@@ -46,6 +47,7 @@ protected:
         return wire;
     }
 
+    size_t raw_size = 0;  // of the last frame
     std::unique_ptr<DiagFrameParser> parser = std::make_unique<DiagFrameParser>();
 };
 
@@ -55,21 +57,23 @@ TEST_F(DiagFrameParserTest, DecodesTheSameWhereverTheInputIsSplit) {
         const char* what;
         std::string input;
         Strings frames;
+        size_t raw_size;  // of the last one
     } cases[] = {
-        {"escapes, next to each other and at both ends", "~}^a}]}^}]~", {"~a}~}"}},
-        {"the byte after an escape is never a flag", "~a}~b~", {"a^b"}},
-        {"repeated flags", "~~~body~", {"body"}},
-        {"garbage before the first flag", "x}yz~body~", {"body"}},
-        {"a closing flag does not open the next frame", "~one~two~", {"one"}},
-        {"in step after a lost opening flag", "~1~2~~3~", {"1", "3"}},
-        {"garbage between frames", "~one~xx}~two~", {"one", "two"}},
-        {"unfinished", "~one~~two", {"one"}},
+        {"escapes, next to each other and at both ends", "~}^a}]}^}]~", {"~a}~}"}, 11},
+        {"the byte after an escape is never a flag", "~a}~b~", {"a^b"}, 6},
+        {"repeated flags", "~~~body~", {"body"}, 6},
+        {"garbage before the first flag", "x}yz~body~", {"body"}, 6},
+        {"a closing flag does not open the next frame", "~one~two~", {"one"}, 5},
+        {"in step after a lost opening flag", "~1~2~~3~", {"1", "3"}, 3},
+        {"garbage between frames", "~one~xx}~two~", {"one", "two"}, 5},
+        {"unfinished", "~one~~two", {"one"}, 5},
     };
     for (const auto& c : cases) {
         for (size_t split = 0; split <= c.input.size(); ++split) {
             parser->init();  // forgets the frame in progress
             EXPECT_EQ(decode({c.input.substr(0, split), c.input.substr(split)}), c.frames)
                 << c.what << ", split at " << split;
+            EXPECT_EQ(raw_size, c.raw_size) << c.what << ", split at " << split;
         }
     }
 }

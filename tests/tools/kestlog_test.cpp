@@ -297,11 +297,17 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_TRUE(said("\"dump_bytes\":1000,\"sequence_gaps\":0,\"payload\":1007,")) << m_out;
 
     // Frames are found between anything, across every window, and after a lost flag.
-    std::string text = "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(700000, 2);
+    std::string text =
+        "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(9000000, 2);
     const std::string big(65527, '~');  // the largest
     text += "~" + frame(big, 3, 4) + frame("lost").substr(1) + frame("last");
     write(WCN_LOG, text);
-    EXPECT_EQ(run("frames " + WCN_LOG + " | grep -v wrong"), 0);
+    EXPECT_EQ(run("frames - <" + WCN_LOG + " | grep -v wrong"), 0);
+    const std::string large = m_out;
+    EXPECT_EQ(
+        run("--version >/dev/null; cat " + WCN_LOG + " | '" KESTLOG "' frames - | grep -v wrong"),
+        0);
+    EXPECT_EQ(m_out, large) << "a file that is read ahead and a pipe differ";
     const size_t at = text.find(frame(big, 3, 4).substr(0, 20));
     const std::string seq = "  seq 0          type ";
     for (const std::string& line :

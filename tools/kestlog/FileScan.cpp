@@ -152,7 +152,7 @@ private:
                 continue;
             }
             const uint64_t end = m_in.offset() + used;
-            const uint64_t size = DiagFrameParser::escaped_size(body, len) + 2;
+            const uint64_t size = m_parser.raw_size();
             if (take_frame(end > size ? end - size : 0, body, len)) {
                 framed += size;
             } else {

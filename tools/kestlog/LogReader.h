@@ -8,13 +8,16 @@
 #include <stdint.h>
 #include <time.h>
 
+#include <memory>
 #include <string>
 #include <vector>
+
+#include "kestlog/ReadAhead.h"
 
 class LogReader {
 public:
     // Larger than any frame or chunk.
-    static constexpr size_t WINDOW = 256 * 1024;
+    static constexpr size_t WINDOW = ReadAhead::SIZE;
 
     LogReader() = default;
     ~LogReader();
@@ -40,6 +43,9 @@ public:
     void skip(size_t n);
 
 private:
+    void fill(size_t want);
+    void fill_ahead(size_t want);
+
     int m_fd = -1;
     int m_error = 0;
     bool m_piped = false;
@@ -48,6 +54,8 @@ private:
     uint64_t m_offset = 0;
     time_t m_modified = 0;
     std::vector<uint8_t> m_window;
+    std::unique_ptr<ReadAhead> m_ahead;  // of a large file, instead of the window
+    uint8_t* m_bytes = nullptr;          // where the window is
     size_t m_start = 0;
     size_t m_end = 0;
 };

@@ -5,12 +5,12 @@
 #include <stdlib.h>
 
 #include <algorithm>
-#include <nlohmann/json.hpp>
 #include <utility>
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/LineBuffer.h"
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/TreeInput.h"
@@ -54,83 +54,120 @@ bool read_options(const CommandLine& line, Wanted* wanted, std::string* wrong) {
     return !line.has("limit") || parse_number(line, "limit", UINT64_MAX, &wanted->limit);
 }
 
-void print_hex(const Piece& piece) {
-    constexpr size_t ROW = 16;
-    for (size_t row = 0; row < piece.data_len; row += ROW) {
-        std::string text;
-        printf("    %06zx ", row);
+class FramePrinter {
+public:
+    FramePrinter(const Wanted& wanted, const std::string& path) : m_wanted(wanted) {
+        if (!wanted.several) {
+            return;
+        }
+        if (wanted.json) {
+            m_file = "\"file\":" + json_string(path) + ",";
+        } else {
+            m_out.add(escape_text(path) + ":");
+            m_out.end_line();
+        }
+    }
+
+    // False once the output cannot be written.
+    bool print(const Piece& piece) {
+        m_wanted.json ? print_json(piece) : print_text(piece);
+        return m_out.end_line();
+    }
+
+private:
+    void print_text(const Piece& piece) {
+        m_out.add(piece.offset, 10);
+        m_out.add("  seq ");
+        m_out.add(piece.seq_num, -10);
+        m_out.add(" type 0x");
+        m_out.add_hex(piece.type);
+        m_out.add(" 0x");
+        m_out.add_hex(piece.sub_type);
+        m_out.add("  ");
+        m_out.add(piece.data_len, 5);
+        m_out.add(" bytes");
+        if (piece.kind) {
+            m_out.add("  ");
+            m_out.add(piece.kind);
+        }
+        m_out.add(piece.intact ? "" : "  wrong length");
+        for (size_t row = 0; m_wanted.hex && row < piece.data_len; row += ROW) {
+            m_out.end_line();
+            print_row(piece, row);
+        }
+    }
+
+    void print_row(const Piece& piece, size_t row) {
+        const size_t end = std::min(row + ROW, piece.data_len);
+        m_out.add("    ");
+        for (const size_t shift : {16, 8, 0}) {
+            m_out.add_hex(static_cast<uint8_t>(row >> shift));
+        }
+        m_out.add(" ");
         for (size_t i = row; i < row + ROW; ++i) {
-            if (i < piece.data_len) {
-                printf(" %02x", piece.data[i]);
-                const char c = static_cast<char>(piece.data[i]);
-                text += c >= 0x20 && c < 0x7f ? c : '.';
-            } else {
-                printf("   ");
+            m_out.add(" ");
+            i < end ? m_out.add_hex(piece.data[i]) : m_out.add("  ");
+        }
+        m_out.add("  ");
+        for (size_t i = row; i < end; ++i) {
+            const char c = static_cast<char>(piece.data[i]);
+            m_out.add({c >= 0x20 && c < 0x7f ? &c : ".", 1});
+        }
+    }
+
+    // By hand, as there may be millions. No text in it needs to be escaped but the file's.
+    void print_json(const Piece& piece) {
+        m_out.add("{");
+        m_out.add(m_file);
+        const std::pair<const char*, uint64_t> numbers[] = {
+            {"\"offset\":", piece.offset},  {",\"seq\":", piece.seq_num},
+            {",\"type\":", piece.type},     {",\"sub_type\":", piece.sub_type},
+            {",\"len\":", piece.len_field}, {",\"payload\":", piece.data_len}};
+        for (const auto& [key, value] : numbers) {
+            m_out.add(key);
+            m_out.add(value);
+        }
+        m_out.add(piece.intact ? ",\"intact\":true" : ",\"intact\":false");
+        if (piece.kind) {
+            m_out.add(",\"kind\":\"");
+            m_out.add(piece.kind);
+            m_out.add("\"");
+        }
+        if (m_wanted.hex) {
+            m_out.add(",\"data\":\"");
+            for (size_t i = 0; i < piece.data_len; ++i) {
+                m_out.add_hex(piece.data[i]);
             }
+            m_out.add("\"");
         }
-        printf("  %s\n", text.c_str());
+        m_out.add("}");
     }
-}
 
-std::string hex_text(const Piece& piece) {
-    static const char DIGITS[] = "0123456789abcdef";
-    std::string text;
-    for (size_t i = 0; i < piece.data_len; ++i) {
-        text += DIGITS[piece.data[i] >> 4];
-        text += DIGITS[piece.data[i] & 15];
-    }
-    return text;
-}
+    static constexpr size_t ROW = 16;
 
-void print_piece(const Wanted& wanted, const std::string& path, const Piece& piece) {
-    if (!wanted.json) {
-        printf("%10llu  seq %-10u type 0x%02x 0x%02x  %5zu bytes%s%s%s\n",
-               static_cast<unsigned long long>(piece.offset), piece.seq_num, piece.type,
-               piece.sub_type, piece.data_len, piece.kind ? "  " : "", piece.kind ? piece.kind : "",
-               piece.intact ? "" : "  wrong length");
-        if (wanted.hex) {
-            print_hex(piece);
-        }
-        return;
-    }
-    Json object;
-    if (wanted.several) {
-        object["file"] = json_text(path);
-    }
-    object["offset"] = piece.offset;
-    object["seq"] = piece.seq_num;
-    object["type"] = piece.type;
-    object["sub_type"] = piece.sub_type;
-    object["len"] = piece.len_field;
-    object["payload"] = piece.data_len;
-    object["intact"] = piece.intact;
-    if (piece.kind) {
-        object["kind"] = piece.kind;
-    }
-    if (wanted.hex) {
-        object["data"] = hex_text(piece);
-    }
-    print_json(object);
-}
+    const Wanted& m_wanted;
+    std::string m_file;
+    LineBuffer m_out;
+};
 
 int frames(const std::string& path, Wanted* wanted) {
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
     }
-    if (wanted->several && !wanted->json) {
-        printf("%s:\n", escape_text(path).c_str());
-    }
     FileReport report;
-    const PieceVisitor print = [&](const Piece& piece) {
-        if ((wanted->type < 0 || wanted->type == piece.type) &&
-            (wanted->sub_type < 0 || wanted->sub_type == piece.sub_type)) {
-            print_piece(*wanted, path, piece);
-            --wanted->limit;
-        }
-        return wanted->limit > 0 && ferror(stdout) == 0;
-    };
-    scan_file(in, FileName(file_part(path)), print, &report);
+    {
+        FramePrinter printer(*wanted, path);
+        const PieceVisitor print = [&](const Piece& piece) {
+            bool more = true;
+            if ((wanted->type < 0 || wanted->type == piece.type) &&
+                (wanted->sub_type < 0 || wanted->sub_type == piece.sub_type)) {
+                more = printer.print(piece) && --wanted->limit > 0;
+            }
+            return more;
+        };
+        scan_file(in, FileName(file_part(path)), print, &report);
+    }
     tell_damage(path, report);
     return scan_status(in, path, report);
 }

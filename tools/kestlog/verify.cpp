@@ -53,6 +53,7 @@ public:
                         {"notes", m_notes},
                         {"unreadable", m_unreadable}});
         } else {
+            Progress::clear();
             printf("%llu files checked, %llu damages, %llu notes\n",
                    static_cast<unsigned long long>(m_files),
                    static_cast<unsigned long long>(m_damages),

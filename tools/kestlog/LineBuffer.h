@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: Apache-2.0
+// Lines for standard output, several million a second: printf would take longer than reading
+// what they are about.
+#ifndef KESTLOG_LINEBUFFER_H_
+#define KESTLOG_LINEBUFFER_H_
+
+#include <stddef.h>
+#include <stdint.h>
+#include <string.h>
+
+#include <string_view>
+#include <vector>
+
+class LineBuffer {
+public:
+    LineBuffer() : m_bytes(SIZE) {}
+    ~LineBuffer() { flush(); }
+    LineBuffer(const LineBuffer&) = delete;
+    LineBuffer& operator=(const LineBuffer&) = delete;
+
+    void add(std::string_view text) {
+        if (text.size() > SIZE - m_len) {
+            add_long(text);
+            return;
+        }
+        memcpy(m_bytes.data() + m_len, text.data(), text.size());
+        m_len += text.size();
+    }
+    // In decimal, with blanks before it up to the width, or after it when that is negative.
+    void add(uint64_t number, int width = 0);
+    // Two hexadecimal digits.
+    void add_hex(uint8_t byte) {
+        static const char DIGITS[] = "0123456789abcdef";
+        const char text[] = {DIGITS[byte >> 4], DIGITS[byte & 15]};
+        add({text, sizeof(text)});
+    }
+    // Ends a line. False once the output cannot be written any more.
+    bool end_line();
+    void flush();
+
+private:
+    static constexpr size_t SIZE = 64 * 1024;
+
+    void add_long(std::string_view text);
+
+    std::vector<char> m_bytes;
+    size_t m_len = 0;
+};
+
+#endif  // KESTLOG_LINEBUFFER_H_
