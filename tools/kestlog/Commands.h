@@ -11,5 +11,6 @@ int run_info(const CommandLine& line);
 int run_verify(const CommandLine& line);
 int run_frames(const CommandLine& line);
 int run_split(const CommandLine& line);
+int run_export(const CommandLine& line);
 
 #endif  // KESTLOG_COMMANDS_H_

@@ -30,12 +30,13 @@ constexpr Command COMMANDS[] = {
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+    {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify";
+constexpr char TREES[] = "ls verify export";
 // Those and the commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames";
+constexpr char TIMES[] = "ls verify frames export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -44,12 +45,14 @@ constexpr Option OPTIONS[] = {
     {"until",        "T",     TIMES,   "leave out files that begin after T"},
     {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},
     {"tree",         nullptr, "ls",    "draw the directories as a tree"},
-    {"type",         "N",     "frames", "only frames of this type: 0x9d, 157"},
+    {"cp",           "NAME",  "export", "only this co-processor"},
+    {"type",         "N",     "frames export", "only frames of this type: 0x9d, 157"},
     {"sub-type",     "N",     "frames", "only frames of this sub-type"},
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
-    {"output",       "DIR",   "split", "write the files to DIR instead of the current directory", 'o'},
-    {"force",        nullptr, "split", "replace files that exist"},
+    {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
+    {"output",       "PATH",  "split export", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "split export", "replace files that exist"},
 };
 // clang-format on
 

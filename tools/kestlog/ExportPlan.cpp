@@ -1,0 +1,116 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/ExportPlan.h"
+
+#include <cutils/properties.h>
+#include <strings.h>
+
+#include <algorithm>
+#include <map>
+#include <utility>
+
+#include "common/text.h"
+#include "kestlog/LogReader.h"
+#include "kestlog/LogStream.h"
+
+namespace {
+
+bool is_wanted(const std::string& cp, const std::string& wanted) {
+    return wanted.empty() || strcasecmp(cp.c_str(), wanted.c_str()) == 0;
+}
+
+// Whether its bytes are framed. Without a name of the service it may be anything.
+bool has_frames(const TreeFile& file, bool given) {
+    return file.name.framed_dump || (given && !file.name.exact);
+}
+
+// The version that stands beside the file; "" without one.
+std::string firmware_of(const ExportSource& source) {
+    const FileName name(source.file->name.cp + ".version");
+    LogReader in;
+    if (name.type != LT_VERSION || !in.open(source.file->dir->path + name.text, false)) {
+        return "";
+    }
+    size_t got;
+    const uint8_t* data = in.peek(1, got);
+    const std::string text(data, data + std::min<size_t>(got, PROPERTY_VALUE_MAX));
+    return text.substr(0, text.find_last_not_of("\r\n") + 1);
+}
+
+ExportInterface interface_of(const ExportSource& source) {
+    const TreeSet& set = *source.set;
+    const std::string version = firmware_of(source);
+    std::string description =
+        set.name.empty() ? set.shown : "set " + set.name + " on " + set.medium;
+    description += version.empty() ? "" : ", firmware " + version;
+    return {escape_text(source.cp.empty() ? source.file->name.text : source.cp),
+            escape_text(description), 1};
+}
+
+}  // namespace
+
+ExportPlan::ExportPlan(const LogTree& tree, const std::string& cp) {
+    find_sources(tree, cp);
+    std::stable_sort(
+        sources.begin(), sources.end(),
+        [](const ExportSource& a, const ExportSource& b) { return a.order < b.order; });
+    find_interfaces();
+}
+
+uint64_t ExportPlan::size() const {
+    uint64_t bytes = 0;
+    for (const ExportSource& source : sources) {
+        bytes += source.file->size;
+    }
+    return bytes;
+}
+
+void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
+    for (const LogStream& stream : log_streams(tree)) {
+        LogTime order;
+        for (const StreamFile& log : stream.files) {
+            order = std::max(order, log.file->name.time);
+            if (is_wanted(stream.cp, cp)) {
+                sources.push_back({log.set, log.file, stream.cp, order});
+            }
+        }
+    }
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& dir : set.cps) {
+            for (const TreeFile& file : dir.files) {
+                if (file.name.is_log() || !is_wanted(dir.name, cp)) {
+                    continue;
+                }
+                const ExportSource source = {&set, &file, dir.name, file.name.time};
+                if (has_frames(file, source.given())) {
+                    sources.push_back(source);
+                } else {
+                    ++left_out;
+                }
+            }
+        }
+    }
+}
+
+void ExportPlan::find_interfaces() {
+    std::map<std::pair<const TreeSet*, std::string>, uint32_t> numbers;
+    std::vector<ExportSource*> last_logs;  // of each interface
+    for (ExportSource& source : sources) {
+        const auto next = static_cast<uint32_t>(interfaces.size());
+        const auto [it, is_new] = numbers.insert({{source.set, source.cp}, next});
+        source.interface = it->second;
+        if (is_new) {
+            interfaces.push_back(interface_of(source));
+            last_logs.push_back(nullptr);
+        }
+        if (!source.file->name.is_log()) {
+            source.queue = interfaces[source.interface].queues++;
+            continue;
+        }
+        ExportSource*& last = last_logs[source.interface];
+        if (last) {
+            last->continued = last->file->name.number == source.file->name.number + 1;
+        }
+        last = &source;
+    }
+}

@@ -1,0 +1,225 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/FrameExporter.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <string.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "channels/DspChunkHeader.h"
+#include "channels/modem_dump_end.h"
+#include "common/text.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/Report.h"
+#include "kestlog/TreeInput.h"
+
+namespace {
+
+// The longest frame in a file.
+constexpr size_t MAX_TAIL = 2 * DiagFrameParser::MAX_FRAME + 2;
+constexpr size_t MAX_REMARKS = 2000;
+
+// Bytes of a file, again; fewer when it has become shorter.
+std::string read_at(const std::string& path, uint64_t offset, size_t len) {
+    std::string bytes(len, '\0');
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
+    size_t got = 0;
+    for (ssize_t n; fd >= 0 && got < len; got += static_cast<size_t>(n)) {
+        n = pread(fd, &bytes[got], len - got, static_cast<off_t>(offset + got));
+        if (n <= 0) {
+            break;
+        }
+    }
+    if (fd >= 0) {
+        close(fd);
+    }
+    bytes.resize(got);
+    return bytes;
+}
+
+size_t framed_size(const uint8_t* body, size_t len) {
+    return DiagFrameParser::escaped_size(body, len) + 2;
+}
+
+}  // namespace
+
+int FrameExporter::add(const ExportSource& source) {
+    const std::string shown = source.file->shown();
+    LogReader in;
+    if (!in.open(source.file->path(), source.given())) {
+        return failure(ES_UNREADABLE, shown + ": " + strerror(errno));
+    }
+    FileReport report;
+    m_source = &source;
+    m_report = &report;
+    m_begun = m_any = m_named = false;
+    ++m_totals.files;
+    const PieceVisitor visit = [this](const Piece& piece) { return take(piece); };
+    scan_file(in, source.file->name, visit, &report);
+    if (m_writer.good()) {
+        end(in);
+    }
+    tell_damage(shown, report);
+    return scan_status(in, shown, report);
+}
+
+// Before the first piece, which begins at that offset; or at the end of a file without one.
+void FrameExporter::begin(uint64_t first) {
+    const LogTime& named = m_source->file->name.time;
+    m_begun = true;
+    m_time = has_time(named) ? seconds_of(named) : 0;
+    m_end = m_tail = 0;
+    if (m_report->has_record) {
+        m_time = m_report->record.seconds;
+        m_end = m_tail = sizeof(TimeSyncRecord);
+    }
+    if (m_source->queue == 0 && !line().tail.empty()) {
+        join(first);
+    }
+}
+
+// The frame that began in the log file before this one and ends in this one.
+void FrameExporter::join(uint64_t first) {
+    Line& before = line();
+    std::string bytes;
+    bytes.swap(before.tail);
+    const uint64_t rest = first - std::min(first, m_end);
+    if (rest > 0 && bytes.size() + rest <= MAX_TAIL) {
+        const size_t tail = bytes.size();
+        bytes += read_at(m_source->file->path(), m_end, static_cast<size_t>(rest));
+        uint8_t* body;
+        size_t len;
+        size_t used;
+        DiagHeader header;
+        m_parser.init();
+        if (m_parser.unescape(reinterpret_cast<const uint8_t*>(bytes.data()), bytes.size(), body,
+                              len, used) &&
+            len >= sizeof(header) && used > tail) {
+            memcpy(&header, body, sizeof(header));
+            const uint64_t skipped = used - std::min(used, framed_size(body, len));
+            if (header.len == len) {
+                if (skipped > 0) {
+                    remark_next(outside(skipped, "before this packet"));
+                }
+                if (write(before.tail_time, header.type, body, len)) {
+                    m_writer.comment(
+                        escape_text("begins in " + before.tail_file + ", ends in " + file_name()));
+                }
+                m_end = m_tail = m_end + (used - tail);
+                return;
+            }
+        }
+    }
+    if (before.tail_other > 0) {
+        remark_next(outside(before.tail_other, "at the end of " + before.tail_file));
+    }
+}
+
+bool FrameExporter::take(const Piece& piece) {
+    if (!m_begun) {
+        begin(piece.offset);
+    }
+    if (!piece.data || !(piece.intact || m_wanted.broken)) {
+        return true;  // it counts with the bytes before the next one
+    }
+    const size_t head = piece.kind ? DSP_CHUNK_HEADER_LEN : sizeof(DiagHeader);
+    const uint8_t* const body = piece.data - head;
+    const size_t len = head + piece.data_len;
+    if (piece.offset > m_end) {
+        remark_next(outside(piece.offset - m_end, "before this packet"));
+    }
+    m_end = piece.offset + (piece.kind ? len : framed_size(body, len));
+    m_tail = piece.intact ? m_end : m_end - 1;
+    if (!write(m_time, piece.type, body, len)) {
+        return m_writer.good();
+    }
+    if (!m_named) {
+        m_named = true;
+        const char* const source = m_report->has_record                  ? "time of its record"
+                                   : has_time(m_source->file->name.time) ? "time of its name"
+                                                                         : "time unknown";
+        m_writer.comment(escape_text(file_name()) + ": " + source);
+    }
+    if (!piece.intact) {
+        ++m_totals.broken;
+        m_writer.comment("broken: its header says " + std::to_string(piece.len_field) +
+                         " bytes, there are " + std::to_string(len));
+    }
+    if (m_source->file->name.framed_dump && piece.data_len == MODEM_DUMP_END_LEN &&
+        memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0) {
+        m_writer.comment("end of the memory dump");
+    }
+    return true;
+}
+
+// After the last piece.
+void FrameExporter::end(const LogReader& in) {
+    const TreeFile& file = *m_source->file;
+    if (!m_begun) {
+        begin(in.size());
+    }
+    const uint64_t left = in.size() - std::min(in.size(), m_end);
+    const uint64_t tail = in.size() - std::min(in.size(), m_tail);
+    if (m_source->continued && !m_report->chunked && tail > 0 && tail <= MAX_TAIL) {
+        line().tail = read_at(file.path(), m_tail, static_cast<size_t>(tail));
+        line().tail_other = left;
+        line().tail_time = m_time;
+        line().tail_file = file.name.text;
+    } else if (left > 0) {
+        remark_last(outside(left, "at the end of " + file.name.text));
+    }
+    if (file.name.framed_dump && !m_report->end_marker) {
+        remark_last("the memory dump ends without its end marker");
+    }
+    if (file.missing > 0) {
+        remark_last("log files are missing after " + file.name.text + ": " + missing_text(file));
+    }
+}
+
+// False when it was left out or could not be written.
+bool FrameExporter::write(int64_t time, uint8_t type, const uint8_t* data, size_t len) {
+    if (m_wanted.type >= 0 && m_wanted.type != type) {
+        return false;
+    }
+    m_writer.add_packet(m_source->interface, m_source->queue, time, data, len);
+    if (!line().remarks.empty()) {
+        m_writer.comment(line().remarks);
+        line().remarks.clear();
+    }
+    m_any = true;
+    ++m_totals.packets;
+    return m_writer.good();
+}
+
+FrameExporter::Totals FrameExporter::totals() const {
+    Totals totals = m_totals;
+    for (const Line& each : m_lines) {
+        totals.other += each.tail.empty() ? 0 : each.tail_other;  // nothing went on with it
+    }
+    return totals;
+}
+
+// Counts bytes that are in no packet; the words for them.
+std::string FrameExporter::outside(uint64_t bytes, const std::string& where) {
+    m_totals.other += bytes;
+    return std::to_string(bytes) + (bytes == 1 ? " byte " : " bytes ") + where + " " +
+           (bytes == 1 ? "is" : "are") + " in no intact " + (m_report->chunked ? "chunk" : "frame");
+}
+
+void FrameExporter::remark_next(const std::string& text) {
+    std::string& remarks = line().remarks;
+    if (remarks.size() < MAX_REMARKS) {
+        remarks += (remarks.empty() ? "" : "; ") + escape_text(text);
+    }
+}
+
+void FrameExporter::remark_last(const std::string& text) {
+    if (m_any) {
+        m_writer.comment(escape_text(text));
+    } else {
+        remark_next(text);
+    }
+}

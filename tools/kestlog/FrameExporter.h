@@ -1,0 +1,78 @@
+// SPDX-License-Identifier: Apache-2.0
+// Makes packets of the frames and chunks in the files of a plan. A CP's log may hold anything,
+// and bytes between two flags are not yet a frame: only intact ones become packets, unless broken
+// ones are asked for. How much is in no packet stands in the comments on the packets around it.
+// Owned by kestlog export; the plan and the writer have to outlive it.
+#ifndef KESTLOG_FRAMEEXPORTER_H_
+#define KESTLOG_FRAMEEXPORTER_H_
+
+#include <stdint.h>
+
+#include <string>
+#include <vector>
+
+#include "channels/DiagFrameParser.h"
+#include "kestlog/ExportPlan.h"
+#include "kestlog/FileScan.h"
+#include "kestlog/PcapngWriter.h"
+
+class FrameExporter {
+public:
+    struct Wanted {
+        int type = -1;        // frames of other types are left out; -1: of none
+        bool broken = false;  // also bytes between flags with another length in their header
+    };
+
+    struct Totals {
+        uint64_t files = 0;    // that could be opened
+        uint64_t packets = 0;  // written
+        uint64_t broken = 0;   // how many of them are
+        uint64_t other = 0;    // bytes that are outside frames and chunks, or in broken ones
+    };
+
+    FrameExporter(const ExportPlan& plan, PcapngWriter* writer, const Wanted& wanted)
+        : m_writer(*writer), m_wanted(wanted), m_lines(plan.interfaces.size()) {}
+
+    // Called for the sources of the plan, in their order. Prints damage; returns the exit status.
+    int add(const ExportSource& source);
+    Totals totals() const;
+
+private:
+    // What one file of an interface leaves for the next.
+    struct Line {
+        std::string remarks;      // for the comment on the next packet
+        std::string tail;         // the log's last bytes, when a frame may go on in the next file
+        uint64_t tail_other = 0;  // how many of them are in no packet
+        int64_t tail_time = 0;
+        std::string tail_file;
+    };
+
+    Line& line() { return m_lines[m_source->interface]; }
+    const std::string& file_name() const { return m_source->file->name.text; }
+    void begin(uint64_t first);
+    bool take(const Piece& piece);
+    void end(const LogReader& in);
+    void join(uint64_t first);
+    bool write(int64_t time, uint8_t type, const uint8_t* data, size_t len);
+    void remark_next(const std::string& text);
+    void remark_last(const std::string& text);
+    std::string outside(uint64_t bytes, const std::string& where);
+
+    PcapngWriter& m_writer;
+    const Wanted m_wanted;
+    std::vector<Line> m_lines;  // of the interfaces
+    Totals m_totals;
+    DiagFrameParser m_parser;
+
+    // About the file in progress.
+    const ExportSource* m_source = nullptr;
+    const FileReport* m_report = nullptr;
+    bool m_begun = false;
+    bool m_any = false;    // it has the last packet that was written
+    bool m_named = false;  // a comment has said which file it is
+    int64_t m_time = 0;
+    uint64_t m_end = 0;   // of the last piece
+    uint64_t m_tail = 0;  // where the next one may begin: also with the flag that ends broken bytes
+};
+
+#endif  // KESTLOG_FRAMEEXPORTER_H_
