@@ -64,24 +64,32 @@ kestdiag.prefs.gaps = Pref.bool("Show gaps in the sequence", true,
 -- The log and each dump of a co-processor count on their own: they are queues of an interface.
 local interface_id = Field.new("frame.interface_id")
 local interface_queue = Field.new("frame.interface_queue")
-local next_seq = {} -- of each queue, while the packets come in order for the first time
-local gaps = {}     -- by packet number: the sequence number that was expected
+local next_seq = {}   -- of each queue
+local last_number = 0 -- of the packet that counted last
+local gaps = {}       -- by packet number: the sequence number that was expected
 
 function kestdiag.init()
     next_seq = {}
+    last_number = 0
     gaps = {}
 end
 
-local function text_of(field)
-    local info = field()
-    return info and tostring(info) or "?"
-end
+-- With a filter it makes Wireshark read these fields while it reads the file.
+local tap = Listener.new("frame", "kestdiag")
 
+-- Where the fields are read later only (tshark -2 without a filter), the packets count as long
+-- as they come one after the other.
+-- seq is nil for a packet that does not count: what is broken may have any number.
 local function follow_sequence(pinfo, seq)
-    if pinfo.visited then
+    local id, number = interface_id(), interface_queue()
+    if not id or (pinfo.visited and pinfo.number ~= last_number + 1) then
         return
     end
-    local queue = text_of(interface_id) .. "/" .. text_of(interface_queue)
+    last_number = pinfo.number
+    if not seq then
+        return
+    end
+    local queue = id.value .. "/" .. (number and number.value or 0)
     local expected = next_seq[queue]
     next_seq[queue] = (seq + 1) % 0x100000000
     -- A sender that does not count always sends the same number.
@@ -127,6 +135,7 @@ function kestdiag.dissector(buffer, pinfo, root)
     pinfo.cols.protocol = "KESTDIAG"
     local tree = root:add(kestdiag, buffer())
     if captured < HEADER_LEN then
+        follow_sequence(pinfo, nil)
         tree:add_proto_expert_info(e.short)
         pinfo.cols.info = string.format("%d bytes, no header", captured)
         return captured
@@ -171,10 +180,7 @@ function kestdiag.dissector(buffer, pinfo, root)
             "The header's length is %d where %d is right", len, captured - start))
         words = words .. " [wrong length]"
     end
-    -- What is broken may have any number.
-    if good and not is_end then
-        follow_sequence(pinfo, seq)
-    end
+    follow_sequence(pinfo, good and not is_end and seq or nil)
     local expected = gaps[pinfo.number]
     if expected and kestdiag.prefs.gaps then
         tree:add(f.expected, expected):set_generated()
