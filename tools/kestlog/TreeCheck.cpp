@@ -1,0 +1,125 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/TreeCheck.h"
+
+#include <errno.h>
+#include <string.h>
+
+#include <algorithm>
+
+#include "kestlog/Report.h"
+
+namespace {
+
+class TreeCheck {
+public:
+    TreeCheck(const LogTree& tree, TreeVisitor& visitor) : m_tree(tree), m_visitor(visitor) {}
+
+    void run() {
+        for (const std::string& path : m_tree.strays) {
+            m_visitor.find(path, {true, "name", "does not belong here", -1});
+        }
+        for (const std::string& path : m_tree.foreign) {
+            m_visitor.find(path, {false, "foreign", "left by a PC", -1});
+        }
+        for (const TreeFile& file : m_tree.root_files) {
+            look({nullptr, nullptr, &file});
+        }
+        for (const TreeSet& set : m_tree.sets) {
+            for (const TreeCp& cp : set.cps) {
+                for (const TreeFile& file : cp.files) {
+                    look({&set, &cp, &file});
+                }
+            }
+        }
+        for (const std::string& words : m_tree.failures) {
+            m_visitor.unreadable(words);
+        }
+    }
+
+private:
+    void look(const FilePlace& place) {
+        const PieceVisitor visit = m_visitor.begin(place);
+        if (place.cp) {
+            name(place);
+            number(*place.file);
+        } else {
+            parsing_database(*place.file);
+        }
+        FileReport report;
+        content(*place.file, visit, &report);
+        m_visitor.end(place, report);
+    }
+
+    // In each log root the database and its digest must both be there, or neither.
+    void parsing_database(const TreeFile& file) {
+        const std::string other =
+            file.dir->shown + (file.name.text == DIGEST_NAME ? DATABASE_NAME : DIGEST_NAME);
+        const std::vector<TreeFile>& files = m_tree.root_files;
+        if (std::none_of(files.begin(), files.end(),
+                         [&](const TreeFile& f) { return f.shown() == other; })) {
+            m_visitor.find(file.shown(), {true, "pair", "without " + file_part(other), -1});
+        }
+    }
+
+    void name(const FilePlace& place) {
+        const FileName& name = place.file->name;
+        const CpType type = cp_type_of(place.cp->name);
+        if (name.type == LT_UNKNOWN) {
+            m_visitor.find(place.file->shown(),
+                           {true, "name", "not a file name the service creates", -1});
+        } else if (type != CT_UNKNOWN && name.cp_type != CT_UNKNOWN && name.cp_type != type) {
+            m_visitor.find(place.file->shown(),
+                           {true, "name", "the name belongs to another CP", -1});
+        }
+    }
+
+    void number(const TreeFile& log) {
+        if (log.doubled) {
+            m_visitor.find(log.shown(),
+                           {!log.set_aside, "double", "two log files with this number", -1});
+        }
+        if (log.missing) {
+            m_visitor.find(log.shown(), {false, "gap", missing_text(log), -1});
+        }
+        if (log.disordered) {
+            m_visitor.find(log.shown(),
+                           {false, "order", "newer than a log file with a lower number", -1});
+        }
+    }
+
+    void content(const TreeFile& file, const PieceVisitor& visit, FileReport* report) {
+        LogReader in;
+        if (!in.open(file.path(), false)) {
+            if (errno == ENOENT) {
+                // The service may rename and trim files while they are checked.
+                m_visitor.find(file.shown(),
+                               {false, "gone", "gone or renamed since the directory was read", -1});
+            } else {
+                m_visitor.unreadable(file.shown() + ": " + strerror(errno));
+            }
+            return;
+        }
+        scan_file(in, file.name, visit, report);
+        if (in.error()) {
+            m_visitor.unreadable(file.shown() + ": " + strerror(in.error()));
+        }
+        for (const Finding& finding : report->findings) {
+            m_visitor.find(file.shown(), finding);
+        }
+        if (report->more_findings) {
+            m_visitor.find(file.shown(),
+                           {report->damaged, "more",
+                            std::to_string(report->more_findings) + " more findings", -1});
+        }
+    }
+
+    const LogTree& m_tree;
+    TreeVisitor& m_visitor;
+};
+
+}  // namespace
+
+void check_tree(const LogTree& tree, TreeVisitor& visitor) {
+    TreeCheck(tree, visitor).run();
+}
