@@ -58,6 +58,9 @@ struct TreeSet {
     std::vector<TreeCp> cps;
 };
 
+// A time of the file system, in this machine's zone.
+LogTime local_time(time_t seconds);
+
 // "numbers 3 to 5 are missing".
 std::string missing_text(const TreeFile& log);
 

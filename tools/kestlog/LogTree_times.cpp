@@ -6,11 +6,6 @@
 
 namespace {
 
-LogTime local_time(time_t seconds) {
-    struct tm t;
-    return localtime_r(&seconds, &t) ? LogTime::from_tm(t) : LogTime();
-}
-
 bool older(const TreeFile& a, const TreeFile& b) {
     if (a.name.time < b.name.time || b.name.time < a.name.time) {
         return a.name.time < b.name.time;
@@ -52,6 +47,11 @@ void find_missing(std::vector<TreeFile>* files) {
 }
 
 }  // namespace
+
+LogTime local_time(time_t seconds) {
+    struct tm t;
+    return localtime_r(&seconds, &t) ? LogTime::from_tm(t) : LogTime();
+}
 
 std::string missing_text(const TreeFile& log) {
     const std::string first = std::to_string(log.first_missing);

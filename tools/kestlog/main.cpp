@@ -29,14 +29,15 @@ constexpr Command COMMANDS[] = {
     {"info",   "FILE...", 1, ANY, run_info,   "print what a file is, its time record, frames and damage"},
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
+    {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
     {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify export";
+constexpr char TREES[] = "ls verify report export";
 // Those and the commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames export";
+constexpr char TIMES[] = "ls verify frames report export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -51,8 +52,13 @@ constexpr Option OPTIONS[] = {
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
     {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
-    {"output",       "PATH",  "split export", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "split export", "replace files that exist"},
+    {"iq-rate",      "HZ",    "report", "draw the spectra of I/Q captures with this sample rate"},
+    {"iq-format",    "F",     "report", "and this format: ci8, ci16_le, ci32_le, cf32_le"},
+    {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
+    {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
+    {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
+    {"output",       "PATH",  "export report split", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "export report split", "replace files that exist"},
 };
 // clang-format on
 

@@ -1,0 +1,283 @@
+// SPDX-License-Identifier: Apache-2.0
+// kestlog report: its data from trees with events, its page, and the page in a real browser.
+#include <math.h>
+
+#include <algorithm>
+#include <fstream>
+#include <nlohmann/json.hpp>
+
+#include "KestlogFixture.h"
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+const std::string HANDSET = "handset/data/";
+const std::string DAY = HANDSET + "modem_log/2016-03-01-08-00-00/cp_wcdma/";
+const std::string CARD = "handset/storage/sdcard0/modem_log/";
+// The name is text, wherever it is shown.
+const std::string HOSTILE = "<script>alert(1)<\xff";
+const std::string CARD_TEXT = CARD + "<script>alert(1)<\xc3\xbf";
+
+std::string log_at(int number, const std::string& time) {
+    return std::to_string(number) + "-cp_wcdma-2016-03-01_" + time + ".log";
+}
+
+bool by_level(char a, char b) {
+    return static_cast<uint8_t>(a) < static_cast<uint8_t>(b);
+}
+
+// A number as the page shows it: "1,234".
+std::string grouped(const Json& number) {
+    std::string text = number.dump();
+    for (size_t at = text.size(); at > 3; at -= 3) {
+        text.insert(at - 3, ",");
+    }
+    return text;
+}
+
+class ReportTest : public KestlogTest {
+protected:
+    ReportTest() { setenv("TZ", "CST-8", 1); }  // where the fixture's files are of 09:15
+    ~ReportTest() override { unsetenv("TZ"); }
+
+    Json report(const std::string& args, int status = 0) {
+        EXPECT_EQ(run("report --json " + args), status) << m_err;
+        return Json::parse(m_out, nullptr, false);
+    }
+    // The object of a list in which these members have these values.
+    static Json only(const Json& list, const Json& like) {
+        Json found;
+        for (const Json& each : list) {
+            bool same = true;
+            for (const auto& [name, value] : like.items()) {
+                same = same && each.value(name, Json()) == value;
+            }
+            EXPECT_FALSE(same && !found.is_null()) << "two of " << like;
+            found = same ? each : found;
+        }
+        EXPECT_FALSE(found.is_null()) << "no " << like << " in " << list;
+        return found.is_null() ? Json::object() : found;
+    }
+    void written_last(const std::string& rel, int seconds_after_nine) {
+        const struct timespec time = {1456794000 + seconds_after_nine, 0};
+        const struct timespec times[2] = {time, time};
+        EXPECT_EQ(utimensat(AT_FDCWD, m_root.path(rel).c_str(), times, 0), 0);
+    }
+    // The internal medium from 09:00 to 09:15, then the card.
+    void write_day() {
+        const std::string modem = DAY;
+        write(modem + log_at(3, "09-00-00"), TIME_RECORD + frame("one") + frame("two", 5, 6));
+        written_last(modem + log_at(3, "09-00-00"), 300);
+        write(modem + log_at(2, "09-05-00"), std::string(3000, 'x'));
+        written_last(modem + log_at(2, "09-05-00"), 400);
+        write(modem + log_at(0, "09-12-00"), TIME_RECORD);
+        write(modem + "cp_wcdma.version", "baseband 1");
+        write(modem + "mini_dump_2016-03-01_09-06-00.bin", "mini");
+        write(modem + "smsg_2016-03-01_09-06-01.log", "s");
+        write(modem + "cp_wcdma_memory_2016-03-01_09-06-02.dmp", frame("x"));
+        write(modem + "mini_dump_2016-03-01_09-08-00.bin", "again");
+        write(modem + "cp_wcdma_ringbuf_2016-03-01_09-10-00.log", "r");
+        const std::string on_card = CARD + "2016-03-01-09-30-00/cp_wcdma/";
+        write(on_card + log_at(0, "09-31-00"), TIME_RECORD);
+        write(on_card + "cp_wcdma.version", "baseband 2");
+        write(CARD + HOSTILE + "/x", "x");
+    }
+};
+
+TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
+    write_day();
+    const Json json = report("handset", 3);
+    EXPECT_EQ(json["totals"].dump(),
+              R"({"sets":2,"cps":1,"files":11,"size":3116,"damages":2,"notes":2,"unreadable":0})");
+    const struct {
+        const char *kind, *from, *to;
+        Json more;
+    } ITEMS[] = {
+        {"trimmed", "08:00:00", "09:00:00", {{"medium", "internal"}}},
+        {"log", "09:00:00", "09:05:00", {{"size", 42}, {"damages", 0}}},
+        {"log", "09:05:00", "09:06:40", {{"rate", 30}}},
+        {"missing", "09:06:40", "09:12:00", {{"words", "number 1 is missing"}}},
+        {"crash",
+         "09:06:00",
+         "09:06:02",
+         {{"words", "mini dump, IPC record, memory dump"}, {"damages", 1}}},
+        {"crash", "09:08:00", "09:08:00", {{"words", "mini dump"}, {"size", 5}}},
+        {"ring buffer", "09:10:00", "09:10:00", {{"size", 1}}},
+        {"log", "09:12:00", "09:15:00", {{"medium", "internal"}}},
+        {"silence", "09:15:00", "09:30:00", Json::object()},
+        {"firmware", "09:30:00", "09:30:00", {{"words", "baseband 1 -> baseband 2"}}},
+        {"trimmed", "09:30:00", "09:31:00", {{"medium", "card"}}},
+        {"log", "09:31:00", "09:31:00", {{"medium", "card"}}},
+    };
+    const std::string day = "2016-03-01 ";
+    EXPECT_EQ(json["timeline"].size(), std::size(ITEMS));
+    for (const auto& item : ITEMS) {
+        Json like = {{"kind", item.kind}, {"from", day + item.from}, {"to", day + item.to}};
+        like.update(item.more);
+        only(json["timeline"], like);
+    }
+    const Json cp = only(json["cps"], {{"cp", "cp_wcdma"}, {"seconds", 580}, {"frames", 2}});
+    EXPECT_EQ(cp["types"].dump(), R"([{"type":5,"sub_type":6,"count":1,"bytes":3,"rate":0},)"
+                                  R"({"type":157,"sub_type":1,"count":1,"bytes":3,"rate":0}])");
+    only(json["findings"], {{"code", "name"}, {"path", CARD_TEXT}});
+    // A copy that has its own times does not tell how long the newest file lasts.
+    written_last(DAY + log_at(3, "09-00-00"), 5000);
+    only(report("handset", 3)["timeline"],
+         {{"kind", "log"}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
+    // Of a part nobody can say what was there before.
+    for (const Json& item : report("handset --since 09:05", 3)["timeline"]) {
+        EXPECT_NE(item["kind"], "trimmed");
+    }
+}
+
+TEST_F(ReportTest, ALotIsMergedAndStillCounted) {
+    const std::string dir = "modem_log/2016-03-01-00-00-00/cp_gnss/";
+    m_root.make_dir(dir);
+    for (int i = 0; i < 6000; ++i) {
+        char name[64];
+        snprintf(name, sizeof(name), "%d-cp_gnss-2016-03-01_%02d-%02d-%02d.log", 5999 - i, i / 3600,
+                 i / 60 % 60, i % 60);
+        std::ofstream(m_root.path(dir + name)) << "12";
+    }
+    const Json json = report(".");
+    EXPECT_EQ(json["most_merged"], 2);
+    uint64_t files = 0, size = 0;
+    for (const Json& item : json["timeline"]) {
+        files += item.value("files", 0u);
+        size += item.value("size", 0u);
+    }
+    EXPECT_LE(json["timeline"].size(), 5003u);
+    EXPECT_EQ(files, 6000u);
+    EXPECT_EQ(size, 12000u);
+}
+
+// A tone an eighth of the rate above the middle, half of full scale: -6 dB.
+TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
+    std::string iq, pcm;
+    for (int k = 0; k < 4096; ++k) {
+        for (const double value : {cos(k * M_PI / 4), sin(k * M_PI / 4)}) {
+            const int number = static_cast<int>(lround(value * 16384));
+            iq += static_cast<char>(number & 0xff);
+            iq += static_cast<char>(number >> 8 & 0xff);
+        }
+    }
+    for (int k = 0; k < 3000; ++k) {
+        pcm += static_cast<char>(k % 3 == 0 ? 64 : k % 3 == 1 ? -32 : 0);
+        pcm += static_cast<char>(k == 2000 ? -128 : 0);  // of the other channel
+    }
+    write(MODEM + "cp_wcdma_wiq_" + STAMP + ".bin", iq);
+    // Cut within a sample, in two files, with a log between.
+    write(OLD_DSP_LOG, chunk(1, PCM, pcm.substr(0, 1001)) + chunk(2, LOG, "no sample"));
+    write(DSP_LOG, chunk(3, PCM, pcm.substr(1001)));
+    const std::string pictures =
+        " --iq-rate 3.84e6 --iq-format ci16_le --pcm-rate 8000 --pcm-format s8 --pcm-channels 2";
+    const Json json = report("." + pictures);
+    const Json spectrum =
+        only(json["spectra"], {{"samples", 4096}, {"columns", 16}, {"bins", 256}});
+    write("levels", spectrum["levels"]);
+    ASSERT_EQ(system(("base64 -d " + m_root.path("levels") + " >" + m_root.path("out")).c_str()),
+              0);
+    const std::string levels = m_root.read_file("out");
+    ASSERT_EQ(levels.size(), 16 * 256u);
+    EXPECT_EQ(levels.substr(0, 256), levels.substr(15 * 256));
+    EXPECT_EQ(std::max_element(levels.begin(), levels.begin() + 256, by_level) - levels.begin(),
+              128 + 32);
+    EXPECT_EQ(static_cast<uint8_t>(levels[160]), 243);  // 2 levels are 1 dB
+    EXPECT_LT(static_cast<uint8_t>(levels[96]), 128);   // the mirror image is far below
+    const Json waveform = only(json["waveforms"], {{"samples", 3000}, {"samples_per_point", 4}});
+    EXPECT_EQ(waveform["channels"][0][0], -250);
+    EXPECT_EQ(waveform["channels"][0][1], 500);
+    EXPECT_EQ(waveform["channels"][1][1000], -1000);
+    EXPECT_EQ(waveform["channels"][1].size(), 1500u);
+    EXPECT_TRUE(report(".")["spectra"].empty());
+    for (const char* wrong :
+         {"--iq-rate 1", "--iq-rate 0 --iq-format ci8", "--iq-rate 1 --iq-format s8",
+          "--pcm-rate 1 --pcm-format s8 --pcm-channels 17", "--pcm-channels 2"}) {
+        EXPECT_EQ(run("report --json . " + std::string(wrong)), 1) << wrong;
+    }
+}
+
+// The object in the page, as the page itself reads it.
+Json data_of(const std::string& page) {
+    const std::string start = "id=\"data\">";
+    const size_t at = page.find(start) + start.size();
+    return Json::parse(page.substr(at, page.find("</script>", at) - at), nullptr, false);
+}
+
+TEST_F(ReportTest, ThePageIsOneFileAndTextFromACardIsText) {
+    write_day();
+    const Json json = report("handset", 3);
+    EXPECT_EQ(run("report handset -o page.html"), 3) << m_err;
+    EXPECT_EQ(m_out, "page.html: 11 files, 2 damages, 2 notes\n");
+    const std::string page = m_root.read_file("page.html");
+    EXPECT_EQ(data_of(page), json);
+    EXPECT_EQ(occurrences(page, "<script"), 2u);
+    EXPECT_EQ(occurrences(page, "</script"), 2u);
+    EXPECT_EQ(occurrences(page, "alert(1)"), 1u);
+    for (const char* loads : {"src=", "href=", "@import", "url(http", "{{"}) {
+        EXPECT_EQ(page.find(loads), std::string::npos) << loads;
+    }
+    EXPECT_EQ(run("report handset -o page.html"), 4);
+    EXPECT_EQ(run("report handset --force -o - | cmp - page.html"), 0) << m_out;
+    EXPECT_EQ(run("report handset"), 1);
+    EXPECT_EQ(run("report handset -o no/where.html"), 4);
+}
+
+// Needs a Chromium; without one it is skipped.
+TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
+    const char* const FIND = "{ command -v chromium || command -v chromium-browser; }";
+    if (system((std::string(FIND) + " >/dev/null").c_str()) != 0) {
+        GTEST_SKIP() << "no chromium is installed: the page is not tried in a browser";
+    }
+    write_day();
+    const Json json = report("handset", 3);
+    run("report handset -o page.html");
+    // Keys and wheel as a reader would use them, then what they show.
+    write("page.html", m_root.read_file("page.html") + R"(<script>
+        const chart = document.querySelector('#chart svg');
+        const range = () => document.getElementById('range').textContent;
+        const press = (key) => chart.dispatchEvent(new KeyboardEvent('keydown', {key: key}));
+        const seen = [];
+        const todo = [() => press('+'), () => press('ArrowRight'), () => press('n'),
+            () => chart.dispatchEvent(new WheelEvent('wheel', {deltaY: 1})), () => press('0')];
+        setInterval(() => {
+            seen.push(range());
+            document.title = seen.join('|');
+            (todo.shift() || (() => {}))();
+        }, 50);</script>)");
+    const std::string browser =
+        "B=$(" + std::string(FIND) + ") && cd " + m_root.root() +
+        " && HOME=$PWD timeout 300 $B --headless --no-sandbox --disable-gpu --user-data-dir=$PWD/b "
+        "--virtual-time-budget=5000 --enable-logging=stderr --dump-dom page.html >dom 2>console";
+    ASSERT_EQ(system(browser.c_str()), 0) << m_root.read_file("console");
+    const std::string console = m_root.read_file("console"), dom = m_root.read_file("dom");
+    EXPECT_EQ(console.find("CONSOLE"), std::string::npos) << console;
+    for (const auto& [name, value] : json["totals"].items()) {
+        const std::string total = "id=\"total-" + name + "\" class=\"" +
+                                  (name == "damages" ? "bad" : "") + "\">" + grouped(value) + "<";
+        EXPECT_NE(dom.find(total), std::string::npos) << total;
+    }
+    std::string cells;
+    for (const char* key :
+         {"files", "size", "logs", "log_size", "seconds", "rate", "frames", "chunks", "broken",
+          "payload", "other_bytes", "sequence_gaps", "missing", "damages", "notes"}) {
+        cells += "<td class=\"number\">" + grouped(json["cps"][0][key]) + "</td>";
+    }
+    EXPECT_NE(dom.find("<td class=\"\">cp_wcdma</td>" + cells), std::string::npos) << cells;
+    EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size());
+    EXPECT_NE(dom.find(">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<"),
+              std::string::npos);
+    EXPECT_NE(dom.find("<p id=\"detail\" aria-live=\"polite\">cp_wcdma · nothing since the start"),
+              std::string::npos);
+    const std::string ALL = "2016-03-01 07:58:10 to 2016-03-01 09:32:49|";
+    const std::string shown =
+        ALL +
+        "2016-03-01 08:21:50 to 2016-03-01 09:09:09|2016-03-01 08:33:40 to 2016-03-01 09:20:59|"
+        "2016-03-01 07:58:10 to 2016-03-01 08:45:30|2016-03-01 07:58:10 to 2016-03-01 08:57:19|" +
+        ALL;
+    EXPECT_NE(dom.find("<title>" + shown), std::string::npos)
+        << dom.substr(dom.find("<title>"), 400);
+}
+
+}  // namespace

@@ -1,0 +1,359 @@
+// SPDX-License-Identifier: Apache-2.0
+// What each file of the tree adds to the report.
+#include "kestlog/CardReport.h"
+
+#include <algorithm>
+
+#include "kestlog/ExitStatus.h"
+#include "kestlog/Spectrum.h"
+#include "kestlog/TreeInput.h"
+
+namespace {
+
+// Logs that pause for longer are shown as a gap.
+constexpr int64_t PAUSE_SECONDS = 10;
+
+int64_t seconds_between(const LogTime& from, const LogTime& to) {
+    return has_time(from) && has_time(to) ? seconds_of(to) - seconds_of(from) : 0;
+}
+
+// Whether the times of the last writes are those of the handset. A copy may have its own.
+bool has_own_times(const TreeCp& cp) {
+    constexpr time_t TOLERANCE = 60;
+    return std::none_of(cp.files.begin(), cp.files.end(), [](const TreeFile& file) {
+        return file.name.is_log() && file.end < local_time(file.modified - TOLERANCE);
+    });
+}
+
+// The first bytes of a small file.
+std::string small_content(const TreeFile& file) {
+    LogReader in;
+    size_t got = 0;
+    const uint8_t* data = nullptr;
+    constexpr size_t MOST = 200;
+    if (in.open(file.path(), false)) {
+        data = in.peek(MOST, got);
+    }
+    return std::string(data, data + std::min(got, MOST));
+}
+
+std::string base64(const std::vector<uint8_t>& bytes) {
+    static const char DIGITS[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+    std::string text;
+    for (size_t i = 0; i < bytes.size(); i += 3) {
+        uint32_t bits = 0;
+        const size_t n = std::min<size_t>(3, bytes.size() - i);
+        for (size_t k = 0; k < 3; ++k) {
+            bits = bits << 8 | (k < n ? bytes[i + k] : 0u);
+        }
+        for (size_t k = 0; k < 4; ++k) {
+            text += k <= n ? DIGITS[bits >> (18 - 6 * k) & 63] : '=';
+        }
+    }
+    return text;
+}
+
+size_t count_cps(const LogTree& tree) {
+    std::set<std::string> names;
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            names.insert(cp.name);
+        }
+    }
+    return names.size();
+}
+
+}  // namespace
+
+CardReport::CardReport(const LogTree& tree, const ReportOptions& options)
+    : m_tree(tree), m_options(options), m_timeline(count_cps(tree)) {
+    // In the order in which they are printed.
+    for (const char* value : {"version", "roots", "from", "to", "totals", "most_merged"}) {
+        m_json[value] = nullptr;
+    }
+    for (const char* list : {"sets", "cps", "timeline", "crashes", "versions", "databases",
+                             "findings", "unreadable", "spectra", "waveforms"}) {
+        m_json[list] = Json::array();
+    }
+    for (const TreeSet& set : tree.sets) {
+        m_sets[&set];
+        for (const TreeCp& cp : set.cps) {
+            m_cps[cp.name];
+        }
+    }
+    check_tree(tree, *this);
+    add_crashes();
+    write_totals();
+}
+
+PieceVisitor CardReport::begin(const FilePlace& place) {
+    ++m_files;
+    m_size += place.file->size;
+    m_file_damages = 0;
+    m_place = place;
+    if (!place.cp || !place.file->name.is_log()) {
+        return nullptr;
+    }
+    CpSum* const cp = &m_cps[place.cp->name];
+    Waveform* waveform = nullptr;
+    if (m_options.pcm && place.file->name.cp_type == CT_AGDSP) {
+        const auto found =
+            std::find_if(m_waveforms.begin(), m_waveforms.end(), [&place](const auto& entry) {
+                return entry.first.set == place.set && entry.first.cp == place.cp;
+            });
+        if (found != m_waveforms.end()) {
+            waveform = &found->second;
+        } else if (m_waveforms.size() < MAX_PICTURES) {
+            m_waveforms.push_back({place, Waveform(*m_options.pcm, m_options.pcm_channels)});
+            waveform = &m_waveforms.back().second;
+        }
+    }
+    return [this, cp, waveform](const Piece& piece) {
+        if (!piece.intact) {
+            return true;
+        }
+        TypeSum& sum = cp->types[piece.type * 256 + piece.sub_type];
+        ++sum.count;
+        sum.bytes += piece.data_len;
+        if (waveform && piece.kind) {
+            if (piece.seq_num != m_next_seq) {
+                waveform->restart();
+            }
+            m_next_seq = piece.seq_num + 1;
+            if (piece.kind == CHUNK_KINDS[CK_PCM]) {
+                waveform->add(piece.data, piece.data_len);
+            }
+        }
+        return true;
+    };
+}
+
+// When the file was written to last or, when nothing tells that, when the next one began.
+LogTime CardReport::last_byte(const FilePlace& place) {
+    const TreeFile& log = *place.file;
+    if (m_timed_cp != place.cp) {
+        m_timed_cp = place.cp;
+        m_own_times = has_own_times(*place.cp);
+    }
+    const LogTime& start = log.name.time;
+    const LogTime written = m_own_times ? local_time(log.modified) : log.end;
+    const bool newest = log.name.number == 0;
+    LogTime last = written < start || log.end < written ? log.end : written;
+    if (newest && !m_own_times) {
+        last = start;
+    }
+    // A set ends where the next begins.
+    const auto next =
+        std::upper_bound(m_tree.sets.begin(), m_tree.sets.end(), start,
+                         [](const LogTime& time, const TreeSet& set) { return time < set.time; });
+    return newest && next != m_tree.sets.end() ? std::min(last, next->time) : last;
+}
+
+void CardReport::find(const std::string& path, const Finding& finding) {
+    ++(finding.damage ? m_damages : m_notes);
+    m_file_damages += finding.damage ? 1 : 0;
+    if (m_place.cp) {
+        CpSum& cp = m_cps[m_place.cp->name];
+        ++(finding.damage ? cp.damages : cp.notes);
+    }
+    Json row = finding_json(finding);
+    row["path"] = json_text(path);
+    add_row("findings", MAX_ROWS, row);
+}
+
+void CardReport::unreadable(const std::string& words) {
+    ++m_unreadable;
+    failure(ES_UNREADABLE, words);
+    add_row("unreadable", MAX_ROWS, json_text(words));
+}
+
+void CardReport::end(const FilePlace& place, const FileReport& report) {
+    const TreeFile& file = *place.file;
+    if (!place.cp) {
+        add_database(file);
+        m_place = {};
+        return;
+    }
+    CpSum& cp = m_cps[place.cp->name];
+    SetSum& set = m_sets[place.set];
+    ++cp.files;
+    cp.size += file.size;
+    ++set.files;
+    set.size += file.size;
+    set.damages += m_file_damages;
+    if (has_time(file.name.time)) {
+        set.from = has_time(set.from) ? std::min(set.from, file.name.time) : file.name.time;
+        set.to = std::max(set.to, file.name.is_log() ? last_byte(place) : file.name.time);
+    }
+    const LogType type = file.name.type;
+    if (type == LT_LOG) {
+        add_log(place, report, &cp);
+    } else if (type == LT_VERSION) {
+        add_version(place, &cp);
+    } else if (type == LT_RINGBUF || type == LT_SLEEP_LOG || type == LT_WCDMA_IQ) {
+        TimelineItem item;
+        item.from = item.to = file.name.time;
+        item.files = 1;
+        item.size = file.size;
+        item.damages = m_file_damages;
+        item.set = place.set;
+        item.name = file.name.text;
+        m_timeline.add(place.cp->name, file.name.kind, item);
+    }
+    if (of_crash(file) && m_file_damages) {
+        m_damaged[&file] = m_file_damages;
+    }
+    if (type == LT_WCDMA_IQ && m_options.iq) {
+        add_spectrum(place);
+    }
+    m_place = {};
+}
+
+void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum* cp) {
+    const TreeFile& log = *place.file;
+    TimelineItem item;
+    item.from = log.name.time;
+    item.to = last_byte(place);
+    item.files = 1;
+    item.size = log.size;
+    item.seconds = static_cast<uint64_t>(std::max<int64_t>(0, seconds_between(item.from, item.to)));
+    item.damages = m_file_damages;
+    item.set = place.set;
+    item.name = log.name.text;
+    m_timeline.add(place.cp->name, TK_LOG, item);
+    add_gaps(place, item.to, cp);
+
+    ++cp->logs;
+    cp->log_size += log.size;
+    cp->seconds += item.seconds;
+    cp->frames += report.frames;
+    for (const auto& chunks : report.chunks) {
+        cp->chunks += chunks.count;
+    }
+    cp->broken += report.broken;
+    cp->payload += report.payload;
+    cp->other += report.other;
+    cp->sequence_gaps += report.sequence_gaps;
+    cp->missing += log.missing;
+}
+
+void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) {
+    const TreeFile& log = *place.file;
+    TimelineItem gap;
+    gap.set = place.set;
+    LogTime first = log.name.time;
+    if (m_options.whole && cp->last_set != place.set && !place.set->name.empty() &&
+        seconds_between(place.set->time, first) > PAUSE_SECONDS) {
+        gap.from = place.set->time;
+        gap.to = first;
+        gap.words = "no log from the start of the set: trimmed, or the CP began later";
+        m_timeline.add(place.cp->name, TK_TRIMMED, gap);
+        first = place.set->time;
+    }
+    if (seconds_between(cp->last_byte, first) > PAUSE_SECONDS) {
+        gap.from = cp->last_byte;
+        gap.to = first;
+        gap.words = "nothing was logged";
+        m_timeline.add(place.cp->name, TK_SILENCE, gap);
+    }
+    if (log.missing) {
+        gap.from = to;
+        gap.to = log.end;
+        gap.words = missing_text(log);
+        m_timeline.add(place.cp->name, TK_MISSING, gap);
+    }
+    cp->last_set = place.set;
+    cp->last_byte = std::max(cp->last_byte, log.missing ? log.end : to);
+}
+
+void CardReport::add_version(const FilePlace& place, CpSum* cp) {
+    const std::string version = small_content(*place.file);
+    const bool changed = !cp->version.empty() && cp->version != version;
+    if (changed) {
+        TimelineItem item;
+        item.from = item.to = place.set->time;
+        item.set = place.set;
+        item.words = cp->version + " -> " + version;
+        m_timeline.add(place.cp->name, TK_FIRMWARE, item);
+    }
+    cp->version = version;
+    add_row("versions", MAX_ROWS,
+            {{"cp", json_text(place.cp->name)},
+             {"set", json_text(place.set->name)},
+             {"medium", json_text(place.set->medium)},
+             {"version", json_text(version)},
+             {"changed", changed}});
+}
+
+void CardReport::add_database(const TreeFile& file) {
+    Json row = {{"path", json_text(file.shown())}, {"size", file.size}};
+    if (file.name.text == DIGEST_NAME) {
+        row["digest"] = json_text(small_content(file));
+    }
+    add_row("databases", MAX_ROWS, row);
+}
+
+void CardReport::add_spectrum(const FilePlace& place) {
+    LogReader in;
+    if (m_json["spectra"].size() >= MAX_PICTURES) {
+        add_row("spectra", 0, nullptr);  // counts it
+        return;
+    }
+    if (!in.open(place.file->path(), false)) {
+        return;  // the check has told why
+    }
+    const Spectrum spectrum = spectrum_of(in, *m_options.iq);
+    if (in.error()) {
+        unreadable(place.file->shown() + ": read error");
+    }
+    add_row("spectra", MAX_PICTURES,
+            {{"cp", json_text(place.cp->name)},
+             {"name", json_text(place.file->name.text)},
+             {"time", time_text(place.file->name.time)},
+             {"format", m_options.iq->iq},
+             {"rate", m_options.iq_rate},
+             {"samples", spectrum.samples},
+             {"columns", spectrum.columns},
+             {"bins", Spectrum::BINS},
+             {"lowest_db", Spectrum::LOWEST_DB},
+             {"levels", base64(spectrum.levels)}});
+}
+
+void CardReport::add_crashes() {
+    for (const Crash& crash : find_crashes(m_tree)) {
+        TimelineItem item;
+        Json files = Json::array();
+        item.from = crash.time;
+        item.set = crash.set;
+        item.name = crash.files[0]->name.text;
+        item.words = crash_text(crash);
+        for (const TreeFile* file : crash.files) {
+            ++item.files;
+            item.size += file->size;
+            item.to = file->name.time;
+            const auto damaged = m_damaged.find(file);
+            item.damages += damaged == m_damaged.end() ? 0 : damaged->second;
+            files.push_back(json_text(file->name.text));
+        }
+        m_timeline.add(crash.cp->name, TK_CRASH, item);
+        add_row("crashes", MAX_ROWS,
+                {{"cp", json_text(crash.cp->name)},
+                 {"set", json_text(crash.set->name)},
+                 {"medium", json_text(crash.set->medium)},
+                 {"time", time_text(crash.time)},
+                 {"what", json_text(item.words)},
+                 {"size", item.size},
+                 {"damages", item.damages},
+                 {"files", files}});
+    }
+}
+
+void CardReport::add_row(const char* list, size_t max, const Json& row) {
+    Json& rows = m_json[list];
+    if (rows.size() < max) {
+        rows.push_back(row);
+    } else {
+        Json& more = m_json[std::string("more_") + list];
+        more = more.is_null() ? 1 : more.get<uint64_t>() + 1;
+    }
+}
