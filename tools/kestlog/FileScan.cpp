@@ -152,8 +152,8 @@ private:
                 continue;
             }
             const uint64_t end = m_in.offset() + used;
-            const uint64_t size = m_parser.raw_size();
-            if (take_frame(end > size ? end - size : 0, body, len)) {
+            const size_t size = m_parser.raw_size();
+            if (take_frame(end > size ? end - size : 0, size, body, len)) {
                 framed += size;
             } else {
                 first_broken = m_report.broken++ ? first_broken : end - size;
@@ -184,10 +184,11 @@ private:
     }
 
     // True for an intact frame.
-    bool take_frame(uint64_t offset, const uint8_t* body, size_t len) {
+    bool take_frame(uint64_t offset, size_t size, const uint8_t* body, size_t len) {
         DiagHeader header{};
         Piece piece{};
         piece.offset = offset;
+        piece.size = size;
         if (len >= sizeof(header)) {
             memcpy(&header, body, sizeof(header));
             piece.data = body + sizeof(header);
@@ -258,8 +259,9 @@ private:
         ++m_report.chunks[kind].count;
         m_report.chunks[kind].bytes += len;
         m_report.payload += len;
-        m_stop = m_visit && !m_visit({m_in.offset(), header.seq_num, header.diag_len, header.type,
-                                      header.sub_type, data, len, true, CHUNK_KINDS[kind]});
+        m_stop = m_visit &&
+                 !m_visit({m_in.offset(), sizeof(header) + len, header.seq_num, header.diag_len,
+                           header.type, header.sub_type, data, len, true, CHUNK_KINDS[kind]});
     }
 
     // The newest file of a CP may still be written to.

@@ -23,6 +23,7 @@ struct Finding {
 // A diag frame or a chunk.
 struct Piece {
     uint64_t offset;
+    size_t size;  // in the file, with its header, flags and escapes
     uint32_t seq_num;
     size_t len_field;  // the length in the header
     uint8_t type;

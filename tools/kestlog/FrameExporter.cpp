@@ -40,10 +40,6 @@ std::string read_at(const std::string& path, uint64_t offset, size_t len) {
     return bytes;
 }
 
-size_t framed_size(const uint8_t* body, size_t len) {
-    return DiagFrameParser::escaped_size(body, len) + 2;
-}
-
 }  // namespace
 
 int FrameExporter::add(const ExportSource& source) {
@@ -99,7 +95,7 @@ void FrameExporter::join(uint64_t first) {
                               len, used) &&
             len >= sizeof(header) && used > tail) {
             memcpy(&header, body, sizeof(header));
-            const uint64_t skipped = used - std::min(used, framed_size(body, len));
+            const uint64_t skipped = used - std::min(used, m_parser.raw_size());
             if (header.len == len) {
                 if (skipped > 0) {
                     remark_next(outside(skipped, "before this packet"));
@@ -131,7 +127,7 @@ bool FrameExporter::take(const Piece& piece) {
     if (piece.offset > m_end) {
         remark_next(outside(piece.offset - m_end, "before this packet"));
     }
-    m_end = piece.offset + (piece.kind ? len : framed_size(body, len));
+    m_end = piece.offset + piece.size;
     m_tail = piece.intact ? m_end : m_end - 1;
     if (!write(m_time, piece.type, body, len)) {
         return m_writer.good();
