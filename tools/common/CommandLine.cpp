@@ -97,10 +97,18 @@ bool CommandLine::parse(int argc, char** argv) {
     }
     m_command = name;
     m_params.assign(argv + optind + 1, argv + argc);
-    for (const Option& option : m_syntax.options) {
-        if (has(option.name) && !takes_option(name, option)) {
-            return end(usage_error(std::string("--") + option.name + " is for " +
-                                   option_owners(option) + " only"));
+    // Two commands may have an option of the same name, each with a row of its own.
+    for (const auto& [given, value] : m_options) {
+        std::string owners;
+        bool taken = false;
+        for (const Option& option : m_syntax.options) {
+            if (given == option.name) {
+                owners += (owners.empty() ? "" : ", ") + option_owners(option);
+                taken = taken || takes_option(name, option);
+            }
+        }
+        if (!taken) {
+            return end(usage_error("--" + given + " is for " + owners + " only"));
         }
     }
     return true;
@@ -241,8 +249,11 @@ void CommandLine::print_completions(const Args& words) const {
         }
     }
     if (typed.compare(0, 1, "-") == 0) {
+        Args offered;
         for (const Option& option : options) {
-            if (args.empty() || takes_option(args[0], option)) {
+            if ((args.empty() || takes_option(args[0], option)) &&
+                std::find(offered.begin(), offered.end(), option.name) == offered.end()) {
+                offered.push_back(option.name);
                 offer(std::string("--") + option.name);
             }
         }

@@ -11,6 +11,7 @@
 
 typedef std::vector<std::string> Args;
 
+// An option whose parameter or meaning depends on the command has a row for each.
 struct Option {
     const char* name;
     const char* param;     // null without one
