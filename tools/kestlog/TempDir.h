@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // A private temporary directory. However this process ends, by a signal too, the directory is
-// removed: a child process waits for that.
+// removed: a child process, which has made it, waits for that.
 #ifndef KESTLOG_TEMPDIR_H_
 #define KESTLOG_TEMPDIR_H_
 
