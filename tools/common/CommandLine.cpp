@@ -215,12 +215,12 @@ void CommandLine::print_help() const {
            m_syntax.operands.c_str(), m_syntax.purpose.c_str());
     for (const Option& option : options) {
         const std::string owners = option_owners(option);
-        printf("  %-*s %s%s%s\n", width, option_usage(option).c_str(), owners.c_str(),
+        printf("  %-*s  %s%s%s\n", width, option_usage(option).c_str(), owners.c_str(),
                owners.empty() ? "" : ": ", option.help);
     }
     printf("\nCommands:\n");
     for (const Syntax::Command& command : m_syntax.commands) {
-        printf("  %-*s %s\n", width, command.usage.c_str(), command.help.c_str());
+        printf("  %-*s  %s\n", width, command.usage.c_str(), command.help.c_str());
     }
     printf("\n%s", m_syntax.notes.c_str());
 }
