@@ -83,8 +83,7 @@ int begin(Call call, Place place) {
     }
     if (state.counters.calls - state.pass_calls > MAX_CALLS_A_PASS) {
         fail_run("hang", "%llu calls in one pass of the loop, now %s in %s",
-                 static_cast<unsigned long long>(MAX_CALLS_A_PASS), CALL_NAMES[call],
-                 PLACE_NAMES[place]);
+                 number(MAX_CALLS_A_PASS), CALL_NAMES[call], PLACE_NAMES[place]);
     }
     for (FaultRule& rule : state.faults) {
         // What fails in the start for want of these stays so for the life of the process.
@@ -144,6 +143,18 @@ int refusal(Place place, bool takes_room) {
         ledger::excuse_all();
     }
     return error;
+}
+
+// The same, after a rule had its chance.
+int hindrance(Call call, Place place, bool takes_room) {
+    const int fault = begin(call, place);
+    return fault > 0 ? fault : refusal(place, takes_room);
+}
+
+bool exists(const char* path) {
+    const Outside outside;
+    struct stat st;
+    return lstat(path, &st) == 0;
 }
 
 int result_of(const char* name, const char* path, int result) {
@@ -247,14 +258,6 @@ ssize_t write_to_thread(int fd, uint8_t byte) {
 
 }  // namespace
 
-const char* name_of(Call call) {
-    return CALL_NAMES[call];
-}
-
-const char* name_of(Place place) {
-    return PLACE_NAMES[place];
-}
-
 void print_traces_to(int fd) {
     s_trace_fd = fd;
 }
@@ -300,20 +303,28 @@ void fail_run(const char* failure_class, const char* format, ...) {
     snprintf(g_state->failure_class, sizeof(g_state->failure_class), "%s", failure_class);
     va_list args;
     va_start(args, format);
-    vsnprintf(g_state->failure, sizeof(g_state->failure), format, args);
+    char text[1500];
+    vsnprintf(text, sizeof(text), format, args);
     va_end(args);
-    trace("FAILED %s: %s", failure_class, without_root(g_state->failure).c_str());
+    snprintf(g_state->failure, sizeof(g_state->failure), "%s", without_root(text).c_str());
+    trace("FAILED %s: %s", failure_class, g_state->failure);
     if (getenv("SIMULATION_ABORT")) {
         abort();  // a stack trace is wanted
     }
     end_life(LIFE_FAILED);
 }
 
-#define REAL(result, name, ...) extern "C" result __real_##name(__VA_ARGS__)
 #define WRAPPED(result, name, ...)                \
     extern "C" result __real_##name(__VA_ARGS__); \
     extern "C" result __wrap_##name(__VA_ARGS__); \
     extern "C" result __wrap_##name(__VA_ARGS__)
+
+// A call that fails by a rule, and else does what it always does.
+#define WITH_FAULTS(name, call, place, arguments, ...)              \
+    WRAPPED(int, name, __VA_ARGS__) {                               \
+        const int fault = g_inside ? begin(call, place) : 0;        \
+        return fault > 0 ? failed(fault) : __real_##name arguments; \
+    }
 
 // ---- Time
 
@@ -405,12 +416,12 @@ extern "C" int __wrap_open(const char* path, int flags, ...) {
         return result_of("open", path, world().open_device(path));
     }
     struct stat st;
-    const bool exists = lstat(path, &st) == 0;
-    if (exists && S_ISFIFO(st.st_mode) && !(flags & O_NONBLOCK)) {
+    const bool there = lstat(path, &st) == 0;
+    if (there && S_ISFIFO(st.st_mode) && !(flags & O_NONBLOCK)) {
         fail_run("hang", "blocking open of the FIFO %s", path);
     }
     if ((flags & O_ACCMODE) != O_RDONLY && on_medium(place)) {
-        if (const int error = refusal(place, (flags & O_CREAT) && !exists)) {
+        if (const int error = refusal(place, (flags & O_CREAT) && !there)) {
             return result_of("open", path, failed(error));
         }
     }
@@ -514,21 +525,9 @@ WRAPPED(ssize_t, pwrite, int fd, const void* data, size_t len, off_t offset) {
     return __real_pwrite(fd, data, fault == SHORT_COUNT && len > 1 ? len / 2 : len, offset);
 }
 
-WRAPPED(int, ftruncate, int fd, off_t len) {
-    if (!g_inside) {
-        return __real_ftruncate(fd, len);
-    }
-    const int fault = begin(CALL_TRUNCATE, place_of_fd(fd));
-    return fault > 0 ? failed(fault) : __real_ftruncate(fd, len);
-}
-
-WRAPPED(int, fcntl, int fd, int command, long argument) {
-    if (!g_inside) {
-        return __real_fcntl(fd, command, argument);
-    }
-    const int fault = begin(CALL_FCNTL, place_of_fd(fd));
-    return fault > 0 ? failed(fault) : __real_fcntl(fd, command, argument);
-}
+WITH_FAULTS(ftruncate, CALL_TRUNCATE, place_of_fd(fd), (fd, len), int fd, off_t len)
+WITH_FAULTS(fcntl, CALL_FCNTL, place_of_fd(fd), (fd, command, argument), int fd, int command,
+            long argument)
 
 WRAPPED(int, fclose, FILE* file) {
     if (!g_inside) {
@@ -628,10 +627,9 @@ WRAPPED(int, stat, const char* path, struct stat* st) {
     return result;
 }
 
-WRAPPED(int, lstat, const char* path, struct stat* st) {
-    const int fault = g_inside ? begin(CALL_STAT, world().place_of(path)) : 0;
-    return fault > 0 ? failed(fault) : __real_lstat(path, st);
-}
+WITH_FAULTS(lstat, CALL_STAT, world().place_of(path), (path, st), const char* path, struct stat* st)
+WITH_FAULTS(fstatat, CALL_STAT, place_of_fd(fd), (fd, name, st, flags), int fd, const char* name,
+            struct stat* st, int flags)
 
 WRAPPED(int, fstat, int fd, struct stat* st) {
     const int fault = g_inside ? begin(CALL_STAT, place_of_fd(fd)) : 0;
@@ -643,11 +641,6 @@ WRAPPED(int, fstat, int fd, struct stat* st) {
         world().set_times("", *st);
     }
     return result;
-}
-
-WRAPPED(int, fstatat, int fd, const char* name, struct stat* st, int flags) {
-    const int fault = g_inside ? begin(CALL_STAT, place_of_fd(fd)) : 0;
-    return fault > 0 ? failed(fault) : __real_fstatat(fd, name, st, flags);
 }
 
 WRAPPED(int, access, const char* path, int mode) {
@@ -670,20 +663,11 @@ WRAPPED(int, rename, const char* from, const char* to) {
     if (!g_inside) {
         return __real_rename(from, to);
     }
-    const Place place = world().place_of(from);
-    const int fault = begin(CALL_RENAME, place);
-    if (fault > 0) {
-        return result_of("rename", from, failed(fault));
-    }
-    if (const int error = refusal(place, false)) {
+    if (const int error = hindrance(CALL_RENAME, world().place_of(from), false)) {
         return result_of("rename", from, failed(error));
     }
-    {
-        const Outside outside;
-        struct stat st;
-        if (lstat(to, &st) == 0) {
-            fail_run("replaced", "rename of %s replaces %s", from, to);
-        }
+    if (exists(to)) {
+        fail_run("replaced", "rename of %s replaces %s", from, to);
     }
     return result_of("rename", to, __real_rename(from, to));
 }
@@ -693,11 +677,7 @@ WRAPPED(int, unlink, const char* path) {
         return __real_unlink(path);
     }
     const Place place = world().place_of(path);
-    const int fault = begin(CALL_UNLINK, place);
-    if (fault > 0) {
-        return result_of("unlink", path, failed(fault));
-    }
-    if (const int error = refusal(place, false)) {
+    if (const int error = hindrance(CALL_UNLINK, place, false)) {
         return result_of("unlink", path, failed(error));
     }
     {
@@ -708,37 +688,19 @@ WRAPPED(int, unlink, const char* path) {
 }
 
 WRAPPED(int, mkdir, const char* path, mode_t mode) {
-    if (!g_inside) {
+    if (!g_inside || exists(path)) {
         return __real_mkdir(path, mode);
     }
-    const Place place = world().place_of(path);
-    const int fault = begin(CALL_MKDIR, place);
-    if (fault > 0) {
-        return result_of("mkdir", path, failed(fault));
-    }
-    struct stat st;
-    if (__real_lstat(path, &st) == 0) {
-        return failed(EEXIST);
-    }
-    if (const int error = refusal(place, true)) {
-        return result_of("mkdir", path, failed(error));
-    }
-    return result_of("mkdir", path, __real_mkdir(path, mode));
+    const int error = hindrance(CALL_MKDIR, world().place_of(path), true);
+    return result_of("mkdir", path, error ? failed(error) : __real_mkdir(path, mode));
 }
 
 WRAPPED(int, rmdir, const char* path) {
     if (!g_inside) {
         return __real_rmdir(path);
     }
-    const Place place = world().place_of(path);
-    const int fault = begin(CALL_RMDIR, place);
-    if (fault > 0) {
-        return failed(fault);
-    }
-    if (const int error = refusal(place, false)) {
-        return failed(error);
-    }
-    return result_of("rmdir", path, __real_rmdir(path));
+    const int error = hindrance(CALL_RMDIR, world().place_of(path), false);
+    return result_of("rmdir", path, error ? failed(error) : __real_rmdir(path));
 }
 
 WRAPPED(int, system, const char* command) {

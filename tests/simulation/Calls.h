@@ -118,7 +118,4 @@ enum LifeEnd { LIFE_OVER = 0, LIFE_FAILED = 3, LIFE_KILLED = 9 };
 // Ends this process without any destructor.
 [[noreturn]] void end_life(LifeEnd end);
 
-const char* name_of(Call call);
-const char* name_of(Place place);
-
 #endif  // SIMULATION_CALLS_H_

@@ -3,16 +3,15 @@
 #include "simulation/Clients.h"
 
 #include <errno.h>
-#include <stddef.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <utility>
 #include <vector>
 
+#include "sim/local_socket.h"
 #include "simulation/Calls.h"
 #include "simulation/World.h"
 
@@ -213,20 +212,8 @@ bool Clients::connected(Client& client) {
     if (client.fd >= 0) {
         return true;
     }
-    client.fd = socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
-    struct sockaddr_un address;
-    memset(&address, 0, sizeof(address));
-    address.sun_family = AF_UNIX;
-    const std::string name = "kestmodem@" + m_root;
-    memcpy(address.sun_path + 1, name.data(), name.size());
-    const socklen_t len =
-        static_cast<socklen_t>(offsetof(struct sockaddr_un, sun_path) + 1 + name.size());
-    if (connect(client.fd, reinterpret_cast<struct sockaddr*>(&address), len) < 0) {
-        close(client.fd);
-        client.fd = -1;
-        return false;
-    }
-    return true;
+    client.fd = connect_local("kestmodem", m_root);
+    return client.fd >= 0;
 }
 
 void Clients::drop(Client& client) {

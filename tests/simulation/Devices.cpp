@@ -229,7 +229,7 @@ void Devices::take_requests(End& end, unsigned stream) {
 
 void Devices::dump_confirmed(int fd) {
     StreamState& s = g_state->streams[ST_DUMP];
-    trace("dump confirmed, %llu bytes unread", static_cast<unsigned long long>(s.fed - s.consumed));
+    trace("dump confirmed, %llu bytes unread", number(s.fed - s.consumed));
     g_state->dump_unconfirmed = false;
     uint8_t bytes[4096];
     while (recv(fd, bytes, sizeof(bytes), 0) > 0) {

@@ -28,10 +28,6 @@ constexpr size_t LOCATABLE = 15;
 const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
                                          "agdsp",    "DSP PCM", "DSP dump"};
 
-unsigned long long number(uint64_t n) {
-    return n;
-}
-
 void gap(unsigned stream, uint64_t to) {
     StreamState& s = g_state->streams[stream];
     const uint64_t len = to - s.written;

@@ -360,9 +360,7 @@ void Media::check_bytes() const {
         if (difference > 3 * s.cuts) {
             fail_run("media",
                      "stream %u: %llu bytes on the media, %llu written and %llu of them deleted",
-                     stream, static_cast<unsigned long long>(there[stream]),
-                     static_cast<unsigned long long>(s.stored),
-                     static_cast<unsigned long long>(s.removed));
+                     stream, number(there[stream]), number(s.stored), number(s.removed));
         }
     }
 }
@@ -399,8 +397,7 @@ void Media::check_names() const {
         std::map<std::string, std::set<uint64_t>> numbers;
         for (const LogFileSeen& log : look(medium).logs) {
             if (log.size > MAX_SIZE) {
-                fail_run("size", "%s has %llu bytes", log.path.c_str(),
-                         static_cast<unsigned long long>(log.size));
+                fail_run("size", "%s has %llu bytes", log.path.c_str(), number(log.size));
             }
             if (!numbers[fs::path(log.path).parent_path()].insert(log.number).second) {
                 fail_run("numbers", "%s: its number is there twice", log.path.c_str());

@@ -2,13 +2,13 @@
 
 #include "simulation/Peers.h"
 
+#include <errno.h>
 #include <poll.h>
-#include <stddef.h>
 #include <string.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 #include <unistd.h>
 
+#include "sim/local_socket.h"
 #include "simulation/Calls.h"
 
 namespace {
@@ -46,16 +46,9 @@ Peers::~Peers() {
 }
 
 int Peers::listen_at(const char* name) const {
-    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
-    struct sockaddr_un address;
-    memset(&address, 0, sizeof(address));
-    address.sun_family = AF_UNIX;
-    const std::string full = std::string(name) + "@" + m_root;
-    memcpy(address.sun_path + 1, full.data(), full.size());
-    const socklen_t len =
-        static_cast<socklen_t>(offsetof(struct sockaddr_un, sun_path) + 1 + full.size());
-    if (bind(fd, reinterpret_cast<struct sockaddr*>(&address), len) < 0 || listen(fd, 8) < 0) {
-        fail_run("simulation", "cannot listen as %s: %s", full.c_str(), strerror(errno));
+    const int fd = listen_local(name, m_root);
+    if (fd < 0) {
+        fail_run("simulation", "cannot listen as %s: %s", name, strerror(errno));
     }
     return fd;
 }

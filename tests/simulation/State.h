@@ -97,6 +97,11 @@ struct Counters {
     uint64_t thread_steps;
 };
 
+// For %llu.
+inline unsigned long long number(uint64_t n) {
+    return n;
+}
+
 struct State {
     int64_t boot_ns;
     int64_t wall_ns;  // to be added for the time of day

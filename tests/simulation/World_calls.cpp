@@ -100,8 +100,7 @@ void World::service_deletes(const char* path, Place place) const {
 void World::dump_confirmed(int fd) {
     const StreamState& s = g_state->streams[ST_DUMP];
     if (s.fed != s.consumed && !g_fds[fd].failed && !g_state->fault_in_step && !refusal_is_due()) {
-        fail_run("dump", "taken, with %llu bytes unread",
-                 static_cast<unsigned long long>(s.fed - s.consumed));
+        fail_run("dump", "taken, with %llu bytes unread", number(s.fed - s.consumed));
     }
     m_devices.dump_confirmed(fd);
 }

@@ -71,10 +71,9 @@ void World::check_quota() const {
     const uint64_t limit = std::max(uint64_t{quota.value} << 20, seen.spared);
     if (!quota.uncertain && quota.value && seen.bytes > limit + 32768 &&
         m_controller->stor_mgr().media_type() == MT_EXTERNAL) {
-        fail_run(
-            "quota", "%llu bytes on a card with a quota of %u MB; counted are %llu",
-            static_cast<unsigned long long>(seen.bytes), quota.value,
-            static_cast<unsigned long long>(m_controller->stor_mgr().get_media_stor()->size()));
+        fail_run("quota", "%llu bytes on a card with a quota of %u MB; counted are %llu",
+                 number(seen.bytes), quota.value,
+                 number(m_controller->stor_mgr().get_media_stor()->size()));
     }
 }
 
@@ -115,25 +114,22 @@ void World::check_totals() const {
                 }
                 if (of_dir != dir->size()) {
                     fail_run("total", "directory %s: %llu, its files %llu", dir->path().string(),
-                             static_cast<unsigned long long>(dir->size()),
-                             static_cast<unsigned long long>(of_dir));
+                             number(dir->size()), number(of_dir));
                 }
                 of_set += of_dir;
             }
             sum += set->size();
             if (of_set != set->size() && !g_state->tampered && !g_state->faulted) {
                 fail_run("total", "set %s: %llu, its files %llu", set->path().string(),
-                         static_cast<unsigned long long>(set->size()),
-                         static_cast<unsigned long long>(of_set));
+                         number(set->size()), number(of_set));
             }
         }
         if (g_state->tampered || g_state->faulted) {
             continue;
         }
         if (sum != media->size()) {
-            fail_run("total", "medium %d: %llu, its sets %llu", type,
-                     static_cast<unsigned long long>(media->size()),
-                     static_cast<unsigned long long>(sum));
+            fail_run("total", "medium %d: %llu, its sets %llu", type, number(media->size()),
+                     number(sum));
         }
         const bool external = type == MT_EXTERNAL;
         uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
@@ -144,8 +140,8 @@ void World::check_totals() const {
         }
         const bool known = !external || (g_state->card_in && media->scanned());
         if (known && (sum < there || sum > there + (STREAM_COUNT + 2) * 65536)) {
-            fail_run("total", "medium %d: %llu, on the medium %llu", type,
-                     static_cast<unsigned long long>(sum), static_cast<unsigned long long>(there));
+            fail_run("total", "medium %d: %llu, on the medium %llu", type, number(sum),
+                     number(there));
         }
     }
 }

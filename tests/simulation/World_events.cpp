@@ -3,13 +3,17 @@
 #include <stdlib.h>
 #include <time.h>
 
+#include <algorithm>
+#include <iterator>
+
 #include "simulation/World.h"
 
 void World::act(const Event& event) {
     State& state = *g_state;
     trace("event %s", to_text(event).c_str());
-    if (event.kind != EV_FEED && event.kind != EV_REQUEST && event.kind != EV_CHECK &&
-        event.kind != EV_SUPERVISOR) {
+    static const EventKind DISTURBING_NOBODY[] = {EV_FEED,       EV_REQUEST, EV_CHECK,
+                                                  EV_SUPERVISOR, EV_IQ,      EV_IMAGE};
+    if (std::count(std::begin(DISTURBING_NOBODY), std::end(DISTURBING_NOBODY), event.kind) == 0) {
         state.calm_ns = 0;
     }
     Chance chance(event.b, event.a);

@@ -14,18 +14,6 @@
 
 namespace {
 
-const char USAGE[] =
-    "usage: simulate [OPTION...] [PLAN]\n"
-    "Runs the service in a simulated world and checks all that it does.\n"
-    "  PLAN              runs the events of this file\n"
-    "  --seed N          first seed, 1\n"
-    "  --seeds N         how many seeds, 1\n"
-    "  --seconds N       as many seeds as fit into so many seconds\n"
-    "  --weather 0..3    fair, outside, faults, storm; all of them in turn when left out\n"
-    "  --events N        events of a seed, 400\n"
-    "  --trace           prints all that happens\n"
-    "  --no-shorten      does not look for a shorter plan\n";
-
 const char* const WEATHERS[WEATHER_COUNT] = {"fair", "outside", "faults", "storm"};
 
 struct Options {
@@ -36,6 +24,7 @@ struct Options {
     size_t events = 400;
     bool trace = false;
     bool shorten = true;
+    bool first = false;
     const char* plan = nullptr;
 };
 
@@ -52,16 +41,11 @@ void show_failure(const Plan& plan, const RunResult& result, const Options& opti
 }
 
 void add(Counters& sum, const Counters& more) {
-    sum.events += more.events;
-    sum.calls += more.calls;
-    sum.faults += more.faults;
-    sum.kills += more.kills;
-    sum.bytes += more.bytes;
-    sum.requests += more.requests;
-    sum.replies += more.replies;
-    sum.dumps += more.dumps;
-    sum.passes += more.passes;
-    sum.checks += more.checks;
+    uint64_t* const to = reinterpret_cast<uint64_t*>(&sum);
+    const uint64_t* const from = reinterpret_cast<const uint64_t*>(&more);
+    for (size_t i = 0; i < sizeof(Counters) / sizeof(uint64_t); ++i) {
+        to[i] += from[i];
+    }
 }
 
 double now() {
@@ -85,7 +69,7 @@ int run_file(const Options& options) {
     }
     const RunResult result = run_plan(plan, options.trace ? STDOUT_FILENO : -1);
     printf("%s: %s, digest %016llx\n", options.plan, result.passed ? "passed" : "FAILED",
-           static_cast<unsigned long long>(result.digest));
+           number(result.digest));
     if (!result.passed) {
         show_failure(plan, result, options);
     }
@@ -109,43 +93,41 @@ int run_seeds(const Options& options) {
         hours += result.hours;
         if (!result.passed) {
             ++failures;
-            printf("seed %llu, %s: FAILED, digest %016llx\n", static_cast<unsigned long long>(seed),
-                   WEATHERS[weather], static_cast<unsigned long long>(result.digest));
+            printf("seed %llu, %s: FAILED, digest %016llx\n", number(seed), WEATHERS[weather],
+                   number(result.digest));
             show_failure(plan, result, options);
             fflush(stdout);
+            if (options.first) {
+                break;
+            }
         }
     }
     printf(
         "%llu seeds, %llu failed; %.1f s, %.1f virtual days, %llu events, %llu calls, "
         "%llu faults, %llu kills, %.1f MB, %llu requests, %llu replies, %llu dump notices\n",
-        static_cast<unsigned long long>(runs), static_cast<unsigned long long>(failures),
-        now() - start, hours / 24, static_cast<unsigned long long>(sum.events),
-        static_cast<unsigned long long>(sum.calls), static_cast<unsigned long long>(sum.faults),
-        static_cast<unsigned long long>(sum.kills), static_cast<double>(sum.bytes) / 1e6,
-        static_cast<unsigned long long>(sum.requests), static_cast<unsigned long long>(sum.replies),
-        static_cast<unsigned long long>(sum.dumps));
+        number(runs), number(failures), now() - start, hours / 24, number(sum.events),
+        number(sum.calls), number(sum.faults), number(sum.kills),
+        static_cast<double>(sum.bytes) / 1e6, number(sum.requests), number(sum.replies),
+        number(sum.dumps));
     return failures ? 1 : 0;
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-    Options options;
+// False when an option is not known or lacks its value.
+bool parse(int argc, char** argv, Options& options) {
     for (int i = 1; i < argc; ++i) {
         const std::string option = argv[i];
-        const char* const value = i + 1 < argc ? argv[i + 1] : nullptr;
         if (option == "--trace") {
             options.trace = true;
         } else if (option == "--no-shorten") {
             options.shorten = false;
+        } else if (option == "--first") {
+            options.first = true;
         } else if (option[0] != '-') {
             options.plan = argv[i];
-        } else if (!value) {
-            fputs(USAGE, option == "--help" ? stdout : stderr);
-            return option == "--help" ? 0 : 2;
+        } else if (++i == argc) {
+            return false;
         } else {
-            ++i;
-            const uint64_t number = strtoull(value, nullptr, 10);
+            const uint64_t number = strtoull(argv[i], nullptr, 10);
             if (option == "--seed") {
                 options.seed = number;
             } else if (option == "--seeds") {
@@ -157,10 +139,20 @@ int main(int argc, char** argv) {
             } else if (option == "--events") {
                 options.events = number;
             } else {
-                fputs(USAGE, stderr);
-                return 2;
+                return false;
             }
         }
+    }
+    return true;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    Options options;
+    if (!parse(argc, argv, options)) {
+        fputs("see scripts/simulate --help\n", stderr);
+        return 2;
     }
     return options.plan ? run_file(options) : run_seeds(options);
 }
