@@ -100,21 +100,14 @@ const Request& request_of(uint64_t index) {
 }
 
 std::string value_text(unsigned which, unsigned value) {
-    switch (which) {
-        case SET_OVERWRITE:
-            return value ? "OK ENABLE" : "OK DISABLE";
-        case SET_MD_INTERNAL:
-            return value ? "OK INTERNAL" : "OK EXTERNAL";
-        default:
-            return "OK " + std::to_string(value);
-    }
+    static const char* const WORDS[][2] = {{"DISABLE", "ENABLE"}, {"EXTERNAL", "INTERNAL"}};
+    return "OK " +
+           (which < SET_OVERWRITE ? std::to_string(value) : WORDS[which - SET_OVERWRITE][value]);
 }
 
 unsigned value_of(unsigned which, const std::string& line) {
-    if (which == SET_OVERWRITE || which == SET_MD_INTERNAL) {
-        return line == value_text(which, 1);
-    }
-    return static_cast<unsigned>(strtoul(line.c_str() + 2, nullptr, 10));
+    return which < SET_OVERWRITE ? static_cast<unsigned>(strtoul(line.c_str() + 2, nullptr, 10))
+                                 : line == value_text(which, 1);
 }
 
 bool is_error(const std::string& line, const char* codes) {
@@ -209,19 +202,12 @@ uint64_t Clients::request_named(const char* text) {
 }
 
 bool Clients::connected(Client& client) {
-    if (client.fd >= 0) {
-        return true;
-    }
-    client.fd = connect_local("kestmodem", m_root);
+    client.fd = client.fd >= 0 ? client.fd : connect_local("kestmodem", m_root);
     return client.fd >= 0;
 }
 
 void Clients::drop(Client& client) {
-    for (const Asked& asked : client.asked) {
-        for (const auto& set : set_by(request_of(asked.index))) {
-            set.first->uncertain = true;
-        }
-    }
+    mark_uncertain(client);
     m_ghosts = m_ghosts || !client.asked.empty();
     if (client.fd >= 0) {
         close(client.fd);
@@ -431,10 +417,14 @@ bool Clients::waiting() const {
 
 void Clients::mark_uncertain() {
     for (const Client& client : m_clients) {
-        for (const Asked& asked : client.asked) {
-            for (const auto& set : set_by(request_of(asked.index))) {
-                set.first->uncertain = true;
-            }
+        mark_uncertain(client);
+    }
+}
+
+void Clients::mark_uncertain(const Client& client) {
+    for (const Asked& asked : client.asked) {
+        for (const auto& set : set_by(request_of(asked.index))) {
+            set.first->uncertain = true;
         }
     }
 }

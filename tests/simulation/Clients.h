@@ -67,6 +67,7 @@ private:
 
     unsigned connected_count() const;
     static bool saves(const Client& client);
+    static void mark_uncertain(const Client& client);
     bool connected(Client& client);
     void drop(Client& client);
     void ask(Client& client, uint64_t index);

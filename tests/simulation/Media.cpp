@@ -323,17 +323,18 @@ void Media::make_something(uint64_t what, Chance chance) {
 }
 
 void Media::install_image(uint64_t number, uint64_t how) {
-    enum { GOOD, SHORT, FOREIGN, GONE };
+    enum Kind { GOOD, SHORT, FOREIGN, GONE };
+    const Kind kind = static_cast<Kind>(how < 4 ? how : 0);
     std::vector<uint8_t> bytes = SimModemImage(IMAGE_SIZE, static_cast<uint32_t>(number)).bytes();
-    g_state->image = how % 4 == GOOD ? static_cast<uint32_t>(number) : 0;
-    if (how % 4 == SHORT) {
+    g_state->image = kind == GOOD ? static_cast<uint32_t>(number) : 0;
+    if (kind == SHORT) {
         bytes.resize(number % bytes.size());
-    } else if (how % 4 == FOREIGN) {
+    } else if (kind == FOREIGN) {
         bytes[number % 16] ^= 0x20;
     }
     const std::string path = m_root + "/image/w_modem";
     unlink(path.c_str());
-    if (how % 4 != GONE) {
+    if (kind != GONE) {
         std::ofstream(path, std::ios::binary)
             .write(reinterpret_cast<const char*>(bytes.data()),
                    static_cast<std::streamsize>(bytes.size()));

@@ -6,6 +6,7 @@
 #include <stdlib.h>
 
 #include <algorithm>
+#include <iterator>
 #include <sstream>
 
 #include "simulation/Calls.h"
@@ -14,50 +15,47 @@
 
 namespace {
 
-const char* const NAMES[EV_KIND_COUNT] = {
-    "feed",    "device-fails", "device-gone", "device-back", "card-out", "card-in",
-    "card-ro", "full",         "room",        "delete",      "stranger", "clock",
-    "zone",    "request",      "pieces",      "flood",       "leave",    "supervisor",
-    "time",    "diag",         "property",    "iq",          "image",    "kest-conf",
-    "option",  "fault",        "no-fault",    "kill",        "calm",     "check"};
-
-struct Weight {
-    EventKind kind;
+// By EventKind: how often it happens, from which weather on, and the limits of a and b, where
+// they have any.
+struct KindInfo {
+    const char* name;
     unsigned weight;
-    Weather from;  // the mildest weather in which it happens
+    Weather from;
+    uint64_t a;
+    uint64_t b;
 };
-
-const Weight WEIGHTS[] = {
-    {EV_FEED, 500, WEATHER_FAIR},
-    {EV_REQUEST, 100, WEATHER_FAIR},
-    {EV_PIECES, 10, WEATHER_FAIR},
-    {EV_FLOOD, 5, WEATHER_FAIR},
-    {EV_CLIENT_LEAVES, 15, WEATHER_FAIR},
-    {EV_SUPERVISOR, 40, WEATHER_FAIR},
-    {EV_TIME_SERVICE, 10, WEATHER_FAIR},
-    {EV_DIAG, 20, WEATHER_FAIR},
-    {EV_PROPERTY, 10, WEATHER_FAIR},
-    {EV_CHECK, 20, WEATHER_FAIR},
-    {EV_IQ, 25, WEATHER_FAIR},
-    {EV_IMAGE, 8, WEATHER_FAIR},
-    {EV_KEST_CONF, 8, WEATHER_FAIR},
-    {EV_DEVICE_FAILS, 6, WEATHER_OUTSIDE},
-    {EV_DEVICE_GONE, 6, WEATHER_OUTSIDE},
-    {EV_DEVICE_BACK, 12, WEATHER_OUTSIDE},
-    {EV_CARD_OUT, 12, WEATHER_OUTSIDE},
-    {EV_CARD_IN, 24, WEATHER_OUTSIDE},
-    {EV_CARD_READ_ONLY, 5, WEATHER_OUTSIDE},
-    {EV_MEDIUM_FULL, 8, WEATHER_OUTSIDE},
-    {EV_MEDIUM_ROOM, 12, WEATHER_OUTSIDE},
-    {EV_DELETE, 20, WEATHER_OUTSIDE},
-    {EV_STRANGER, 10, WEATHER_OUTSIDE},
-    {EV_CLOCK, 10, WEATHER_OUTSIDE},
-    {EV_ZONE, 5, WEATHER_OUTSIDE},
-    {EV_FAULT, 40, WEATHER_FAULTS},
-    {EV_NO_FAULTS, 15, WEATHER_FAULTS},
-    {EV_CALM, 8, WEATHER_FAULTS},
-    {EV_KILL, 10, WEATHER_STORM},
-    {EV_OPTION, 3, WEATHER_STORM},
+constexpr uint64_t ANY = uint64_t{1} << 48;
+const KindInfo KINDS[EV_KIND_COUNT] = {
+    {"feed", 500, WEATHER_FAIR, STREAM_COUNT, ANY},
+    {"device-fails", 6, WEATHER_OUTSIDE, STREAM_COUNT, ANY},
+    {"device-gone", 6, WEATHER_OUTSIDE, STREAM_COUNT, ANY},
+    {"device-back", 12, WEATHER_OUTSIDE, STREAM_COUNT, ANY},
+    {"card-out", 12, WEATHER_OUTSIDE, 4, ANY},
+    {"card-in", 24, WEATHER_OUTSIDE, 4, ANY},
+    {"card-ro", 5, WEATHER_OUTSIDE, ANY, ANY},
+    {"full", 8, WEATHER_OUTSIDE, MEDIUM_COUNT, 300000},
+    {"room", 12, WEATHER_OUTSIDE, MEDIUM_COUNT, ANY},
+    {"delete", 20, WEATHER_OUTSIDE, DEL_COUNT, ANY},
+    {"stranger", 10, WEATHER_OUTSIDE, ANY, ANY},
+    {"clock", 10, WEATHER_OUTSIDE, ANY, ANY},
+    {"zone", 5, WEATHER_OUTSIDE, 4, ANY},
+    {"request", 100, WEATHER_FAIR, 2 * Clients::COUNT, ANY},
+    {"pieces", 10, WEATHER_FAIR, 2 * Clients::COUNT, ANY},
+    {"flood", 5, WEATHER_FAIR, Clients::COUNT, ANY},
+    {"leave", 15, WEATHER_FAIR, Clients::COUNT, ANY},
+    {"supervisor", 40, WEATHER_FAIR, 2, SUP_COUNT},
+    {"time", 10, WEATHER_FAIR, 4, ANY},
+    {"diag", 20, WEATHER_FAIR, STREAM_COUNT, 8},
+    {"property", 10, WEATHER_FAIR, 4, 3},
+    {"iq", 25, WEATHER_FAIR, ANY, 300000},
+    {"image", 8, WEATHER_FAIR, 100, 8},
+    {"kest-conf", 8, WEATHER_FAIR, 24, ANY},
+    {"option", 3, WEATHER_STORM, 2, ANY},
+    {"fault", 40, WEATHER_FAULTS, ANY, ANY},
+    {"no-fault", 15, WEATHER_FAULTS, ANY, ANY},
+    {"kill", 10, WEATHER_STORM, 300, ANY},
+    {"calm", 8, WEATHER_FAULTS, ANY, ANY},
+    {"check", 20, WEATHER_FAIR, 1, ANY},
 };
 
 bool is_request(EventKind kind) {
@@ -66,54 +64,27 @@ bool is_request(EventKind kind) {
 
 EventKind pick_kind(Chance& chance, Weather weather) {
     unsigned total = 0;
-    for (const Weight& each : WEIGHTS) {
+    for (const KindInfo& each : KINDS) {
         total += each.from <= weather ? each.weight : 0;
     }
     uint64_t at = chance.below(total);
-    for (const Weight& each : WEIGHTS) {
-        if (each.from > weather) {
-            continue;
-        }
-        if (at < each.weight) {
-            return each.kind;
-        }
-        at -= each.weight;
+    int kind = 0;
+    for (; KINDS[kind].from > weather || at >= KINDS[kind].weight; ++kind) {
+        at -= KINDS[kind].from <= weather ? KINDS[kind].weight : 0;
     }
-    return EV_FEED;
+    return static_cast<EventKind>(kind);
 }
 
 // Mostly at once or soon, sometimes much later.
 uint64_t pause_ms(Chance& chance) {
-    switch (chance.below(10)) {
-        case 0:
-        case 1:
-        case 2:
-            return 0;
-        case 3:
-        case 4:
-        case 5:
-            return chance.below(50);
-        case 6:
-        case 7:
-            return chance.below(1000);
-        case 8:
-            return chance.below(4000);
-        default:
-            return chance.one_in(30) ? chance.below(3600000) : chance.below(10000);
-    }
+    static const uint64_t LIMITS[] = {1, 1, 1, 50, 50, 50, 1000, 1000, 4000, 10000};
+    const uint64_t limit = chance.pick(LIMITS);
+    return chance.below(limit == 10000 && chance.one_in(30) ? 3600000 : limit);
 }
 
 uint64_t feed_size(Chance& chance) {
-    switch (chance.below(6)) {
-        case 0:
-            return 1 + chance.below(100);
-        case 1:
-            return 32768;
-        case 2:
-            return 1 + chance.below(200000);
-        default:
-            return 1 + chance.below(40000);
-    }
+    static const uint64_t LIMITS[] = {100, 200000, 40000, 40000, 40000};
+    return chance.one_in(6) ? 32768 : 1 + chance.below(chance.pick(LIMITS));
 }
 
 // The thread looks for a command behind each 10 MiB.
@@ -143,20 +114,14 @@ uint64_t fault_size(Chance& chance, uint64_t call) {
 }
 
 Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
-    Event event = {at_ms, pick_kind(chance, weather), chance.next() >> 16, chance.next() >> 16};
-    switch (event.kind) {
+    const EventKind kind = pick_kind(chance, weather);
+    Event event = {at_ms, kind, chance.below(KINDS[kind].a), chance.below(KINDS[kind].b)};
+    switch (kind) {
         case EV_FEED:
-            event.a %= STREAM_COUNT;
             if (event.a == ST_DUMP && !chance.one_in(4)) {
                 event.a = ST_DSP;  // the DSP seldom crashes
             }
             event.b = feed_size(chance);
-            break;
-        case EV_DEVICE_FAILS:
-        case EV_DEVICE_GONE:
-        case EV_DEVICE_BACK:
-        case EV_DIAG:
-            event.a %= STREAM_COUNT;
             break;
         case EV_CLOCK: {
             static const int64_t JUMPS[] = {-86400, -3600, -60, -2, -1, 1, 60, 3600, 86400};
@@ -164,33 +129,22 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
             break;
         }
         case EV_MEDIUM_FULL:
-            event.a %= MEDIUM_COUNT;
-            event.b = chance.one_in(2) ? 0 : chance.below(300000);
-            break;
-        case EV_MEDIUM_ROOM:
-            event.a %= MEDIUM_COUNT;
+            event.b = chance.one_in(2) ? 0 : event.b;
             break;
         case EV_DELETE:
-            event.a = chance.one_in(3) ? chance.below(DEL_COUNT) : chance.below(DEL_CP_DIR);
+            event.a %= chance.one_in(3) ? DEL_COUNT : DEL_CP_DIR;
             break;
         case EV_SUPERVISOR:
-            event.a %= 2;
-            event.b = chance.one_in(2) ? uint64_t{SUP_ALIVE} : chance.below(SUP_COUNT);
-            break;
-        case EV_IMAGE:
-            event.a = 1 + chance.below(100);
-            event.b = chance.below(8) < 4 ? 0 : chance.below(4);
+            event.b = chance.one_in(2) ? uint64_t{SUP_ALIVE} : event.b;
             break;
         case EV_KEST_CONF:
-            event.a =
-                chance.one_in(3) ? chance.below(8) : uint64_t{KEST_ON | KEST_MODEM | KEST_WCN};
+            event.a = event.a < 8 ? event.a : uint64_t{KEST_ON | KEST_MODEM | KEST_WCN};
             break;
         case EV_IQ:
             event.b = iq_size(chance);
             break;
         case EV_REQUEST:
         case EV_PIECES:
-            event.a = chance.below(8);
             event.b = chance.below(Clients::request_count());
             break;
         case EV_FAULT:
@@ -198,7 +152,7 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
             event.b = fault_size(chance, event.a % PLAN_PLACE);
             break;
         case EV_KILL:
-            event.a = chance.one_in(2) ? chance.below(300) : chance.below(10);
+            event.a %= chance.one_in(2) ? 300 : 10;
             break;
         default:
             break;
@@ -265,7 +219,8 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
 
 std::string to_text(const Event& event) {
     std::ostringstream text;
-    text << event.at_ms << ' ' << NAMES[event.kind] << ' ' << static_cast<int64_t>(event.a) << ' ';
+    text << event.at_ms << ' ' << KINDS[event.kind].name << ' ' << static_cast<int64_t>(event.a)
+         << ' ';
     if (is_request(event.kind)) {
         text << Clients::request_text(event.b);
     } else {
@@ -285,8 +240,9 @@ bool add_line(Plan& plan, const std::string& line) {
     if (!(text >> at_ms >> name >> a)) {
         return false;
     }
-    const char* const* const found = std::find(NAMES, NAMES + EV_KIND_COUNT, name);
-    const EventKind kind = static_cast<EventKind>(found - NAMES);
+    const KindInfo* const found = std::find_if(
+        KINDS, std::end(KINDS), [&name](const KindInfo& each) { return name == each.name; });
+    const EventKind kind = static_cast<EventKind>(found - KINDS);
     std::string rest;
     std::getline(text >> std::ws, rest);
     if (kind == EV_KIND_COUNT || rest.empty()) {
