@@ -104,6 +104,7 @@ int begin(Call call, Place place) {
         state.fault_in_step = true;
         state.fault_seen = true;
         state.faulted = true;
+        state.card_fresh = false;
         const Outside outside;
         world().rule_fired(call, place);
         ledger::excuse_all();

@@ -105,7 +105,7 @@ void Media::pull_card() {
     if (!g_state->card_in) {
         return;
     }
-    g_state->card_in = false;
+    g_state->card_in = g_state->pulled_seen = g_state->card_fresh = false;
     g_state->card_read_only = false;
     g_state->room[MED_CARD] = UINT64_MAX;
     ++g_state->card_generation;
@@ -122,6 +122,7 @@ void Media::insert_card(bool fresh) {
     }
     rmdir((m_root + "/card").c_str());
     if (fresh) {
+        g_state->card_fresh = g_state->pulled_seen;
         g_state->card += 1;
         mkdir((m_root + "/card").c_str(), 0775);
     } else {
@@ -129,6 +130,10 @@ void Media::insert_card(bool fresh) {
                (m_root + "/card").c_str());
     }
     g_state->card_in = true;
+}
+
+bool Media::is_doubtful(MediumId medium) {
+    return (g_state->tampered || g_state->faulted) && !(medium == MED_CARD && g_state->card_fresh);
 }
 
 std::vector<std::string> Media::trees() const {
@@ -284,6 +289,7 @@ bool Media::remove_something(uint64_t what, Chance chance) {
     }
     trace("somebody deletes %s", victim->c_str());
     g_state->tampered = true;
+    g_state->card_fresh = false;
     remove_all(*victim);
     return true;
 }
@@ -300,6 +306,7 @@ void Media::make_something(uint64_t what, Chance chance) {
     }
     trace("somebody makes %s", path.c_str());
     g_state->tampered = true;
+    g_state->card_fresh = false;
     switch (what % 5) {
         case 0:
             make_text_file(path);
@@ -390,11 +397,11 @@ void Media::check_libraries(bool in_use) const {
 }
 
 void Media::check_names() const {
-    if (g_state->tampered || g_state->faulted) {
-        return;
-    }
     constexpr uint64_t MAX_SIZE = (2 << 20) + 65536;
     for (MediumId medium : {MED_DATA, MED_CARD}) {
+        if (is_doubtful(medium)) {
+            continue;
+        }
         std::map<std::string, std::set<uint64_t>> numbers;
         for (const LogFileSeen& log : look(medium).logs) {
             if (log.size > MAX_SIZE) {

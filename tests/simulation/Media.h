@@ -66,6 +66,8 @@ public:
     void check_names() const;
     // The stream whose directory this is part of, or CHANNEL_COUNT.
     static unsigned stream_of(const std::string& path);
+    // What happened to the medium, numbers and totals need not be right.
+    static bool is_doubtful(MediumId medium);
     static bool is_capture_name(const std::string& name);
     static bool is_log_name(const std::string& name);
 

@@ -169,6 +169,14 @@ Plan make_plan(uint64_t seed, Weather weather, size_t events) {
         Chance chance(seed, i);
         now += pause_ms(chance);
         plan.push_back(make_event(now, weather, chance));
+        if (weather == WEATHER_STORM && chance.one_in(60)) {
+            // Dies while the parsing library is replaced.
+            plan.push_back({now, EV_KILL, 20 + chance.below(120), 0});
+            plan.push_back({now, EV_IMAGE, 1 + chance.below(100), 0});
+            for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA"}) {
+                plan.push_back({now, EV_REQUEST, 0, Clients::request_named(request)});
+            }
+        }
     }
     // Now and then so much that the quota of the card has to be kept in the calm.
     if (seed % 5 == 0) {
@@ -193,6 +201,15 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     plan.push_back({now, EV_SUPERVISOR, 1, SUP_ALIVE});
     for (const char* request : REQUESTS) {
         plan.push_back({now += 100, EV_REQUEST, 0, Clients::request_named(request)});
+    }
+    if (at_ms % 2) {
+        // The service notices that the card goes, and that another one comes.
+        plan.push_back({now += 1000, EV_CARD_OUT, 0, 0});
+        plan.push_back({now + 10, EV_FEED, ST_GNSS, 5000});
+        plan.push_back({now + 1000, EV_CARD_IN, 1, 0});
+        plan.push_back({now + 1010, EV_FEED, ST_GNSS, 5000});
+        plan.push_back({now + 2000, EV_CALM, 0, 0});
+        now += 70000;
     }
     for (const char* request : {"SUBSCRIBE WCDMA DUMP", "SUBSCRIBE WCN DUMP"}) {
         plan.push_back({now += 100, EV_REQUEST, 1, Clients::request_named(request)});

@@ -57,6 +57,7 @@ void live(const std::string& root, const Plan& plan) {
     World world(root, plan);
     set_world(&world);
     trace("life %u", g_state->lives);
+    world.check_between_lives();
     {
         auto controller = std::make_unique<LogController>();
         world.attach(controller.get());

@@ -52,7 +52,7 @@ public:
     void service_read(const FdInfo& info, const uint8_t* data, size_t len);
     void dump_confirmed(int fd);
     void reading_failed() { m_last_stream = STREAM_COUNT; }
-    void service_deletes(const char* path, Place place) const;
+    void service_deletes(const char* path, Place place);
     int remove_by_shell(const char* command);
     // The stamps of the property file, in virtual time.
     void set_times(const char* path, struct stat& st) const;
@@ -63,6 +63,8 @@ public:
     void service_dies();
     // What a device answered, whole, is in a file whose name has this in it.
     void check_saved(unsigned stream, const char* kind) const;
+    // The service is not running: what it left behind.
+    void check_between_lives() const;
     // The service is not running for so long.
     void pass_without_service(int64_t ns);
 
@@ -80,6 +82,7 @@ private:
     void check_totals() const;
     void check_settings() const;
     void check_quota() const;
+    void check_room_made();
     void spins(const struct pollfd* fds, nfds_t count) const;
     void write_props() const;
     void write_kest_conf() const;
@@ -97,6 +100,7 @@ private:
     Media m_media;
     unsigned m_idle_passes = 0;
     unsigned m_refused_since_deletion = UINT32_MAX / 2;
+    unsigned m_refused = 0;  // blocks in a row, by a full medium
     unsigned m_last_stream = STREAM_COUNT;
 };
 

@@ -83,6 +83,7 @@ void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len
         g_state->streams[info.stream].answers_seen = true;
     }
     if (logged > 0) {
+        g_state->pulled_seen = !g_state->card_in && !g_state->card_told_ns;
         ledger::consumed(info.stream, logged, exchange);
         if (exchange) {
             m_devices.spoil_answer(info.stream);
@@ -90,7 +91,8 @@ void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len
     }
 }
 
-void World::service_deletes(const char* path, Place place) const {
+void World::service_deletes(const char* path, Place place) {
+    m_refused = 0;
     if (place == PLACE_DATA || place == PLACE_CARD) {
         m_media.book_removal(path);
     }
@@ -170,6 +172,7 @@ void World::message(const std::string& text) {
         fail_run("refused", "nothing was in the way: %s", text.c_str());
     }
     ledger::excuse(m_last_stream);
+    check_room_made();
 }
 
 // Whether the medium in use is above its quota and may not delete anything.

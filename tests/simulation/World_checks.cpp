@@ -29,6 +29,9 @@ void World::check(bool last) {
     m_media.check_bytes();
     if (last) {
         check_quota();
+        if (m_controller->stor_mgr().media_type() != MT_EXTERNAL) {
+            fail_run("medium", "the card is in, and not used");
+        }
         for (const std::string& capture : m_media.captures()) {
             IqDevice::check_file(capture);
         }
@@ -77,6 +80,29 @@ void World::check_quota() const {
     }
 }
 
+// A full medium whose old logs may be deleted takes data again.
+void World::check_room_made() {
+    constexpr unsigned MAX_REFUSED = 40;
+    constexpr uint64_t MUCH = 4 << 20;
+    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
+    const Setting& overwrite = g_state->settings[SET_OVERWRITE];
+    const bool has_to = g_state->room[card ? MED_CARD : MED_DATA] == 0 && overwrite.value &&
+                        !overwrite.uncertain && !g_state->fault_seen && !g_state->card_read_only;
+    m_refused = has_to ? m_refused + 1 : 0;
+    if (m_refused > MAX_REFUSED) {
+        const Media::Seen seen = m_media.look(card ? MED_CARD : MED_DATA);
+        if (seen.bytes > seen.spared + MUCH) {
+            fail_run("full", "%u blocks refused, with %llu bytes that may be deleted", m_refused,
+                     number(seen.bytes - seen.spared));
+        }
+    }
+}
+
+void World::check_between_lives() const {
+    m_media.check_bytes();
+    m_media.check_libraries(false);
+}
+
 void World::check_descriptors() const {
     unsigned count[FD_CLASS_COUNT] = {};
     unsigned devices[STREAM_COUNT] = {};
@@ -104,6 +130,8 @@ void World::check_descriptors() const {
 void World::check_totals() const {
     for (MediaType type : {MT_INTERNAL, MT_EXTERNAL}) {
         const MediaStorage* const media = m_controller->stor_mgr().get_media(type);
+        const bool external = type == MT_EXTERNAL;
+        const bool doubtful = Media::is_doubtful(external ? MED_CARD : MED_DATA);
         uint64_t sum = 0;
         for (const CpSetDirectory* set : media->sets()) {
             uint64_t of_set = 0;
@@ -119,19 +147,18 @@ void World::check_totals() const {
                 of_set += of_dir;
             }
             sum += set->size();
-            if (of_set != set->size() && !g_state->tampered && !g_state->faulted) {
+            if (of_set != set->size() && !doubtful) {
                 fail_run("total", "set %s: %llu, its files %llu", set->path().string(),
                          number(set->size()), number(of_set));
             }
         }
-        if (g_state->tampered || g_state->faulted) {
+        if (doubtful) {
             continue;
         }
         if (sum != media->size()) {
             fail_run("total", "medium %d: %llu, its sets %llu", type, number(media->size()),
                      number(sum));
         }
-        const bool external = type == MT_EXTERNAL;
         uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
         for (const FdInfo& info : g_fds) {
             // What the thread has written is counted when it is done.

@@ -46,6 +46,7 @@ void World::act(const Event& event) {
         case EV_CARD_READ_ONLY:
             state.card_read_only = state.card_in;
             state.tampered = true;
+            state.card_fresh = false;
             break;
         case EV_MEDIUM_FULL:
             state.room[event.a % MEDIUM_COUNT] = event.b;
