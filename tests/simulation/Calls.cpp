@@ -320,6 +320,14 @@ void fail_run(const char* failure_class, const char* format, ...) {
     extern "C" result __wrap_##name(__VA_ARGS__); \
     extern "C" result __wrap_##name(__VA_ARGS__)
 
+// The same, for a call of the service alone.
+#define INSIDE(result, name, arguments, ...)                                 \
+    static result inside_##name(__VA_ARGS__);                                \
+    WRAPPED(result, name, __VA_ARGS__) {                                     \
+        return g_inside ? inside_##name arguments : __real_##name arguments; \
+    }                                                                        \
+    static result inside_##name(__VA_ARGS__)
+
 // A call that fails by a rule, and else does what it always does.
 #define WITH_FAULTS(name, call, place, arguments, ...)              \
     WRAPPED(int, name, __VA_ARGS__) {                               \
@@ -329,20 +337,14 @@ void fail_run(const char* failure_class, const char* format, ...) {
 
 // ---- Time
 
-WRAPPED(int, clock_gettime, clockid_t clock, struct timespec* now) {
-    if (!g_inside) {
-        return __real_clock_gettime(clock, now);
-    }
+INSIDE(int, clock_gettime, (clock, now), clockid_t clock, struct timespec* now) {
     const int64_t ns = g_state->boot_ns + (clock == CLOCK_REALTIME ? g_state->wall_ns : 0);
     now->tv_sec = ns / 1000000000;
     now->tv_nsec = ns % 1000000000;
     return 0;
 }
 
-WRAPPED(time_t, time, time_t* result) {
-    if (!g_inside) {
-        return __real_time(result);
-    }
+INSIDE(time_t, time, (result), time_t* result) {
     const time_t now = (g_state->boot_ns + g_state->wall_ns) / 1000000000;
     if (result) {
         *result = now;
@@ -350,10 +352,7 @@ WRAPPED(time_t, time, time_t* result) {
     return now;
 }
 
-WRAPPED(int, usleep, useconds_t us) {
-    if (!g_inside) {
-        return __real_usleep(us);
-    }
+INSIDE(int, usleep, (us), useconds_t us) {
     begin(CALL_COUNT, PLACE_OTHER);
     if (SavingThread::here()) {
         world().thread().stop_before_call(int64_t{us} * 1000);
@@ -365,16 +364,13 @@ WRAPPED(int, usleep, useconds_t us) {
     return 0;
 }
 
-WRAPPED(pid_t, getpid, ) {
-    return g_inside ? 77 : __real_getpid();
+INSIDE(pid_t, getpid, (), ) {
+    return 77;
 }
 
 // ---- The loop
 
-WRAPPED(int, poll, struct pollfd* fds, nfds_t count, int timeout) {
-    if (!g_inside) {
-        return __real_poll(fds, count, timeout);
-    }
+INSIDE(int, poll, (fds, count, timeout), struct pollfd* fds, nfds_t count, int timeout) {
     const bool loops_own = world().is_loops_own(fds);
     if (const int error = begin(CALL_POLL, PLACE_ANY)) {
         if (loops_own) {
@@ -433,20 +429,14 @@ extern "C" int __wrap_open(const char* path, int flags, ...) {
     return result_of("open", path, fd);
 }
 
-WRAPPED(int, close, int fd) {
-    if (!g_inside) {
-        return __real_close(fd);
-    }
+INSIDE(int, close, (fd), int fd) {
     const int error = begin(CALL_CLOSE, place_of_fd(fd));
     forget_fd(fd);
     const int result = __real_close(fd);
     return error > 0 ? failed(error) : result;
 }
 
-WRAPPED(ssize_t, read, int fd, void* data, size_t len) {
-    if (!g_inside) {
-        return __real_read(fd, data, len);
-    }
+INSIDE(ssize_t, read, (fd, data, len), int fd, void* data, size_t len) {
     const int fault = begin(CALL_READ, place_of_fd(fd));
     if (fault > 0) {
         return failed(fault);
@@ -472,10 +462,7 @@ WRAPPED(ssize_t, read, int fd, void* data, size_t len) {
     return n;
 }
 
-WRAPPED(ssize_t, write, int fd, const void* data, size_t len) {
-    if (!g_inside) {
-        return __real_write(fd, data, len);
-    }
+INSIDE(ssize_t, write, (fd, data, len), int fd, const void* data, size_t len) {
     if (fd == STDERR_FILENO) {
         const Outside outside;
         const std::string text(static_cast<const char*>(data), len);
@@ -515,10 +502,8 @@ WRAPPED(ssize_t, writev, int fd, const struct iovec* pieces, int count) {
     return fault > 0 ? failed(fault) : write_to_medium(fd, pieces, count, fault);
 }
 
-WRAPPED(ssize_t, pwrite, int fd, const void* data, size_t len, off_t offset) {
-    if (!g_inside) {
-        return __real_pwrite(fd, data, len, offset);
-    }
+INSIDE(ssize_t, pwrite, (fd, data, len, offset), int fd, const void* data, size_t len,
+       off_t offset) {
     const int fault = begin(CALL_WRITE, place_of_fd(fd));
     if (fault > 0) {
         return failed(fault);
@@ -530,20 +515,14 @@ WITH_FAULTS(ftruncate, CALL_TRUNCATE, place_of_fd(fd), (fd, len), int fd, off_t 
 WITH_FAULTS(fcntl, CALL_FCNTL, place_of_fd(fd), (fd, command, argument), int fd, int command,
             long argument)
 
-WRAPPED(int, fclose, FILE* file) {
-    if (!g_inside) {
-        return __real_fclose(file);
-    }
+INSIDE(int, fclose, (file), FILE* file) {
     const int fault = begin(CALL_CLOSE, place_of_fd(fileno(file)));
     forget_fd(fileno(file));
     const int result = __real_fclose(file);
     return fault > 0 ? failed(fault) : result;
 }
 
-WRAPPED(int, ioctl, int fd, unsigned long request, unsigned long argument) {
-    if (!g_inside) {
-        return __real_ioctl(fd, request, argument);
-    }
+INSIDE(int, ioctl, (fd, request, argument), int fd, unsigned long request, unsigned long argument) {
     const int fault = begin(CALL_IOCTL, place_of_fd(fd));
     if (fault > 0 && g_fds[fd].cls == FD_IQ_DEVICE) {
         g_state->iq.taken = false;  // the driver goes on to report a buffer it could not release
@@ -573,19 +552,15 @@ WRAPPED(void*, mmap, void* address, size_t len, int protection, int flags, int f
 
 // ---- The saving thread
 
-WRAPPED(int, pthread_create, pthread_t* id, const pthread_attr_t* attributes,
-        void* (*routine)(void*), void* param) {
-    if (!g_inside) {
-        return __real_pthread_create(id, attributes, routine, param);
-    }
+INSIDE(int, pthread_create, (id, attributes, routine, param), pthread_t* id,
+       const pthread_attr_t* attributes, void* (*routine)(void*), void* param) {
+    (void)attributes;
     const int fault = begin(CALL_THREAD, PLACE_OTHER);
     return fault ? EAGAIN : world().thread().create(id, routine, param);
 }
 
-WRAPPED(int, pthread_join, pthread_t id, void** result) {
-    if (!g_inside) {
-        return __real_pthread_join(id, result);
-    }
+INSIDE(int, pthread_join, (id, result), pthread_t id, void** result) {
+    (void)result;
     begin(CALL_COUNT, PLACE_OTHER);
     return world().thread().join(id);
 }
@@ -644,10 +619,7 @@ WRAPPED(int, fstat, int fd, struct stat* st) {
     return result;
 }
 
-WRAPPED(int, access, const char* path, int mode) {
-    if (!g_inside) {
-        return __real_access(path, mode);
-    }
+INSIDE(int, access, (path, mode), const char* path, int mode) {
     const Place place = world().place_of(path);
     if (const int fault = begin(CALL_ACCESS, place)) {
         return failed(fault == SHORT_COUNT ? EIO : fault);
@@ -660,10 +632,7 @@ WRAPPED(int, access, const char* path, int mode) {
     return __real_access(path, mode);
 }
 
-WRAPPED(int, rename, const char* from, const char* to) {
-    if (!g_inside) {
-        return __real_rename(from, to);
-    }
+INSIDE(int, rename, (from, to), const char* from, const char* to) {
     if (const int error = hindrance(CALL_RENAME, world().place_of(from), false)) {
         return result_of("rename", from, failed(error));
     }
@@ -673,10 +642,7 @@ WRAPPED(int, rename, const char* from, const char* to) {
     return result_of("rename", to, __real_rename(from, to));
 }
 
-WRAPPED(int, unlink, const char* path) {
-    if (!g_inside) {
-        return __real_unlink(path);
-    }
+INSIDE(int, unlink, (path), const char* path) {
     const Place place = world().place_of(path);
     if (const int error = hindrance(CALL_UNLINK, place, false)) {
         return result_of("unlink", path, failed(error));
@@ -696,28 +662,19 @@ WRAPPED(int, mkdir, const char* path, mode_t mode) {
     return result_of("mkdir", path, error ? failed(error) : __real_mkdir(path, mode));
 }
 
-WRAPPED(int, rmdir, const char* path) {
-    if (!g_inside) {
-        return __real_rmdir(path);
-    }
+INSIDE(int, rmdir, (path), const char* path) {
     const int error = hindrance(CALL_RMDIR, world().place_of(path), false);
     return result_of("rmdir", path, error ? failed(error) : __real_rmdir(path));
 }
 
-WRAPPED(int, system, const char* command) {
-    if (!g_inside) {
-        return __real_system(command);
-    }
+INSIDE(int, system, (command), const char* command) {
     const int fault = begin(CALL_SYSTEM, PLACE_ANY);
     const Outside outside;
     trace("system %s", without_root(command).c_str());
     return fault > 0 ? failed(fault) : world().remove_by_shell(command);
 }
 
-WRAPPED(DIR*, opendir, const char* path) {
-    if (!g_inside) {
-        return __real_opendir(path);
-    }
+INSIDE(DIR*, opendir, (path), const char* path) {
     const int fault = begin(CALL_OPENDIR, world().place_of(path));
     if (fault > 0) {
         errno = fault;
@@ -737,10 +694,7 @@ WRAPPED(DIR*, opendir, const char* path) {
     return dir;
 }
 
-WRAPPED(struct dirent*, readdir, DIR* dir) {
-    if (!g_inside) {
-        return __real_readdir(dir);
-    }
+INSIDE(struct dirent*, readdir, (dir), DIR* dir) {
     if (const int fault = begin(CALL_READDIR, place_of_fd(dirfd(dir)))) {
         errno = fault == SHORT_COUNT ? 0 : fault;
         return nullptr;
