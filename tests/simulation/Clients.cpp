@@ -13,6 +13,7 @@
 
 #include "sim/local_socket.h"
 #include "simulation/Calls.h"
+#include "simulation/Ledger.h"
 #include "simulation/World.h"
 
 namespace {
@@ -347,6 +348,11 @@ void Clients::take_line(Client& client, const std::string& line) {
                 world().check_saved(done.what, done.text.compare(0, 12, "SAVE_RINGBUF") == 0
                                                    ? "_ringbuf_"
                                                    : "_sleeplog_");
+            }
+            const Setting* const logged =
+                done.kind == SETS_STREAM ? &g_state->streams[done.what].logged : nullptr;
+            if (logged && !logged->value && !logged->uncertain && client.asked.empty()) {
+                ledger::check_written(done.what);  // its file is closed
             }
             return;
         }

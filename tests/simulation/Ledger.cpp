@@ -297,14 +297,20 @@ void file_removed(const std::string& path, unsigned channel) {
     }
 }
 
+void check_written(unsigned stream) {
+    const StreamState& s = g_state->streams[stream];
+    const uint64_t open = s.consumed - s.written;
+    if (open > s.excuse || (open > 0 && s.written > s.excuse_until)) {
+        fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
+                 number(open));
+    }
+}
+
 void check_settled() {
     for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
         const StreamState& s = g_state->streams[stream];
         const uint64_t open = s.consumed - s.written;
-        if (open > s.excuse || (open > 0 && s.written > s.excuse_until)) {
-            fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
-                     number(open));
-        }
+        check_written(stream);
         const Setting& logged = g_state->streams[std::min<unsigned>(stream, ST_DSP)].logged;
         if (logged.value && !logged.uncertain && s.fed != s.consumed) {
             fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],

@@ -32,6 +32,8 @@ void file_written(FdInfo& file, const uint8_t* data, size_t len);
 // A log file is deleted; the rest of what its descriptor gets is deleted too.
 void file_removed(const std::string& path, unsigned channel);
 
+// Nothing that was read of the stream is outstanding without a reason.
+void check_written(unsigned stream);
 // Nothing may be outstanding when everything was calm and written out.
 void check_settled();
 

@@ -222,6 +222,10 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
     plan.push_back({now, EV_IQ, 1000, 200000});
     now += 300000;  // with the thread as slow as it can be
     for (unsigned round = 0; round < rounds; ++round) {
+        if (round % 8 == 7) {
+            // What the quota of 14 MB leaves, others take; and give it back.
+            plan.push_back({now, round % 16 == 7 ? EV_MEDIUM_FULL : EV_MEDIUM_ROOM, MED_CARD, 0});
+        }
         for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
             plan.push_back({now, EV_FEED, stream, round == 0 ? uint64_t{70000} : uint64_t{250000}});
         }

@@ -82,8 +82,8 @@ void World::check_quota() const {
 
 // A full medium whose old logs may be deleted takes data again.
 void World::check_room_made() {
-    constexpr unsigned MAX_REFUSED = 40;
-    constexpr uint64_t MUCH = 4 << 20;
+    constexpr unsigned MAX_REFUSED = 12;
+    constexpr uint64_t MUCH = 3 << 20;
     const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
     const bool has_to = g_state->room[card ? MED_CARD : MED_DATA] == 0 && overwrite.value &&
