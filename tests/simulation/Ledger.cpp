@@ -28,6 +28,12 @@ constexpr size_t LOCATABLE = 15;
 const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
                                          "agdsp",    "DSP PCM", "DSP dump"};
 
+// Whether the stream has to be read now, for certain.
+bool is_logged(unsigned stream) {
+    const Setting& logged = g_state->streams[std::min<unsigned>(stream, ST_DSP)].logged;
+    return logged.value && !logged.uncertain;
+}
+
 void gap(unsigned stream, uint64_t to) {
     StreamState& s = g_state->streams[stream];
     const uint64_t len = to - s.written;
@@ -306,17 +312,23 @@ void check_written(unsigned stream) {
     }
 }
 
+void check_read() {
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
+        const StreamState& s = g_state->streams[stream];
+        if (is_logged(stream) && s.fed != s.consumed) {
+            fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],
+                     number(s.fed - s.consumed));
+        }
+    }
+}
+
 void check_settled() {
+    check_read();
     for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
         const StreamState& s = g_state->streams[stream];
         const uint64_t open = s.consumed - s.written;
         check_written(stream);
-        const Setting& logged = g_state->streams[std::min<unsigned>(stream, ST_DSP)].logged;
-        if (logged.value && !logged.uncertain && s.fed != s.consumed) {
-            fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],
-                     number(s.fed - s.consumed));
-        }
-        if (logged.value && !logged.uncertain && open > 0) {
+        if (is_logged(stream) && open > 0) {
             fail_run("stopped", "%s: the last bytes, in calm, are not in a file", NAMES[stream]);
         }
     }

@@ -34,6 +34,8 @@ void file_removed(const std::string& path, unsigned channel);
 
 // Nothing that was read of the stream is outstanding without a reason.
 void check_written(unsigned stream);
+// What the devices gave has been read.
+void check_read();
 // Nothing may be outstanding when everything was calm and written out.
 void check_settled();
 

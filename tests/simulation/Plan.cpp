@@ -230,6 +230,7 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
             plan.push_back({now, EV_FEED, stream, round == 0 ? uint64_t{70000} : uint64_t{250000}});
         }
         now += 5000;
+        plan.push_back({now - 1, EV_CHECK, 3, 0});
     }
     // The parsing library comes with a start, if the log root is there by then.
     for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA", "FLUSH"}) {

@@ -40,7 +40,8 @@ enum EventKind {
     EV_NO_FAULTS,       // calls do not fail any more
     EV_KILL,            // a: so many calls from now
     EV_CALM,            // everything is in order again
-    EV_CHECK,           // media and lists are compared; a: 1: at the end, 2: and dumps were told
+    EV_CHECK,           // media and lists are compared; a: 1: at the end, 2: and
+                        // dumps were told; 3: nothing waits in a device
     EV_KIND_COUNT
 };
 

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <iterator>
 
+#include "simulation/Ledger.h"
 #include "simulation/World.h"
 
 void World::act(const Event& event) {
@@ -130,6 +131,9 @@ void World::act(const Event& event) {
             break;
         case EV_CHECK:
             check(event.a == 1 || event.a == 2);
+            if (event.a == 3) {
+                ledger::check_read();
+            }
             if (event.a == 2) {
                 IqDevice::check_saved();
                 m_clients.check_dumps_told(1);
