@@ -349,9 +349,8 @@ void Clients::take_line(Client& client, const std::string& line) {
                                                    ? "_ringbuf_"
                                                    : "_sleeplog_");
             }
-            const Setting* const logged =
-                done.kind == SETS_STREAM ? &g_state->streams[done.what].logged : nullptr;
-            if (logged && !logged->value && !logged->uncertain && client.asked.empty()) {
+            if (done.kind == SETS_STREAM && !done.argument && !asked.contested &&
+                client.asked.empty()) {
                 ledger::check_written(done.what);  // its file is closed
             }
             return;

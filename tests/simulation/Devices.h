@@ -47,7 +47,9 @@ public:
     // What the service has to have in a file of the last exchange: null when its answer was not
     // a whole one.
     const std::string* whole_answer(unsigned stream) const {
-        return m_whole[stream] ? &m_answer[stream] : nullptr;
+        return m_whole[stream] && m_log[stream].answers.empty() && m_diag[stream].answers.empty()
+                   ? &m_answer[stream]
+                   : nullptr;
     }
     // Bytes of the stream, which know no frames, came between those of the answer.
     void spoil_answer(unsigned stream) { m_whole[stream] = false; }

@@ -306,7 +306,7 @@ void file_removed(const std::string& path, unsigned channel) {
 void check_written(unsigned stream) {
     const StreamState& s = g_state->streams[stream];
     const uint64_t open = s.consumed - s.written;
-    if (open > s.excuse || (open > 0 && s.written > s.excuse_until)) {
+    if (open > (s.written > s.excuse_until ? 0 : s.excuse) + s.unplaced) {
         fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
                  number(open));
     }

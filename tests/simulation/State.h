@@ -133,6 +133,7 @@ struct State {
     bool reply_lost;   // by a failed write, since everything was calm
     bool pulled_seen;  // the service read log data while the card was out: it knows
     bool card_fresh;   // nothing happened to this card since it came, empty and noticed
+    bool scan_failed;  // by a rule: what was not read may not be counted
     bool tampered;     // files were deleted or made by others: names need not be contiguous
     bool killed;
     bool faulted;  // fault_seen, at any time in the run

@@ -166,6 +166,8 @@ void World::rule_fired(Call call, Place place) {
     if (g_state->starting) {
         no_setting_is_certain();  // a settings file that cannot be read is replaced by the default
     }
+    g_state->scan_failed =
+        g_state->scan_failed || call == CALL_OPENDIR || call == CALL_READDIR || call == CALL_STAT;
     if (call == CALL_WRITE && place == PLACE_SOCKET) {
         g_state->reply_lost = true;
     }

@@ -72,7 +72,7 @@ void World::check_quota() const {
     const Setting& quota = g_state->settings[SET_CARD_MB];
     const Media::Seen seen = m_media.look(MED_CARD);
     const uint64_t limit = std::max(uint64_t{quota.value} << 20, seen.spared);
-    if (!quota.uncertain && quota.value && seen.bytes > limit + 32768 &&
+    if (!quota.uncertain && quota.value && !g_state->scan_failed && seen.bytes > limit + 32768 &&
         m_controller->stor_mgr().media_type() == MT_EXTERNAL) {
         fail_run("quota", "%llu bytes on a card with a quota of %u MB; counted are %llu",
                  number(seen.bytes), quota.value,
