@@ -87,8 +87,9 @@ int begin(Call call, Place place) {
     }
     for (FaultRule& rule : state.faults) {
         // What fails in the start for want of these stays so for the life of the process.
-        if (state.starting && (place == PLACE_PROPS || place == PLACE_SOCKET ||
-                               (place == PLACE_SETTINGS && call == CALL_FCNTL))) {
+        if (state.starting &&
+            (place == PLACE_PROPS || place == PLACE_SOCKET ||
+             (place == PLACE_SETTINGS && (call == CALL_FCNTL || call == CALL_STAT)))) {
             continue;
         }
         if (!rule.active || rule.call != call || (rule.place != PLACE_ANY && rule.place != place)) {
@@ -142,6 +143,7 @@ int refusal(Place place, bool takes_room) {
     }
     if (error) {
         state.fault_in_step = true;
+        state.card_failed_ns = place == PLACE_CARD ? state.boot_ns : state.card_failed_ns;
         ledger::excuse_all();
     }
     return error;
@@ -191,6 +193,7 @@ ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
     State& state = *g_state;
     if (info.place == PLACE_CARD && (!state.card_in || info.generation != state.card_generation)) {
         state.fault_in_step = true;
+        state.card_failed_ns = state.boot_ns;
         ledger::excuse_all();
         return failed(EIO);
     }

@@ -191,6 +191,7 @@ Media::Seen Media::look_at(const std::string& tree) const {
                 seen.spared += sizes.begin()->second + sizes.rbegin()->second;
             }
         }
+        seen.most_spared = std::max(seen.most_spared, seen.spared);
     }
     return seen;
 }
@@ -217,7 +218,7 @@ bool Media::must_refuse(MediumId medium, uint64_t quota, bool overwrite) const {
     // What is staged counts and is not seen here.
     constexpr uint64_t UNSEEN = CHANNEL_COUNT * 2 * 65536;
     const Seen seen = look(medium);
-    return quota != 0 && (overwrite ? seen.spared : seen.bytes) + UNSEEN >= quota;
+    return quota != 0 && (overwrite ? seen.most_spared : seen.bytes) + UNSEEN >= quota;
 }
 
 // ---- Other people's hands

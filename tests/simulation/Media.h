@@ -28,8 +28,9 @@ public:
     };
     struct Seen {
         std::vector<LogFileSeen> logs;
-        uint64_t bytes = 0;   // of all files
-        uint64_t spared = 0;  // of those that a quota does not delete, of the newest set
+        uint64_t bytes = 0;        // of all files
+        uint64_t spared = 0;       // of those that a quota does not delete, of the newest set
+        uint64_t most_spared = 0;  // the same of the set that has most of it
         std::vector<std::string> captures;  // of I/Q buffers
     };
 

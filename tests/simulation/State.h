@@ -129,12 +129,13 @@ struct State {
     bool fault_in_step;  // something failed since the loop last waited
     bool fault_seen;     // a call failed by a rule since everything was calm
     bool starting;
-    int64_t calm_ns;   // when everything was put in order; 0: something happened since
-    bool reply_lost;   // by a failed write, since everything was calm
-    bool pulled_seen;  // the service read log data while the card was out: it knows
-    bool card_fresh;   // nothing happened to this card since it came, empty and noticed
-    bool scan_failed;  // by a rule: what was not read may not be counted
-    bool tampered;     // files were deleted or made by others: names need not be contiguous
+    int64_t calm_ns;         // when everything was put in order; 0: something happened since
+    bool reply_lost;         // by a failed write, since everything was calm
+    bool pulled_seen;        // the service read log data while the card was out: it knows
+    bool card_fresh;         // nothing happened to this card since it came, empty and noticed
+    int64_t card_failed_ns;  // when it last took nothing: it may rest for ten minutes
+    bool scan_failed;        // by a rule: what was not read may not be counted
+    bool tampered;           // files were deleted or made by others: names need not be contiguous
     bool killed;
     bool faulted;  // fault_seen, at any time in the run
     Setting settings[SETTING_COUNT];

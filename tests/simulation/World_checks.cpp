@@ -29,7 +29,9 @@ void World::check(bool last) {
     m_media.check_bytes();
     if (last) {
         check_quota();
-        if (m_controller->stor_mgr().media_type() != MT_EXTERNAL) {
+        constexpr int64_t REST_NS = int64_t{610} * 1000000000;
+        if (m_controller->stor_mgr().media_type() != MT_EXTERNAL &&
+            g_state->boot_ns - g_state->card_failed_ns > REST_NS) {
             fail_run("medium", "the card is in, and not used");
         }
         for (const std::string& capture : m_media.captures()) {
@@ -87,7 +89,8 @@ void World::check_room_made() {
     const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
     const bool has_to = g_state->room[card ? MED_CARD : MED_DATA] == 0 && overwrite.value &&
-                        !overwrite.uncertain && !g_state->fault_seen && !g_state->card_read_only;
+                        !overwrite.uncertain && m_clients.quiet() && !g_state->fault_seen &&
+                        !g_state->card_read_only;
     m_refused = has_to ? m_refused + 1 : 0;
     if (m_refused > MAX_REFUSED) {
         const Media::Seen seen = m_media.look(card ? MED_CARD : MED_DATA);
