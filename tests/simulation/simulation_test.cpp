@@ -29,13 +29,17 @@ Plan read_plan(const std::filesystem::path& path) {
 }
 
 TEST(Simulation, ASeedRepeatsExactlyAlsoWithKillsAndTwoThreads) {
-    const Plan plan = make_plan(11, WEATHER_STORM, 300);
-    const RunResult first = run_plan(plan);
+    // The first seed in which all of it happens.
+    uint64_t seed = 0;
+    Plan plan;
+    RunResult first;
+    do {
+        ASSERT_LT(seed, 50u);
+        plan = make_plan(++seed, WEATHER_STORM, 300);
+        first = run_plan(plan);
+    } while (!first.counters.kills || !first.counters.faults || !first.counters.thread_steps ||
+             !first.counters.iq_bytes);
     const RunResult second = run_plan(plan);
-    EXPECT_GT(first.counters.kills, 0u);
-    EXPECT_GT(first.counters.faults, 0u);
-    EXPECT_GT(first.counters.thread_steps, 0u);
-    EXPECT_GT(first.counters.iq_bytes, 0u);
     EXPECT_EQ(second.digest, first.digest);
     EXPECT_EQ(second.counters.calls, first.counters.calls);
 }
