@@ -140,6 +140,7 @@ int refusal(Place place, bool takes_room) {
     } else if (takes_room && on_medium(place) &&
                state.room[place == PLACE_CARD ? MED_CARD : MED_DATA] == 0) {
         error = ENOSPC;
+        state.full_seen = true;
     }
     if (error) {
         state.fault_in_step = true;

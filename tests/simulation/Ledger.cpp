@@ -268,6 +268,12 @@ void consumed(unsigned stream, size_t len, bool diverted) {
     }
 }
 
+void answer_logged(unsigned stream, size_t len) {
+    // As many of the stream's own bytes in front of it may be taken for the answer's.
+    g_state->streams[stream].answers_logged += len + LOCATABLE;
+    g_state->streams[stream].answers_seen = true;
+}
+
 void file_written(FdInfo& file, const uint8_t* data, size_t len) {
     const size_t record = skip_record(file, data, len);
     file.position += len;

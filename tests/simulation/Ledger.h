@@ -27,6 +27,8 @@ void excuse_kill();
 
 // The service read so many bytes from the stream's log device. diverted: not into the log.
 void consumed(unsigned stream, size_t len, bool diverted);
+// So many of the bytes that it read there were an answer's, and become log data.
+void answer_logged(unsigned stream, size_t len);
 // These bytes reached a log file.
 void file_written(FdInfo& file, const uint8_t* data, size_t len);
 // A log file is deleted; the rest of what its descriptor gets is deleted too.

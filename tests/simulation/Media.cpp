@@ -149,8 +149,8 @@ std::vector<std::string> Media::trees() const {
 
 // ---- Looking
 
-Media::Seen Media::look(MediumId medium) const {
-    return look_at(log_root(medium));
+Media::Seen Media::look(MediumId medium, const std::string& in_use) const {
+    return look_at(log_root(medium), in_use);
 }
 
 std::vector<std::string> Media::captures() const {
@@ -162,11 +162,11 @@ std::vector<std::string> Media::captures() const {
     return all;
 }
 
-Media::Seen Media::look_at(const std::string& tree) const {
+Media::Seen Media::look_at(const std::string& tree, const std::string& in_use) const {
     Seen seen;
     const std::vector<fs::path> sets = dirs(tree);
     for (const fs::path& set : sets) {
-        seen.spared = 0;
+        uint64_t spared = 0;
         for (const fs::path& cp : dirs(set)) {
             std::map<uint64_t, uint64_t> sizes;
             for (const fs::path& file : entries(cp)) {
@@ -178,7 +178,7 @@ Media::Seen Media::look_at(const std::string& tree) const {
                 seen.bytes += size;
                 if (is_capture_name(file.filename())) {
                     seen.captures.push_back(file);
-                    seen.spared += size;
+                    spared += size;
                 }
                 const unsigned stream = stream_of(file);
                 if (is_log_name(file.filename()) && stream < CHANNEL_COUNT) {
@@ -188,10 +188,11 @@ Media::Seen Media::look_at(const std::string& tree) const {
                 }
             }
             if (!sizes.empty()) {
-                seen.spared += sizes.begin()->second + sizes.rbegin()->second;
+                spared += sizes.begin()->second + sizes.rbegin()->second;
             }
         }
-        seen.most_spared = std::max(seen.most_spared, seen.spared);
+        seen.most_spared = std::max(seen.most_spared, spared);
+        seen.spared = set == in_use ? spared : seen.spared;
     }
     return seen;
 }
@@ -412,10 +413,15 @@ void Media::check_names() const {
                 fail_run("numbers", "%s: its number is there twice", log.path.c_str());
             }
         }
-        for (const auto& dir : numbers) {
-            // One may be missing behind 0, and one more after a kill.
+        for (auto& dir : numbers) {
+            // The first file's number, the largest, is its own affair.
+            dir.second.erase(std::prev(dir.second.end()));
+            if (dir.second.empty()) {
+                continue;
+            }
             const size_t missing = *dir.second.rbegin() + 1 - dir.second.size();
-            if (missing > (g_state->killed ? 2u : 1u)) {
+            const bool no_zero = dir.second.count(0) == 0 && g_state->full_seen;
+            if (missing > (g_state->killed ? 1u : 0u) + (no_zero ? 1u : 0u)) {
                 fail_run("numbers", "%s: %zu numbers are missing", dir.first.c_str(), missing);
             }
         }

@@ -29,7 +29,7 @@ public:
     struct Seen {
         std::vector<LogFileSeen> logs;
         uint64_t bytes = 0;        // of all files
-        uint64_t spared = 0;       // of those that a quota does not delete, of the newest set
+        uint64_t spared = 0;       // of those that a quota does not delete, of the set in use
         uint64_t most_spared = 0;  // the same of the set that has most of it
         std::vector<std::string> captures;  // of I/Q buffers
     };
@@ -41,8 +41,8 @@ public:
     void pull_card();
     // fresh: another one, empty.
     void insert_card(bool fresh);
-    // Everything of one medium that is there now.
-    Seen look(MediumId medium) const;
+    // Everything of one medium that is there now. in_use: the set that is being written.
+    Seen look(MediumId medium, const std::string& in_use = "") const;
     // Whether a file of the stream's directory, with this in its name, has that content.
     bool holds(unsigned stream, const char* kind, const std::string& content) const;
     // Whether the medium is so full, by its quota, that a write has to be refused.
@@ -74,7 +74,7 @@ public:
 
 private:
     std::vector<std::string> trees() const;
-    Seen look_at(const std::string& tree) const;
+    Seen look_at(const std::string& tree, const std::string& in_use = "") const;
 
     const std::string m_root;
 };

@@ -134,6 +134,7 @@ struct State {
     bool pulled_seen;        // the service read log data while the card was out: it knows
     bool card_fresh;         // nothing happened to this card since it came, empty and noticed
     int64_t card_failed_ns;  // when it last took nothing: it may rest for ten minutes
+    bool full_seen;          // a full medium took nothing, at any time
     bool scan_failed;        // by a rule: what was not read may not be counted
     bool tampered;           // files were deleted or made by others: names need not be contiguous
     bool killed;

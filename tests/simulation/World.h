@@ -83,6 +83,7 @@ private:
     void check_settings() const;
     void check_quota() const;
     void check_room_made();
+    Media::Seen look_at_medium_in_use() const;
     void spins(const struct pollfd* fds, nfds_t count) const;
     void write_props() const;
     void write_kest_conf() const;
@@ -100,7 +101,8 @@ private:
     Media m_media;
     unsigned m_idle_passes = 0;
     unsigned m_refused_since_deletion = UINT32_MAX / 2;
-    unsigned m_refused = 0;  // blocks in a row, by a full medium
+    unsigned m_refused = 0;       // blocks in a row, by a full medium
+    uint64_t m_refused_from = 0;  // bytes read until the first of them
     unsigned m_last_stream = STREAM_COUNT;
 };
 

@@ -79,8 +79,7 @@ void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len
     const bool exchange = channel && channel->state() != CWS_WORKING;
     const size_t logged = m_devices.log_bytes(info.stream, len);
     if (logged < len) {
-        g_state->streams[info.stream].answers_logged += len - logged;
-        g_state->streams[info.stream].answers_seen = true;
+        ledger::answer_logged(info.stream, len - logged);
     }
     if (logged > 0) {
         g_state->pulled_seen = !g_state->card_in && !g_state->card_told_ns;

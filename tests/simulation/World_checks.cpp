@@ -69,13 +69,22 @@ void World::check_settings() const {
     }
 }
 
+Media::Seen World::look_at_medium_in_use() const {
+    const MediaStorage* const media = m_controller->stor_mgr().get_media_stor();
+    const CpSetDirectory* const set = media ? media->working_set() : nullptr;
+    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
+    return m_media.look(card ? MED_CARD : MED_DATA, set ? set->path().string() : "");
+}
+
 // In the calm nothing keeps a card above its quota.
 void World::check_quota() const {
     const Setting& quota = g_state->settings[SET_CARD_MB];
-    const Media::Seen seen = m_media.look(MED_CARD);
+    if (m_controller->stor_mgr().media_type() != MT_EXTERNAL) {
+        return;
+    }
+    const Media::Seen seen = look_at_medium_in_use();
     const uint64_t limit = std::max(uint64_t{quota.value} << 20, seen.spared);
-    if (!quota.uncertain && quota.value && !g_state->scan_failed && seen.bytes > limit + 32768 &&
-        m_controller->stor_mgr().media_type() == MT_EXTERNAL) {
+    if (!quota.uncertain && quota.value && !g_state->scan_failed && seen.bytes > limit + 32768) {
         fail_run("quota", "%llu bytes on a card with a quota of %u MB; counted are %llu",
                  number(seen.bytes), quota.value,
                  number(m_controller->stor_mgr().get_media_stor()->size()));
@@ -86,17 +95,24 @@ void World::check_quota() const {
 void World::check_room_made() {
     constexpr unsigned MAX_REFUSED = 12;
     constexpr uint64_t MUCH = 3 << 20;
+    constexpr uint64_t ENOUGH = 3 << 20;  // of new data: one and a half times the largest file
     const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
     const bool has_to = g_state->room[card ? MED_CARD : MED_DATA] == 0 && overwrite.value &&
                         !overwrite.uncertain && m_clients.quiet() && !g_state->fault_seen &&
                         !g_state->card_read_only;
     m_refused = has_to ? m_refused + 1 : 0;
+    if (m_refused == 1) {
+        m_refused_from = g_state->counters.bytes;
+    }
     if (m_refused > MAX_REFUSED) {
-        const Media::Seen seen = m_media.look(card ? MED_CARD : MED_DATA);
-        if (seen.bytes > seen.spared + MUCH) {
-            fail_run("full", "%u blocks refused, with %llu bytes that may be deleted", m_refused,
-                     number(seen.bytes - seen.spared));
+        const Media::Seen seen = look_at_medium_in_use();
+        // Once enough for a new set has come, nothing is spared any more.
+        const uint64_t came = g_state->counters.bytes - m_refused_from;
+        const uint64_t spared = came > ENOUGH ? 0 : seen.spared;
+        if (seen.bytes > spared + MUCH) {
+            fail_run("full", "%u blocks refused, %llu bytes came, with %llu that may be deleted",
+                     m_refused, number(came), number(seen.bytes - spared));
         }
     }
 }

@@ -54,6 +54,7 @@ void World::act(const Event& event) {
             break;
         case EV_MEDIUM_ROOM:
             state.room[event.a % MEDIUM_COUNT] = UINT64_MAX;
+            m_refused = 0;
             break;
         case EV_DELETE:
             m_media.remove_something(event.a, chance);
