@@ -3,6 +3,7 @@
 #include "storage/CpDirectory.h"
 
 #include <errno.h>
+#include <fcntl.h>
 #include <string.h>
 #include <sys/stat.h>
 
@@ -58,9 +59,9 @@ LogFile* CpDirectory::create_log_file() {
         errno = 0;  // nothing is wrong with the medium
         return nullptr;
     }
-    const android::String8 name = free_name(android::String8::format(
-        "0-%s-%s.log", m_name.string(), LogTime::from_tm(t).file_stamp().string()));
-    LogFile* file = open_and_list(std::make_unique<LogFile>(name, this, t));
+    const android::String8 name = android::String8::format(
+        "0-%s-%s.log", m_name.string(), LogTime::from_tm(t).file_stamp().string());
+    LogFile* file = open_and_list(std::make_unique<LogFile>(free_name(name), this, t), name);
     if (!file) {
         return nullptr;
     }
@@ -75,12 +76,15 @@ LogFile* CpDirectory::create_log_file() {
     return file;
 }
 
-// Opens the file and puts it at the end of the list. Null with errno when it cannot be opened.
-LogFile* CpDirectory::open_and_list(std::unique_ptr<LogFile> file) {
-    if (file->open() < 0) {
-        const SavedErrno keep;
-        file.reset();
-        return nullptr;
+// Opens the new file and puts it at the end of the list. Null with errno when it cannot be opened.
+LogFile* CpDirectory::open_and_list(std::unique_ptr<LogFile> file, const android::String8& wanted) {
+    while (file->open(O_EXCL) < 0) {
+        if (errno != EEXIST) {
+            const SavedErrno keep;
+            file.reset();
+            return nullptr;
+        }
+        file->set_name(aside_name(wanted));  // a directory that could not be looked at has it
     }
     m_files.push_back(file.get());
     return file.release();
@@ -139,7 +143,7 @@ android::String8 CpDirectory::free_name(const android::String8& name) {
 }
 
 LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
-    return open_and_list(std::make_unique<LogFile>(free_name(name), this, type, 0));
+    return open_and_list(std::make_unique<LogFile>(free_name(name), this, type, 0), name);
 }
 
 int CpDirectory::remove_file(LogFile* file) {

@@ -84,7 +84,7 @@ public:
 private:
     typedef android::List<LogFile*>::iterator FileIter;
 
-    LogFile* open_and_list(std::unique_ptr<LogFile> file);
+    LogFile* open_and_list(std::unique_ptr<LogFile> file, const android::String8& wanted);
     LogFile* find(const android::String8& name) const;
     android::String8 free_name(const android::String8& name);
     android::String8 aside_name(const android::String8& name);

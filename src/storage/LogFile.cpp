@@ -39,13 +39,13 @@ MediaStorage* LogFile::media() const {
     return m_dir->set()->media();
 }
 
-int LogFile::open() {
+int LogFile::open(int more_flags) {
     if (m_fd >= 0) {
         return -1;
     }
     // A link on a card must not lead the writing out of the log tree.
     m_fd = ::open(JoinedPath(m_dir->path(), m_name).string(),
-                  O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
+                  O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC | more_flags, 0644);
     if (m_fd < 0) {
         return -1;
     }

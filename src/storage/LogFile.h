@@ -50,9 +50,9 @@ public:
     MediaStorage* media() const;
     int fd() const { return m_fd; }
 
-    // Opens the file for writing from its start, creating it when missing. 0, or -1
-    // when it is open already or cannot be opened.
-    int open();
+    // Opens the file for writing from its start, creating it when missing; with O_EXCL in
+    // more_flags it must be missing. 0, or -1 when it is open already or cannot be opened.
+    int open(int more_flags = 0);
     // Writes out what is staged and closes. Does nothing on a closed file. Always 0.
     int close();
 
@@ -103,6 +103,8 @@ public:
 
     // Sets type and time from the name.
     void parse_name();
+    // Another name for a file that has not been opened yet.
+    void set_name(const android::String8& name) { m_name = name; }
 
 private:
     ssize_t write_staged_with(const void* data, size_t len);
