@@ -1,5 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The part of MediaStorage that keeps the medium within its limits.
+#include <errno.h>
+
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
@@ -100,6 +102,13 @@ bool MediaStorage::make_room_with_new_set() {
     }
     const android::String8 old = m_working_set->path();  // the set itself may go
     const CpSetDirectory* set = create_cp_set();
+    if (!set && errno == ENOSPC) {
+        // No room for a directory either: the old set is trimmed before there is a new one.
+        m_manager->stop_all_storages();
+        m_working_set = nullptr;
+        trim(m_file_size);
+        set = create_cp_set();
+    }
     if (!set || set->path() == old) {
         return false;  // set names have one-second resolution: try later
     }
