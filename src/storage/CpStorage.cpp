@@ -4,6 +4,7 @@
 
 #include <errno.h>
 
+#include "core/SavedErrno.h"
 #include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/MediaStorage.h"
@@ -41,6 +42,7 @@ int CpStorage::write(const void* data, size_t len) {
         close_full_file(media);
         keep_quota(media);
     } else if (n == LogFile::FULL) {
+        const SavedErrno keep;  // the caller reports why the block is lost
         make_room(media);
     } else if (n < 0) {
         m_manager->write_failed(media, errno);
