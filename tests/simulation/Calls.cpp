@@ -663,6 +663,7 @@ WRAPPED(int, mkdir, const char* path, mode_t mode) {
     if (!g_inside || exists(path)) {
         return __real_mkdir(path, mode);
     }
+    world().set_begins(path);
     const int error = hindrance(CALL_MKDIR, world().place_of(path), true);
     return result_of("mkdir", path, error ? failed(error) : __real_mkdir(path, mode));
 }

@@ -116,20 +116,24 @@ void Media::pull_card() {
     ledger::excuse_all();
 }
 
-void Media::insert_card(bool fresh) {
-    if (g_state->card_in) {
+void Media::insert_card(Card card) {
+    State& state = *g_state;
+    if (state.card_in) {
         return;
     }
     rmdir((m_root + "/card").c_str());
-    if (fresh) {
-        g_state->card_fresh = g_state->pulled_seen;
-        g_state->card += 1;
+    if (card == EMPTY) {
+        state.card_fresh = state.pulled_seen;
+        state.card_bytes = state.counters.bytes;
+        state.card = ++state.cards;
         mkdir((m_root + "/card").c_str(), 0775);
     } else {
-        rename((m_root + "/cards/" + std::to_string(g_state->card)).c_str(),
+        state.card -= card == FORMER && state.card > 0;
+        rename((m_root + "/cards/" + std::to_string(state.card)).c_str(),
                (m_root + "/card").c_str());
     }
-    g_state->card_in = true;
+    state.tampered |= card != SAME && !state.pulled_seen;  // it is taken for the last one
+    state.card_in = true;
 }
 
 bool Media::is_doubtful(MediumId medium) {
@@ -178,6 +182,8 @@ Media::Seen Media::look_at(const std::string& tree, const std::string& in_use) c
                 seen.bytes += size;
                 if (is_capture_name(file.filename())) {
                     seen.captures.push_back(file);
+                    spared += size;
+                } else if (file.extension() == ".version") {
                     spared += size;
                 }
                 const unsigned stream = stream_of(file);

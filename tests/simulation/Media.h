@@ -39,8 +39,8 @@ public:
     std::string log_root(MediumId medium) const;
 
     void pull_card();
-    // fresh: another one, empty.
-    void insert_card(bool fresh);
+    enum Card { SAME, EMPTY, FORMER };  // FORMER: the one before the last, if there was one
+    void insert_card(Card card);
     // Everything of one medium that is there now. in_use: the set that is being written.
     Seen look(MediumId medium, const std::string& in_use = "") const;
     // Whether a file of the stream's directory, with this in its name, has that content.

@@ -6,12 +6,14 @@
 #include <stdlib.h>
 
 #include <algorithm>
+#include <initializer_list>
 #include <iterator>
 #include <sstream>
 
 #include "simulation/Calls.h"
 #include "simulation/Chance.h"
 #include "simulation/Clients.h"
+#include "simulation/Media.h"
 
 namespace {
 
@@ -160,60 +162,78 @@ Event make_event(uint64_t at_ms, Weather weather, Chance chance) {
     return event;
 }
 
+// Requests of one client, so long apart; each time the last one's.
+void add_requests(Plan& plan, uint64_t& at_ms, uint64_t pause, uint64_t client,
+                  std::initializer_list<const char*> requests) {
+    for (const char* request : requests) {
+        plan.push_back({at_ms += pause, EV_REQUEST, client, Clients::request_named(request)});
+    }
+}
+
+// The other service changes its file, and has it read.
+void add_kest_conf(Plan& plan, uint64_t& at_ms, uint64_t conf) {
+    plan.push_back({at_ms, EV_KEST_CONF, conf, 0});
+    add_requests(plan, at_ms, 1, 0, {"kestctl reload", "GET_LOG_STATE WCDMA", "GET_LOG_STATE WCN"});
+}
+
 }  // namespace
 
 Plan make_plan(uint64_t seed, Weather weather, size_t events) {
     Plan plan;
     uint64_t now = 0;
+    if (seed % 5 == 0) {
+        plan.push_back({now, EV_OPTION, 1, 0});
+    }
+    if (seed % 3 == 0) {
+        add_kest_conf(plan, now, Chance(seed).below(8));
+        add_requests(plan, now, 1000, 0, {"ENABLE_LOG WCDMA", "ENABLE_LOG WCN"});
+    }
     for (size_t i = 0; i < events; ++i) {
         Chance chance(seed, i);
         now += pause_ms(chance);
-        plan.push_back(make_event(now, weather, chance));
+        const Event event = make_event(now, weather, chance);
+        if (event.kind == EV_KEST_CONF) {
+            add_kest_conf(plan, now, event.a);
+        } else {
+            plan.push_back(event);
+        }
         if (weather == WEATHER_STORM && chance.one_in(60)) {
             // Dies while the parsing library is replaced.
             plan.push_back({now, EV_KILL, 20 + chance.below(120), 0});
             plan.push_back({now, EV_IMAGE, 1 + chance.below(100), 0});
-            for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA"}) {
-                plan.push_back({now, EV_REQUEST, 0, Clients::request_named(request)});
-            }
+            add_requests(plan, now, 0, 0, {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA"});
         }
     }
     // Now and then so much that the quota of the card has to be kept in the calm.
-    if (seed % 5 == 0) {
-        plan.insert(plan.begin(), {0, EV_OPTION, 1, 0});
-    }
     append_end(plan, now, seed % 16 < WEATHER_COUNT ? 20 : 3);
     return plan;
 }
 
 void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
-    static const char* const REQUESTS[] = {
-        "DISABLE_LOG WCDMA",    "DISABLE_LOG AG-DSP",  "ENABLE_IQ WCDMA WCDMA",
-        "ENABLE_LOG_OVERWRITE", "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12",
-        "SET_SD_MAX_SIZE 14",   "ENABLE_LOG WCDMA",    "ENABLE_LOG WCN",
-        "ENABLE_LOG GNSS",      "ENABLE_LOG AG-DSP",
-    };
     plan.push_back({at_ms, EV_CALM, 0, 0});
     plan.push_back({at_ms, EV_IMAGE, 200 + at_ms % 100, 0});
     // By then the supervisors are connected again.
     uint64_t now = at_ms + 60000;
     plan.push_back({now, EV_SUPERVISOR, 0, SUP_ALIVE});
     plan.push_back({now, EV_SUPERVISOR, 1, SUP_ALIVE});
-    for (const char* request : REQUESTS) {
-        plan.push_back({now += 100, EV_REQUEST, 0, Clients::request_named(request)});
-    }
+    add_requests(
+        plan, now, 100, 0,
+        {"DISABLE_LOG WCDMA", "DISABLE_LOG AG-DSP", "ENABLE_IQ WCDMA WCDMA", "ENABLE_LOG_OVERWRITE",
+         "SET_LOG_FILE_SIZE 1", "SET_DATA_MAX_SIZE\t12", "SET_SD_MAX_SIZE 14", "ENABLE_LOG WCDMA",
+         "ENABLE_LOG WCN", "ENABLE_LOG GNSS", "ENABLE_LOG AG-DSP"});
     if (at_ms % 2) {
-        // The service notices that the card goes, and that another one comes.
-        plan.push_back({now += 1000, EV_CARD_OUT, 0, 0});
-        plan.push_back({now + 10, EV_FEED, ST_GNSS, 5000});
-        plan.push_back({now + 1000, EV_CARD_IN, 1, 0});
-        plan.push_back({now + 1010, EV_FEED, ST_GNSS, 5000});
-        plan.push_back({now + 2000, EV_CALM, 0, 0});
+        // The service notices that the card goes, that another one comes, and the first again.
+        for (uint64_t card : {Media::EMPTY, Media::FORMER}) {
+            plan.push_back({now += 1000, EV_CARD_OUT, 0, 0});
+            plan.push_back({now += 10, EV_FEED, ST_GNSS, 5000});
+            plan.push_back({now += 1000, EV_CARD_IN, card, 0});
+            plan.push_back({now += 10, EV_FEED, ST_GNSS, 5000});
+            plan.push_back({now += 1000, EV_CHECK, 0, 0});
+        }
+        plan.push_back({now, EV_CALM, 0, 0});
         now += 70000;
     }
-    for (const char* request : {"SUBSCRIBE WCDMA DUMP", "SUBSCRIBE WCN DUMP"}) {
-        plan.push_back({now += 100, EV_REQUEST, 1, Clients::request_named(request)});
-    }
+    add_requests(plan, now, 100, 1, {"SUBSCRIBE WCDMA DUMP", "SUBSCRIBE WCN DUMP"});
     for (uint64_t what : {SUP_ASSERT, SUP_ALIVE}) {
         plan.push_back({now += 30000, EV_SUPERVISOR, 0, what});
         plan.push_back({now, EV_SUPERVISOR, 1, what});
@@ -233,9 +253,7 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds) {
         plan.push_back({now - 1, EV_CHECK, 3, 0});
     }
     // The parsing library comes with a start, if the log root is there by then.
-    for (const char* request : {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA", "FLUSH"}) {
-        plan.push_back({now, EV_REQUEST, 0, Clients::request_named(request)});
-    }
+    add_requests(plan, now, 0, 0, {"DISABLE_LOG WCDMA", "ENABLE_LOG WCDMA", "FLUSH"});
     plan.push_back({now + 1000, EV_CHECK, 2, 0});
 }
 

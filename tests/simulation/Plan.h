@@ -16,7 +16,7 @@ enum EventKind {
     EV_DEVICE_GONE,     // a: stream; it cannot be opened either
     EV_DEVICE_BACK,     // a: stream
     EV_CARD_OUT,        // a: 1: the mount goes before the property tells it
-    EV_CARD_IN,         // a: 1: another card, empty
+    EV_CARD_IN,         // a: 1: another card, empty; 2: the one before
     EV_CARD_READ_ONLY,  // the card's file system gives up
     EV_MEDIUM_FULL,     // a: medium, b: bytes left
     EV_MEDIUM_ROOM,     // a: medium

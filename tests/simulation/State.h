@@ -123,6 +123,7 @@ struct State {
     bool card_in;
     bool card_read_only;
     uint32_t card;                // number of the card in the slot, or of the last one
+    uint32_t cards;               // number of the newest one
     uint32_t card_generation;     // counts pulls
     uint64_t room[MEDIUM_COUNT];  // bytes left; UINT64_MAX: no limit
     FaultRule faults[MAX_FAULTS];
@@ -135,6 +136,7 @@ struct State {
     bool card_fresh;         // nothing happened to this card since it came, empty and noticed
     int64_t card_failed_ns;  // when it last took nothing: it may rest for ten minutes
     bool full_seen;          // a full medium took nothing, at any time
+    uint64_t card_bytes;     // read before it came
     bool scan_failed;        // by a rule: what was not read may not be counted
     bool tampered;           // files were deleted or made by others: names need not be contiguous
     bool killed;

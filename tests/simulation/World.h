@@ -53,6 +53,8 @@ public:
     void dump_confirmed(int fd);
     void reading_failed() { m_last_stream = STREAM_COUNT; }
     void service_deletes(const char* path, Place place);
+    // The service makes a directory, perhaps of a new set.
+    void set_begins(const std::string& path) const;
     int remove_by_shell(const char* command);
     // The stamps of the property file, in virtual time.
     void set_times(const char* path, struct stat& st) const;

@@ -41,7 +41,7 @@ void World::act(const Event& event) {
             break;
         case EV_CARD_IN:
             state.card_told_ns = 0;
-            m_media.insert_card(event.a % 4 == 1);
+            m_media.insert_card(static_cast<Media::Card>(event.a % 4 % 3));
             write_props();
             break;
         case EV_CARD_READ_ONLY:
@@ -202,7 +202,7 @@ void World::calm() {
     m_thread.set_pace(0);
     state.calm_ns = state.boot_ns;
     state.card_told_ns = 0;
-    m_media.insert_card(false);
+    m_media.insert_card(Media::SAME);
     state.card_read_only = false;
     state.room[MED_DATA] = state.room[MED_CARD] = UINT64_MAX;
     state.time_answers = TIME_PROMPT;
