@@ -2,7 +2,6 @@
 
 #include "sim/SimModemImage.h"
 
-#include <stdio.h>
 #include <string.h>
 #include <unistd.h>
 
@@ -47,11 +46,7 @@ SimModemImage::SimModemImage(size_t database_size, uint32_t seed, unsigned other
         byte = static_cast<uint8_t>(x >> 24);
     }
     m_digest = sha1(m_database.data(), m_database.size());
-    for (uint8_t byte : m_digest) {
-        char digits[3];
-        snprintf(digits, sizeof digits, "%02X", byte);
-        m_digest_text += digits;
-    }
+    m_digest_text = ::digest_text(m_digest);
 }
 
 std::vector<uint8_t> SimModemImage::bytes() const {

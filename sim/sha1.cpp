@@ -2,6 +2,8 @@
 
 #include "sim/sha1.h"
 
+#include <stdio.h>
+
 namespace {
 
 uint32_t rotate_left(uint32_t value, unsigned bits) {
@@ -65,4 +67,14 @@ std::vector<uint8_t> sha1(const uint8_t* data, size_t len) {
         }
     }
     return digest;
+}
+
+std::string digest_text(const std::vector<uint8_t>& digest) {
+    std::string text;
+    for (uint8_t byte : digest) {
+        char digits[3];
+        snprintf(digits, sizeof digits, "%02X", byte);
+        text += digits;
+    }
+    return text;
 }

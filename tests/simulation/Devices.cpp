@@ -46,14 +46,6 @@ std::vector<uint8_t> text(const char* words) {
 
 }  // namespace
 
-const char* Devices::log_path(unsigned stream) {
-    return LOG_PATHS[stream];
-}
-
-const char* Devices::diag_path(unsigned stream) {
-    return DIAG_PATHS[stream][0] ? DIAG_PATHS[stream] : LOG_PATHS[stream];
-}
-
 bool Devices::is_device(const std::string& path) {
     return path.compare(0, 5, "/sim/") == 0 || path.compare(0, 5, "/dev/") == 0;
 }

@@ -18,10 +18,6 @@
 
 class Devices {
 public:
-    // Paths of the devices, below the root: of the log device, and of the diag device where
-    // that is another one.
-    static const char* log_path(unsigned stream);
-    static const char* diag_path(unsigned stream);
     static bool is_device(const std::string& path);
 
     // A device of that class, with the end that is ours: the service's descriptor.

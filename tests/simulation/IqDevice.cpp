@@ -11,9 +11,9 @@
 
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
+#include "sim/files.h"
 #include "simulation/CodedStream.h"
 #include "simulation/Devices.h"
-#include "simulation/Media.h"
 
 namespace {
 
@@ -145,11 +145,12 @@ void IqDevice::responds(int response) {
 }
 
 void IqDevice::check_file(const std::string& path) {
-    const std::vector<uint8_t> bytes = content_of(path);
+    const std::string text = read_text_file(path);
+    const uint8_t* const bytes = reinterpret_cast<const uint8_t*>(text.data());
     uint64_t at;
-    if (bytes.size() >= 15 &&
-        (!coded_stream::locate(SAMPLE_STREAM, bytes.data(), bytes.size(), &at) ||
-         at + bytes.size() > SAMPLES || memcmp(s_samples + at, bytes.data(), bytes.size()) != 0)) {
+    if (text.size() >= 15 &&
+        (!coded_stream::locate(SAMPLE_STREAM, bytes, text.size(), &at) ||
+         at + text.size() > SAMPLES || memcmp(s_samples + at, bytes, text.size()) != 0)) {
         fail_run("iq", "%s has something else than samples", path.c_str());
     }
 }

@@ -8,9 +8,9 @@
 #include <algorithm>
 #include <vector>
 
+#include "sim/files.h"
 #include "simulation/Calls.h"
 #include "simulation/CodedStream.h"
-#include "simulation/Media.h"
 #include "simulation/State.h"
 
 namespace {
@@ -215,7 +215,8 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes, uint8_t ki
 
 // The stream's bytes of a whole log file.
 std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
-    std::vector<uint8_t> bytes = content_of(path);
+    const std::string text = read_text_file(path);
+    std::vector<uint8_t> bytes(text.begin(), text.end());
     if (CHUNK_KINDS[stream]) {
         return chunk_payload(bytes, CHUNK_KINDS[stream]);
     }

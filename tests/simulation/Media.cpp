@@ -13,6 +13,7 @@
 #include <set>
 
 #include "sim/SimModemImage.h"
+#include "sim/files.h"
 #include "sim/sha1.h"
 #include "simulation/Calls.h"
 #include "simulation/Ledger.h"
@@ -40,8 +41,7 @@ std::vector<fs::path> entries(const fs::path& dir) {
 }
 
 bool is_dir(const fs::path& path) {
-    struct stat st;
-    return lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
+    return fs::is_directory(fs::symlink_status(path));
 }
 
 std::vector<fs::path> dirs(const fs::path& dir) {
@@ -55,10 +55,6 @@ std::vector<fs::path> dirs(const fs::path& dir) {
 template <typename T>
 const T* pick(const std::vector<T>& all, Chance& chance) {
     return all.empty() ? nullptr : &all[chance.below(all.size())];
-}
-
-void make_text_file(const fs::path& path) {
-    std::ofstream(path) << "stranger";
 }
 
 }  // namespace
@@ -86,17 +82,6 @@ bool Media::is_log_name(const std::string& name) {
 
 bool Media::is_capture_name(const std::string& name) {
     return name.find("_wiq_") != std::string::npos;
-}
-
-std::vector<uint8_t> content_of(const std::string& path) {
-    std::vector<uint8_t> bytes;
-    std::ifstream in(path, std::ios::binary | std::ios::ate);
-    if (in) {
-        bytes.resize(static_cast<size_t>(in.tellg()));
-        in.seekg(0);
-        in.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
-    }
-    return bytes;
 }
 
 // ---- Cards
@@ -174,11 +159,10 @@ Media::Seen Media::look_at(const std::string& tree, const std::string& in_use) c
         for (const fs::path& cp : dirs(set)) {
             std::map<uint64_t, uint64_t> sizes;
             for (const fs::path& file : entries(cp)) {
-                struct stat st;
-                if (lstat(file.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) {
+                if (!fs::is_regular_file(fs::symlink_status(file))) {
                     continue;
                 }
-                const uint64_t size = static_cast<uint64_t>(st.st_size);
+                const uint64_t size = fs::file_size(file);
                 seen.bytes += size;
                 if (is_capture_name(file.filename())) {
                     seen.captures.push_back(file);
@@ -207,12 +191,8 @@ bool Media::holds(unsigned stream, const char* kind, const std::string& content)
     for (const std::string& tree : trees()) {
         for (const fs::path& set : dirs(tree)) {
             for (const fs::path& file : entries(set / CP_NAMES[stream])) {
-                if (file.filename().native().find(kind) == std::string::npos ||
-                    fs::file_size(file) != content.size()) {
-                    continue;
-                }
-                std::ifstream in(file, std::ios::binary);
-                if (std::string(std::istreambuf_iterator<char>(in), {}) == content) {
+                if (file.filename().native().find(kind) != std::string::npos &&
+                    fs::file_size(file) == content.size() && read_text_file(file) == content) {
                     return true;
                 }
             }
@@ -231,12 +211,11 @@ bool Media::must_refuse(MediumId medium, uint64_t quota, bool overwrite) const {
 // ---- Other people's hands
 
 void Media::book_removal(const std::string& path) const {
-    struct stat st;
     const unsigned stream = stream_of(path);
-    if (lstat(path.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) {
+    if (!fs::is_regular_file(fs::symlink_status(path))) {
         return;
     }
-    const uint64_t size = static_cast<uint64_t>(st.st_size);
+    const uint64_t size = fs::file_size(path);
     if (stream < CHANNEL_COUNT && is_log_name(fs::path(path).filename())) {
         ledger::file_removed(path, stream);
     }
@@ -265,7 +244,7 @@ void Media::remove_matching(const std::string& dir) {
     }
 }
 
-bool Media::remove_something(uint64_t what, Chance chance) {
+void Media::remove_something(uint64_t what, Chance chance) {
     const std::string tree = log_root(chance.one_in(2) ? MED_DATA : MED_CARD);
     const std::vector<fs::path> sets = dirs(tree);
     const fs::path* const set =
@@ -273,33 +252,19 @@ bool Media::remove_something(uint64_t what, Chance chance) {
     const std::vector<fs::path> cps = set ? dirs(*set) : std::vector<fs::path>();
     const fs::path* const cp = pick(cps, chance);
     const std::vector<fs::path> files = cp ? entries(*cp) : std::vector<fs::path>();
-    const fs::path* victim = nullptr;
+    const fs::path* const file = what % DEL_COUNT == DEL_FILE ? pick(files, chance)
+                                 : files.empty()              ? nullptr
+                                                              : &files.front();
     const fs::path whole(tree);
-    switch (what % DEL_COUNT) {
-        case DEL_LOG:
-            victim = files.empty() ? nullptr : &files.front();
-            break;
-        case DEL_FILE:
-            victim = pick(files, chance);
-            break;
-        case DEL_CP_DIR:
-            victim = cp;
-            break;
-        case DEL_SET:
-            victim = set;
-            break;
-        default:
-            victim = &whole;
-            break;
-    }
+    const fs::path* const victims[DEL_COUNT] = {file, file, cp, set, &whole};  // by DeleteWhat
+    const fs::path* const victim = victims[what % DEL_COUNT];
     if (!victim) {
-        return false;
+        return;
     }
     trace("somebody deletes %s", victim->c_str());
     g_state->tampered = true;
     g_state->card_fresh = false;
     remove_all(*victim);
-    return true;
 }
 
 void Media::make_something(uint64_t what, Chance chance) {
@@ -308,8 +273,7 @@ void Media::make_something(uint64_t what, Chance chance) {
     const std::vector<fs::path> cps = sets.empty() ? sets : dirs(sets.back());
     const fs::path dir = cps.empty() ? fs::path(log_root(medium)) : *pick(cps, chance);
     const fs::path path = dir / chance.pick(HOSTILE_NAMES);
-    struct stat st;
-    if (lstat(path.c_str(), &st) == 0) {
+    if (fs::exists(fs::symlink_status(path))) {
         return;
     }
     trace("somebody makes %s", path.c_str());
@@ -317,16 +281,14 @@ void Media::make_something(uint64_t what, Chance chance) {
     g_state->card_fresh = false;
     switch (what % 5) {
         case 0:
-            make_text_file(path);
+            std::ofstream(path) << "stranger";
             break;
         case 1:
             mkdir(path.c_str(), 0775);
-            make_text_file(path / "inside");
+            std::ofstream(path / "inside") << "stranger";
             break;
         case 2:
-            if (symlink("/etc", path.c_str()) < 0) {
-                break;
-            }
+            fs::create_symlink("/etc", path);
             break;
         case 3:
             mkfifo(path.c_str(), 0666);
@@ -385,16 +347,11 @@ void Media::check_libraries(bool in_use) const {
     bool found = false;
     const SimModemImage image(IMAGE_SIZE, g_state->image);
     for (const std::string& tree : trees()) {
-        const std::vector<uint8_t> library = content_of(tree + "/modem_db.gz");
-        const std::vector<uint8_t> digest = content_of(tree + "/sha1.txt");
-        std::string hex;
-        for (uint8_t byte : sha1(library.data(), library.size())) {
-            char digits[3];
-            snprintf(digits, sizeof(digits), "%02X", byte);
-            hex += digits;
-        }
-        if (!library.empty() && digest.size() == hex.size() &&
-            memcmp(digest.data(), hex.data(), hex.size()) != 0) {
+        const std::string library = read_text_file(tree + "/modem_db.gz");
+        const std::string digest = read_text_file(tree + "/sha1.txt");
+        const std::string own =
+            digest_text(sha1(reinterpret_cast<const uint8_t*>(library.data()), library.size()));
+        if (!library.empty() && digest.size() == own.size() && digest != own) {
             fail_run("library", "the digest in %s is not the library's", tree.c_str());
         }
         found = found || image.saved_in(tree);

@@ -13,9 +13,6 @@
 #include "simulation/Chance.h"
 #include "simulation/State.h"
 
-// All bytes of a file.
-std::vector<uint8_t> content_of(const std::string& path);
-
 class Media {
 public:
     explicit Media(const std::string& root) : m_root(root) {}
@@ -48,8 +45,8 @@ public:
     // Whether the medium is so full, by its quota, that a write has to be refused.
     bool must_refuse(MediumId medium, uint64_t quota, bool overwrite) const;
 
-    // Somebody else's hands. False when there was nothing to delete.
-    bool remove_something(uint64_t what, Chance chance);
+    // Somebody else's hands.
+    void remove_something(uint64_t what, Chance chance);
     // The modem's firmware image becomes another one, or a broken one.
     void install_image(uint64_t number, uint64_t how);
     void make_something(uint64_t what, Chance chance);

@@ -91,8 +91,6 @@ struct Counters {
     uint64_t requests;
     uint64_t replies;
     uint64_t dumps;
-    uint64_t passes;
-    uint64_t checks;
     uint64_t iq_bytes;
     uint64_t thread_steps;
 };

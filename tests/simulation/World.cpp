@@ -64,7 +64,6 @@ void World::pump() {
 void World::pass_ends(bool idle) {
     g_state->fault_in_step = false;
     g_state->pass_calls = g_state->counters.calls;
-    ++g_state->counters.passes;
     m_idle_passes = idle ? m_idle_passes + 1 : 0;
 }
 

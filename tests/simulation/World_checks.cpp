@@ -16,7 +16,6 @@ void World::check(bool last) {
         }
         return;
     }
-    ++g_state->counters.checks;
     m_clients.check_waiting();
     if (g_state->dump_unconfirmed) {
         fail_run("dump", "what was read of the DSP's memory is not confirmed");

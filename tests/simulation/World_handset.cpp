@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // The part of World that makes the handset's files and properties.
 #include <stdio.h>
-#include <sys/stat.h>
 
+#include <filesystem>
 #include <fstream>
 
 #include "simulation/World.h"
@@ -27,19 +27,12 @@ void make_file(const std::string& path, const std::string& content) {
     std::ofstream(path, std::ios::binary) << content;
 }
 
-void make_dirs(const std::string& path) {
-    for (size_t at = 1; (at = path.find('/', at)) != std::string::npos; ++at) {
-        mkdir(path.substr(0, at).c_str(), 0775);
-    }
-    mkdir(path.c_str(), 0775);
-}
-
 }  // namespace
 
 void World::make_handset(const std::string& root) {
     for (const char* dir : {"/data/local/tmp/kestmodem", "/data/local/tmp/kest", "/system/etc",
                             "/card", "/cards", "/image", "/proc/cpw", "/d/dipx"}) {
-        make_dirs(root + dir);
+        std::filesystem::create_directories(root + dir);
     }
     make_file(root + "/system/etc/kest_modem.conf", CONFIG);
     make_file(root + "/proc/cpw/mem", std::string(200000, 'm'));
