@@ -4,8 +4,10 @@
 
 #include <errno.h>
 #include <stdlib.h>
+#include <string.h>
 
 #include <algorithm>
+#include <fstream>
 #include <initializer_list>
 #include <iterator>
 #include <sstream>
@@ -292,4 +294,17 @@ bool add_line(Plan& plan, const std::string& line) {
                                         : strtoull(rest.c_str(), nullptr, 10);
     plan.push_back({at_ms, kind, static_cast<uint64_t>(a), b});
     return true;
+}
+
+std::string read_plan(const std::string& path, Plan& plan) {
+    std::ifstream in(path);
+    if (!in) {
+        return path + ": " + strerror(errno);
+    }
+    for (std::string line; std::getline(in, line);) {
+        if (!add_line(plan, line)) {
+            return path + ": not an event: " + line;
+        }
+    }
+    return "";
 }

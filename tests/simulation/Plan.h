@@ -88,5 +88,7 @@ void append_end(Plan& plan, uint64_t at_ms, unsigned rounds);
 std::string to_text(const Event& event);
 // False when the line is neither an event nor a comment nor empty.
 bool add_line(Plan& plan, const std::string& line);
+// What is wrong with the file, or "".
+std::string read_plan(const std::string& path, Plan& plan);
 
 #endif  // SIMULATION_PLAN_H_

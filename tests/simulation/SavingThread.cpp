@@ -20,6 +20,11 @@ bool SavingThread::here() {
     return s_here;
 }
 
+SavingThread::SavingThread() {
+    sem_init(&m_turns[false], 0, 0);
+    sem_init(&m_turns[true], 0, 0);
+}
+
 int SavingThread::create(pthread_t* id, void* (*routine)(void*), void* param) {
     if (m_exists) {
         fail_run("thread", "a second saving thread");
@@ -46,24 +51,19 @@ int SavingThread::join(pthread_t id) {
 void* SavingThread::run(void* param) {
     SavingThread* const self = static_cast<SavingThread*>(param);
     s_here = true;
-    std::unique_lock<std::mutex> lock(self->m_mutex);
-    self->m_turn.wait(lock, [self] { return self->m_threads_turn; });
-    lock.unlock();
+    sem_wait(&self->m_turns[true]);
     g_inside = true;
     void* const result = self->m_routine(self->m_param);
     g_inside = false;
-    lock.lock();
     self->m_exists = false;
-    self->m_threads_turn = false;
-    self->m_turn.notify_one();
+    sem_post(&self->m_turns[false]);
     return result;
 }
 
 void SavingThread::hand_over(bool to_thread) {
-    std::unique_lock<std::mutex> lock(m_mutex);
-    m_threads_turn = to_thread;
-    m_turn.notify_one();
-    m_turn.wait(lock, [this, to_thread] { return m_threads_turn != to_thread; });
+    sem_post(&m_turns[to_thread]);
+    while (sem_wait(&m_turns[!to_thread]) != 0) {  // a signal
+    }
 }
 
 void SavingThread::stop_before_call(int64_t pause_ns) {

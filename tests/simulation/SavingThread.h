@@ -8,15 +8,14 @@
 #define SIMULATION_SAVINGTHREAD_H_
 
 #include <pthread.h>
+#include <semaphore.h>
 #include <stdint.h>
-
-#include <condition_variable>
-#include <mutex>
 
 #include "simulation/Chance.h"
 
 class SavingThread {
 public:
+    SavingThread();
     // In place of pthread_create and pthread_join.
     int create(pthread_t* id, void* (*routine)(void*), void* param);
     int join(pthread_t id);
@@ -43,9 +42,7 @@ private:
     static void* run(void* thread);
     void hand_over(bool to_thread);
 
-    std::mutex m_mutex;
-    std::condition_variable m_turn;
-    bool m_threads_turn = false;
+    sem_t m_turns[2];  // of the loop, of the thread
     // These are touched by the one whose turn it is.
     bool m_exists = false;
     bool m_rests = false;

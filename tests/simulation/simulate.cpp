@@ -7,7 +7,7 @@
 #include <time.h>
 #include <unistd.h>
 
-#include <fstream>
+#include <map>
 #include <string>
 
 #include "simulation/Runner.h"
@@ -19,18 +19,18 @@ const char* const WEATHERS[WEATHER_COUNT] = {"fair", "outside", "faults", "storm
 struct Options {
     uint64_t seed = 1;
     uint64_t seeds = 1;
-    double seconds = 0;
-    int weather = -1;
-    size_t events = 400;
+    uint64_t seconds = 0;
+    uint64_t weather = WEATHER_COUNT;  // each in turn
+    uint64_t events = 400;
     bool trace = false;
-    bool shorten = true;
+    bool no_shorten = false;
     bool first = false;
     const char* plan = nullptr;
 };
 
 void show_failure(const Plan& plan, const RunResult& result, const Options& options) {
     printf("  %s: %s\n", result.failure_class.c_str(), result.failure.c_str());
-    if (!options.shorten) {
+    if (options.no_shorten) {
         return;
     }
     const Plan shorter = shorten(plan, result.failure_class);
@@ -56,16 +56,10 @@ double now() {
 
 int run_file(const Options& options) {
     Plan plan;
-    std::ifstream in(options.plan);
-    if (!in) {
-        perror(options.plan);
+    const std::string error = read_plan(options.plan, plan);
+    if (!error.empty()) {
+        fprintf(stderr, "%s\n", error.c_str());
         return 2;
-    }
-    for (std::string line; std::getline(in, line);) {
-        if (!add_line(plan, line)) {
-            fprintf(stderr, "%s: not an event: %s\n", options.plan, line.c_str());
-            return 2;
-        }
     }
     const RunResult result = run_plan(plan, options.trace ? STDOUT_FILENO : -1);
     printf("%s: %s, digest %016llx\n", options.plan, result.passed ? "passed" : "FAILED",
@@ -83,9 +77,11 @@ int run_seeds(const Options& options) {
     uint64_t runs = 0;
     const double start = now();
     for (uint64_t seed = options.seed;
-         options.seconds > 0 ? now() - start < options.seconds : runs < options.seeds; ++seed) {
+         options.seconds > 0 ? now() - start < static_cast<double>(options.seconds)
+                             : runs < options.seeds;
+         ++seed) {
         const Weather weather = static_cast<Weather>(
-            options.weather >= 0 ? static_cast<uint64_t>(options.weather) : seed % WEATHER_COUNT);
+            options.weather < WEATHER_COUNT ? options.weather : seed % WEATHER_COUNT);
         const Plan plan = make_plan(seed, weather, options.events);
         const RunResult result = run_plan(plan, options.trace ? STDOUT_FILENO : -1);
         ++runs;
@@ -114,33 +110,24 @@ int run_seeds(const Options& options) {
 
 // False when an option is not known or lacks its value.
 bool parse(int argc, char** argv, Options& options) {
+    const std::map<std::string, bool*> flags = {{"--trace", &options.trace},
+                                                {"--no-shorten", &options.no_shorten},
+                                                {"--first", &options.first}};
+    const std::map<std::string, uint64_t*> numbers = {{"--seed", &options.seed},
+                                                      {"--seeds", &options.seeds},
+                                                      {"--seconds", &options.seconds},
+                                                      {"--weather", &options.weather},
+                                                      {"--events", &options.events}};
     for (int i = 1; i < argc; ++i) {
-        const std::string option = argv[i];
-        if (option == "--trace") {
-            options.trace = true;
-        } else if (option == "--no-shorten") {
-            options.shorten = false;
-        } else if (option == "--first") {
-            options.first = true;
-        } else if (option[0] != '-') {
+        if (flags.count(argv[i])) {
+            *flags.at(argv[i]) = true;
+        } else if (argv[i][0] != '-') {
             options.plan = argv[i];
-        } else if (++i == argc) {
+        } else if (!numbers.count(argv[i]) || i + 1 == argc) {
             return false;
         } else {
-            const uint64_t number = strtoull(argv[i], nullptr, 10);
-            if (option == "--seed") {
-                options.seed = number;
-            } else if (option == "--seeds") {
-                options.seeds = number;
-            } else if (option == "--seconds") {
-                options.seconds = static_cast<double>(number);
-            } else if (option == "--weather" && number < WEATHER_COUNT) {
-                options.weather = static_cast<int>(number);
-            } else if (option == "--events") {
-                options.events = number;
-            } else {
-                return false;
-            }
+            *numbers.at(argv[i]) = strtoull(argv[i + 1], nullptr, 10);
+            ++i;
         }
     }
     return true;
