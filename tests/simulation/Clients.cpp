@@ -8,6 +8,7 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <utility>
 #include <vector>
 
@@ -19,23 +20,28 @@
 namespace {
 
 enum Kind {
-    DOES,         // OK
-    MAY,          // OK or an error: it depends on what is going on
-    WRONG,        // the error of the argument
-    SETS,         // OK; sets the setting to the argument
-    GETS,         // OK and the setting
-    RELOADS,      // OK; switches the logging of streams as the other service's file says
-    SETS_STREAM,  // OK; switches the logging of a stream
-    GETS_STREAM,
-    SAVES  // OK or an error, when the transaction ends
+    DOES,     // OK
+    MAY,      // OK or an error: it depends on what is going on
+    WRONG,    // the error of the argument
+    SETS,     // OK; sets the setting to the argument
+    GETS,     // OK and the setting
+    RELOADS,  // OK; switches the logging of streams as the other service's file says
+    SAVES     // OK or an error, when the transaction ends
 };
 
 struct Request {
     std::string text;
     Kind kind;
-    unsigned what;  // setting, stream or error
+    unsigned what;  // setting, LOGGED + stream, stream or error
     unsigned argument;
 };
+
+// The logging of the streams are settings like others.
+constexpr unsigned LOGGED = SETTING_COUNT;
+
+Setting* setting_of(unsigned what) {
+    return what < LOGGED ? &g_state->settings[what] : &g_state->streams[what - LOGGED].logged;
+}
 
 const char* const STREAM_NAMES[CHANNEL_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
 
@@ -78,10 +84,10 @@ std::vector<Request> make_requests() {
     for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
         const std::string name = STREAM_NAMES[stream];
         // As often as it is switched off and looked at, so that most streams flow.
-        requests.push_back({"ENABLE_LOG " + name, SETS_STREAM, stream, 1});
-        requests.push_back({"ENABLE_LOG " + name, SETS_STREAM, stream, 1});
-        requests.push_back({"DISABLE_LOG " + name, SETS_STREAM, stream, 0});
-        requests.push_back({"GET_LOG_STATE " + name, GETS_STREAM, stream, 0});
+        requests.push_back({"ENABLE_LOG " + name, SETS, LOGGED + stream, 1});
+        requests.push_back({"ENABLE_LOG " + name, SETS, LOGGED + stream, 1});
+        requests.push_back({"DISABLE_LOG " + name, SETS, LOGGED + stream, 0});
+        requests.push_back({"GET_LOG_STATE " + name, GETS, LOGGED + stream, 0});
         if (stream != ST_DSP) {
             requests.push_back({"SAVE_RINGBUF " + name, SAVES, stream, 0});
             requests.push_back({"SAVE_SLEEP_LOG " + name, SAVES, stream, 0});
@@ -101,9 +107,10 @@ const Request& request_of(uint64_t index) {
 }
 
 std::string value_text(unsigned which, unsigned value) {
-    static const char* const WORDS[][2] = {{"DISABLE", "ENABLE"}, {"EXTERNAL", "INTERNAL"}};
-    return "OK " +
-           (which < SET_OVERWRITE ? std::to_string(value) : WORDS[which - SET_OVERWRITE][value]);
+    static const char* const WORDS[][2] = {
+        {"DISABLE", "ENABLE"}, {"EXTERNAL", "INTERNAL"}, {"OFF", "ON"}};
+    return "OK " + (which < SET_OVERWRITE ? std::to_string(value)
+                                          : WORDS[std::min(which, LOGGED) - SET_OVERWRITE][value]);
 }
 
 unsigned value_of(unsigned which, const std::string& line) {
@@ -120,9 +127,7 @@ std::vector<std::pair<Setting*, unsigned>> set_by(const Request& request) {
     const uint32_t conf = g_state->kest_conf;
     switch (request.kind) {
         case SETS:
-            return {{&g_state->settings[request.what], request.argument}};
-        case SETS_STREAM:
-            return {{&g_state->streams[request.what].logged, request.argument}};
+            return {{setting_of(request.what), request.argument}};
         case RELOADS:
             return {{&g_state->streams[ST_WCDMA].logged, conf & KEST_ON && conf & KEST_MODEM},
                     {&g_state->streams[ST_WCN].logged, conf & KEST_ON && conf & KEST_WCN}};
@@ -144,24 +149,11 @@ bool agrees(Setting& setting, unsigned value, const Setting& expected, bool cont
     return true;
 }
 
-// What the request asks for, or null.
-Setting* asked_by(const Request& request) {
-    switch (request.kind) {
-        case GETS:
-            return &g_state->settings[request.what];
-        case GETS_STREAM:
-            return &g_state->streams[request.what].logged;
-        default:
-            return nullptr;
-    }
-}
-
 bool acceptable(const Request& request, const std::string& line, const Setting& expected,
                 bool contested) {
     switch (request.kind) {
         case DOES:
         case SETS:
-        case SETS_STREAM:
             return line == "OK";
         case RELOADS:
             return line == "OK" || (g_state->faulted && is_error(line, "3"));
@@ -174,11 +166,8 @@ bool acceptable(const Request& request, const std::string& line, const Setting& 
         case GETS: {
             const unsigned value = value_of(request.what, line);
             return line == value_text(request.what, value) &&
-                   agrees(*asked_by(request), value, expected, contested);
+                   agrees(*setting_of(request.what), value, expected, contested);
         }
-        case GETS_STREAM:
-            return (line == "OK ON" || line == "OK OFF") &&
-                   agrees(*asked_by(request), line == "OK ON", expected, contested);
     }
     return false;
 }
@@ -202,9 +191,13 @@ uint64_t Clients::request_named(const char* text) {
     fail_run("simulation", "no request '%s' is known", text);
 }
 
-bool Clients::connected(Client& client) {
+// Connects it. Requests behind one that waits for a transaction would be answered before it.
+bool Clients::may_ask(Client& client) const {
+    if (!client.asked.empty() && request_of(client.asked.back().index).kind == SAVES) {
+        return false;
+    }
     client.fd = client.fd >= 0 ? client.fd : connect_local("kestmodem", m_root);
-    return client.fd >= 0;
+    return client.fd >= 0 && client.rest.empty();
 }
 
 void Clients::drop(Client& client) {
@@ -221,11 +214,6 @@ void Clients::drop(Client& client) {
     }
 }
 
-// Requests behind one that waits for a transaction would be answered before it.
-bool Clients::saves(const Client& client) {
-    return !client.asked.empty() && request_of(client.asked.back().index).kind == SAVES;
-}
-
 void Clients::ask(Client& client, uint64_t index) {
     const Request& request = request_of(index);
     bool contested = m_ghosts;
@@ -239,12 +227,12 @@ void Clients::ask(Client& client, uint64_t index) {
     }
     for (const auto& set : set_by(request)) {
         *set.first = {set.second, contested};
-        if (request.kind == SETS) {
+        if (request.kind == SETS && request.what < LOGGED) {
             g_state->save_failed = false;
         }
     }
-    const Setting* const asked = asked_by(request);
-    client.asked.push_back({index, g_state->boot_ns, contested, asked ? *asked : Setting()});
+    client.asked.push_back({index, g_state->boot_ns, contested,
+                            request.kind == GETS ? *setting_of(request.what) : Setting()});
     ++g_state->counters.requests;
 }
 
@@ -257,7 +245,7 @@ void Clients::send_text(Client& client, const std::string& text) {
 
 void Clients::request(unsigned number, uint64_t index, bool in_pieces) {
     Client& client = m_clients[number % COUNT];
-    if (saves(client) || !connected(client) || !client.rest.empty()) {
+    if (!may_ask(client)) {
         return;
     }
     std::string text = request_of(index).text + (number < COUNT ? "\n" : std::string(1, '\0'));
@@ -272,7 +260,7 @@ void Clients::request(unsigned number, uint64_t index, bool in_pieces) {
 
 void Clients::flood(unsigned number, uint64_t index) {
     Client& client = m_clients[number % COUNT];
-    if (saves(client) || !connected(client) || !client.rest.empty()) {
+    if (!may_ask(client)) {
         return;
     }
     std::string text;
@@ -349,9 +337,9 @@ void Clients::take_line(Client& client, const std::string& line) {
                                                    ? "_ringbuf_"
                                                    : "_sleeplog_");
             }
-            if (done.kind == SETS_STREAM && !done.argument && !asked.contested &&
+            if (done.kind == SETS && done.what >= LOGGED && !done.argument && !asked.contested &&
                 client.asked.empty()) {
-                ledger::check_written(done.what);  // its file is closed
+                ledger::check_written(done.what - LOGGED);  // its file is closed
             }
             return;
         }
@@ -372,12 +360,9 @@ void Clients::take_notice(Client& client, const std::string& line) {
     dump = {true, start, g_state->boot_ns};
 }
 
-unsigned Clients::connected_count() const {
-    unsigned connected = 0;
-    for (const Client& client : m_clients) {
-        connected += client.fd >= 0;
-    }
-    return connected;
+int64_t Clients::connected_count() const {
+    return std::count_if(std::begin(m_clients), std::end(m_clients),
+                         [](const Client& client) { return client.fd >= 0; });
 }
 
 void Clients::service_rests() {
@@ -412,12 +397,8 @@ void Clients::check_dumps_told(unsigned number) const {
 }
 
 bool Clients::waiting() const {
-    for (const Client& client : m_clients) {
-        if (!client.asked.empty()) {
-            return true;
-        }
-    }
-    return false;
+    return std::any_of(std::begin(m_clients), std::end(m_clients),
+                       [](const Client& client) { return !client.asked.empty(); });
 }
 
 void Clients::mark_uncertain() {

@@ -65,10 +65,9 @@ private:
         Dump dumps[CHANNEL_COUNT];
     };
 
-    unsigned connected_count() const;
-    static bool saves(const Client& client);
+    int64_t connected_count() const;
     static void mark_uncertain(const Client& client);
-    bool connected(Client& client);
+    bool may_ask(Client& client) const;
     void drop(Client& client);
     void ask(Client& client, uint64_t index);
     void send_text(Client& client, const std::string& text);

@@ -35,11 +35,16 @@ World::World(const std::string& root, const Plan& plan)
     : m_root(root), m_plan(plan), m_peers(root), m_clients(root), m_media(root) {
     setenv("KESTMODEM_ROOT", root.c_str(), 1);
     setenv("EXTERNAL_STORAGE", (root + "/card").c_str(), 1);
-    setenv("TZ", ZONES[g_state->zone], 1);
-    tzset();
+    set_zone();
     write_props();
     write_kest_conf();
     g_state->pass_calls = g_state->counters.calls;
+}
+
+void World::set_zone() {
+    static const char* const ZONES[] = {"UTC0", "CET-1", "XST+9:30", "NZST-12"};
+    setenv("TZ", ZONES[g_state->zone], 1);
+    tzset();
 }
 
 // ---- The loop

@@ -24,7 +24,6 @@ class LogController;
 
 constexpr int64_t NS_PER_MS = 1000000;
 constexpr int64_t START_NS = int64_t{100} * 1000000000;
-const char* const ZONES[] = {"UTC0", "CET-1", "XST+9:30", "NZST-12"};
 
 class World {
 public:
@@ -77,7 +76,9 @@ private:
     void act_next();
     void act(const Event& event);
     void act_on_supervisor(uint64_t which, uint64_t what);
-    void add_fault(const Event& event);
+    static void add_fault(const Event& event);
+    static void end_faults();
+    static void set_zone();
     void calm();
     void check(bool last);
     void check_descriptors() const;

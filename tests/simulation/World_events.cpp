@@ -1,8 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 // The part of World that makes the events of the plan happen.
-#include <stdlib.h>
-#include <time.h>
-
 #include <algorithm>
 #include <iterator>
 
@@ -18,118 +15,96 @@ void World::act(const Event& event) {
         state.calm_ns = 0;
     }
     Chance chance(event.b, event.a);
+    const unsigned stream = static_cast<unsigned>(event.a % STREAM_COUNT);
+    const unsigned client = static_cast<unsigned>(event.a);
     switch (event.kind) {
         case EV_FEED:
-            m_devices.feed(static_cast<unsigned>(event.a % STREAM_COUNT), event.b);
-            break;
+            return m_devices.feed(stream, event.b);
         case EV_DEVICE_FAILS:
-            m_devices.fail(static_cast<unsigned>(event.a % STREAM_COUNT));
-            break;
+            return m_devices.fail(stream);
         case EV_DEVICE_GONE:
-            m_devices.pull(static_cast<unsigned>(event.a % STREAM_COUNT));
-            break;
+            return m_devices.pull(stream);
         case EV_DEVICE_BACK:
-            state.streams[event.a % STREAM_COUNT].gone = false;
-            break;
+            state.streams[stream].gone = false;
+            return;
         case EV_CARD_OUT:
             if (state.card_in && event.a % 4 == 1) {
                 state.tampered = true;  // it may be back before the service is told
                 state.card_told_ns = state.boot_ns + 2000 * NS_PER_MS;
             }
             m_media.pull_card();
-            write_props();
-            break;
+            return write_props();
         case EV_CARD_IN:
             state.card_told_ns = 0;
             m_media.insert_card(static_cast<Media::Card>(event.a % 4 % 3));
-            write_props();
-            break;
+            return write_props();
         case EV_CARD_READ_ONLY:
             state.card_read_only = state.card_in;
             state.tampered = true;
             state.card_fresh = false;
-            break;
+            return;
         case EV_MEDIUM_FULL:
-            state.room[event.a % MEDIUM_COUNT] = event.b;
-            break;
         case EV_MEDIUM_ROOM:
-            state.room[event.a % MEDIUM_COUNT] = UINT64_MAX;
+            state.room[event.a % MEDIUM_COUNT] =
+                event.kind == EV_MEDIUM_FULL ? event.b : UINT64_MAX;
             m_refused = 0;
-            break;
+            return;
         case EV_DELETE:
-            m_media.remove_something(event.a, chance);
             m_refused_since_deletion = 0;
-            break;
+            return m_media.remove_something(event.a, chance);
         case EV_STRANGER:
-            m_media.make_something(event.a, chance);
-            break;
+            return m_media.make_something(event.a, chance);
         case EV_CLOCK:
             state.wall_ns += static_cast<int64_t>(event.a) * 1000000000;
-            break;
+            return;
         case EV_ZONE:
             state.zone = static_cast<uint32_t>(event.a % 4);
-            setenv("TZ", ZONES[state.zone], 1);
-            tzset();
-            break;
+            return set_zone();
         case EV_REQUEST:
-            m_clients.request(static_cast<unsigned>(event.a), event.b, false);
-            break;
         case EV_PIECES:
-            m_clients.request(static_cast<unsigned>(event.a), event.b, true);
-            break;
+            return m_clients.request(client, event.b, event.kind == EV_PIECES);
         case EV_FLOOD:
-            m_clients.flood(static_cast<unsigned>(event.a), event.b);
-            break;
+            return m_clients.flood(client, event.b);
         case EV_CLIENT_LEAVES:
-            m_clients.leave(static_cast<unsigned>(event.a));
-            break;
+            return m_clients.leave(client);
         case EV_SUPERVISOR:
-            act_on_supervisor(event.a, event.b);
-            break;
+            return act_on_supervisor(event.a, event.b);
         case EV_TIME_SERVICE:
             state.time_answers = static_cast<uint32_t>(event.a % TIME_COUNT);
-            break;
+            return;
         case EV_DIAG:
-            state.streams[event.a % STREAM_COUNT].answers = static_cast<uint8_t>(event.b % 8);
-            break;
+            state.streams[stream].answers = static_cast<uint8_t>(event.b % 8);
+            return;
         case EV_PROPERTY:
             if (event.a % 4 == 0) {
                 ++state.version;
             } else {
                 state.cp_reset[event.a % 2] = event.b % 3 == 0;
             }
-            write_props();
-            break;
+            return write_props();
         case EV_IMAGE:
-            m_media.install_image(event.a, event.b);
-            break;
+            return m_media.install_image(event.a, event.b);
         case EV_KEST_CONF:
             if (m_clients.quiet()) {  // a reload on its way might see either
                 state.kest_conf = static_cast<uint32_t>(event.a);
                 write_kest_conf();
             }
-            break;
+            return;
         case EV_OPTION:
             state.next_layout = event.a % 2;
-            break;
+            return;
         case EV_IQ:
             m_thread.set_pace(event.a);
-            m_iq.fill(event.a, event.b);
-            break;
+            return m_iq.fill(event.a, event.b);
         case EV_FAULT:
-            add_fault(event);
-            break;
+            return add_fault(event);
         case EV_NO_FAULTS:
-            for (FaultRule& rule : state.faults) {
-                rule.active = false;
-            }
-            break;
+            return end_faults();
         case EV_KILL:
             state.kill_at = state.counters.calls + 1 + event.a;
-            break;
+            return;
         case EV_CALM:
-            calm();
-            break;
+            return calm();
         case EV_CHECK:
             check(event.a == 1 || event.a == 2);
             if (event.a == 3) {
@@ -139,9 +114,15 @@ void World::act(const Event& event) {
                 IqDevice::check_saved();
                 m_clients.check_dumps_told(1);
             }
-            break;
+            return;
         case EV_KIND_COUNT:
-            break;
+            return;
+    }
+}
+
+void World::end_faults() {
+    for (FaultRule& rule : g_state->faults) {
+        rule.active = false;
     }
 }
 
@@ -150,27 +131,24 @@ void World::act_on_supervisor(uint64_t which, uint64_t what) {
         {"Modem Assert: here\n", "Modem Alive\n", "Modem Blocked\n"},
         {"WCN-EXTERNAL-DUMP\n", "WCN-EXTERNAL-ALIVE\n", "WCN-EXTERNAL-DUMP\n"}};
     const unsigned supervisor = static_cast<unsigned>(which % Peers::SUPERVISORS);
-    switch (what % SUP_COUNT) {
+    what %= SUP_COUNT;
+    switch (what) {
         case SUP_ASSERT:
         case SUP_ALIVE:
         case SUP_BLOCKED:
-            m_peers.supervisor_says(supervisor, WORDS[supervisor][what % SUP_COUNT]);
-            if (supervisor == 1 && what % SUP_COUNT != SUP_ALIVE) {
+            m_peers.supervisor_says(supervisor, WORDS[supervisor][what]);
+            if (supervisor == 1 && what != SUP_ALIVE) {
                 m_devices.push_memory(ST_WCN, g_state->counters.events);
             }
-            break;
+            return;
         case SUP_BABBLE:
-            m_peers.supervisor_says(supervisor, std::string(900, '\x1b') + "Modem Al");
-            break;
+            return m_peers.supervisor_says(supervisor, std::string(900, '\x1b') + "Modem Al");
         case SUP_DROP:
-            m_peers.supervisor_drops(supervisor);
-            break;
+            return m_peers.supervisor_drops(supervisor);
         case SUP_GONE:
-            m_peers.supervisor_goes(supervisor);
-            break;
+            return m_peers.supervisor_goes(supervisor);
         default:
-            m_peers.supervisor_comes(supervisor);
-            break;
+            return m_peers.supervisor_comes(supervisor);
     }
 }
 
@@ -191,9 +169,7 @@ void World::add_fault(const Event& event) {
 
 void World::calm() {
     State& state = *g_state;
-    for (FaultRule& rule : state.faults) {
-        rule.active = false;
-    }
+    end_faults();
     for (unsigned client = 0; client < Clients::COUNT; ++client) {
         m_clients.leave(client);
     }
