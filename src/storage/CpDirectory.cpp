@@ -19,6 +19,12 @@
 #include "storage/log_name.h"
 #include "storage/paths.h"
 
+namespace {
+
+constexpr int MAX_NAMES = 100;  // that are tried for a new file
+
+}  // namespace
+
 CpDirectory::CpDirectory(CpSetDirectory* set, const android::String8& name)
     : m_set(set), m_name(name), m_path(set->path()) {
     m_path.append("/");
@@ -78,8 +84,8 @@ LogFile* CpDirectory::create_log_file() {
 
 // Opens the new file and puts it at the end of the list. Null with errno when it cannot be opened.
 LogFile* CpDirectory::open_and_list(std::unique_ptr<LogFile> file, const android::String8& wanted) {
-    while (file->open(O_EXCL) < 0) {
-        if (errno != EEXIST) {
+    for (int tries = 1; file->open(O_EXCL) < 0; ++tries) {
+        if (errno != EEXIST || tries == MAX_NAMES) {
             const SavedErrno keep;
             file.reset();
             return nullptr;

@@ -37,6 +37,14 @@ TEST_F(FailingMediumTest, WantOfDescriptorsKeepsTheCard) {
     EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
 }
 
+// A broken medium may say of every name that it is taken.
+TEST_F(FailingMediumTest, NamesAreNotTriedForEver) {
+    faults::fail(faults::OPEN, 1, EEXIST, faults::FOREVER);
+    EXPECT_EQ(lost_of(1, "x"), 1);
+    faults::reset();
+    EXPECT_EQ(lost_of(1, "x"), 0);
+}
+
 // Only files that trimming spares are left on a full medium.
 TEST_F(FailingMediumTest, FullMediumOfSparedFiles) {
     const std::string block(70000, 'x');
