@@ -364,7 +364,7 @@ TEST_F(KestlogTest, WrongUsageAndHelp) {
     }
     EXPECT_EQ(run("--help"), 0);
     for (const char* line :
-         {"\n  ls ROOT... ", "\n  info FILE... ", "\n  split FILE... ", ", split: replace"}) {
+         {"\n  ls ROOT... ", "\n  info FILE... ", "\n  split FILE... ", ": replace files"}) {
         EXPECT_TRUE(said(line)) << line;
     }
     EXPECT_EQ(run("vrify ."), 1);

@@ -11,6 +11,7 @@ int run_info(const CommandLine& line);
 int run_verify(const CommandLine& line);
 int run_frames(const CommandLine& line);
 int run_report(const CommandLine& line);
+int run_join(const CommandLine& line);
 int run_split(const CommandLine& line);
 int run_export(const CommandLine& line);
 

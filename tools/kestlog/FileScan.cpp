@@ -25,6 +25,11 @@ bool begins_with_magic(const uint8_t* data, size_t len) {
     return len > 0 && memcmp(data, &magic, std::min(len, sizeof(magic))) == 0;
 }
 
+// A modem's log should begin with a time record, and any log may.
+bool record_due(const FileName& name) {
+    return name.is_log() && name.of_modem();
+}
+
 int chunk_kind(const DspChunkHeader& header) {
     static const uint8_t TYPES[CK_NUM] = {DSP_CHUNK_LOG, DSP_CHUNK_PCM, DSP_CHUNK_DUMP};
     for (int i = 0; i < CK_NUM; ++i) {
@@ -112,27 +117,25 @@ private:
         }
     }
 
-    // Any log may begin with a time record; a modem's log should.
     void take_record() {
         size_t got;
         const uint8_t* data = m_in.peek(sizeof(TimeSyncRecord), got);
-        if (m_name.type == LT_DUMP) {
-            return;
-        }
-        const bool due = m_name.is_log() && m_name.of_modem();
-        if (!begins_with_magic(data, got) || (got < sizeof(TimeSyncRecord) && !due)) {
-            if (due) {
+        bool cut;
+        const size_t len = time_record_len(data, got, m_name, &cut);
+        if (len == 0) {
+            if (record_due(m_name)) {
                 m_report.add(false, "record", "no time record at the start");
             }
-        } else if (got < sizeof(TimeSyncRecord)) {
+            return;
+        }
+        if (cut) {
             m_report.add(true, "record", "the time record is cut off", here());
-            m_report.other += got;
-            m_in.skip(got);
+            m_report.other += len;
         } else {
             m_report.has_record = true;
             memcpy(&m_report.record, data, sizeof(TimeSyncRecord));
-            m_in.skip(sizeof(TimeSyncRecord));
         }
+        m_in.skip(len);
     }
 
     void scan_frames() {
@@ -314,6 +317,13 @@ void FileReport::add(bool damage, const char* code, const std::string& words, in
     } else {
         ++more_findings;
     }
+}
+
+size_t time_record_len(const uint8_t* data, size_t got, const FileName& name, bool* cut) {
+    const size_t len = std::min(got, sizeof(TimeSyncRecord));
+    *cut = len < sizeof(TimeSyncRecord);
+    return name.type != LT_DUMP && begins_with_magic(data, len) && (!*cut || record_due(name)) ? len
+                                                                                               : 0;
 }
 
 bool is_chunked(LogReader& in, const FileName& name) {

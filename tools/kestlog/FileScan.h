@@ -60,6 +60,10 @@ struct FileReport {
     void add(bool damage, const char* code, const std::string& words, int64_t offset = -1);
 };
 
+// The length of the time record in the first bytes of a file, 0 without one. got may be less
+// than a record only where the file ends; *cut tells that the record is not whole.
+size_t time_record_len(const uint8_t* data, size_t got, const FileName& name, bool* cut);
+
 // Whether the content is chunks: decided by the file's name or, if that says nothing, by the
 // first header.
 bool is_chunked(LogReader& in, const FileName& name);

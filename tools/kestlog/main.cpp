@@ -30,14 +30,15 @@ constexpr Command COMMANDS[] = {
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
     {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
+    {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
     {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify report export";
+constexpr char TREES[] = "ls verify report join export";
 // Those and the commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report export";
+constexpr char TIMES[] = "ls verify frames report join export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -47,6 +48,9 @@ constexpr Option OPTIONS[] = {
     {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},
     {"tree",         nullptr, "ls",    "draw the directories as a tree"},
     {"cp",           "NAME",  "export", "only this co-processor"},
+    {"cp",           "NAME",  "join",  "the CP, when there are several"},
+    {"records",      nullptr, "join",  "keep the time records"},
+    {"kind",         "KIND",  "join",  "of an audio DSP's log only the data of chunks: log, pcm, dump"},
     {"type",         "N",     "frames export", "only frames of this type: 0x9d, 157"},
     {"sub-type",     "N",     "frames", "only frames of this sub-type"},
     {"limit",        "N",     "frames", "stop after that many"},
@@ -57,8 +61,8 @@ constexpr Option OPTIONS[] = {
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "export report split", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "export report split", "replace files that exist"},
+    {"output",       "PATH",  "export join report split", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "export join report split", "replace files that exist"},
 };
 // clang-format on
 

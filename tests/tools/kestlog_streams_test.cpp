@@ -1,0 +1,196 @@
+// SPDX-License-Identifier: Apache-2.0
+// What kestlog takes out of log trees: streams, memory images, sound and I/Q captures.
+#include <unistd.h>
+
+#include <nlohmann/json.hpp>
+
+#include "tools/KestlogFixture.h"
+
+namespace {
+
+typedef nlohmann::json Json;
+
+class KestlogStreamsTest : public KestlogTest {
+protected:
+    bool complained(const std::string& part) const { return m_err.find(part) != std::string::npos; }
+
+    void write_log(const std::string& set, const std::string& cp, int number,
+                   const std::string& time, const std::string& content) {
+        write(set + cp + "/" + std::to_string(number) + "-" + cp + "-2016-03-01_" + time + ".log",
+              content);
+    }
+};
+
+const std::string INTERNAL = "data/modem_log/2016-03-01-09-00-00/";
+const std::string CARD = "storage/sdcard0/modem_log/2016-03-01-10-00-00/";
+
+// Both media, a record in each file, fed in pieces that end anywhere.
+TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
+    const std::string fed = pattern_bytes(700000, 3);
+    write_log(INTERNAL, "cp_wcdma", 12, "09:00:00", "x");  // no name of the service
+    write_log(INTERNAL, "cp_wcdma", 12, "09-00-00", TIME_RECORD + fed.substr(0, 300001));
+    write_log(INTERNAL, "cp_wcdma", 11, "09-10-00", TIME_RECORD + fed.substr(300001, 1));
+    write_log(INTERNAL, "cp_wcdma", 10, "09-20-00", TIME_RECORD);
+    for (int number = 9; number > 0; --number) {
+        write_log(INTERNAL, "cp_wcdma", number, "09-20-0" + std::to_string(10 - number), "");
+    }
+    write_log(INTERNAL, "cp_wcdma", 0, "09-30-00", fed.substr(300002, 5));
+    write_log(CARD, "cp_wcdma", 0, "10-00-00", TIME_RECORD + fed.substr(300007));
+
+    EXPECT_EQ(run("join ."), 0) << m_err;
+    EXPECT_EQ(m_out, fed);
+    EXPECT_EQ(m_err, "");
+    EXPECT_EQ(run("join . | cat"), 0);
+    EXPECT_EQ(m_out, fed);
+    EXPECT_EQ(run("join . --records --since 10:00"), 0);
+    EXPECT_EQ(m_out, TIME_RECORD + fed.substr(300007));
+    EXPECT_EQ(run("join . --json -o all --until 09:30"), 0) << m_err;
+    EXPECT_EQ(m_root.read_file("all"), fed.substr(0, 300007));
+    EXPECT_EQ(Json::parse(m_out), Json::parse(R"({"cp":"cp_wcdma","output":"all","files":13,
+        "left_out":0,"bytes":300007,"damages":0,"notes":0})"));
+
+    // Nothing is replaced unasked, and nothing but the file is left.
+    EXPECT_EQ(run("join . -o all"), 4);
+    EXPECT_TRUE(complained("kestlog: all: File exists; use --force to replace it\n")) << m_err;
+    EXPECT_EQ(run("join . -o all --force"), 0) << m_err;
+    EXPECT_EQ(m_out, "all: cp_wcdma, 14 files, 700000 bytes\n");
+    EXPECT_EQ(m_root.read_file("all"), fed);
+    EXPECT_EQ(run("join . -o data --force"), 4);
+    EXPECT_EQ(run("join . >/dev/full; echo $?"), 0);
+    EXPECT_EQ(m_out, "4\n");
+    EXPECT_EQ(run("join . -o /dev/full"), 4);
+    EXPECT_TRUE(m_root.find(".kestlog-").empty());
+
+    write_log(CARD, "cp_gnss", 0, "10-00-00", "gnss");
+    EXPECT_EQ(run("join ."), 1);
+    EXPECT_TRUE(complained("choose one with --cp: cp_gnss, cp_wcdma\n")) << m_err;
+    EXPECT_EQ(run("join . --cp cp_gnss"), 0);
+    EXPECT_EQ(m_out, "gnss");
+    EXPECT_EQ(run("join . --cp cp_wcn"), 2);
+    EXPECT_EQ(run("join . --cp cp_gnss --kind pcm"), 1);
+    EXPECT_EQ(run("join . --cp cp_gnss --until 2015-01-01"), 2);
+}
+
+TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
+    const std::string copied = "copy/modem_log/2016-03-01-09-00-00/";
+    const std::string three = chunk(5, LOG, "one") + chunk(6, PCM, "two") + chunk(7, DUMP, "3");
+    struct Log {
+        std::string set, cp;
+        int number;
+        std::string time, content;
+    };
+    const struct {
+        std::vector<Log> logs;
+        std::string args;
+        int status;
+        std::string stream, words;
+    } CASES[] = {
+        {{{INTERNAL, "cp_wcn", 5, "09-00-00", "a"},
+          {INTERNAL, "cp_wcn", 2, "09-20-00", "b"},
+          {INTERNAL, "cp_wcn", 1, "09-30-00", "c"},
+          {INTERNAL, "cp_wcn", 0, "09-40-00", "d"}},
+         "",
+         3,
+         "abcd",
+         "-00-00.log: damage: after it numbers 3 to 4 are missing\n"},
+        // What --until cuts off is not missing, what --since leaves is.
+        {{{INTERNAL, "cp_wcn", 2, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-20-00", "b"}},
+         "--until 09:10",
+         0,
+         "a",
+         ""},
+        // The oldest files are trimmed in each set; only the last file may lack a newer one.
+        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "a"}, {CARD, "cp_wcn", 4, "10-00-00", "b"}},
+         "",
+         3,
+         "ab",
+         "09-00-00.log: damage: after it number 0 is missing\n"},
+        {{{CARD, "cp_wcn", 1, "10-00-00", "b"}},
+         "",
+         0,
+         "b",
+         "10-00-00.log: note: after it number 0 is missing\n"},
+        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-00-00-1", "b"}},
+         "",
+         0,
+         "ba",
+         ""},
+        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-20-00", "b"}},
+         "",
+         3,
+         "ab",
+         "damage: two log files with this number\n"},
+        // Copied while it grew, and before it was renumbered.
+        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "abc"},
+          {INTERNAL, "cp_wcn", 0, "09-20-00", "d"},
+          {copied, "cp_wcn", 0, "09-00-00", "ab"}},
+         "",
+         3,
+         "abcd",
+         "copy/modem_log/2016-03-01-09-00-00/cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log"
+         ": damage: the beginning of ./data/modem_log/2016-03-01-09-00-00/cp_wcn/1-cp_wcn-"
+         "2016-03-01_09-00-00.log; left out\n"},
+        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "ab"}, {copied, "cp_wcn", 0, "09-00-00", "ab"}},
+         "",
+         3,
+         "ab",
+         "damage: a copy of "},
+        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "ab"}, {copied, "cp_wcn", 0, "09-00-00", "xyz"}},
+         "",
+         3,
+         "abxyz",
+         "damage: started at the same second as "},
+        {{{INTERNAL, "cp_wcdma", 0, "09-00-00", TIME_RECORD.substr(0, 15)}},
+         "",
+         3,
+         "",
+         "damage: the time record is cut off (at byte 0)\n"},
+        {{{INTERNAL, "agdsp", 1, "09-00-00", TIME_RECORD + three.substr(0, 50)},
+          {INTERNAL, "agdsp", 0, "09-10-00", three}},
+         "",
+         3,
+         three.substr(0, 50) + three,
+         "damage: the last chunk is cut off (at byte 62)\n"},
+        {{{INTERNAL, "agdsp", 0, "09-00-00", three.substr(0, 50)},
+          {CARD, "agdsp", 0, "10-00-00", three}},
+         "--kind pcm",
+         3,
+         "twotwo",
+         "damage: the last chunk is unfinished (at byte 46)\n"},
+        {{{INTERNAL, "agdsp", 1, "09-00-00", three}, {INTERNAL, "agdsp", 0, "09-10-00", three}},
+         "--kind log",
+         0,
+         "oneone",
+         "note: chunk 5 where 8 was expected (at byte 0)\n"},
+        {{{INTERNAL, "agdsp", 0, "09-00-00", chunk(5, DUMP, "a") + "~~~~\x1b" + three}},
+         "--kind dump",
+         3,
+         "a3",
+         "damage: wrong chunk header: mark (at byte 21)\n"},
+        {{{INTERNAL, "agdsp", 0, "09-00-00", three}}, "--kind sms", 1, "", "not log, pcm or dump"},
+    };
+    for (const auto& c : CASES) {
+        for (const Log& log : c.logs) {
+            write_log(log.set, log.cp, log.number, log.time, log.content);
+        }
+        const std::string roots = m_root.exists("copy") ? ". copy " : ". ";
+        EXPECT_EQ(run("join " + roots + c.args), c.status) << c.words << m_err;
+        EXPECT_EQ(m_out, c.stream) << c.words;
+        EXPECT_TRUE(c.words.empty() ? m_err.empty() : complained(c.words)) << c.words << m_err;
+        ASSERT_EQ(
+            system(
+                ("cd " + m_root.root() + " && rm -r data/* storage copy 2>/dev/null; :").c_str()),
+            0);
+    }
+    // A link is not followed, an unreadable file costs only itself.
+    write_log(INTERNAL, "cp_wcn", 0, "09-00-00", "a");
+    ASSERT_EQ(symlink("/etc/passwd", m_root
+                                         .path(INTERNAL + "cp_wcn/1-cp_wcn-2016-03-01_08-00-00"
+                                                          ".log")
+                                         .c_str()),
+              0);
+    EXPECT_EQ(run("join . nowhere"), 2);
+    EXPECT_EQ(m_out, "a");
+}
+
+}  // namespace

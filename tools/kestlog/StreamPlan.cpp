@@ -1,0 +1,144 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/StreamPlan.h"
+
+#include <string.h>
+
+#include <algorithm>
+#include <map>
+
+#include "kestlog/ExitStatus.h"
+#include "kestlog/LogReader.h"
+#include "kestlog/Report.h"
+
+namespace {
+
+// Whether the shorter of two files is the beginning of the longer one.
+bool same_beginning(const TreeFile& a, const TreeFile& b) {
+    LogReader readers[2];
+    if (!readers[0].open(a.path(), false) || !readers[1].open(b.path(), false)) {
+        return false;
+    }
+    for (;;) {
+        size_t got[2];
+        const uint8_t* data[2];
+        for (int i = 0; i < 2; ++i) {
+            data[i] = readers[i].peek(1, got[i]);
+        }
+        const size_t len = std::min(got[0], got[1]);
+        if (len == 0) {
+            return readers[0].error() == 0 && readers[1].error() == 0;
+        }
+        if (memcmp(data[0], data[1], len) != 0) {
+            return false;
+        }
+        readers[0].skip(len);
+        readers[1].skip(len);
+    }
+}
+
+// What two copies of a file have in common, even when one was renumbered since.
+std::string identity(const StreamFile& place) {
+    const std::string& name = place.file->name.text;
+    return place.set->name + "/" + name.substr(std::min(name.find('-'), name.size()));
+}
+
+void leave_out(PlannedFile* file, const char* code, const std::string& words) {
+    file->left_out = true;
+    file->findings.push_back({true, code, words + "; left out", -1});
+}
+
+void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
+    std::map<std::string, size_t> known;
+    for (size_t i = 0; i < plan->size(); ++i) {
+        const StreamFile& place = stream.files[i];
+        if (place.set->name.empty()) {
+            continue;
+        }
+        const auto [it, fresh] = known.insert({identity(place), i});
+        PlannedFile* older = &(*plan)[it->second];
+        PlannedFile* newer = &(*plan)[i];
+        if (fresh || older->file->dir == newer->file->dir) {
+            continue;
+        }
+        if (!same_beginning(*older->file, *newer->file)) {
+            newer->findings.push_back({true, "double",
+                                       "started at the same second as " + older->file->shown() +
+                                           " in a set of the same name",
+                                       -1});
+        } else if (older->file->size < newer->file->size) {
+            leave_out(older, "copy", "the beginning of " + newer->file->shown());
+            it->second = i;
+        } else {
+            leave_out(
+                newer, "copy",
+                (older->file->size == newer->file->size ? "a copy of " : "the beginning of ") +
+                    older->file->shown());
+        }
+    }
+}
+
+void find_gaps(std::vector<PlannedFile>* plan) {
+    std::map<const TreeDir*, size_t> newest;  // of each directory
+    size_t last = 0;
+    for (size_t i = 0; i < plan->size(); ++i) {
+        if (!(*plan)[i].left_out) {
+            newest[(*plan)[i].file->dir.get()] = last = i;
+        }
+    }
+    for (size_t i = 0; i < plan->size(); ++i) {
+        PlannedFile& each = (*plan)[i];
+        const TreeFile& file = *each.file;
+        if (each.left_out) {
+            continue;
+        }
+        each.last = i == last;
+        if (file.doubled && !file.set_aside) {
+            each.findings.push_back({true, "double", "two log files with this number", -1});
+        }
+        // What follows a file of the stream is missing only when something newer is there; what
+        // --until has cut off is not missing.
+        const bool ends = file.first_missing == 0;
+        if (file.missing > 0 && (ends || newest[file.dir.get()] != i)) {
+            each.findings.push_back(
+                {!(ends && each.last), "gap", "after it " + missing_text(file), -1});
+        }
+    }
+}
+
+}  // namespace
+
+std::vector<PlannedFile> plan_stream(const LogStream& stream) {
+    const CpType type = cp_type_of(stream.cp);
+    std::vector<PlannedFile> plan(stream.files.size());
+    for (size_t i = 0; i < plan.size(); ++i) {
+        plan[i].file = stream.files[i].file;
+        const CpType own = plan[i].file->name.cp_type;
+        if (type != CT_UNKNOWN && own != CT_UNKNOWN && own != type) {
+            leave_out(&plan[i], "name", "the name belongs to another CP");
+        }
+    }
+    find_copies(stream, &plan);
+    find_gaps(&plan);
+    return plan;
+}
+
+const LogStream* choose_stream(const CommandLine& line, const std::vector<LogStream>& streams,
+                               int* status) {
+    const std::string wanted = line.value("cp", "");
+    std::string names;
+    for (const LogStream& stream : streams) {
+        if (stream.cp == wanted || (streams.size() == 1 && !line.has("cp"))) {
+            return &stream;
+        }
+        names += (names.empty() ? "" : ", ") + stream.cp;
+    }
+    if (streams.empty()) {
+        *status = failure(ES_UNREADABLE, "no log files there");
+    } else if (line.has("cp")) {
+        *status = failure(ES_UNREADABLE, "no log files of " + wanted + "; there are: " + names);
+    } else {
+        *status = line.usage_error("choose one with --cp: " + names);
+    }
+    return nullptr;
+}
