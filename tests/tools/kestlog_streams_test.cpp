@@ -193,4 +193,68 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
     EXPECT_EQ(m_out, "a");
 }
 
+// A dump of 3 MiB in frames, its image byte for byte.
+TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
+    const std::string memory = pattern_bytes(3 << 20, 9);
+    std::string dump;
+    for (size_t at = 0; at < memory.size(); at += 32000) {
+        dump += frame(memory.substr(at, 32000));
+    }
+    write_good_tree();
+    write(MODEM_DUMP, dump + raw_frame("1234567\x7e" + END_TEXT));
+    const std::string image = "cp_wcdma_memory_" + STAMP + ".bin";
+    EXPECT_EQ(run("extract " + MODEM_DUMP + " -o to"), 0) << m_err;
+    EXPECT_EQ(m_out, "to/" + image +
+                         ": memory image, 3145728 bytes of 99 frames; left out: "
+                         "the end marker\n");
+    EXPECT_EQ(m_root.read_file("to/" + image), memory);
+    EXPECT_EQ(run("extract " + MODEM_DUMP + " -o to"), 4);
+    // Under any name the same.
+    write("crash", m_root.read_file(MODEM_DUMP));
+    EXPECT_EQ(run("extract crash -o to"), 0) << m_err;
+    EXPECT_EQ(m_root.read_file("to/crash.image.bin"), memory);
+
+    const std::string broken = altered(frame("lost"), 5, 99);
+    write(MODEM_DUMP, "junk" + broken + frame("kept") + frame("x", 1));
+    EXPECT_EQ(run("extract --force " + MODEM_DUMP + " --type 0x9d -o to"), 3);
+    const std::string typed = "to/cp_wcdma_memory_" + STAMP + ".type-9d.bin";
+    EXPECT_EQ(m_root.read_file(typed), "kept");
+    EXPECT_EQ(m_out, typed +
+                         ": payload, 4 bytes of 1 frames; left out: 1 other frames, 1 broken "
+                         "frames, 18 bytes outside intact frames\n");
+    EXPECT_TRUE(complained(".dmp: damage: 1 frames with a wrong length")) << m_err;
+    EXPECT_EQ(run("extract " + WCN_LOG + " -o to"), 2);
+    EXPECT_EQ(m_err, "kestlog: found nothing to extract\n");
+    for (const char* args : {"--type 256", "--type x", "--sub-type ''", "-o ''"}) {
+        EXPECT_EQ(run("extract . -o to " + std::string(args)), 1) << args;
+    }
+
+    // From a tree: every image, ring buffer and sleep log, those in logs as well.
+    write(MODEM_LOG, TIME_RECORD + frame("ring", 0x3a, 0x64) + frame("end", 0x3a, 1) +
+                         frame("sleep", 0x3b, 0x64) + "tail");
+    write(MODEM_DUMP, frame(LOG_DATA) + DUMP_END);
+    write(DSP_LOG, THREE_CHUNKS);
+    unlink(m_root.path(OLD_DSP_LOG).c_str());
+    unlink(m_root.path("crash").c_str());
+    const std::string name = "cp_wcdma-" + STAMP;
+    const std::pair<std::string, std::string> FILES[] = {
+        {"0-" + name + ".ringbuf.bin", "ring"},        {"0-" + name + ".sleeplog.bin", "sleep"},
+        {"0-agdsp-" + STAMP + ".dump.bin", LOG_DATA},  {image, LOG_DATA},
+        {"cp_wcdma_memory_" + STAMP + "-1.bin", "x"},  // of the kernel's copy
+        {"cp_wcdma_ringbuf_" + STAMP + ".bin", "x"},   {"cp_wcdma_sleeplog_" + STAMP + ".bin", "x"},
+        {"cp_wcn_memory_" + STAMP + ".bin", LOG_DATA},
+    };
+    EXPECT_EQ(run("extract . --json -o all"), 0) << m_err;
+    EXPECT_EQ(m_root.list("all").size(), std::size(FILES));
+    for (const auto& [file, content] : FILES) {
+        EXPECT_EQ(m_root.read_file("all/" + file), content) << file;
+    }
+    const Json first = Json::parse(m_out.substr(0, m_out.find('\n')));
+    EXPECT_EQ(first,
+              Json::parse(R"({"file":"./)" + DSP_LOG + R"(","output":"all/0-agdsp-)" + STAMP +
+                          R"(.dump.bin","content":"memory image","framed":true,"bytes":1000,
+        "frames":1,"other_frames":2,"broken_frames":0,"other_bytes":0,"time_record":false,
+        "end_marker":false})"));
+}
+
 }  // namespace

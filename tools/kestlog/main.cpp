@@ -31,14 +31,16 @@ constexpr Command COMMANDS[] = {
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
     {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
     {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
+    {"extract", "FILE|ROOT...", 1, ANY, run_extract,
+     "write what is in frames to files: memory images, ring buffers, the payloads of a type"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
     {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify report join export";
+constexpr char TREES[] = "ls verify report join extract export";
 // Those and the commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report join export";
+constexpr char TIMES[] = "ls verify frames report join extract export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -51,8 +53,8 @@ constexpr Option OPTIONS[] = {
     {"cp",           "NAME",  "join",  "the CP, when there are several"},
     {"records",      nullptr, "join",  "keep the time records"},
     {"kind",         "KIND",  "join",  "of an audio DSP's log only the data of chunks: log, pcm, dump"},
-    {"type",         "N",     "frames export", "only frames of this type: 0x9d, 157"},
-    {"sub-type",     "N",     "frames", "only frames of this sub-type"},
+    {"type",         "N",     "export extract frames", "only frames of this type: 0x9d, 157"},
+    {"sub-type",     "N",     "extract frames", "only frames of this sub-type"},
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
     {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
@@ -61,8 +63,8 @@ constexpr Option OPTIONS[] = {
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "export join report split", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "export join report split", "replace files that exist"},
+    {"output",       "PATH",  "export extract join report split", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "export extract join report split", "replace files that exist"},
 };
 // clang-format on
 

@@ -1,0 +1,330 @@
+// SPDX-License-Identifier: Apache-2.0
+// kestlog extract.
+#include <ctype.h>
+#include <errno.h>
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <deque>
+#include <nlohmann/json.hpp>
+#include <set>
+
+#include "channels/modem_dump_end.h"
+#include "common/text.h"
+#include "core/open_file.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/OutputFile.h"
+#include "kestlog/Problems.h"
+#include "kestlog/TreeInput.h"
+
+namespace {
+
+constexpr int ANY = -1;
+
+// What of a file goes to one file. The kind is that of chunks, or null for frames.
+struct Content {
+    const char* words;
+    std::string suffix;  // of the output's name
+    int type;
+    int sub_type;
+    const char* kind;
+};
+
+// The diag types and sub-type of data that the service asks for.
+constexpr int RING_BUFFER = 0x3a;
+constexpr int SLEEP_LOG = 0x3b;
+constexpr int DATA = 0x64;
+
+bool is_end(const Piece& piece) {
+    return piece.data_len == MODEM_DUMP_END_LEN &&
+           memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0;
+}
+
+// A file that holds nothing but payload already.
+bool is_plain(const FileName& name) {
+    return name.type == LT_RINGBUF || name.type == LT_SLEEP_LOG ||
+           (name.type == LT_DUMP && !name.framed_dump);
+}
+
+bool holds_frames(const FileName& name) {
+    return name.is_log() || name.framed_dump || !name.exact;
+}
+
+// The end marker of a dump. In a file of an unknown name it may count as a broken frame.
+struct End {
+    bool seen = false;
+    uint64_t counted = 0;  // among the intact frames
+};
+
+struct Part {
+    Content content;
+    OutputFile out;
+    uint64_t frames = 0;
+    uint64_t bytes = 0;
+};
+
+class Extractor {
+public:
+    explicit Extractor(const CommandLine& line)
+        : m_dir(line.value("output", "")),
+          m_force(line.has("force")),
+          m_problems(line.has("json"), stdout) {}
+
+    bool read_options(const CommandLine& line, int* status) {
+        if (m_dir.empty()) {
+            *status = line.usage_error("-o DIR is missing");
+            return false;
+        }
+        return read_type(line, "type", &m_type, status) &&
+               read_type(line, "sub-type", &m_sub_type, status);
+    }
+
+    // False when the output failed; *status is set then.
+    bool extract(const TreeFile& file, bool named, int* status) {
+        const bool chosen = m_type != ANY || m_sub_type != ANY;
+        if (is_plain(file.name) && !chosen) {
+            return copy(file, named ? Links::FOLLOW : Links::REFUSE, status);
+        }
+        return !holds_frames(file.name) || scan(file, named, status);
+    }
+
+    uint64_t outputs() const { return m_outputs.size(); }
+    int status() const { return m_problems.status(); }
+
+private:
+    static bool read_type(const CommandLine& line, const char* option, int* type, int* status) {
+        const std::string text = line.value(option, "");
+        char* end;
+        const unsigned long value = strtoul(text.c_str(), &end, 0);
+        if (!line.has(option)) {
+            return true;
+        }
+        if (text.empty() || !isdigit(static_cast<unsigned char>(text[0])) || *end || value > 0xff) {
+            *status = line.usage_error("--" + std::string(option) + ": '" + text +
+                                       "' is not a number from 0 to 255");
+            return false;
+        }
+        *type = static_cast<int>(value);
+        return true;
+    }
+
+    std::vector<Content> contents(const FileName& name, bool chunked) const {
+        if (m_type != ANY || m_sub_type != ANY) {
+            char suffix[40] = "";
+            size_t len = 0;
+            if (m_type != ANY) {
+                len += static_cast<size_t>(snprintf(suffix, sizeof(suffix), ".type-%02x", m_type));
+            }
+            if (m_sub_type != ANY) {
+                snprintf(suffix + len, sizeof(suffix) - len, ".sub-type-%02x", m_sub_type);
+            }
+            return {{"payload", suffix, m_type, m_sub_type, nullptr}};
+        }
+        if (chunked) {
+            return {{"memory image", ".dump", ANY, ANY, CHUNK_KINDS[CK_DUMP]}};
+        }
+        if (name.is_log()) {
+            return {{"ring buffer", ".ringbuf", RING_BUFFER, DATA, nullptr},
+                    {"sleep log", ".sleeplog", SLEEP_LOG, DATA, nullptr}};
+        }
+        return {{"memory image", name.exact ? "" : ".image", ANY, ANY, nullptr}};
+    }
+
+    // Where it goes: no two outputs of one run have the same name.
+    std::string output_path(const TreeFile& file, const std::string& suffix) {
+        const std::string& name = file.name.text;
+        const size_t dot = name.rfind('.');
+        const std::string stem = m_dir + "/" + (dot == 0 ? name : name.substr(0, dot)) + suffix;
+        std::string path = stem + ".bin";
+        for (int i = 1; !m_outputs.insert(path).second; ++i) {
+            path = stem + "-" + std::to_string(i) + ".bin";
+        }
+        return path;
+    }
+
+    bool open(const TreeFile& file, const std::string& suffix, OutputFile* out) {
+        if (m_outputs.empty()) {
+            mkdir(m_dir.c_str(), 0777);  // if it cannot be made, the file in it cannot either
+        }
+        return out->open(output_path(file, suffix), m_force);
+    }
+
+    bool take(const TreeFile& file, const Piece& piece, Part* part) {
+        const Content& content = part->content;
+        if (!piece.intact || (content.type != ANY && content.type != piece.type) ||
+            (content.sub_type != ANY && content.sub_type != piece.sub_type) ||
+            (content.kind && content.kind != piece.kind)) {
+            return true;
+        }
+        if (part->frames == 0 && !open(file, content.suffix, &part->out)) {
+            return false;
+        }
+        ++part->frames;
+        part->bytes += piece.data_len;
+        return part->out.write(piece.data, piece.data_len);
+    }
+
+    bool scan(const TreeFile& file, bool named, int* status) {
+        const std::string path = file.shown();
+        LogReader in;
+        if (!in.open(file.path(), named)) {
+            m_problems.unreadable(path, errno);
+            return true;
+        }
+        std::deque<Part> parts;
+        for (const Content& content : contents(file.name, is_chunked(in, file.name))) {
+            parts.emplace_back();
+            parts.back().content = content;
+        }
+        FileReport report;
+        const Part* failed = nullptr;
+        End end;
+        scan_file(
+            in, file.name,
+            [&](const Piece& piece) {
+                if (!file.name.is_log() && !piece.kind && is_end(piece)) {
+                    end.seen = true;
+                    end.counted += piece.intact ? 1 : 0;
+                    return true;
+                }
+                for (Part& part : parts) {
+                    failed = !failed && !take(file, piece, &part) ? &part : failed;
+                }
+                return !failed;
+            },
+            &report);
+        for (Part& part : parts) {
+            failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
+        }
+        if (failed) {
+            *status = failed->out.failed();
+            return false;
+        }
+        for (const Part& part : parts) {
+            if (part.frames > 0) {
+                print(path, part, report, end);
+            }
+        }
+        tell(path, report, in.error());
+        return true;
+    }
+
+    void tell(const std::string& path, const FileReport& report, int error) {
+        for (const Finding& finding : report.findings) {
+            if (finding.damage) {
+                m_problems.add(path, {finding});
+            }
+        }
+        if (error) {
+            m_problems.unreadable(path, error);
+        }
+    }
+
+    // A file that has no frames.
+    bool copy(const TreeFile& file, Links links, int* status) {
+        const std::string path = file.shown();
+        const int fd = open_to_read(file.path().c_str(), links);
+        if (fd < 0) {
+            m_problems.unreadable(path, errno);
+            return true;
+        }
+        OutputFile out;
+        uint64_t copied = 0;
+        int error = 0;
+        const bool good =
+            open(file, "", &out) && out.copy_from(fd, file.size, &copied, &error) && out.close();
+        close(fd);
+        if (!good) {
+            *status = out.failed();
+            return false;
+        }
+        if (m_problems.json()) {
+            m_problems.print({{"file", json_text(path)},
+                              {"output", json_text(out.path())},
+                              {"content", file.name.kind},
+                              {"framed", false},
+                              {"bytes", copied}});
+        } else {
+            printf("%s: %s, %llu bytes; it has no frames, nothing was left out\n",
+                   escape_text(out.path()).c_str(), file.name.kind,
+                   static_cast<unsigned long long>(copied));
+        }
+        tell(path, FileReport(), error);
+        return true;
+    }
+
+    void print(const std::string& path, const Part& part, const FileReport& report,
+               const End& end) {
+        uint64_t all = report.frames;
+        for (const auto& chunks : report.chunks) {
+            all += chunks.count;
+        }
+        const uint64_t others = all - part.frames - end.counted;
+        if (m_problems.json()) {
+            m_problems.print({{"file", json_text(path)},
+                              {"output", json_text(part.out.path())},
+                              {"content", part.content.words},
+                              {"framed", true},
+                              {"bytes", part.bytes},
+                              {"frames", part.frames},
+                              {"other_frames", others},
+                              {"broken_frames", report.broken},
+                              {"other_bytes", report.other},
+                              {"time_record", report.has_record},
+                              {"end_marker", end.seen}});
+            return;
+        }
+        const char* const frames = report.chunked ? " chunks" : " frames";
+        std::string left_out;
+        const auto add = [&](bool any, const std::string& words) {
+            left_out += any ? (left_out.empty() ? "" : ", ") + words : "";
+        };
+        add(others > 0, std::to_string(others) + " other" + frames);
+        add(report.broken > 0, std::to_string(report.broken) + " broken frames");
+        add(report.other > 0, std::to_string(report.other) + " bytes outside intact" + frames);
+        add(report.has_record, "the time record");
+        add(end.seen, "the end marker");
+        printf("%s: %s, %llu bytes of %llu%s; left out: %s\n", escape_text(part.out.path()).c_str(),
+               part.content.words, static_cast<unsigned long long>(part.bytes),
+               static_cast<unsigned long long>(part.frames), frames,
+               left_out.empty() ? "nothing" : left_out.c_str());
+    }
+
+    std::string m_dir;
+    bool m_force;
+    Problems m_problems;
+    int m_type = ANY;
+    int m_sub_type = ANY;
+    std::set<std::string> m_outputs;
+};
+
+}  // namespace
+
+int run_extract(const CommandLine& line) {
+    Extractor extractor(line);
+    LogTree tree;
+    int status;
+    if (!extractor.read_options(line, &status) ||
+        !open_tree(line, &tree, &status, LogTree::FILES_TOO)) {
+        return status;
+    }
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                if (!extractor.extract(file, file.shown() == cp.shown, &status)) {
+                    return status;
+                }
+            }
+        }
+    }
+    status = std::max(extractor.status(), tell_failures(tree));
+    if (extractor.outputs() == 0 && status == ES_OK) {
+        status = failure(ES_UNREADABLE, "found nothing to extract");
+    }
+    return status;
+}
