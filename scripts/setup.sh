@@ -3,9 +3,9 @@
 # Sourced by the other scripts, with the checkout as the current directory: what they need,
 # and builds that show their progress in one line.
 
-# The libraries of kestlog; without one of them it is left out of a build.
+# The libraries of kestlog; without one of them it, or a command of it, is left out of a build.
 # shellcheck disable=SC2034
-kest_reader_libraries=(nlohmann-json3-dev libarchive-dev)
+kest_reader_libraries=(nlohmann-json3-dev libarchive-dev libsndfile1-dev)
 
 # Whether there is what a Debian package brings. Looks for the tool itself, so that it also
 # tells on a system that has no such package.
@@ -20,6 +20,7 @@ kest_has() {
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libarchive-dev) kest_includes archive.h ;;
+        libsndfile1-dev) kest_includes sndfile.h ;;
         libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;
         sanitizers) kest_links c++ address,undefined main && kest_links c++ thread main ;;
         *) command -v "$1" >/dev/null ;;

@@ -257,4 +257,54 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
         "end_marker":false})"));
 }
 
+// Stereo samples of 16 bits in chunks that end within a sample; the log's chunks lie between.
+TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
+    const std::string samples = pattern_bytes(4001, 5);
+    const std::string sound = "--rate 1000 --channels 2 --format s16le -o ";
+    write_log(INTERNAL, "agdsp", 1, "09-00-00",
+              chunk(1, PCM, samples.substr(0, 1001)) + chunk(2, LOG, "log"));
+    write_log(INTERNAL, "agdsp", 0, "09-10-00",
+              chunk(3, PCM, samples.substr(1001, 999)) + chunk(6, PCM, samples.substr(2000)));
+    EXPECT_EQ(run("wav . " + sound + "gap.wav"), 0) << m_err;
+    EXPECT_EQ(m_out,
+              "gap.wav: 1.000 seconds of 3 chunks; 1 gaps, 0 of them filled with 0.000 "
+              "seconds of silence; 1 bytes of unfinished samples left out\n");
+    EXPECT_TRUE(complained("note: chunk 6 where 4 was expected (at byte 1019)\n")) << m_err;
+    const std::string wav = m_root.read_file("gap.wav");
+    EXPECT_EQ(wav.substr(0, 4) + wav.substr(8, 4), "RIFFWAVE");
+    EXPECT_EQ(wav.substr(wav.size() - 4000), samples.substr(0, 4000));
+
+    EXPECT_EQ(run("wav . --json --fill-gaps " + sound + "-"), 0) << m_err;
+    EXPECT_EQ(m_out.substr(m_out.size() - 5996),
+              samples.substr(0, 2000) + std::string(1996, '\0') + samples.substr(2000, 2000));
+    EXPECT_TRUE(complained("\"gaps\":1,\"gaps_filled\":1,\"silence_frames\":499,")) << m_err;
+
+    // Numbers that go back or far ahead are no silence.
+    write("renamed", chunk(9, PCM, "one.") + chunk(2, PCM, "two.") + chunk(70000, PCM, "far."));
+    const std::string backwards = "--rate 10 --channels 1 --format u8 --fill-gaps -o ";
+    EXPECT_EQ(run("wav renamed " + backwards + "b.wav"), 0) << m_err;
+    EXPECT_EQ(m_root.read_file("b.wav").substr(m_root.read_file("b.wav").size() - 12),
+              "one.two.far.");
+    EXPECT_EQ(run("wav renamed " + backwards + "b.wav"), 4);
+    write("renamed", "foreign");
+    for (const std::string args :
+         {"renamed ", "nowhere ", "data/modem_log/../.. --until 2015-01-01 "}) {
+        EXPECT_EQ(run("wav " + args + sound + "none.wav"), 2) << args;
+    }
+    for (const char* args : {"--rate 1 --channels 1 --format s16 -o x", "--rate 0 --format u8 -o x",
+                             "--rate 9 --channels 2000 --format u8 -o x", "--rate 1 --format u8"}) {
+        EXPECT_EQ(run("wav . " + std::string(args)), 1) << args;
+    }
+    EXPECT_FALSE(m_root.exists("none.wav"));
+    EXPECT_TRUE(m_root.find(".kestlog-").empty());
+
+    if (run("--version >/dev/null && soxi gap.wav") == 127) {
+        GTEST_SKIP() << "soxi is not installed";
+    }
+    for (const char* line : {"Channels       : 2\n", "Sample Rate    : 1000\n", "= 1000 samples",
+                             "Sample Encoding: 16-bit Signed Integer PCM\n"}) {
+        EXPECT_TRUE(said(line)) << line << m_out;
+    }
+}
+
 }  // namespace

@@ -5,15 +5,17 @@
 
 #include <stdint.h>
 
+#include <string>
+
 #include "kestlog/FileScan.h"
 #include "kestlog/LogTree.h"
 
 class ChunkSequence {
 public:
     // Before the first chunk of a file. In another set the numbers may begin anew.
-    void enter(const TreeDir* dir) {
-        m_follows &= dir == m_dir;
-        m_dir = dir;
+    void enter(const TreeDir& dir) {
+        m_follows &= dir.path == m_dir;
+        m_dir = dir.path;
         m_first = true;
     }
 
@@ -35,7 +37,7 @@ public:
     }
 
 private:
-    const TreeDir* m_dir = nullptr;
+    std::string m_dir;
     bool m_first = true;
     bool m_follows = false;
     uint32_t m_next = 0;

@@ -15,5 +15,6 @@ int run_report(const CommandLine& line);
 int run_join(const CommandLine& line);
 int run_split(const CommandLine& line);
 int run_export(const CommandLine& line);
+int run_wav(const CommandLine& line);  // only with libsndfile
 
 #endif  // KESTLOG_COMMANDS_H_

@@ -34,11 +34,15 @@ void Problems::add(const std::string& path, const FileReport& report, int error)
 }
 
 void Problems::unreadable(const std::string& path, int error) {
-    ++m_unreadable;
     // The service may rename and trim files while they are read.
-    failure(ES_UNREADABLE, path + ": " +
-                               (error == ENOENT ? "gone or renamed since the directory was read"
-                                                : strerror(error)));
+    unreadable(
+        path + ": " +
+        (error == ENOENT ? "gone or renamed since the directory was read" : strerror(error)));
+}
+
+void Problems::unreadable(const std::string& words) {
+    ++m_unreadable;
+    failure(ES_UNREADABLE, words);
 }
 
 void Problems::print(const Json& object) const {

@@ -21,6 +21,7 @@ public:
     // All that a scan has found, and its read error.
     void add(const std::string& path, const FileReport& report, int error);
     void unreadable(const std::string& path, int error);
+    void unreadable(const std::string& words);
 
     bool json() const { return m_json; }
     // Prints an object to the stream.

@@ -123,7 +123,7 @@ private:
         }
         FileReport report;
         bool good = true;
-        m_sequence.enter(each.file->dir.get());
+        m_sequence.enter(*each.file->dir);
         scan_file(
             in, each.file->name,
             [&](const Piece& piece) {

@@ -34,13 +34,16 @@ constexpr Command COMMANDS[] = {
     {"extract", "FILE|ROOT...", 1, ANY, run_extract,
      "write what is in frames to files: memory images, ring buffers, the payloads of a type"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+#ifdef KEST_WAV
+    {"wav",    "FILE|ROOT...", 1, ANY, run_wav, "write the PCM data of an audio DSP log to a WAV file"},
+#endif
     {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify report join extract export";
+constexpr char TREES[] = "ls verify report join extract wav export";
 // Those and the commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report join extract export";
+constexpr char TIMES[] = "ls verify frames report join extract wav export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -58,13 +61,19 @@ constexpr Option OPTIONS[] = {
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
     {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
+#ifdef KEST_WAV
+    {"rate",         "HZ",    "wav",   "samples per second"},
+    {"channels",     "N",     "wav",   "samples of one moment"},
+    {"format",       "FORMAT", "wav",  "of a sample: u8, s16le, s16be, s24le ... s32be, f32le, f32be"},
+    {"fill-gaps",    nullptr, "wav",   "put silence where chunks are missing"},
+#endif
     {"iq-rate",      "HZ",    "report", "draw the spectra of I/Q captures with this sample rate"},
     {"iq-format",    "F",     "report", "and this format: ci8, ci16_le, ci32_le, cf32_le"},
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "export extract join report split", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "export extract join report split", "replace files that exist"},
+    {"output",       "PATH",  "export extract join report split wav", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "export extract join report split wav", "replace files that exist"},
 };
 // clang-format on
 
