@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <nlohmann/json.hpp>
+#include <regex>
 
 #include "tools/KestlogFixture.h"
 
@@ -305,6 +306,69 @@ TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
                              "Sample Encoding: 16-bit Signed Integer PCM\n"}) {
         EXPECT_TRUE(said(line)) << line << m_out;
     }
+}
+
+// The rules of SigMF's core namespace that concern what kestlog writes.
+void expect_core_rules(const Json& meta) {
+    const Json& global = meta["global"];
+    EXPECT_EQ(meta.size(), 3u);
+    EXPECT_TRUE(meta["annotations"].is_array());
+    EXPECT_TRUE(std::regex_match(global["core:datatype"].get<std::string>(),
+                                 std::regex("(c|r)((f32|f64|i32|i16|u32|u16)(_le|_be)|i8|u8)")));
+    EXPECT_TRUE(std::regex_match(global["core:version"].get<std::string>(),
+                                 std::regex("\\d+\\.\\d+\\.\\d+")));
+    EXPECT_TRUE(global["core:sample_rate"] > 0 && global["core:sample_rate"] <= 1e12);
+    EXPECT_TRUE(global["core:num_channels"].is_number_unsigned());
+    EXPECT_EQ(global["core:dataset"].get<std::string>().find('/'), std::string::npos);
+    EXPECT_FALSE(global.contains("core:metadata_only"));  // not beside a dataset
+    for (const auto& [key, value] : global.items()) {
+        const bool number =
+            key == "core:sample_rate" || key == "core:num_channels" || key == "core:trailing_bytes";
+        EXPECT_TRUE(key.compare(0, 5, "core:") == 0 && (value.is_string() || number)) << key;
+    }
+    ASSERT_EQ(meta["captures"].size(), 1u);
+    EXPECT_EQ(meta["captures"][0]["core:sample_start"], 0);
+}
+
+TEST_F(KestlogStreamsTest, SigmfDescribesACaptureThatStaysWhereItIs) {
+    const std::string stem = INTERNAL + "cp_wcdma/cp_wcdma_wiq_2016-03-01_09-15-00";
+    const std::string told = " --datatype ci16_le --rate 3.84e6 --frequency 2112400000.5";
+    write(stem + ".bin", pattern_bytes(400003, 1));
+    write(INTERNAL + "cp_wcdma/cp_wcdma.version", "MOC\xff\"1\x1b");
+    EXPECT_EQ(run("sigmf " + stem + ".bin" + told), 3);
+    EXPECT_EQ(m_out, stem + ".sigmf-meta: 100000 samples, 0.026042 seconds\n");
+    EXPECT_TRUE(complained("damage: 3 bytes are left behind the last sample of 4 bytes")) << m_err;
+    const Json meta = Json::parse(m_root.read_file(stem + ".sigmf-meta"));
+    expect_core_rules(meta);
+    EXPECT_EQ(meta["global"]["core:dataset"], "cp_wcdma_wiq_2016-03-01_09-15-00.bin");
+    EXPECT_EQ(meta["global"]["core:sample_rate"], 3840000);
+    EXPECT_EQ(meta["global"]["core:trailing_bytes"], 3);
+    EXPECT_EQ(meta["global"]["core:hw"], "cp_wcdma, firmware MOC\u00ff\"1\x1b");
+    EXPECT_EQ(meta["captures"][0]["core:frequency"], 2112400000.5);
+    EXPECT_FALSE(meta["captures"][0].contains("core:datetime"));  // there is no zone
+    EXPECT_NE(meta["global"]["core:description"].get<std::string>().find("2016-03-01 09:15:00"),
+              std::string::npos);
+    EXPECT_EQ(run("sigmf " + stem + ".bin" + told), 4);
+
+    // A renamed capture says nothing of itself.
+    write("caf\u00e9.bin", "12");
+    EXPECT_EQ(run("sigmf --json --force caf* --datatype ri8 --rate 1 --frequency 0"), 0) << m_err;
+    EXPECT_EQ(Json::parse(m_out)["samples"], 2);
+    const Json renamed = Json::parse(m_root.read_file("caf\u00e9.sigmf-meta"));
+    expect_core_rules(renamed);
+    EXPECT_EQ(renamed["global"]["core:dataset"], "caf\u00e9.bin");
+    EXPECT_FALSE(renamed["global"].contains("core:hw"));
+    write(MODEM_DUMP, "12345678");
+    for (const std::string& file : {std::string("caf*"), MODEM_DUMP, std::string("nowhere")}) {
+        EXPECT_EQ(run("sigmf " + file + told + " -o x"), file == "caf*" ? 1 : 2) << file;
+    }
+    write("tiny", "123");
+    EXPECT_EQ(run("sigmf tiny" + told), 2);
+    for (const char* wrong : {"--datatype ci16", "--datatype xi8", "--rate 0", "--rate 2e12",
+                              "--frequency x", "--rate nan", "--datatype ''"}) {
+        EXPECT_EQ(run("sigmf tiny" + told + " " + wrong), 1) << wrong;
+    }
+    EXPECT_EQ(run("sigmf tiny --datatype ci8 --frequency 1"), 1);
 }
 
 }  // namespace

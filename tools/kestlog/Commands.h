@@ -13,6 +13,7 @@ int run_frames(const CommandLine& line);
 int run_extract(const CommandLine& line);
 int run_report(const CommandLine& line);
 int run_join(const CommandLine& line);
+int run_sigmf(const CommandLine& line);
 int run_split(const CommandLine& line);
 int run_export(const CommandLine& line);
 int run_wav(const CommandLine& line);  // only with libsndfile

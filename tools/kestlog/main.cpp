@@ -34,6 +34,7 @@ constexpr Command COMMANDS[] = {
     {"extract", "FILE|ROOT...", 1, ANY, run_extract,
      "write what is in frames to files: memory images, ring buffers, the payloads of a type"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
+    {"sigmf",  "FILE",    1, 1,   run_sigmf,  "write a SigMF meta file beside an I/Q capture"},
 #ifdef KEST_WAV
     {"wav",    "FILE|ROOT...", 1, ANY, run_wav, "write the PCM data of an audio DSP log to a WAV file"},
 #endif
@@ -61,8 +62,10 @@ constexpr Option OPTIONS[] = {
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
     {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
+    {"rate",         "HZ",    "sigmf wav", "samples per second"},
+    {"datatype",     "TYPE",  "sigmf", "of a sample, in SigMF's words: ci16_le, cf32_le, ..."},
+    {"frequency",    "HZ",    "sigmf", "the frequency of the middle of the band"},
 #ifdef KEST_WAV
-    {"rate",         "HZ",    "wav",   "samples per second"},
     {"channels",     "N",     "wav",   "samples of one moment"},
     {"format",       "FORMAT", "wav",  "of a sample: u8, s16le, s16be, s24le ... s32be, f32le, f32be"},
     {"fill-gaps",    nullptr, "wav",   "put silence where chunks are missing"},
@@ -72,8 +75,8 @@ constexpr Option OPTIONS[] = {
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "export extract join report split wav", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "export extract join report split wav", "replace files that exist"},
+    {"output",       "PATH",  "export extract join report sigmf split wav", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "export extract join report sigmf split wav", "replace files that exist"},
 };
 // clang-format on
 

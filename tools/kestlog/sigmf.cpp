@@ -1,0 +1,204 @@
+// SPDX-License-Identifier: Apache-2.0
+// kestlog sigmf: a SigMF meta file for an I/Q capture. The capture stays as it is, a
+// "non-conforming dataset" that core:dataset names, so that nothing large is copied.
+#include <errno.h>
+#include <stdio.h>
+#include <stdlib.h>
+
+#include <algorithm>
+#include <nlohmann/json.hpp>
+
+#include "common/CommandLine.h"
+#include "common/text.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/OutputFile.h"
+#include "kestlog/Problems.h"
+
+namespace {
+
+constexpr char SIGMF_VERSION[] = "1.0.0";
+constexpr double MAX_HERTZ = 1e12;        // of the core namespace
+constexpr size_t MAX_VERSION_LEN = 4096;  // a record of the service is much shorter
+
+struct Settings {
+    std::string datatype;
+    uint64_t sample_bytes;
+    double rate;
+    double frequency;
+};
+
+struct Capture {
+    std::string path;
+    FileName name;
+    uint64_t size;
+};
+
+// The bytes of a sample, 0 when it is no datatype: complex or real, a number type, the byte order
+// of numbers that have one.
+uint64_t sample_bytes(const std::string& datatype) {
+    static const struct {
+        const char* name;
+        uint64_t bytes;
+    } NUMBERS[] = {{"f32", 4}, {"f64", 8}, {"i32", 4}, {"i16", 2},
+                   {"u32", 4}, {"u16", 2}, {"i8", 1},  {"u8", 1}};
+    for (const auto& number : NUMBERS) {
+        for (const char* order : {"", "_le", "_be"}) {
+            if ((number.bytes == 1) == (*order == '\0') &&
+                datatype.substr(std::min<size_t>(1, datatype.size())) ==
+                    std::string(number.name) + order) {
+                return datatype[0] == 'c'   ? 2 * number.bytes
+                       : datatype[0] == 'r' ? number.bytes
+                                            : 0;
+            }
+        }
+    }
+    return 0;
+}
+
+bool read_hertz(const CommandLine& line, const char* option, double least, double* hertz,
+                int* status) {
+    const std::string text = line.value(option, "");
+    char* end;
+    *hertz = strtod(text.c_str(), &end);
+    if (!text.empty() && *end == '\0' && *hertz >= least && *hertz <= MAX_HERTZ) {
+        return true;
+    }
+    *status = line.usage_error("--" + std::string(option) + ": give it in Hz, up to 1e12");
+    return false;
+}
+
+bool read_settings(const CommandLine& line, Settings* settings, int* status) {
+    settings->datatype = line.value("datatype", "");
+    settings->sample_bytes = sample_bytes(settings->datatype);
+    if (settings->sample_bytes == 0) {
+        *status = line.usage_error("--datatype: give one of SigMF, such as ci16_le or cf32_le");
+        return false;
+    }
+    // No rate is 0, a frequency may be.
+    return read_hertz(line, "rate", 1e-6, &settings->rate, status) &&
+           read_hertz(line, "frequency", 0, &settings->frequency, status);
+}
+
+// A whole number without a fraction.
+Json number(double value) {
+    const int64_t whole = static_cast<int64_t>(value);
+    return static_cast<double>(whole) == value ? Json(whole) : Json(value);
+}
+
+// The version record of the CP beside the capture; "" when there is none.
+std::string firmware_version(const Capture& capture, Problems* problems) {
+    const std::string dir = capture.path.substr(0, capture.path.rfind('/') + 1);
+    const std::string path = dir + capture.name.cp + ".version";
+    LogReader in;
+    if (capture.name.cp.empty()) {
+        return "";
+    }
+    if (!in.open(path, false)) {
+        if (errno != ENOENT) {
+            problems->unreadable(path, errno);
+        }
+        return "";
+    }
+    size_t got;
+    const uint8_t* const data = in.peek(MAX_VERSION_LEN, got);
+    if (in.error()) {
+        problems->unreadable(path, in.error());
+    }
+    return std::string(reinterpret_cast<const char*>(data), std::min(got, MAX_VERSION_LEN));
+}
+
+// The dataset's name as it is, if JSON can hold it.
+Json dataset_name(const std::string& name) {
+    const Json text = name;
+    const bool utf8 = Json::parse(text.dump(-1, ' ', false, Json::error_handler_t::ignore)) == text;
+    return utf8 ? text : Json(json_text(name));
+}
+
+Json make_meta(const Capture& capture, const Settings& settings, const std::string& firmware) {
+    const FileName& name = capture.name;
+    std::string description = "I/Q capture";
+    Json global = {{"core:version", SIGMF_VERSION},
+                   {"core:datatype", settings.datatype},
+                   {"core:sample_rate", number(settings.rate)},
+                   {"core:num_channels", 1},
+                   {"core:dataset", dataset_name(name.text)}};
+    if (const uint64_t rest = capture.size % settings.sample_bytes) {
+        global["core:trailing_bytes"] = rest;
+    }
+    global["core:recorder"] = "kestmodem";
+    if (!name.cp.empty()) {
+        description += " of " + name.cp;
+        global["core:hw"] = json_text(name.cp + (firmware.empty() ? "" : ", firmware " + firmware));
+    }
+    // SigMF times are in UTC, and a name does not say the zone: so there is no core:datetime.
+    if (has_time(name.time)) {
+        description += ", begun to be saved at " + time_text(name.time) +
+                       " local time of the handset (its time zone is not known)";
+    }
+    global["core:description"] = description;
+    return {
+        {"global", global},
+        {"captures",
+         Json::array({{{"core:sample_start", 0}, {"core:frequency", number(settings.frequency)}}})},
+        {"annotations", Json::array()}};
+}
+
+void print_result(const Problems& problems, const Capture& capture, const Settings& settings,
+                  const OutputFile& out) {
+    const uint64_t samples = capture.size / settings.sample_bytes;
+    const double seconds = static_cast<double>(samples) / settings.rate;
+    if (problems.json()) {
+        problems.print({{"file", json_text(capture.path)},
+                        {"output", json_text(out.path())},
+                        {"samples", samples},
+                        {"seconds", seconds},
+                        {"trailing_bytes", capture.size % settings.sample_bytes}});
+    } else if (!out.is_standard()) {
+        printf("%s: %llu samples, %.6f seconds\n", escape_text(out.path()).c_str(),
+               static_cast<unsigned long long>(samples), seconds);
+    }
+}
+
+}  // namespace
+
+int run_sigmf(const CommandLine& line) {
+    Settings settings;
+    int status;
+    if (!read_settings(line, &settings, &status)) {
+        return status;
+    }
+    const std::string& path = line.params()[0];
+    LogReader in;
+    if ((status = open_input(in, path)) != ES_OK) {
+        return status;
+    }
+    const Capture capture = {path, FileName(file_part(path)), in.size()};
+    if (capture.name.exact && capture.name.type != LT_WCDMA_IQ) {
+        return failure(ES_UNREADABLE, path + ": not an I/Q capture");
+    }
+    if (capture.size < settings.sample_bytes) {
+        return failure(ES_UNREADABLE, path + ": holds no sample");
+    }
+    const size_t dot = path.rfind('.');
+    const bool extension = dot != std::string::npos && dot > path.rfind('/') + 1;
+    const std::string beside = path.substr(0, extension ? dot : path.size()) + ".sigmf-meta";
+    OutputFile out;
+    if (!out.open(line.value("output", beside), line.has("force"))) {
+        return out.failed();
+    }
+    Problems problems(line.has("json"), out.is_standard() ? stderr : stdout);
+    if (const uint64_t rest = capture.size % settings.sample_bytes) {
+        problems.add(path, {{true, "size",
+                             std::to_string(rest) + " bytes are left behind the last sample of " +
+                                 std::to_string(settings.sample_bytes) + " bytes",
+                             static_cast<int64_t>(capture.size - rest)}});
+    }
+    const Json meta = make_meta(capture, settings, firmware_version(capture, &problems));
+    const std::string text = meta.dump(4, ' ', true) + "\n";
+    if (!out.write(text.data(), text.size()) || !out.close()) {
+        return out.failed();
+    }
+    print_result(problems, capture, settings, out);
+    return problems.status();
+}
