@@ -11,7 +11,7 @@ namespace {
 constexpr size_t SILENCE_STEP = 64 * 1024;  // frames
 
 // clang-format off
-constexpr SampleFormat FORMATS[] = {
+constexpr WavFormat FORMATS[] = {
     {"u8",    SF_FORMAT_PCM_U8, 1, false},
     {"s16le", SF_FORMAT_PCM_16, 2, false},
     {"s16be", SF_FORMAT_PCM_16, 2, true},
@@ -26,8 +26,8 @@ constexpr SampleFormat FORMATS[] = {
 
 }  // namespace
 
-const SampleFormat* find_sample_format(const std::string& name) {
-    for (const SampleFormat& format : FORMATS) {
+const WavFormat* find_wav_format(const std::string& name) {
+    for (const WavFormat& format : FORMATS) {
         if (name == format.name) {
             return &format;
         }
@@ -35,9 +35,9 @@ const SampleFormat* find_sample_format(const std::string& name) {
     return nullptr;
 }
 
-std::string sample_format_names() {
+std::string wav_format_names() {
     std::string names;
-    for (const SampleFormat& format : FORMATS) {
+    for (const WavFormat& format : FORMATS) {
         names += (names.empty() ? "" : ", ") + std::string(format.name);
     }
     return names;
@@ -48,7 +48,7 @@ bool WavFile::fail() {
     return false;
 }
 
-bool WavFile::open(int fd, const SampleFormat& format, int rate, int channels) {
+bool WavFile::open(int fd, const WavFormat& format, int rate, int channels) {
     SF_INFO info = {};
     info.samplerate = rate;
     info.channels = channels;

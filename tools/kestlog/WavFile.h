@@ -11,7 +11,7 @@
 #include <string>
 #include <vector>
 
-struct SampleFormat {
+struct WavFormat {
     const char* name;
     int wav_format;  // of libsndfile
     size_t bytes;    // of a sample
@@ -19,8 +19,8 @@ struct SampleFormat {
 };
 
 // Null when there is none of that name.
-const SampleFormat* find_sample_format(const std::string& name);
-std::string sample_format_names();
+const WavFormat* find_wav_format(const std::string& name);
+std::string wav_format_names();
 
 class WavFile {
 public:
@@ -33,7 +33,7 @@ public:
 
     // Each is false on failure; error() then tells why. The descriptor of an empty file that can
     // be positioned stays the caller's.
-    bool open(int fd, const SampleFormat& format, int rate, int channels);
+    bool open(int fd, const WavFormat& format, int rate, int channels);
     bool write(const uint8_t* data, size_t len);
     bool write_silence(uint64_t frames);
     bool close();
@@ -49,7 +49,7 @@ private:
     bool fail();
 
     SNDFILE* m_file = nullptr;
-    const SampleFormat* m_format = nullptr;
+    const WavFormat* m_format = nullptr;
     size_t m_frame_bytes = 0;  // a sample of each channel
     uint64_t m_frames = 0;
     std::vector<uint8_t> m_pending;  // less than a frame

@@ -25,7 +25,7 @@ namespace {
 constexpr uint64_t MAX_SILENCE_SECONDS = 60;
 
 struct Sound {
-    const SampleFormat* format;
+    const WavFormat* format;
     int rate;
     int channels;
     bool fill_gaps;
@@ -47,10 +47,10 @@ bool read_number(const CommandLine& line, const char* option, int most, int* num
 }
 
 bool read_sound(const CommandLine& line, Sound* sound, int* status) {
-    sound->format = find_sample_format(line.value("format", ""));
+    sound->format = find_wav_format(line.value("format", ""));
     sound->fill_gaps = line.has("fill-gaps");
     if (!sound->format) {
-        *status = line.usage_error("--format: give one of " + sample_format_names());
+        *status = line.usage_error("--format: give one of " + wav_format_names());
         return false;
     }
     if (!line.has("output")) {
