@@ -10,13 +10,17 @@
 
 void LineBuffer::add(uint64_t number, int width) {
     constexpr size_t MAX_DIGITS = 20;
-    char field[2 * MAX_DIGITS];
+    static_assert(2 * MAX_DIGITS <= SLACK, "a number fits");
+    char field[3 * MAX_DIGITS];
     memset(field, ' ', sizeof(field));
     char* const digits = field + MAX_DIGITS;
-    char* const end = std::to_chars(digits, digits + MAX_DIGITS, number).ptr;
-    const size_t len = static_cast<size_t>(end - digits);
+    const size_t len =
+        static_cast<size_t>(std::to_chars(digits, digits + MAX_DIGITS, number).ptr - digits);
     const size_t wide = std::max(len, std::min(static_cast<size_t>(abs(width)), MAX_DIGITS));
-    add({width > 0 ? end - wide : digits, wide});
+    make_room();
+    // Always so many: a copy of a fixed length is faster.
+    memcpy(m_bytes.data() + m_len, width > 0 ? digits + len - wide : digits, 2 * MAX_DIGITS);
+    m_len += wide;
 }
 
 void LineBuffer::add_long(std::string_view text) {
@@ -28,12 +32,7 @@ void LineBuffer::add_long(std::string_view text) {
     }
 }
 
-bool LineBuffer::end_line() {
-    add("\n");
-    return ferror(stdout) == 0;
-}
-
 void LineBuffer::flush() {
-    fwrite(m_bytes.data(), 1, m_len, stdout);
+    m_good = fwrite(m_bytes.data(), 1, m_len, stdout) == m_len && m_good;
     m_len = 0;
 }

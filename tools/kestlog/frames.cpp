@@ -63,7 +63,8 @@ public:
         if (wanted.json) {
             m_file = "\"file\":" + json_string(path) + ",";
         } else {
-            m_out.add(escape_text(path) + ":");
+            m_out.add(std::string_view(escape_text(path)));
+            m_out.add(":");
             m_out.end_line();
         }
     }
@@ -88,9 +89,11 @@ private:
         m_out.add(" bytes");
         if (piece.kind) {
             m_out.add("  ");
-            m_out.add(piece.kind);
+            m_out.add(std::string_view(piece.kind));
         }
-        m_out.add(piece.intact ? "" : "  wrong length");
+        if (!piece.intact) {
+            m_out.add("  wrong length");
+        }
         for (size_t row = 0; m_wanted.hex && row < piece.data_len; row += ROW) {
             m_out.end_line();
             print_row(piece, row);
@@ -100,37 +103,45 @@ private:
     void print_row(const Piece& piece, size_t row) {
         const size_t end = std::min(row + ROW, piece.data_len);
         m_out.add("    ");
-        for (const size_t shift : {16, 8, 0}) {
+        for (const int shift : {16, 8, 0}) {
             m_out.add_hex(static_cast<uint8_t>(row >> shift));
         }
         m_out.add(" ");
         for (size_t i = row; i < row + ROW; ++i) {
             m_out.add(" ");
-            i < end ? m_out.add_hex(piece.data[i]) : m_out.add("  ");
+            if (i < end) {
+                m_out.add_hex(piece.data[i]);
+            } else {
+                m_out.add("  ");
+            }
         }
         m_out.add("  ");
         for (size_t i = row; i < end; ++i) {
             const char c = static_cast<char>(piece.data[i]);
-            m_out.add({c >= 0x20 && c < 0x7f ? &c : ".", 1});
+            m_out.add(std::string_view(c >= 0x20 && c < 0x7f ? &c : ".", 1));
         }
     }
 
     // By hand, as there may be millions. No text in it needs to be escaped but the file's.
     void print_json(const Piece& piece) {
         m_out.add("{");
-        m_out.add(m_file);
-        const std::pair<const char*, uint64_t> numbers[] = {
-            {"\"offset\":", piece.offset},  {",\"seq\":", piece.seq_num},
-            {",\"type\":", piece.type},     {",\"sub_type\":", piece.sub_type},
-            {",\"len\":", piece.len_field}, {",\"payload\":", piece.data_len}};
-        for (const auto& [key, value] : numbers) {
-            m_out.add(key);
-            m_out.add(value);
-        }
-        m_out.add(piece.intact ? ",\"intact\":true" : ",\"intact\":false");
+        m_out.add(std::string_view(m_file));
+        m_out.add("\"offset\":");
+        m_out.add(piece.offset);
+        m_out.add(",\"seq\":");
+        m_out.add(piece.seq_num);
+        m_out.add(",\"type\":");
+        m_out.add(piece.type);
+        m_out.add(",\"sub_type\":");
+        m_out.add(piece.sub_type);
+        m_out.add(",\"len\":");
+        m_out.add(piece.len_field);
+        m_out.add(",\"payload\":");
+        m_out.add(piece.data_len);
+        m_out.add(std::string_view(piece.intact ? ",\"intact\":true" : ",\"intact\":false"));
         if (piece.kind) {
             m_out.add(",\"kind\":\"");
-            m_out.add(piece.kind);
+            m_out.add(std::string_view(piece.kind));
             m_out.add("\"");
         }
         if (m_wanted.hex) {
