@@ -294,6 +294,7 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
               0);
     EXPECT_NE(m_root.read_file("o").find("size            1067\n"), std::string::npos);
     EXPECT_EQ(m_root.read_file("stdin.dump.bin"), LOG_DATA);
+    EXPECT_EQ(run("frames --since 09:15 " + WCN_LOG + " gone"), 2);
     EXPECT_EQ(run("info " + both + " gone"), 2);
     EXPECT_EQ(occurrences(m_out, "kind            log\n"), 2u) << m_out;
 }

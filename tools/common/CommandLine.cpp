@@ -108,7 +108,8 @@ bool CommandLine::parse(int argc, char** argv) {
             }
         }
         if (!taken) {
-            return end(usage_error("--" + given + " is for " + owners + " only"));
+            return end(
+                usage_error(std::string("--").append(given) + " is for " + owners + " only"));
         }
     }
     return true;

@@ -22,6 +22,7 @@ namespace {
 constexpr size_t BLOCK = 256 * 1024;
 constexpr uint64_t MIB = 1024 * 1024;
 constexpr uint64_t MAX_ENTRIES = 1000 * 1000;
+constexpr size_t MAX_DEPTH = 32;  // of directories; a log tree has few
 
 // The parts of an entry's name; empty when it leads out of the directory.
 std::vector<std::string> safe_parts(const std::string& name) {
@@ -124,10 +125,15 @@ private:
         }
         if (archive_entry_hardlink(entry) || archive_entry_symlink(entry) ||
             (archive_entry_filetype(entry) != AE_IFREG && !is_dir)) {
-            if (m_result.strays.size() < MAX_ENTRIES) {
+            if (m_result.strays.size() < Unpacked::MAX_STRAYS) {
                 m_result.strays.push_back(name);
+            } else {
+                ++m_more;
             }
             return;
+        }
+        if (parts.size() > MAX_DEPTH) {
+            return fail(name, "left out: too many directories");
         }
         std::string path = m_dir;
         for (size_t i = 0; i < parts.size(); ++i) {

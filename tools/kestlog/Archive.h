@@ -13,10 +13,11 @@ struct Unpacked {
     bool is_archive = false;
     // A line for each entry that was left out or is damaged: the first MAX_LINES.
     std::vector<std::string> failures;
-    // Names of links and devices, which are left out.
+    // Names of links and devices, which are left out: the first MAX_STRAYS.
     std::vector<std::string> strays;
 
     static constexpr size_t MAX_LINES = 20;
+    static constexpr size_t MAX_STRAYS = 1000;
 };
 
 // Unpacks the file at path, or standard input for "-", into an existing empty directory. limit:

@@ -137,10 +137,11 @@ bool LogTree::add_archive(const std::string& path) {
         return false;
     }
     failures.insert(failures.end(), unpacked.failures.begin(), unpacked.failures.end());
-    for (const std::string& stray : unpacked.strays) {
+    for (const std::string& entry : unpacked.strays) {
         // Elsewhere, as among a handset's devices, they do not matter.
-        if (("/" + stray).find(DIR_MODEM_LOG "/") != std::string::npos) {
-            strays.push_back(path + "/" + stray);
+        const std::string stray = std::string("/").append(entry);
+        if (stray.find(DIR_MODEM_LOG "/") != std::string::npos) {
+            strays.push_back(path + stray);
         }
     }
     m_medium = name;

@@ -25,7 +25,8 @@ int64_t now_ms() {
 }  // namespace
 
 Progress::Progress(uint64_t total, bool talkative)
-    : m_total(total),
+    : m_outer(current),
+      m_total(total),
       m_terminal(isatty(STDERR_FILENO) && !(talkative && isatty(STDOUT_FILENO))),
       m_due_ms(now_ms() + FIRST_MS) {
     current = this;
@@ -33,7 +34,7 @@ Progress::Progress(uint64_t total, bool talkative)
 
 Progress::~Progress() {
     clear();
-    current = nullptr;
+    current = m_outer;
 }
 
 void Progress::advance(uint64_t bytes) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// A line on the terminal that tells how far a long command is, from its second second on. One
-// object at a time; without one, or when standard error is no terminal, nothing is shown.
+// A line on the terminal that tells how far a long command is, from its second second on. Without
+// an object of this class, or when standard error is no terminal, nothing is shown.
 // LogReader counts what it reads, so a command only makes the object.
 #ifndef KESTLOG_PROGRESS_H_
 #define KESTLOG_PROGRESS_H_
@@ -25,6 +25,7 @@ public:
 private:
     void show(int64_t now_ms);
 
+    Progress* const m_outer;  // whose turn it is after this one
     const uint64_t m_total;
     const bool m_terminal;
     uint64_t m_done = 0;

@@ -164,7 +164,9 @@ bool select_files(const CommandLine& line, Args* files, int* status) {
         const auto holds = [&path](const TreeSet& set) {
             return set.shown == path && !set.cps[0].files.empty();
         };
-        if (std::any_of(tree.sets.begin(), tree.sets.end(), holds)) {
+        // One that cannot be read is not left out, but an error.
+        if (access(path.c_str(), R_OK) < 0 ||
+            std::any_of(tree.sets.begin(), tree.sets.end(), holds)) {
             files->push_back(path);
         }
     }
