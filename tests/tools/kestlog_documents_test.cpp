@@ -3,6 +3,7 @@
 #include <fstream>
 #include <map>
 #include <nlohmann/json.hpp>
+#include <regex>
 #include <set>
 #include <sstream>
 
@@ -73,6 +74,21 @@ void flatten(const std::string& name, const Json& json, std::map<std::string, st
     }
 }
 
+// What happens while follow watches, which ends with its reader.
+const std::string CHANGES = R"(modem_log | {
+    upto() { while read -r line; do echo "$line"; case $line in *"$1"*) return;; esac; done; }
+    upto ready
+    cd modem_log && touch sha1.txt && cp -r 2016-03-01-09-15-00 2016-03-01-09-16-00
+    upto '"event":"set"'
+    cd 2016-03-01-09-15-00/agdsp && echo x >0-agdsp-2016-03-01_09-16-00.log
+    echo x >agdsp_memory_2016-03-01_09-15-00.mem
+    upto complete
+    ln -s x link && mv -T link 1-agdsp-2016-03-01_09-00-00.log && rm 0*
+    upto deleted
+    mv ../../2016-03-01-09-16-00 ../../gone
+    upto '"event":"gone"'
+})";
+
 // What makes each command print every kind of line and member that it has.
 const struct {
     const char* command;
@@ -84,6 +100,7 @@ const struct {
     {"frames", {MODEM_LOG, "--hex " + OLD_DSP_LOG + " " + WCN_LOG}},
     {"split", {"-o . " + OLD_DSP_LOG}},
     {"export", {"-o capture ."}},
+    {"follow", {CHANGES}},
 };
 
 TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
@@ -170,14 +187,43 @@ TEST_F(KestlogDocuments, TheManualPageHasEveryCommandAndOption) {
     EXPECT_TRUE(headings.empty()) << *headings.begin() << " is no command";
 }
 
+// Around each example: absolute paths lead into the test's root, what opens a window or is not
+// installed takes what it is given, and while somebody follows, one crash comes after the other.
+const std::string AROUND = R"(set -e -o pipefail
+mkdir -p stubs && PATH=$TOOLS:$PWD/stubs:$PATH
+missing=$(for program in jq tshark sox; do type $program >/dev/null || echo $program; done)
+for program in wireshark xdg-open audacity inspectrum $missing; do
+    printf '#!/bin/sh\n[ ! -p /dev/stdin ] || cat >/dev/null\n' >stubs/$program
+    chmod +x stubs/$program
+done
+crashes() {
+    for time in 1{0..9}-{00..59}-{00..59}; do
+        [ ! -e done ] || return 0
+        cp version $DIR/cp_wcn_memory_2016-03-01_$time.dmp
+    done
+}
+if grep -q ' follow ' example; then
+    crashes &
+fi
+status=0
+bash -o pipefail example || status=$?
+touch done
+wait
+rm -f done $DIR/cp_wcn_memory_2016-03-01_1*
+exit $status
+)";
+
 TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
     write_good_tree();
-    for (const char* line :
-         {"mkdir -p card handset/data && cp -a modem_log card && cp -a modem_log handset/data",
-          "tar czf card.tar.gz card", "find modem_log -name '*.log' -exec cp {} . ';'"}) {
-        ASSERT_EQ(system(("cd " + m_root.root() + " && " + line).c_str()), 0) << line;
-    }
+    write("version", "1");
+    const std::string before =
+        "mkdir -p card handset/data media tmp usr/share && cp -a modem_log card && cp -a modem_log "
+        "handset/data && cp -a modem_log data && cp -a card media && tar czf card.tar.gz card && "
+        "find modem_log -name '*.log' -exec cp {} . ';' && ln -s '" KEST_SOURCE_DIR
+        "/share/kestmodem' usr/share";
+    ASSERT_EQ(system(("cd " + m_root.root() + " && " + before).c_str()), 0);
     const std::string tools = std::string(KESTLOG).substr(0, std::string(KESTLOG).rfind('/'));
+    write("around", "TOOLS='" + tools + "' DIR=data/" + WCN + "\n" + AROUND);
     bool section = false, example = false;
     int examples = 0;
     for (const std::string& line : manual()) {
@@ -186,8 +232,10 @@ TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
         example = line == ".nf" || (example && line != ".fi");
         if (section && example && line[0] != '.') {
             ++examples;
-            write("example", "set -e -o pipefail\nPATH=" + tools + ":$PATH\n" + line + "\n");
-            EXPECT_EQ(system(("cd " + m_root.root() + " && bash example >o 2>&1").c_str()), 0)
+            write("example", std::regex_replace(line, std::regex("(^|[ =:])/(?!dev/)"),
+                                                "$1" + m_root.root() + "/") +
+                                 "\n");
+            EXPECT_EQ(system(("cd " + m_root.root() + " && bash around >o 2>&1").c_str()), 0)
                 << line << "\n"
                 << m_root.read_file("o");
         }

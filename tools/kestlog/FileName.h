@@ -19,6 +19,8 @@ struct FileName {
     // A modem's log files begin with a time record, and its dump consists of frames.
     bool of_modem() const { return cp_type >= CT_WCDMA && cp_type <= CT_5MODE; }
     bool is_log() const { return type == LT_LOG; }
+    // Something that is saved when a CP crashes.
+    bool is_crash() const { return type == LT_DUMP || type == LT_MINI_DUMP || type == LT_IPC_INFO; }
 
     std::string text;
     bool exact = false;  // the name is one that the service creates

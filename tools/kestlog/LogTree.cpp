@@ -16,8 +16,6 @@
 
 namespace {
 
-// Where a handset's root has its card: the mount point that the simulated handset uses, too.
-constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
 constexpr char INTERNAL[] = "internal";
 constexpr char CARD[] = "card";
 

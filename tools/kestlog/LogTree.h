@@ -18,6 +18,9 @@
 #include "kestlog/FileName.h"
 #include "kestlog/TempDir.h"
 
+// Where a handset's root has its card: the mount point that the simulated handset uses, too.
+constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
+
 // A directory with files of the tree. Both end with "/".
 struct TreeDir {
     std::string path;   // where to open the files

@@ -28,9 +28,13 @@ std::string json_text(const std::string& text) {
     return utf8;
 }
 
+std::string json_line(const Json& json) {
+    return json.dump(-1, ' ', true);
+}
+
 void print_json(const Json& json) {
     Progress::clear();
-    printf("%s\n", json.dump(-1, ' ', true).c_str());
+    printf("%s\n", json_line(json).c_str());
 }
 
 Json finding_json(const Finding& finding) {

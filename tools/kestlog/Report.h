@@ -17,7 +17,8 @@ typedef nlohmann::ordered_json Json;
 // Text from a medium as JSON can hold it: each byte is the code point of that number.
 std::string json_text(const std::string& text);
 
-// Prints it in one line of ASCII.
+// It in one line of ASCII, without a line feed; print_json prints it.
+std::string json_line(const Json& json);
 void print_json(const Json& json);
 
 Json finding_json(const Finding& finding);

@@ -28,6 +28,7 @@ constexpr Command COMMANDS[] = {
     {"ls",     "ROOT...", 1, ANY, run_ls,     "list sets, CPs and files with sizes and time spans"},
     {"info",   "FILE...", 1, ANY, run_info,   "print what a file is, its time record, frames and damage"},
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
+    {"follow", "ROOT...", 1, ANY, run_follow, "tell what grows, until Ctrl-C: files, crashes, damage"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
     {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
     {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
@@ -43,12 +44,14 @@ constexpr Command COMMANDS[] = {
 
 // The commands that take a ROOT.
 constexpr char TREES[] = "ls verify report join extract wav export";
-// Those and the commands for which files are chosen by their time.
+// Those and the one that waits for what is still to come.
+constexpr char CARDS[] = "ls verify follow report join extract wav export";
+// The commands for which files are chosen by their time.
 constexpr char TIMES[] = "ls verify frames report join extract wav export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
-    {"card",         "DIR",   TREES,   "the card of the handset whose root is given"},
+    {"card",         "DIR",   CARDS,   "the card of the handset whose root is given"},
     {"since",        "T",     TIMES,   "leave out files that end before T"},
     {"until",        "T",     TIMES,   "leave out files that begin after T"},
     {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},

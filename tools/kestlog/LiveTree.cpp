@@ -1,0 +1,168 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/LiveTree.h"
+
+#include <sys/stat.h>
+
+#include "common/text.h"
+
+LiveEvent LiveTree::ready() const {
+    uint64_t files = 0;
+    uint64_t size = 0;
+    for (const auto& [path, dir] : m_dirs) {
+        for (const auto& [name, file] : dir.files) {
+            ++files;
+            size += file.size;
+        }
+    }
+    LiveEvent event(
+        "ready", "",
+        "following " + count_text(m_sets.size(), "set") + ", " + files_text(files, size));
+    event.json.update({{"sets", m_sets.size()}, {"files", files}, {"size", size}});
+    return event;
+}
+
+LiveTree::Dir* LiveTree::dir(const std::string& path) {
+    const auto it = m_dirs.find(path);
+    return it == m_dirs.end() ? nullptr : &it->second;
+}
+
+void LiveTree::created(Dir& dir, const std::string& name) {
+    struct stat st;
+    // When it is gone the next change says where to.
+    const bool there = lstat((dir.path + "/" + name).c_str(), &st) == 0;
+    if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name)) {
+        return;
+    }
+    add(dir, {FileName(name), there ? static_cast<uint64_t>(st.st_size) : 0}, true);
+}
+
+void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
+    const auto it = dir.files.find(from);
+    if (it == dir.files.end()) {
+        // Known by its new name already, or a stranger's.
+        created(dir, to);
+        closed(dir, to);
+        return;
+    }
+    File file = it->second;
+    const bool was_exact = file.name.exact;
+    file.name = FileName(to);
+    dir.files.erase(it);
+    for (std::set<Place>* places : {&m_closed, &m_written}) {
+        if (places->erase({&dir, from})) {
+            places->insert({&dir, to});
+        }
+    }
+    if (was_exact) {
+        dir.files[to] = file;  // the service counts its files up
+    } else {
+        // What copies a tree gives a file its name when it is whole.
+        dir.files.erase(to);
+        add(dir, file, true);
+        closed(dir, to);
+    }
+}
+
+void LiveTree::removed(Dir& dir, const std::string& name) {
+    const auto it = dir.files.find(name);
+    if (it != dir.files.end()) {
+        ++dir.deleted;
+        dir.deleted_size += it->second.size;
+        dir.files.erase(it);
+        m_closed.erase({&dir, name});
+        m_written.erase({&dir, name});
+    }
+}
+
+void LiveTree::written(Dir& dir, const std::string& name) {
+    const auto it = dir.files.find(name);
+    if (it != dir.files.end()) {
+        it->second.unchecked = true;
+        m_written.insert({&dir, name});
+    }
+}
+
+void LiveTree::closed(Dir& dir, const std::string& name) {
+    written(dir, name);
+    if (dir.files.count(name)) {
+        m_closed.insert({&dir, name});
+    }
+}
+
+// The digest is written last.
+void LiveTree::database_written(const std::string& root) {
+    LiveEvent event("database", "", "new log parsing database in " + escape_text(root));
+    event.json["path"] = json_text(root);
+    m_tell(event);
+}
+
+void LiveTree::add(Dir& dir, const File& file, bool tell) {
+    const auto [it, is_new] = dir.files.insert({file.name.text, file});
+    if (is_new && tell) {
+        it->second.unchecked = true;
+        m_written.insert({&dir, file.name.text});
+        m_sums[cp_of(dir, file)].grown += file.size;
+        tell_new(dir, file);
+    }
+}
+
+void LiveTree::tell_new(Dir& dir, const File& file) {
+    const FileName& name = file.name;
+    const std::string shown = escape_text(name.text);
+    if (name.type == LT_DUMP) {
+        tell("crash", dir, file, std::string(name.kind) + " begins: " + shown,
+             {{"state", "begins"}});
+        return;
+    }
+    if (name.is_crash() || !name.exact) {
+        return;  // told when it is complete
+    }
+    File* before = nullptr;
+    for (auto& [other_name, other] : dir.files) {
+        if (name.is_log() && name.number == 0 && other.name.is_log() && other.name.number > 0 &&
+            (!before || other.name.number < before->name.number)) {
+            before = &other;
+        }
+    }
+    if (!before) {
+        tell("file", dir, file, std::string("new ") + name.kind + ": " + shown, Json::object());
+        return;
+    }
+    look(dir, *before);
+    tell("rotation", dir, file,
+         "rotation: " + shown + " follows " + escape_text(before->name.text) + ", " +
+             size_text(before->size),
+         {{"before", json_text(before->name.text)}, {"before_size", before->size}});
+}
+
+void LiveTree::tell(const char* event, const Dir& dir, const File& file, const std::string& words,
+                    const Json& more) {
+    const std::string& cp = cp_of(dir, file);
+    LiveEvent told(event, dir.medium + " " + cp, words);
+    told.json.update({{"medium", json_text(dir.medium)},
+                      {"set", json_text(dir.set)},
+                      {"cp", json_text(cp)},
+                      {"file", json_text(file.name.text)},
+                      {"kind", file.name.kind},
+                      {"size", file.size}});
+    told.json.update(more);
+    m_tell(told);
+}
+
+void LiveTree::tell_damage(const Dir& dir, const File& file, const Finding& finding) {
+    tell("damage", dir, file, escape_text(file.name.text) + ": " + finding_text(finding),
+         finding_json(finding));
+}
+
+void LiveTree::tell_deleted(Dir& dir) {
+    LiveEvent event("deleted", dir.medium + " " + dir.cp,
+                    files_text(dir.deleted, dir.deleted_size) + " deleted");
+    event.json.update({{"medium", json_text(dir.medium)},
+                       {"set", json_text(dir.set)},
+                       {"cp", json_text(dir.cp)},
+                       {"files", dir.deleted},
+                       {"size", dir.deleted_size}});
+    dir.deleted = dir.deleted_size = 0;
+    m_tell(event);
+}

@@ -1,0 +1,107 @@
+// SPDX-License-Identifier: Apache-2.0
+// What kestlog follow knows of the files in the log trees, and what it tells about their changes.
+// The tree as it was read (take) and the changes that the kernel reports (created, moved, ...)
+// may overlap in any way: nothing is told twice. Owns no descriptor and waits for nothing.
+#ifndef KESTLOG_LIVETREE_H_
+#define KESTLOG_LIVETREE_H_
+
+#include <signal.h>
+#include <stdint.h>
+
+#include <functional>
+#include <map>
+#include <set>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "kestlog/FileScan.h"
+#include "kestlog/LiveEvent.h"
+#include "kestlog/LogTree.h"
+
+class LiveTree {
+public:
+    struct File {
+        FileName name{""};
+        uint64_t size = 0;
+        bool unchecked = false;         // written to since it was last checked
+        uint64_t checked = UINT64_MAX;  // its size when it was checked after it was closed
+    };
+    // A CP's directory. One that is gone is kept: a card that comes back is no news.
+    struct Dir {
+        std::string path, medium, set;
+        std::string cp;  // the directory's own name
+        bool present = false;
+        std::map<std::string, File> files;  // by name
+        uint64_t deleted = 0;               // files, not yet told
+        uint64_t deleted_size = 0;
+    };
+    // Of all files of a CP.
+    struct Sum {
+        uint64_t files = 0;
+        uint64_t size = 0;
+        uint64_t grown = 0;   // bytes since the last sums
+        FileName newest{""};  // of the log files
+    };
+
+    // A check of a file's content ends early when *stop becomes other than 0.
+    LiveTree(std::function<void(const LiveEvent&)> tell, const volatile sig_atomic_t* stop)
+        : m_tell(std::move(tell)), m_stop(*stop) {}
+
+    // The tree, and the log roots and ROOTs, as they are now. Tells what is new, but nothing the
+    // first time; of a medium that appears with old sets only the sets, and the files of the
+    // newest.
+    void take(const LogTree& tree, const std::set<std::string>& roots);
+    // What is known of all files: for the first line.
+    LiveEvent ready() const;
+
+    // The directory that was taken with this path, or null.
+    Dir* dir(const std::string& path);
+    // Changes of one file.
+    void created(Dir& dir, const std::string& name);
+    void moved(Dir& dir, const std::string& from, const std::string& to);
+    void removed(Dir& dir, const std::string& name);
+    void written(Dir& dir, const std::string& name);
+    void closed(Dir& dir, const std::string& name);  // after it was written to
+    void database_written(const std::string& root);
+
+    // For when no more changes are known: checks the files that were closed and tells what was
+    // deleted.
+    void settle();
+    // At the end: checks what was written to and is still open.
+    void check_open();
+    // By CP. Looks at the sizes of the files that were written to.
+    std::map<std::string, Sum> sums();
+
+private:
+    // That a file belongs to: in a renamed directory its own name tells.
+    static const std::string& cp_of(const Dir& dir, const File& file) {
+        return cp_type_of(dir.cp) == CT_UNKNOWN && !file.name.cp.empty() ? file.name.cp : dir.cp;
+    }
+    typedef std::pair<Dir*, std::string> Place;  // a file's directory and name
+
+    void take_roots(const std::set<std::string>& roots, bool tell);
+    void leave(const std::set<std::string>& sets, const std::set<std::string>& dirs);
+    void tell_set(const TreeSet& set);
+    void take_files(Dir& dir, const std::vector<TreeFile>& files, bool tell);
+    void add(Dir& dir, const File& file, bool tell);
+    void tell_new(Dir& dir, const File& file);
+    void tell_deleted(Dir& dir);
+    void tell(const char* event, const Dir& dir, const File& file, const std::string& words,
+              const Json& more);
+    void tell_damage(const Dir& dir, const File& file, const Finding& finding);
+    bool check(Dir& dir, File& file, bool is_closed);
+    void look(Dir& dir, File& file);
+
+    const std::function<void(const LiveEvent&)> m_tell;
+    const volatile sig_atomic_t& m_stop;
+    bool m_taken = false;
+    std::set<std::string> m_roots;
+    std::map<std::string, bool> m_sets;  // by path, and whether it is there
+    std::map<std::string, Dir> m_dirs;
+    std::set<Place> m_closed;   // to be checked
+    std::set<Place> m_written;  // to be looked at
+    std::map<std::string, Sum> m_sums;
+};
+
+#endif  // KESTLOG_LIVETREE_H_

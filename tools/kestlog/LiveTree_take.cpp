@@ -1,0 +1,178 @@
+// SPDX-License-Identifier: Apache-2.0
+// Comparing the tree as it was read with what is known of it.
+#include <algorithm>
+
+#include "common/text.h"
+#include "kestlog/LiveTree.h"
+
+namespace {
+
+std::string parent(const std::string& path) {
+    return path.substr(0, path.rfind('/'));
+}
+
+// Log files are told apart by what the service's counting up leaves as it is.
+std::string lasting_name(const FileName& name) {
+    return name.is_log() ? name.text.substr(name.text.find('-')) : name.text;
+}
+
+}  // namespace
+
+void LiveTree::take(const LogTree& tree, const std::set<std::string>& roots) {
+    const bool tell = m_taken;
+    m_taken = true;
+    std::set<std::string> sets, dirs;
+    std::map<std::string, std::string> newest;  // set of each log root
+    for (const TreeSet& set : tree.sets) {
+        sets.insert(set.shown);
+        newest[parent(set.shown)] = set.shown;
+        for (const TreeCp& cp : set.cps) {
+            dirs.insert(cp.shown);
+        }
+    }
+    take_roots(roots, tell);
+    leave(sets, dirs);
+    for (const TreeSet& set : tree.sets) {
+        const bool is_new = m_sets.count(set.shown) == 0;
+        m_sets[set.shown] = true;
+        if (is_new && tell) {
+            tell_set(set);
+        }
+        // A renamed directory may hold the files of several CPs.
+        std::map<std::string, std::vector<TreeFile>> files;
+        for (const TreeCp& cp : set.cps) {
+            std::vector<TreeFile>& all = files[cp.shown];
+            all.insert(all.end(), cp.files.begin(), cp.files.end());
+        }
+        for (const auto& [path, all] : files) {
+            Dir& dir = m_dirs[path];
+            dir.path = path;
+            dir.medium = set.medium;
+            dir.set = set.name;
+            dir.cp = file_part(path);
+            dir.present = true;
+            take_files(dir, all, tell && (!is_new || newest[parent(set.shown)] == set.shown));
+        }
+    }
+}
+
+// What lies in one that is told already is not told, too.
+void LiveTree::take_roots(const std::set<std::string>& roots, bool tell) {
+    const auto tell_others = [this](const char* name, const char* words,
+                                    const std::set<std::string>& all,
+                                    const std::set<std::string>& known) {
+        std::string told;
+        for (const std::string& root : all) {
+            if (known.count(root) == 0 && (told.empty() || root.find(told + "/") != 0)) {
+                told = root;
+                LiveEvent event(name, "", escape_text(root) + words);
+                event.json["path"] = json_text(root);
+                m_tell(event);
+            }
+        }
+    };
+    if (tell) {
+        tell_others("gone", " is gone", m_roots, roots);
+        tell_others("root", " is there", roots, m_roots);
+    }
+    m_roots = roots;
+}
+
+// Of a log root that is gone the sets are not told, too.
+void LiveTree::leave(const std::set<std::string>& sets, const std::set<std::string>& dirs) {
+    for (auto& [path, present] : m_sets) {
+        if (!present || sets.count(path)) {
+            continue;
+        }
+        present = false;
+        if (m_roots.count(parent(path))) {
+            LiveEvent event("gone", "", escape_text(path) + " is gone");
+            event.json["path"] = json_text(path);
+            m_tell(event);
+        }
+    }
+    for (auto& [path, dir] : m_dirs) {
+        if (dir.present && dirs.count(path) == 0) {
+            dir.present = false;
+            for (const auto& [name, file] : dir.files) {
+                m_closed.erase({&dir, name});
+                m_written.erase({&dir, name});
+            }
+        }
+    }
+}
+
+void LiveTree::tell_set(const TreeSet& set) {
+    uint64_t files = 0;
+    uint64_t size = 0;
+    for (const TreeCp& cp : set.cps) {
+        for (const TreeFile& file : cp.files) {
+            ++files;
+            size += file.size;
+        }
+    }
+    const std::string name = set.name.empty() ? set.shown : set.name;
+    LiveEvent event("set", set.medium,
+                    "new set: " + escape_text(name) + ", " + files_text(files, size));
+    event.json.update({{"medium", json_text(set.medium)},
+                       {"set", json_text(set.name)},
+                       {"path", json_text(set.shown)},
+                       {"files", files},
+                       {"size", size}});
+    m_tell(event);
+}
+
+// The service may have renamed, deleted and created files since they were looked at.
+void LiveTree::take_files(Dir& dir, const std::vector<TreeFile>& files, bool tell) {
+    std::map<std::string, std::vector<File>> known;  // by lasting name, the newest last
+    for (const auto& [name, file] : dir.files) {
+        known[lasting_name(file.name)].push_back(file);
+    }
+    for (auto& [name, list] : known) {
+        std::sort(list.begin(), list.end(),
+                  [](const File& a, const File& b) { return a.name.number > b.name.number; });
+    }
+    std::vector<File> fresh;
+    std::map<std::string, File> before;
+    before.swap(dir.files);
+    for (const TreeFile& seen : files) {  // oldest first
+        std::vector<File>& list = known[lasting_name(seen.name)];
+        if (list.empty()) {
+            fresh.push_back({seen.name, seen.size});
+            continue;
+        }
+        File file = list.front();
+        list.erase(list.begin());
+        for (std::set<Place>* places : {&m_closed, &m_written}) {
+            if (file.name.text != seen.name.text && places->erase({&dir, file.name.text})) {
+                places->insert({&dir, seen.name.text});
+            }
+        }
+        const bool counted_up = file.name.number == 0 && seen.name.number > 0;
+        file.name = seen.name;
+        dir.files[seen.name.text] = file;
+        if (file.size != seen.size) {
+            written(dir, seen.name.text);
+        }
+        if (counted_up && dir.files[seen.name.text].unchecked) {
+            closed(dir, seen.name.text);
+        }
+    }
+    for (const auto& [name, list] : known) {
+        for (const File& file : list) {
+            ++dir.deleted;
+            dir.deleted_size += file.size;
+            m_closed.erase({&dir, file.name.text});
+            m_written.erase({&dir, file.name.text});
+        }
+    }
+    for (const File& file : fresh) {
+        add(dir, file, tell);
+        // Whether it was closed meanwhile is not known; a file that the service has counted up,
+        // or writes in one go, was.
+        if (tell && file.size > 0 &&
+            (file.name.is_log() ? file.name.number > 0 : file.name.type != LT_DUMP)) {
+            closed(dir, file.name.text);
+        }
+    }
+}
