@@ -21,6 +21,8 @@
 #include <map>
 #include <vector>
 
+#include "core/SavedErrno.h"
+#include "sim/calls.h"
 #include "simulation/Ledger.h"
 #include "simulation/SavingThread.h"
 #include "simulation/World.h"
@@ -163,13 +165,8 @@ bool exists(const char* path) {
 }
 
 int result_of(const char* name, const char* path, int result) {
-    const int error = errno;
-    {
-        const Outside outside;
-        trace("%s %s = %d%s%s", name, without_root(path).c_str(), result < 0 ? -1 : 0,
-              result < 0 ? " " : "", result < 0 ? strerror(error) : "");
-    }
-    errno = error;
+    trace("%s %s = %d%s%s", name, path, result < 0 ? -1 : 0, result < 0 ? " " : "",
+          result < 0 ? strerror(errno) : "");
     return result;
 }
 
@@ -222,31 +219,23 @@ ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
 ssize_t write_to_medium(int fd, const struct iovec* pieces, int count, int fault) {
     FdInfo& info = g_fds[fd];
     const Outside outside;
-    std::vector<uint8_t> joined;
-    const uint8_t* data = static_cast<const uint8_t*>(pieces[0].iov_base);
-    size_t len = pieces[0].iov_len;
-    if (count > 1) {
-        for (int i = 0; i < count; ++i) {
-            const uint8_t* const piece = static_cast<const uint8_t*>(pieces[i].iov_base);
-            joined.insert(joined.end(), piece, piece + pieces[i].iov_len);
-        }
-        data = joined.data();
-        len = joined.size();
+    std::vector<uint8_t> data;
+    for (int i = 0; i < count; ++i) {
+        const uint8_t* const piece = static_cast<const uint8_t*>(pieces[i].iov_base);
+        data.insert(data.end(), piece, piece + pieces[i].iov_len);
     }
-    ssize_t n = taken_by_medium(info, len, fault);
+    ssize_t n = taken_by_medium(info, data.size(), fault);
     if (n > 0) {
-        n = write(fd, data, static_cast<size_t>(n));
+        n = write(fd, data.data(), static_cast<size_t>(n));
     }
     if (n > 0 && info.cls == FD_LOG_FILE) {
-        ledger::file_written(info, data, static_cast<size_t>(n));
+        ledger::file_written(info, data.data(), static_cast<size_t>(n));
     }
     if (info.cls == FD_IQ_FILE) {
-        IqDevice::written(data, n);
+        IqDevice::written(data.data(), n);
         info.position += n > 0 ? static_cast<uint64_t>(n) : 0;
     }
-    const int error = errno;
     trace("write %s %zd", info.cls == FD_LOG_FILE ? "log" : "file", n);
-    errno = error;
     return n;
 }
 
@@ -270,25 +259,18 @@ void print_traces_to(int fd) {
 
 void trace(const char* format, ...) {
     const Outside outside;
+    const SavedErrno keep;
     char text[1200];
     va_list args;
     va_start(args, format);
-    int len = vsnprintf(text, sizeof(text) - 1, format, args);
+    vsnprintf(text, sizeof(text), format, args);
     va_end(args);
-    const std::string cut = without_root(std::string(text).substr(0, sizeof(text) - 2).c_str());
-    len = static_cast<int>(cut.size());
-    memcpy(text, cut.data(), cut.size());
-    text[len] = '\n';
-    uint64_t digest = g_state->digest;
-    for (int i = 0; i <= len; ++i) {
-        digest = (digest ^ static_cast<uint8_t>(text[i])) * 0x100000001b3u;
+    const std::string line = without_root(text) + "\n";
+    for (char c : line) {
+        g_state->digest = (g_state->digest ^ static_cast<uint8_t>(c)) * 0x100000001b3u;
     }
-    g_state->digest = digest;
     if (s_trace_fd >= 0) {
-        dprintf(s_trace_fd, "%10.3f ", static_cast<double>(g_state->boot_ns) / 1e9);
-        if (write(s_trace_fd, text, static_cast<size_t>(len) + 1) < 0) {
-            s_trace_fd = -1;
-        }
+        dprintf(s_trace_fd, "%10.3f %s", static_cast<double>(g_state->boot_ns) / 1e9, line.c_str());
     }
 }
 
@@ -333,11 +315,22 @@ void fail_run(const char* failure_class, const char* format, ...) {
     }                                                                        \
     static result inside_##name(__VA_ARGS__)
 
-// A call that fails by a rule, and else does what it always does.
-#define WITH_FAULTS(name, call, place, arguments, ...)              \
-    WRAPPED(int, name, __VA_ARGS__) {                               \
-        const int fault = g_inside ? begin(call, place) : 0;        \
-        return fault > 0 ? failed(fault) : __real_##name arguments; \
+// The same, for one that may fail by a rule. Its body knows of a SHORT_COUNT by fault.
+#define FALLIBLE(result, name, call, place, arguments, ...)                      \
+    static result allowed_##name(int fault, __VA_ARGS__);                        \
+    INSIDE(result, name, arguments, __VA_ARGS__) {                               \
+        const int fault = begin(call, place);                                    \
+        errno = fault > 0 ? fault : errno;                                       \
+        return fault > 0 ? faults::failure<result>()                             \
+                         : allowed_##name(fault, WITHOUT_PARENTHESES arguments); \
+    }                                                                            \
+    static result allowed_##name([[maybe_unused]] int fault, __VA_ARGS__)
+#define WITHOUT_PARENTHESES(...) __VA_ARGS__
+
+// And one that else does what it always does.
+#define WITH_FAULTS(name, call, place, arguments, ...)         \
+    FALLIBLE(int, name, call, place, arguments, __VA_ARGS__) { \
+        return __real_##name arguments;                        \
     }
 
 // ---- Time
@@ -441,11 +434,8 @@ INSIDE(int, close, (fd), int fd) {
     return error > 0 ? failed(error) : result;
 }
 
-INSIDE(ssize_t, read, (fd, data, len), int fd, void* data, size_t len) {
-    const int fault = begin(CALL_READ, place_of_fd(fd));
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(ssize_t, read, CALL_READ, place_of_fd(fd), (fd, data, len), int fd, void* data,
+         size_t len) {
     FdInfo& info = g_fds[fd];
     if (info.failed) {
         world().reading_failed();
@@ -499,20 +489,13 @@ INSIDE(ssize_t, write, (fd, data, len), int fd, const void* data, size_t len) {
     return __real_write(fd, data, cut ? len / 2 : len);
 }
 
-WRAPPED(ssize_t, writev, int fd, const struct iovec* pieces, int count) {
-    if (!g_inside || !on_medium(g_fds[fd].place)) {
-        return __real_writev(fd, pieces, count);
-    }
-    const int fault = begin(CALL_WRITE, place_of_fd(fd));
-    return fault > 0 ? failed(fault) : write_to_medium(fd, pieces, count, fault);
+FALLIBLE(ssize_t, writev, CALL_WRITE, place_of_fd(fd), (fd, pieces, count), int fd,
+         const struct iovec* pieces, int count) {
+    return write_to_medium(fd, pieces, count, fault);
 }
 
-INSIDE(ssize_t, pwrite, (fd, data, len, offset), int fd, const void* data, size_t len,
-       off_t offset) {
-    const int fault = begin(CALL_WRITE, place_of_fd(fd));
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(ssize_t, pwrite, CALL_WRITE, place_of_fd(fd), (fd, data, len, offset), int fd,
+         const void* data, size_t len, off_t offset) {
     return __real_pwrite(fd, data, fault == SHORT_COUNT && len > 1 ? len / 2 : len, offset);
 }
 
@@ -543,8 +526,9 @@ INSIDE(int, ioctl, (fd, request, argument), int fd, unsigned long request, unsig
     return world().iq().control(request, argument);
 }
 
-WRAPPED(void*, mmap, void* address, size_t len, int protection, int flags, int fd, off_t offset) {
-    if (!g_inside || fd < 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
+INSIDE(void*, mmap, (address, len, protection, flags, fd, offset), void* address, size_t len,
+       int protection, int flags, int fd, off_t offset) {
+    if (fd < 0 || g_fds[fd].cls != FD_IQ_DEVICE) {
         return __real_mmap(address, len, protection, flags, fd, offset);
     }
     if (const int fault = begin(CALL_MMAP, PLACE_DEVICE)) {
@@ -570,25 +554,20 @@ INSIDE(int, pthread_join, (id, result), pthread_t id, void** result) {
     return world().thread().join(id);
 }
 
-WRAPPED(int, socketpair, int domain, int type, int protocol, int* pair) {
-    const int fault = g_inside ? begin(CALL_SOCKET, PLACE_OTHER) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(int, socketpair, CALL_SOCKET, PLACE_OTHER, (domain, type, protocol, pair), int domain,
+         int type, int protocol, int* pair) {
     const int result = __real_socketpair(domain, type, protocol, pair);
-    if (g_inside && result == 0) {
+    if (result == 0) {
         remember_fd(pair[0], FD_THREAD, PLACE_OTHER);
         remember_fd(pair[1], FD_THREAD, PLACE_OTHER);
     }
     return result;
 }
 
-WRAPPED(int, shutdown, int fd, int how) {
-    if (g_inside) {
-        begin(CALL_COUNT, PLACE_OTHER);
-    }
+INSIDE(int, shutdown, (fd, how), int fd, int how) {
+    begin(CALL_COUNT, PLACE_OTHER);
     const int result = __real_shutdown(fd, how);
-    if (g_inside && !SavingThread::here()) {
+    if (!SavingThread::here()) {
         world().thread().wake();
     }
     return result;
@@ -596,13 +575,10 @@ WRAPPED(int, shutdown, int fd, int how) {
 
 // ---- Names
 
-WRAPPED(int, stat, const char* path, struct stat* st) {
-    const int fault = g_inside ? begin(CALL_STAT, world().place_of(path)) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(int, stat, CALL_STAT, world().place_of(path), (path, st), const char* path,
+         struct stat* st) {
     const int result = __real_stat(path, st);
-    if (g_inside && result == 0) {
+    if (result == 0) {
         world().set_times(path, *st);
     }
     return result;
@@ -612,13 +588,9 @@ WITH_FAULTS(lstat, CALL_STAT, world().place_of(path), (path, st), const char* pa
 WITH_FAULTS(fstatat, CALL_STAT, place_of_fd(fd), (fd, name, st, flags), int fd, const char* name,
             struct stat* st, int flags)
 
-WRAPPED(int, fstat, int fd, struct stat* st) {
-    const int fault = g_inside ? begin(CALL_STAT, place_of_fd(fd)) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(int, fstat, CALL_STAT, place_of_fd(fd), (fd, st), int fd, struct stat* st) {
     const int result = __real_fstat(fd, st);
-    if (g_inside && result == 0 && g_fds[fd].place == PLACE_PROPS) {
+    if (result == 0 && g_fds[fd].place == PLACE_PROPS) {
         world().set_times("", *st);
     }
     return result;
@@ -659,8 +631,8 @@ INSIDE(int, unlink, (path), const char* path) {
     return result_of("unlink", path, __real_unlink(path));
 }
 
-WRAPPED(int, mkdir, const char* path, mode_t mode) {
-    if (!g_inside || exists(path)) {
+INSIDE(int, mkdir, (path, mode), const char* path, mode_t mode) {
+    if (exists(path)) {
         return __real_mkdir(path, mode);
     }
     world().set_begins(path);
@@ -680,12 +652,7 @@ INSIDE(int, system, (command), const char* command) {
     return fault > 0 ? failed(fault) : world().remove_by_shell(command);
 }
 
-INSIDE(DIR*, opendir, (path), const char* path) {
-    const int fault = begin(CALL_OPENDIR, world().place_of(path));
-    if (fault > 0) {
-        errno = fault;
-        return nullptr;
-    }
+FALLIBLE(DIR*, opendir, CALL_OPENDIR, world().place_of(path), (path), const char* path) {
     const Outside outside;
     DIR* const dir = opendir(path);
     if (dir) {
@@ -709,54 +676,41 @@ INSIDE(struct dirent*, readdir, (dir), DIR* dir) {
     return listing.second < listing.first.size() ? &listing.first[listing.second++] : nullptr;
 }
 
-WRAPPED(int, closedir, DIR* dir) {
-    if (g_inside) {
-        begin(CALL_CLOSE, place_of_fd(dirfd(dir)));
-        forget_fd(dirfd(dir));
-        s_dirs.erase(dir);
-    }
+INSIDE(int, closedir, (dir), DIR* dir) {
+    begin(CALL_CLOSE, place_of_fd(dirfd(dir)));
+    forget_fd(dirfd(dir));
+    s_dirs.erase(dir);
     return __real_closedir(dir);
 }
 
 // ---- Sockets
 
-WRAPPED(int, socket, int domain, int type, int protocol) {
-    const int fault = g_inside ? begin(CALL_SOCKET, PLACE_SOCKET) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(int, socket, CALL_SOCKET, PLACE_SOCKET, (domain, type, protocol), int domain, int type,
+         int protocol) {
     const int fd = __real_socket(domain, type, protocol);
-    if (g_inside && fd >= 0) {
+    if (fd >= 0) {
         remember_fd(fd, FD_CONNECTION, PLACE_SOCKET);
     }
     return fd;
 }
 
-WRAPPED(int, listen, int fd, int backlog) {
-    if (g_inside) {
-        g_fds[fd].cls = FD_SERVER;
-    }
+INSIDE(int, listen, (fd, backlog), int fd, int backlog) {
+    g_fds[fd].cls = FD_SERVER;
     return __real_listen(fd, backlog);
 }
 
-WRAPPED(int, connect, int fd, const struct sockaddr* address, socklen_t len) {
-    const int fault = g_inside ? begin(CALL_CONNECT, PLACE_SOCKET) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
-    if (g_inside && !(__real_fcntl(fd, F_GETFL, 0) & O_NONBLOCK)) {
+FALLIBLE(int, connect, CALL_CONNECT, PLACE_SOCKET, (fd, address, len), int fd,
+         const struct sockaddr* address, socklen_t len) {
+    if (!(__real_fcntl(fd, F_GETFL, 0) & O_NONBLOCK)) {
         fail_run("hang", "blocking connect");
     }
     return __real_connect(fd, address, len);
 }
 
-WRAPPED(int, accept4, int fd, struct sockaddr* address, socklen_t* len, int flags) {
-    const int fault = g_inside ? begin(CALL_ACCEPT, PLACE_SOCKET) : 0;
-    if (fault > 0) {
-        return failed(fault);
-    }
+FALLIBLE(int, accept4, CALL_ACCEPT, PLACE_SOCKET, (fd, address, len, flags), int fd,
+         struct sockaddr* address, socklen_t* len, int flags) {
     const int client = __real_accept4(fd, address, len, flags);
-    if (g_inside && client >= 0) {
+    if (client >= 0) {
         remember_fd(client, FD_CLIENT, PLACE_SOCKET);
         world().progress();
     }
