@@ -176,16 +176,6 @@ void forget_fd(int fd) {
     }
 }
 
-FdInfo& remember_fd(int fd, FdClass cls, Place place) {
-    if (fd >= MAX_FDS) {
-        fail_run("leak", "descriptor %d", fd);
-    }
-    g_fds[fd] = FdInfo();
-    g_fds[fd].cls = cls;
-    g_fds[fd].place = place;
-    return g_fds[fd];
-}
-
 // How many of the bytes a medium takes now; -1 with errno when it takes none.
 ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
     State& state = *g_state;
@@ -252,6 +242,16 @@ ssize_t write_to_thread(int fd, uint8_t byte) {
 }
 
 }  // namespace
+
+FdInfo& remember_fd(int fd, FdClass cls, Place place) {
+    if (fd >= MAX_FDS) {
+        fail_run("leak", "descriptor %d", fd);
+    }
+    g_fds[fd] = FdInfo();
+    g_fds[fd].cls = cls;
+    g_fds[fd].place = place;
+    return g_fds[fd];
+}
 
 void print_traces_to(int fd) {
     s_trace_fd = fd;

@@ -89,6 +89,7 @@ struct FdInfo {
 
 constexpr int MAX_FDS = 1024;
 extern FdInfo g_fds[MAX_FDS];
+FdInfo& remember_fd(int fd, FdClass cls, Place place);
 extern State* g_state;
 extern __thread bool g_inside;  // the service is running, not the simulation
 extern bool g_plan_over;        // the loop shall not be run once more

@@ -43,7 +43,7 @@ Setting* setting_of(unsigned what) {
     return what < LOGGED ? &g_state->settings[what] : &g_state->streams[what - LOGGED].logged;
 }
 
-const char* const STREAM_NAMES[CHANNEL_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
+const char* const CP_NAMES[CHANNEL_COUNT] = {"WCDMA", "WCN", "GNSS", "AG-DSP"};
 
 std::vector<Request> make_requests() {
     std::vector<Request> requests = {
@@ -82,7 +82,7 @@ std::vector<Request> make_requests() {
         {"FLUSH now", WRONG, 1, 0},
     };
     for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
-        const std::string name = STREAM_NAMES[stream];
+        const std::string name = CP_NAMES[stream];
         // As often as it is switched off and looked at, so that most streams flow.
         requests.push_back({"ENABLE_LOG " + name, SETS, LOGGED + stream, 1});
         requests.push_back({"ENABLE_LOG " + name, SETS, LOGGED + stream, 1});

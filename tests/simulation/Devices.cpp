@@ -33,11 +33,7 @@ std::vector<uint8_t> noise(Chance& chance, size_t len) {
 }
 
 std::vector<uint8_t> frame(uint8_t type, uint8_t sub_type, std::vector<uint8_t> payload) {
-    DiagFrame frame;
-    frame.type = type;
-    frame.sub_type = sub_type;
-    frame.payload = std::move(payload);
-    return frame.encode();
+    return DiagFrame{0, type, sub_type, std::move(payload)}.encode();
 }
 
 std::vector<uint8_t> text(const char* words) {
@@ -75,9 +71,7 @@ int Devices::open_pair(FdClass cls, int* peer) {
     // The number has to be the same each time: the lowest free one is the service's.
     const int fd = std::min(pair[0], pair[1]);
     *peer = std::max(pair[0], pair[1]);
-    g_fds[fd] = FdInfo();
-    g_fds[fd].cls = cls;
-    g_fds[fd].place = PLACE_DEVICE;
+    remember_fd(fd, cls, PLACE_DEVICE);
     return fd;
 }
 
@@ -157,8 +151,7 @@ void Devices::pump_answers(End& end) {
         Piece& piece = end.answers.front();
         const ssize_t n = send(end.peer, piece.bytes.data(), piece.bytes.size(), MSG_NOSIGNAL);
         if (n < 0 && errno != EAGAIN) {
-            drop(end);
-            return;
+            return drop(end);
         }
         if (n > 0) {
             end.on_the_way.push_back({false, static_cast<size_t>(n)});
@@ -247,8 +240,7 @@ void Devices::answer(End& end, unsigned stream, uint8_t type, bool dump) {
         return;
     }
     if (how == REFUSING && !dump) {
-        add(frame(type, SUB_REFUSED, {}), 0);
-        return;
+        return add(frame(type, SUB_REFUSED, {}), 0);
     }
     const size_t frames = 1 + chance.below(20);
     for (size_t i = 0; i < frames; ++i) {

@@ -25,9 +25,6 @@ constexpr uint64_t CHANCE = 8;
 // A slice of fewer bytes may hold no whole word of the stream.
 constexpr size_t LOCATABLE = 15;
 
-const char* const NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
-                                         "agdsp",    "DSP PCM", "DSP dump"};
-
 // Whether the stream has to be read now, for certain.
 bool is_logged(unsigned stream) {
     const Setting& logged = g_state->streams[std::min<unsigned>(stream, ST_DSP)].logged;
@@ -37,11 +34,11 @@ bool is_logged(unsigned stream) {
 void gap(unsigned stream, uint64_t to) {
     StreamState& s = g_state->streams[stream];
     const uint64_t len = to - s.written;
-    trace("lost %s %llu bytes at %llu", NAMES[stream], number(len), number(s.written));
+    trace("lost %s %llu bytes at %llu", STREAM_NAMES[stream], number(len), number(s.written));
     const uint64_t excused = s.written > s.excuse_until ? 0 : s.excuse;
     if (len > excused + s.unplaced) {
         fail_run("lost", "%s: %llu bytes lost at %llu; explained are %llu up to %llu",
-                 NAMES[stream], number(len), number(s.written), number(s.excuse),
+                 STREAM_NAMES[stream], number(len), number(s.written), number(s.excuse),
                  number(s.excuse_until));
     }
     s.excuse -= std::min(len, s.excuse);
@@ -80,13 +77,14 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
         if (len < LOCATABLE || !coded_stream::locate(stream, data, len, &position)) {
             if (len < LOCATABLE && s.written + len <= s.consumed) {
                 // Too short to tell: somewhere behind a gap.
-                trace("%s: %zu bytes that cannot be placed", NAMES[stream], len);
+                trace("%s: %zu bytes that cannot be placed", STREAM_NAMES[stream], len);
                 s.unplaced += len;
                 return;
             }
             fail_run("foreign",
                      "%s: %zu bytes behind %llu are not the stream's: %02x %02x %02x %02x ...",
-                     NAMES[stream], len, number(s.written), data[0], data[1], data[2], data[3]);
+                     STREAM_NAMES[stream], len, number(s.written), data[0], data[1], data[2],
+                     data[3]);
         }
         if (position + CHANCE > s.consumed) {
             break;  // not read yet
@@ -96,14 +94,14 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
             continue;
         }
         if (position < s.written) {
-            fail_run("twice", "%s: bytes of %llu are written once more at %llu", NAMES[stream],
-                     number(position), number(s.written));
+            fail_run("twice", "%s: bytes of %llu are written once more at %llu",
+                     STREAM_NAMES[stream], number(position), number(s.written));
         }
         gap(stream, position);
     }
     if (len > 0 || s.written > s.consumed) {
         fail_run("foreign", "%s: %zu bytes behind %llu are written, read only up to %llu",
-                 NAMES[stream], len, number(s.written), number(s.consumed));
+                 STREAM_NAMES[stream], len, number(s.written), number(s.consumed));
     }
     if (s.written > s.excuse_until) {
         s.excuse = 0;
@@ -119,7 +117,7 @@ void take_chunks(FdInfo& file, const uint8_t* data, size_t len) {
     if (len >= 4 && memcmp(data, "~~~~", 4) == 0 &&
         (file.payload_left > 0 || file.header_len > 0)) {
         // A full medium cut the last chunk off.
-        trace("%s: chunk cut off", NAMES[file.stream]);
+        trace("%s: chunk cut off", STREAM_NAMES[file.stream]);
         for (unsigned stream : ledger::streams_in(file.stream)) {
             ++g_state->streams[stream].cuts;
         }
@@ -250,7 +248,7 @@ void excuse_kill() {
         const uint64_t open = s.consumed - s.written;
         if (open > STAGED_AND_BLOCK + s.excuse) {
             fail_run("lost", "%s: %llu bytes were not on the medium when the service was killed",
-                     NAMES[stream], number(open));
+                     STREAM_NAMES[stream], number(open));
         }
         excuse(stream);
     }
@@ -265,7 +263,7 @@ void consumed(unsigned stream, size_t len, bool diverted) {
     }
     const uint64_t open = s.consumed - s.written;
     if (open > STAGED_AND_BLOCK + s.excuse) {
-        fail_run("lost", "%s: %llu bytes read and not written", NAMES[stream], number(open));
+        fail_run("lost", "%s: %llu bytes read and not written", STREAM_NAMES[stream], number(open));
     }
 }
 
@@ -314,7 +312,7 @@ void check_written(unsigned stream) {
     const StreamState& s = g_state->streams[stream];
     const uint64_t open = s.consumed - s.written;
     if (open > (s.written > s.excuse_until ? 0 : s.excuse) + s.unplaced) {
-        fail_run("lost", "%s: %llu bytes read and not written at the end", NAMES[stream],
+        fail_run("lost", "%s: %llu bytes read and not written at the end", STREAM_NAMES[stream],
                  number(open));
     }
 }
@@ -323,7 +321,7 @@ void check_read() {
     for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
         const StreamState& s = g_state->streams[stream];
         if (is_logged(stream) && s.fed != s.consumed) {
-            fail_run("stopped", "%s: %llu bytes wait in the device", NAMES[stream],
+            fail_run("stopped", "%s: %llu bytes wait in the device", STREAM_NAMES[stream],
                      number(s.fed - s.consumed));
         }
     }
@@ -336,7 +334,8 @@ void check_settled() {
         const uint64_t open = s.consumed - s.written;
         check_written(stream);
         if (is_logged(stream) && open > 0) {
-            fail_run("stopped", "%s: the last bytes, in calm, are not in a file", NAMES[stream]);
+            fail_run("stopped", "%s: the last bytes, in calm, are not in a file",
+                     STREAM_NAMES[stream]);
         }
     }
 }

@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <map>
 #include <set>
@@ -23,7 +24,6 @@ namespace fs = std::filesystem;
 
 namespace {
 
-const char* const CP_NAMES[CHANNEL_COUNT] = {"cp_wcdma", "cp_wcn", "cp_gnss", "agdsp"};
 constexpr size_t IMAGE_SIZE = 100000;
 const char* const HOSTILE_NAMES[] = {
     "it's; rm -rf x",      "-rf",    "$(id)", "9999-99-99-99-99-99",
@@ -46,9 +46,7 @@ bool is_dir(const fs::path& path) {
 
 std::vector<fs::path> dirs(const fs::path& dir) {
     std::vector<fs::path> found = entries(dir);
-    found.erase(std::remove_if(found.begin(), found.end(),
-                               [](const fs::path& each) { return !is_dir(each); }),
-                found.end());
+    found.erase(std::remove_if(found.begin(), found.end(), std::not_fn(is_dir)), found.end());
     return found;
 }
 
@@ -67,7 +65,7 @@ std::string Media::log_root(MediumId medium) const {
 unsigned Media::stream_of(const std::string& path) {
     const std::string dir = fs::path(path).parent_path().filename();
     for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
-        if (dir == CP_NAMES[stream]) {
+        if (dir == STREAM_NAMES[stream]) {
             return stream;
         }
     }
@@ -190,7 +188,7 @@ Media::Seen Media::look_at(const std::string& tree, const std::string& in_use) c
 bool Media::holds(unsigned stream, const char* kind, const std::string& content) const {
     for (const std::string& tree : trees()) {
         for (const fs::path& set : dirs(tree)) {
-            for (const fs::path& file : entries(set / CP_NAMES[stream])) {
+            for (const fs::path& file : entries(set / STREAM_NAMES[stream])) {
                 if (file.filename().native().find(kind) != std::string::npos &&
                     fs::file_size(file) == content.size() && read_text_file(file) == content) {
                     return true;

@@ -19,6 +19,9 @@ enum StreamId : unsigned {
     ST_DUMP,
     STREAM_COUNT
 };
+// Those of the channels are also their directories'.
+constexpr const char* STREAM_NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
+                                                    "agdsp",    "DSP PCM", "DSP dump"};
 enum MediumId : unsigned { MED_DATA, MED_CARD, MEDIUM_COUNT };
 
 // The settings that clients can ask for, as they were set last.

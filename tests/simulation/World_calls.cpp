@@ -19,21 +19,17 @@ const CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN, CT_GNSS, CT_AGDSP, 
 }  // namespace
 
 Place World::place_of(const char* path) const {
-    if (strncmp(path, m_root.c_str(), m_root.size()) != 0) {
-        return Devices::is_device(path) ? PLACE_DEVICE : PLACE_OTHER;
-    }
-    const std::string rest = path + m_root.size();
-    if (rest.compare(0, 15, "/data/modem_log") == 0 || rest.compare(0, 10, "/data/kest") == 0) {
-        return PLACE_DATA;
-    }
-    if (rest.compare(0, 5, "/card") == 0) {
-        return PLACE_CARD;
-    }
-    if (rest.compare(0, 12, "/data/local/") == 0) {
-        return PLACE_SETTINGS;
-    }
-    if (rest == "/default.prop") {
-        return PLACE_PROPS;
+    static const std::pair<const char*, Place> PLACES[] = {{"/data/modem_log", PLACE_DATA},
+                                                           {"/data/kest", PLACE_DATA},
+                                                           {"/card", PLACE_CARD},
+                                                           {"/data/local/", PLACE_SETTINGS},
+                                                           {"/default.prop", PLACE_PROPS}};
+    const bool in_root = strncmp(path, m_root.c_str(), m_root.size()) == 0;
+    const char* const rest = in_root ? path + m_root.size() : path;
+    for (const auto& place : PLACES) {
+        if (in_root && strncmp(rest, place.first, strlen(place.first)) == 0) {
+            return place.second;
+        }
     }
     return Devices::is_device(rest) ? PLACE_DEVICE : PLACE_OTHER;
 }
