@@ -50,8 +50,11 @@ TEST_F(FailingMediumTest, FullMediumOfSparedFiles) {
     const std::string block(70000, 'x');
     m_mgr.set_file_size(100000);
     EXPECT_EQ(lost_of(1, block), 0);
+    m_root.write_file("data/modem_log/2016-03-01-09-15-01/stranger", "");  // goes by the shell
     faults::fail(faults::WRITE, 1, ENOSPC);
+    faults::fail(faults::MKDIR, 1, ENOSPC);  // nor is there room for a directory
     EXPECT_EQ(lost_of(1, block), 1);
+    EXPECT_EQ(errno, ENOSPC);                 // not what making room came across
     EXPECT_EQ(internal().sets().size(), 1u);  // the old one is trimmed, nothing else was there
     EXPECT_EQ(internal().size(), 0u);
     EXPECT_EQ(lost_of(3, block), 0);
