@@ -42,13 +42,6 @@ std::map<DIR*, std::pair<std::vector<struct dirent>, size_t>> s_dirs;
 constexpr uint64_t MAX_CALLS_A_PASS = 200000;
 constexpr int SHORT_COUNT = -1;  // a call shall do less than it was asked for
 
-const char* const CALL_NAMES[CALL_COUNT + 1] = {
-    "open",   "read",  "write",   "close",   "stat",     "access", "rename", "unlink",
-    "mkdir",  "rmdir", "opendir", "readdir", "truncate", "system", "socket", "connect",
-    "accept", "fcntl", "poll",    "mmap",    "ioctl",    "thread", "other"};
-const char* const PLACE_NAMES[PLACE_COUNT] = {"any",   "data",   "card",   "settings",
-                                              "props", "device", "socket", "other"};
-
 std::string without_root(const char* text) {
     std::string cut(text);
     const std::string& root = world().root();
@@ -84,8 +77,8 @@ int begin(Call call, Place place) {
         die();
     }
     if (state.counters.calls - state.pass_calls > MAX_CALLS_A_PASS) {
-        fail_run("hang", "%llu calls in one pass of the loop, now %s in %s",
-                 number(MAX_CALLS_A_PASS), CALL_NAMES[call], PLACE_NAMES[place]);
+        fail_run("hang", "%llu calls in one pass of the loop, now %u in place %u",
+                 number(MAX_CALLS_A_PASS), call, place);
     }
     for (FaultRule& rule : state.faults) {
         // What fails in the start for want of these stays so for the life of the process.
@@ -112,7 +105,7 @@ int begin(Call call, Place place) {
         const Outside outside;
         world().rule_fired(call, place);
         ledger::excuse_all();
-        trace("fault %s %s %d", CALL_NAMES[call], PLACE_NAMES[place], rule.error);
+        trace("fault %llu %d", number(call + PLAN_PLACE * place), rule.error);
         return rule.error ? rule.error : SHORT_COUNT;
     }
     return 0;

@@ -9,6 +9,16 @@
 #include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
 
+namespace {
+
+void check_total(const char* of, uint64_t total, uint64_t sum) {
+    if (total != sum) {
+        fail_run("total", "%s: %llu, its parts %llu", of, number(total), number(sum));
+    }
+}
+
+}  // namespace
+
 void World::check(bool last) {
     if (!m_controller) {
         if (last) {
@@ -174,25 +184,16 @@ void World::check_totals() const {
                 for (const LogFile* file : dir->files()) {
                     of_dir += file->counted();
                 }
-                if (of_dir != dir->size()) {
-                    fail_run("total", "directory %s: %llu, its files %llu", dir->path().string(),
-                             number(dir->size()), number(of_dir));
-                }
+                check_total(dir->path().string(), dir->size(), of_dir);
                 of_set += of_dir;
             }
             sum += set->size();
-            if (of_set != set->size() && !doubtful) {
-                fail_run("total", "set %s: %llu, its files %llu", set->path().string(),
-                         number(set->size()), number(of_set));
-            }
+            check_total(set->path().string(), set->size(), doubtful ? set->size() : of_set);
         }
         if (doubtful) {
             continue;
         }
-        if (sum != media->size()) {
-            fail_run("total", "medium %d: %llu, its sets %llu", type, number(media->size()),
-                     number(sum));
-        }
+        check_total(media->top_dir().string(), media->size(), sum);
         uint64_t there = m_media.look(external ? MED_CARD : MED_DATA).bytes;
         for (const FdInfo& info : g_fds) {
             // What the thread has written is counted when it is done.
