@@ -1,9 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog's scanner of a log file: every byte is accounted for, and every piece is what stands
-// at its place.
+// at its place. A chunk of the audio DSP that the service writes is read back whole, and one
+// that is cut is told.
 #include <string.h>
 
-#include "fuzz/scan.h"
+#include <string>
+#include <vector>
+
+#include "channels/DspChunkHeader.h"
+#include "fuzz/fuzz.h"
+#include "kestlog/FileScan.h"
 
 namespace {
 
@@ -21,6 +27,39 @@ const char* const NAMES[] = {
 constexpr size_t NAME_NUM = sizeof(NAMES) / sizeof(NAMES[0]);
 constexpr size_t RECORD_LEN = 16;
 const std::string RECORD_MAGIC("\x78\x56\x34\x12");
+
+struct ScannedPiece {
+    uint64_t offset;
+    uint32_t seq_num;
+    bool intact;
+    std::string kind;  // of a chunk
+    std::string data;
+};
+
+struct Scanned {
+    FileReport report;
+    std::vector<ScannedPiece> pieces;
+};
+
+// The scan of a file of that name and content.
+Scanned fuzz_scan(const std::string& name, const std::string& content) {
+    static const FuzzFile file;
+    file.write(content);
+    Scanned result;
+    LogReader in;
+    FUZZ_CHECK(in.open(file.path, true));
+    scan_file(
+        in, FileName(name),
+        [&](const Piece& piece) {
+            result.pieces.push_back(
+                {piece.offset, piece.seq_num, piece.intact, piece.kind ? piece.kind : "",
+                 piece.data_len > 0 ? fuzz_text(piece.data, piece.data_len) : std::string()});
+            return true;
+        },
+        &result.report);
+    FUZZ_CHECK(in.error() == 0);
+    return result;
+}
 
 uint64_t head(const FileReport& report) {
     return report.has_record ? RECORD_LEN : 0;
@@ -79,12 +118,36 @@ void check_frames(const Scanned& scan, const std::string& content) {
     FUZZ_CHECK(scan.report.other + payload + head(scan.report) <= content.size());
 }
 
+// Two bytes tell where the chunk is cut, one its kind and one its number.
+void check_own_chunk(const uint8_t* data, size_t size) {
+    static constexpr uint8_t KINDS[] = {0, 2, 3};  // log, dump, PCM
+    if (size < 4) {
+        return;
+    }
+    const std::string body = fuzz_text(data + 4, size - 4);
+    const DspChunkHeader header = make_dsp_chunk_header(body.size(), KINDS[data[2] % 3], data[3]);
+    const std::string chunk =
+        fuzz_text(reinterpret_cast<const uint8_t*>(&header), sizeof(header)) + body;
+
+    const Scanned whole = fuzz_scan("1-agdsp-2016-03-01_09-15-00.log", chunk);
+    FUZZ_CHECK(whole.pieces.size() == 1 && !whole.report.damaged && whole.report.other == 0);
+    FUZZ_CHECK(whole.pieces[0].data == body && whole.pieces[0].seq_num == data[3]);
+
+    const size_t len = (data[0] | static_cast<size_t>(data[1]) << 8) % chunk.size();
+    const Scanned cut = fuzz_scan("1-agdsp-2016-03-01_09-15-00.log", chunk.substr(0, len));
+    FUZZ_CHECK(cut.pieces.empty() && cut.report.other == len && cut.report.damaged == (len > 0));
+}
+
 }  // namespace
 
-// The first byte tells the name; from 0x80 on, the content is repeated past the reader's
-// window.
+// The first byte tells the name, or is 'c' for a chunk that the service writes; from 0x80 on,
+// the content is repeated past the reader's window.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     if (size < 1) {
+        return 0;
+    }
+    if (data[0] == 'c') {
+        check_own_chunk(data + 1, size - 1);
         return 0;
     }
     const std::string name = NAMES[(data[0] & 0x7f) % NAME_NUM];
