@@ -13,7 +13,6 @@
 namespace {
 
 const char CONFIG[] = "data/local/tmp/kestmodem/kest_modem.conf";
-const size_t BLOCK = 32768;
 
 class ServiceTest : public ChannelFixture {
 protected:
@@ -31,11 +30,6 @@ protected:
     // One block into an empty device, and all of it read again, once the service is there.
     static bool feed(const Fifo& fifo, const std::string& block) {
         return fifo.put(block) && wait_until([&] { return fifo.unread() == 0; });
-    }
-    // A set's name has the resolution of a second.
-    static void next_second() {
-        const time_t now = time(nullptr);
-        wait_until([&] { return time(nullptr) > now; });
     }
 
     ChildProcess process;
@@ -70,99 +64,27 @@ TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
     }
 }
 
-// What was sent through each log device, to be found on the media byte for byte.
-class StreamsTest : public ServiceTest {
-protected:
-    // Two blocks always fill the staging buffer, so an even number leaves nothing staged.
-    bool send_blocks(const char* medium, int blocks) {
-        for (int i = 0; i < blocks; ++i) {
-            for (Stream& stream : streams) {
-                const std::string block = pattern_bytes(BLOCK, seed++);
-                if (!feed(stream.fifo, block)) {
-                    return false;
-                }
-                stream.sent[medium] += block;
-            }
-        }
-        return true;
-    }
-    // All that was sent is there at last, in so many files.
-    void check(const std::string& medium, size_t files) {
-        for (Stream& stream : streams) {
-            SCOPED_TRACE(medium + " " + stream.cp);
-            const auto paths = [&] { return log_files(root, medium + "/modem_log", stream.cp); };
-            EXPECT_TRUE(wait_until(
-                [&] { return log_content(root, paths(), stream.head) == stream.sent[medium]; }));
-            EXPECT_EQ(paths().size(), files);
-        }
-    }
-    // Modes as asked for in spite of the parent's mask, and a version file a directory.
-    void check_modes(const std::string& medium) {
-        size_t versions = 0;
-        for (const std::string& name : root.tree(medium)) {
-            const std::filesystem::path path = root.path(medium + "/" + name);
-            EXPECT_EQ(std::filesystem::status(path).permissions(), std::filesystem::perms(0644));
-            EXPECT_EQ(std::filesystem::status(path.parent_path()).permissions(),
-                      std::filesystem::perms(0775));
-            versions += root.read_file(medium + "/" + name) == "BB_1";
-        }
-        EXPECT_EQ(versions, root.list(medium).size());
-    }
-
-    struct Stream {
-        const char* cp;
-        Fifo fifo;
-        std::string head;
-        std::map<std::string, std::string> sent;  // by medium
-    } streams[3] = {{"cp_wcdma",
-                     Fifo(root.path("log_w")),
-                     std::string("\x78\x56\x34\x12\x40\x42\x0f\0cp-time!", 16),
-                     {}},
-                    {"cp_wcn", Fifo(root.path("wcn")), "", {}},
-                    {"cp_gnss", Fifo(root.path("gnss")), "", {}}};
-    uint32_t seed = 0;
-};
-
-// Four lives: internal medium, killed and started again on the old set, SD card in, SD card
-// out.
-TEST_F(StreamsTest, NoByteIsLostAcrossRestartAndMediumChanges) {
-    const std::string settings =  // the system's, to be copied
-        "log_file_size 1\nstream cp_wcdma on 5 3\nstream cp_wcn on 5 3\nstream cp_gnss on 5 3\n";
+TEST_F(ServiceTest, WhatItMakesHasItsModeInSpiteOfTheParentsMask) {
+    const std::string settings = "stream cp_wcdma on 5 3\n";  // the system's, to be copied
     root.write_file("system/etc/kest_modem.conf", settings);
     root.make_dir("data/local/tmp/kestmodem");
     root.set_prop("gsm.version.baseband", "BB_1");
-    const TimeServer time_service(std::string("\x40\x42\x0f\0cp-time!", 12));
-
+    const Fifo modem(root.path("log_w"));
     run();
-    ASSERT_TRUE(send_blocks("data", 80));
+    // Two blocks fill the staging buffer.
+    ASSERT_TRUE(feed(modem, pattern_bytes(32768, 1)) && feed(modem, pattern_bytes(32768, 2)));
+    ASSERT_TRUE(wait_until([&] { return content("cp_wcdma").size() == 65536; }));
     EXPECT_EQ(root.read_file(CONFIG), settings);
-    process.stop(SIGKILL);
-    check("data", 3);
-
-    next_second();
-    run();
-    ASSERT_TRUE(send_blocks("data", 34));
-    check("data", 3 + 2);
-
-    next_second();
-    root.set_prop("init.svc.fuse_sdcard0", "running");
-    ASSERT_TRUE(send_blocks("sd", 41));  // what is staged at the change is kept, too
-    root.set_prop("init.svc.fuse_sdcard0", "stopped");
-    next_second();
-    ASSERT_TRUE(send_blocks("data", 2));
-    check("data", 3 + 2 + 1);
-    check("sd", 2);
-    EXPECT_EQ(root.list("data/modem_log").size(), 3u);
-
-    // A single block stays staged: killing the service costs exactly that.
-    ASSERT_TRUE(feed(streams[2].fifo, pattern_bytes(BLOCK, seed)));
-    EXPECT_TRUE(logged("bool StorageManager::check_media_change(): sd card is umounted!"));
+    const std::vector<std::string> files = root.tree("data/modem_log");
+    EXPECT_EQ(files.size(), 2u) << "the log and the version";
+    for (const std::string& name : files) {
+        const std::filesystem::path path = root.path("data/modem_log/" + name);
+        EXPECT_EQ(std::filesystem::status(path).permissions(), std::filesystem::perms(0644));
+        EXPECT_EQ(std::filesystem::status(path.parent_path()).permissions(),
+                  std::filesystem::perms(0775));
+    }
     EXPECT_FALSE(logged("save log"));
     EXPECT_FALSE(logged("kestcp: open "));
-    process.stop(SIGKILL);
-    check("data", 3 + 2 + 1);
-    check_modes("data/modem_log");
-    check_modes("sd/modem_log");
 }
 
 // Between two marked blocks, the system calls are those of the log path and no others.
