@@ -47,6 +47,7 @@ const ScriptPlayer::CommandRow ScriptPlayer::COMMANDS[] = {
     {"supervisor", &ScriptPlayer::tell_by_supervisor},
     {"sd", &ScriptPlayer::move_sd},
     {"client", &ScriptPlayer::client_request},
+    {"client-log", &ScriptPlayer::client_log},
     {"client-send", &ScriptPlayer::client_send},
     {"client-reply", &ScriptPlayer::client_reply},
     {"client-notice", &ScriptPlayer::client_notice},

@@ -71,6 +71,7 @@ protected:
     bool tell_by_supervisor(const std::string& args);
     bool move_sd(const std::string& args);
     bool client_request(const std::string& args);
+    bool client_log(const std::string& args);
     bool client_send(const std::string& args);
     bool client_reply(const std::string& args);
     bool client_notice(const std::string& args);

@@ -7,6 +7,9 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <regex>
+#include <sstream>
+#include <vector>
 
 #include "sim/ScriptPlayer.h"
 #include "sim/byte_text.h"
@@ -286,6 +289,44 @@ bool ScriptPlayer::move_sd(const std::string& args) {
 
 bool ScriptPlayer::client_request(const std::string& args) {
     return client_send(args) && client_reply("");
+}
+
+bool ScriptPlayer::client_log(const std::string& args) {
+    static const std::regex process("^[A-Z]/[A-Z]+\\([0-9]+\\): ");
+    static const std::regex error(" \\[[0-9]+\\(.*\\)\\]$");
+    // What is not known is logged before it is answered, after all that came before.
+    const auto settled_log = [&] {
+        m_settler.request("settled", m_patience_ms);
+        return m_service.log_text();
+    };
+    std::string request;
+    if (!bytes_of(args, &request)) {
+        return false;
+    }
+    tell("client: " + args);
+    const size_t before = settled_log().size();
+    if (!m_client.send(request) || !client_reply("")) {
+        return fail("no reply to " + args);
+    }
+    std::istringstream log(settled_log().substr(before));
+    std::vector<std::string> messages;
+    for (std::string line; std::getline(log, line);) {
+        line = std::regex_replace(line, process, "");
+        const std::string& root = m_handset.root();
+        const size_t at = line.find(root);
+        if (at != std::string::npos) {
+            line.replace(at, root.size(), "$ROOT");
+        }
+        messages.push_back("log: " + std::regex_replace(line, error, " [errno]"));
+    }
+    if (messages.empty()) {
+        return fail("the service does not log");
+    }
+    messages.pop_back();  // of the settling
+    for (const std::string& message : messages) {
+        tell(message);
+    }
+    return true;
 }
 
 bool ScriptPlayer::client_send(const std::string& args) {
