@@ -27,16 +27,15 @@ const char SD_LOGS[] = "storage/sdcard0/modem_log";
 struct ScriptPlayer::CommandRow {
     const char* word;
     Command run;
-    Round last = AGAIN;  // FIRST: only for the handset as it is made
 };
 
 const ScriptPlayer::CommandRow ScriptPlayer::COMMANDS[] = {
-    {"configure", &ScriptPlayer::configure, FIRST},
-    {"cp", &ScriptPlayer::add_cp, FIRST},
+    {"configure", &ScriptPlayer::configure},
+    {"cp", &ScriptPlayer::add_cp},
     {"property", &ScriptPlayer::set_property},
-    {"file", &ScriptPlayer::write_file, FIRST},
+    {"file", &ScriptPlayer::write_file},
     {"time", &ScriptPlayer::set_time},
-    {"start", &ScriptPlayer::start, FIRST},
+    {"start", &ScriptPlayer::start},
     {"log", &ScriptPlayer::feed_log},
     {"queue", &ScriptPlayer::queue_log},
     {"pcm", &ScriptPlayer::feed_pcm},
@@ -46,6 +45,7 @@ const ScriptPlayer::CommandRow ScriptPlayer::COMMANDS[] = {
     {"diag-request", &ScriptPlayer::await_diag_request},
     {"supervisor", &ScriptPlayer::tell_by_supervisor},
     {"sd", &ScriptPlayer::move_sd},
+    {"show", &ScriptPlayer::show_file},
     {"client", &ScriptPlayer::client_request},
     {"client-log", &ScriptPlayer::client_log},
     {"client-send", &ScriptPlayer::client_send},
@@ -89,8 +89,10 @@ bool ScriptPlayer::read(const std::string& script_file) {
 }
 
 bool ScriptPlayer::play_lines(Round round, bool patient) {
+    bool skipped = round == AGAIN;
     for (const Line& line : m_lines) {
-        if (play_line(line.text, round)) {
+        if (skipped || play_line(line.text)) {
+            skipped = skipped && line.text != "start";
             continue;
         }
         if (patient) {
@@ -101,7 +103,7 @@ bool ScriptPlayer::play_lines(Round round, bool patient) {
     return true;
 }
 
-bool ScriptPlayer::play_line(const std::string& line, Round round) {
+bool ScriptPlayer::play_line(const std::string& line) {
     std::string args = line;
     const std::string word = take_script_word(&args);
     if (word.empty() || word[0] == '#') {
@@ -110,9 +112,8 @@ bool ScriptPlayer::play_line(const std::string& line, Round round) {
     for (const CommandRow& row : COMMANDS) {
         if (word == row.word) {
             const bool has_root = !m_handset.root().empty();
-            return round > row.last ||
-                   ((row.run == &ScriptPlayer::configure || has_root || make_handset()) &&
-                    (this->*row.run)(args) && settle());
+            return (row.run == &ScriptPlayer::configure || has_root || make_handset()) &&
+                   (this->*row.run)(args) && settle();
         }
     }
     return fail("unknown command " + word);

@@ -30,8 +30,8 @@ public:
     // Plays the whole script, once for each object. False with error() set: what failed in
     // which line, and the end of the service's log.
     bool play(const std::string& script_file);
-    // In steps: reads the script, and plays its lines as often as wanted. Again: without what
-    // makes and starts the handset. Patient: the first line that fails is the last one. Otherwise
+    // In steps: reads the script, and plays its lines as often as wanted. Again: only those
+    // behind the start. Patient: the first line that fails is the last one. Otherwise
     // what comes behind it is given less and less time.
     bool read(const std::string& script_file);
     enum Round { FIRST, AGAIN };
@@ -53,7 +53,7 @@ protected:
     struct CommandRow;
     static const CommandRow COMMANDS[];
 
-    bool play_line(const std::string& line, Round round);
+    bool play_line(const std::string& line);
     // The commands; args is the rest of the line.
     bool configure(const std::string& args);
     bool add_cp(const std::string& args);
@@ -70,6 +70,7 @@ protected:
     bool await_diag_request(const std::string& args);
     bool tell_by_supervisor(const std::string& args);
     bool move_sd(const std::string& args);
+    bool show_file(const std::string& args);
     bool client_request(const std::string& args);
     bool client_log(const std::string& args);
     bool client_send(const std::string& args);

@@ -13,6 +13,7 @@
 
 #include "sim/ScriptPlayer.h"
 #include "sim/byte_text.h"
+#include "sim/files.h"
 
 namespace {
 
@@ -285,6 +286,18 @@ bool ScriptPlayer::move_sd(const std::string& args) {
     }
     return (args == "in" ? m_handset.insert_sd() : m_handset.remove_sd()) ||
            fail(m_handset.error());
+}
+
+bool ScriptPlayer::show_file(const std::string& path) {
+    if (!std::filesystem::exists(m_handset.path(path))) {
+        tell(path + ": is not there");
+        return true;
+    }
+    tell(path + ":");
+    for (const std::string& piece : show_bytes(read_text_file(m_handset.path(path)))) {
+        tell("    " + piece);
+    }
+    return true;
 }
 
 bool ScriptPlayer::client_request(const std::string& args) {
