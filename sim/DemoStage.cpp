@@ -58,20 +58,8 @@ bool DemoStage::fail(const std::string& text) {
 // within their quotas, the dumps, and what is fed while the quotas are lifted.
 bool DemoStage::has_room() {
     const uint64_t needed = (uint64_t{380} << 20) + uint64_t{m_options.rate} * 1024 * 30;
-    fs::path place = m_options.root.empty() ? fs::path(temp_dir()) : fs::absolute(m_options.root);
-    std::error_code ec;
-    while (place.has_relative_path() && !fs::exists(place, ec)) {
-        place = place.parent_path();
-    }
-    const fs::space_info space = fs::space(place, ec);
-    if (ec || space.available >= needed) {
-        return true;  // what else is wrong shows when the root is made
-    }
-    char text[128];
-    snprintf(text, sizeof text, ": %.0f MB are free, %.0f MB are needed", to_mb(space.available),
-             to_mb(needed));
-    return fail("not enough room in " + place.string() + text +
-                "; set TMPDIR, or name a place with --root DIR");
+    std::string problem;
+    return ::has_room(m_options.root, needed, &problem) || fail(problem);
 }
 
 bool DemoStage::set_up() {

@@ -2,36 +2,10 @@
 
 #include "sim/DspLogCheck.h"
 
-#include <string.h>
-
-#include <algorithm>
 #include <fstream>
 #include <iterator>
 
-namespace {
-
-const size_t HEADER_SIZE = 20;
-
-uint32_t little(const uint8_t* bytes, size_t size) {
-    uint32_t value = 0;
-    for (size_t i = size; i > 0; --i) {
-        value = value << 8 | bytes[i - 1];
-    }
-    return value;
-}
-
-// The ones' complement sum of the words at 4, 6 and 8, and the checksum itself, has all
-// bits set.
-bool sum_fits(const uint8_t* header) {
-    uint32_t sum = 0;
-    for (size_t at = 4; at <= 10; at += 2) {
-        sum += little(header + at, 2);
-    }
-    sum = (sum & 0xFFFF) + (sum >> 16);
-    return ((sum & 0xFFFF) + (sum >> 16)) == 0xFFFF;
-}
-
-}  // namespace
+#include "sim/DspHeader.h"
 
 void DspLogCheck::damage(const std::string& text) {
     if (m_damages++ == 0) {
@@ -62,35 +36,28 @@ bool DspLogCheck::add_file(const std::string& path) {
 
 // The bytes of the chunk, 0 if there is none.
 size_t DspLogCheck::take_chunk(const uint8_t* bytes, size_t len) {
-    if (len < HEADER_SIZE || memcmp(bytes, "\x7E\x7E\x7E\x7E", 4) != 0) {
+    DspHeader header;
+    if (len < DspHeader::SIZE || !header.read(bytes) || header.data_size > len - DspHeader::SIZE) {
         return 0;
     }
-    const size_t n = little(bytes + 16, 2) - 8;
-    if (n > len - HEADER_SIZE) {
-        return 0;
-    }
-    const uint32_t number = little(bytes + 12, 4);
-    const std::string name = "chunk " + std::to_string(number);
-    if (little(bytes + 4, 2) != n + 16 || little(bytes + 6, 2) != 0 ||
-        little(bytes + 8, 2) != 0x5A5A || bytes[18] != 0x9D) {
+    const std::string name = "chunk " + std::to_string(header.number);
+    if (!header.right_form) {
         damage(name + " has a wrong header");
     }
-    if (!sum_fits(bytes)) {
+    if (!header.right_sum) {
         damage(name + " has a wrong checksum");
     }
-    if (number != m_next_number) {
+    if (header.number != m_next_number) {
         damage(name + " in place of " + std::to_string(m_next_number));
     }
-    m_next_number = number + 1;
+    m_next_number = header.number + 1;
     ++m_chunks;
-    const Source source = bytes[19] == 0x40   ? LOG
-                          : bytes[19] == 0x42 ? DUMP
-                          : bytes[19] == 0x43 ? PCM
-                                              : SOURCE_COUNT;
-    if (source == SOURCE_COUNT) {
+    const uint8_t* data = bytes + DspHeader::SIZE;
+    if (header.source == DspSource::UNKNOWN) {
         damage(name + " is of an unknown kind");
     } else {
-        m_data[source].insert(m_data[source].end(), bytes + HEADER_SIZE, bytes + HEADER_SIZE + n);
+        std::vector<uint8_t>& all = m_data[static_cast<size_t>(header.source)];
+        all.insert(all.end(), data, data + header.data_size);
     }
-    return HEADER_SIZE + n;
+    return DspHeader::SIZE + header.data_size;
 }

@@ -10,14 +10,16 @@
 #include <string>
 #include <vector>
 
+#include "sim/DspHeader.h"
+
 class DspLogCheck {
 public:
-    enum Source { LOG, PCM, DUMP, SOURCE_COUNT };
-
     // Adds a log file; the oldest comes first. False when it cannot be read.
     bool add_file(const std::string& path);
 
-    const std::vector<uint8_t>& data(Source source) const { return m_data[source]; }
+    const std::vector<uint8_t>& data(DspSource source) const {
+        return m_data[static_cast<size_t>(source)];
+    }
     unsigned chunks() const { return m_chunks; }
     // Headers that are wrong, chunks cut short, numbers out of sequence.
     unsigned damages() const { return m_damages; }
@@ -27,7 +29,8 @@ private:
     size_t take_chunk(const uint8_t* bytes, size_t len);
     void damage(const std::string& text);
 
-    std::vector<uint8_t> m_data[SOURCE_COUNT];
+    // For each known source.
+    std::vector<uint8_t> m_data[static_cast<size_t>(DspSource::UNKNOWN)];
     unsigned m_chunks = 0;
     uint32_t m_next_number = 0;
     unsigned m_damages = 0;

@@ -2,6 +2,7 @@
 
 #include "sim/files.h"
 
+#include <stdio.h>
 #include <stdlib.h>
 
 #include <filesystem>
@@ -18,6 +19,26 @@ std::string read_text_file(const std::string& path) {
 std::string temp_dir() {
     const char* tmp = getenv("TMPDIR");
     return tmp && *tmp ? tmp : "/tmp";
+}
+
+bool has_room(const std::string& dir, uint64_t needed, std::string* problem) {
+    namespace fs = std::filesystem;
+    const double mb = 1 << 20;
+    std::error_code ec;
+    fs::path place = dir.empty() ? fs::path(temp_dir()) : fs::absolute(dir, ec);
+    while (place.has_relative_path() && !fs::exists(place, ec)) {
+        place = place.parent_path();
+    }
+    const fs::space_info space = fs::space(place, ec);
+    if (ec || space.available >= needed) {
+        return true;
+    }
+    char text[128];
+    snprintf(text, sizeof text, ": %.0f MB are free, %.0f MB are needed",
+             static_cast<double>(space.available) / mb, static_cast<double>(needed) / mb);
+    *problem = "not enough room in " + place.string() + text +
+               "; set TMPDIR, or name a place with --root DIR";
+    return false;
 }
 
 std::string make_temp_dir(const std::string& parent, const std::string& prefix) {

@@ -3,6 +3,8 @@
 #ifndef SIM_FILES_H_
 #define SIM_FILES_H_
 
+#include <stdint.h>
+
 #include <string>
 
 // What the file holds; "" when it cannot be read.
@@ -10,6 +12,10 @@ std::string read_text_file(const std::string& path);
 
 // Where directories for a while are made: $TMPDIR or /tmp.
 std::string temp_dir();
+// Whether so many bytes are free where a directory is or is to be made; "" is for a new one in
+// temp_dir(). What else is wrong with the place shows when the directory is made. False with
+// *problem, a line for people.
+bool has_room(const std::string& dir, uint64_t needed, std::string* problem);
 // Makes a directory "prefix.XXXXXX" below the parent. Its path; "" with errno set on failure.
 std::string make_temp_dir(const std::string& parent, const std::string& prefix);
 // Removes the directory with everything below it.

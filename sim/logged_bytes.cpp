@@ -40,7 +40,7 @@ std::vector<std::string> logged_bytes(const std::string& cp_dir) {
         }
     }
     if (fs::path(cp_dir).filename() == "agdsp") {
-        const std::vector<uint8_t>& log = chunks.data(DspLogCheck::LOG);
+        const std::vector<uint8_t>& log = chunks.data(DspSource::LOG);
         return {std::string(log.begin(), log.end())};
     }
     return contents;

@@ -74,8 +74,8 @@ void play_audio_dsp(DemoStage& stage) {
     stage.check(check.chunks() > 0 && check.damages() == 0,
                 std::to_string(check.chunks()) + " chunks with good headers, numbered in sequence" +
                     (check.damages() > 0 ? ", but " + check.first_damage() : ""));
-    stage.check(check.data(DspLogCheck::LOG) == log && check.data(DspLogCheck::PCM) == pcm &&
-                    check.data(DspLogCheck::DUMP) == dumps,
+    stage.check(check.data(DspSource::LOG) == log && check.data(DspSource::PCM) == pcm &&
+                    check.data(DspSource::DUMP) == dumps,
                 "they hold " + std::to_string(log.size()) + " bytes of log, " +
                     std::to_string(pcm.size()) + " of PCM data and " +
                     std::to_string(dumps.size()) + " of dumps, as they were sent");
