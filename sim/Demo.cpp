@@ -54,6 +54,21 @@ void print_tree(const fs::path& dir, const std::string& indent) {
 Demo::Demo(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
     : m_options(options), m_interrupted(interrupted), m_stage(m_options, interrupted) {}
 
+void Demo::show_plan() {
+    const SimSizes& sizes = m_stage.handset().sizes();
+    printf("Log files of %u MB, quota %u MB internal and %u MB on the SD card; %u KB/s from each",
+           sizes.log_file, sizes.data, sizes.sd, m_options.rate);
+    for (const auto& cp : m_stage.handset().cps()) {
+        printf(" %s", cp->name.c_str());
+    }
+    printf(
+        "\nRunning %s for %.0f s; Ctrl-C ends it earlier.\n"
+        "Below: MB fed, MB on disk, sets, files, MB of each quota ([ ] marks the medium in "
+        "use)\n\n",
+        m_options.program.c_str(), m_options.seconds);
+    fflush(stdout);
+}
+
 void Demo::play() {
     if (!m_stage.check(m_stage.client().connect(m_stage.handset().root(), 5000),
                        "the service listens for control clients")) {
@@ -71,6 +86,7 @@ int Demo::run() {
     const bool started = m_stage.set_up();
     bool good = started;
     if (started) {
+        show_plan();
         play();
         if (*m_interrupted) {
             m_stage.say("interrupted: ending early");
@@ -78,21 +94,7 @@ int Demo::run() {
         good = finish();
     }
     m_stage.take_down();
-    SimHandset& handset = m_stage.handset();
-    if (handset.root().empty()) {
-        return 1;
-    }
-    // A root that this program made and never used is of no use to anybody; where a check
-    // failed there is something to look for.
-    const bool kept = m_options.keep || !m_options.root.empty() || (started && !good);
-    if (kept) {
-        printf("Everything is in %s (remove it when done).\n", handset.root().c_str());
-    } else {
-        handset.remove_root();
-        if (started) {
-            printf("%s was removed; --keep keeps it.\n", handset.root().c_str());
-        }
-    }
+    end_root(m_stage.handset(), m_options, started, good);
     return good ? 0 : 1;
 }
 

@@ -18,6 +18,7 @@ public:
     int run();
 
 private:
+    void show_plan();
     void play();
     bool finish();
     bool read_logs();

@@ -41,6 +41,22 @@ bool ends_with(const std::string& text, const std::string& end) {
 
 }  // namespace
 
+void end_root(SimHandset& handset, const DemoOptions& options, bool started, bool good) {
+    if (handset.root().empty()) {
+        return;
+    }
+    // A root that this program made and never used is of no use to anybody; where a check
+    // failed there is something to look for.
+    if (options.keep || !options.root.empty() || (started && !good)) {
+        printf("Everything is in %s (remove it when done).\n", handset.root().c_str());
+        return;
+    }
+    handset.remove_root();
+    if (started) {
+        printf("%s was removed; --keep keeps it.\n", handset.root().c_str());
+    }
+}
+
 DemoStage::DemoStage(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
     : m_options(options),
       m_interrupted(interrupted),
@@ -76,7 +92,8 @@ bool DemoStage::set_up() {
             return fail(m_handset.error());
         }
     }
-    if (!m_handset.add_audio_dsp() || !m_handset.add_iq_memory()) {
+    if (!m_handset.add_audio_dsp() || !m_handset.add_iq_memory() ||
+        (m_options.serve && m_options.card_in && !m_handset.insert_sd())) {
         return fail(m_handset.error());
     }
     const std::string& root = m_handset.root();
@@ -90,18 +107,6 @@ bool DemoStage::set_up() {
     m_wcn_diag = std::make_unique<SimDiagResponder>(*wcn().log.terminal(), uint8_t{2});
     m_modem_diag->start();
     m_wcn_diag->start();
-    const SimSizes& sizes = m_handset.sizes();
-    printf("Log files of %u MB, quota %u MB internal and %u MB on the SD card; %u KB/s from each",
-           sizes.log_file, sizes.data, sizes.sd, m_options.rate);
-    for (const auto& cp : m_handset.cps()) {
-        printf(" %s", cp->name.c_str());
-    }
-    printf(
-        "\nRunning %s for %.0f s; Ctrl-C ends it earlier.\n"
-        "Below: MB fed, MB on disk, sets, files, MB of each quota ([ ] marks the medium in "
-        "use)\n\n",
-        m_options.program.c_str(), m_options.seconds);
-    fflush(stdout);
     m_logs = std::make_unique<LogCollector>(m_handset);
     if (!m_service.start(m_options.program, m_handset)) {
         return fail("cannot run " + m_options.program + ": " + strerror(errno));
@@ -120,6 +125,11 @@ void DemoStage::take_down() {
         }
     }
     m_handset.time_service().stop();
+}
+
+unsigned DemoStage::rate_of(const std::string& cp_name) const {
+    const auto own = m_options.rates.find(cp_name);
+    return own == m_options.rates.end() ? m_rate : own->second;
 }
 
 bool DemoStage::over() {
@@ -163,7 +173,9 @@ void DemoStage::step() {
         m_next_watch = m_now + 0.05;
     }
     if (m_now >= m_next_line) {
-        show_progress();
+        if (m_tty || !m_options.serve) {
+            show_progress();
+        }
         m_next_line += 1;
     }
 }
@@ -173,7 +185,7 @@ void DemoStage::feed(double seconds) {
     for (size_t i = 0; i < m_due.size(); ++i) {
         SimCp& cp = *m_handset.cps()[i];
         if (cp.running) {
-            m_due[i] += seconds * m_rate * 1024;
+            m_due[i] += seconds * rate_of(cp.name) * 1024;
             const uint64_t fed = cp.feed(std::min(static_cast<uint64_t>(m_due[i]), FEED_STEP));
             m_due[i] -= static_cast<double>(fed);
             m_unwatched += fed;

@@ -9,6 +9,7 @@
 
 #include <chrono>
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -25,12 +26,21 @@ struct DemoOptions {
     std::string program;  // of the service
     std::string root;     // empty: a new directory
     double seconds = 60;
-    unsigned rate = 500;  // KB/s for each CP
-    bool sd = true;       // the SD card comes and goes
-    bool fast = false;    // the scenes do not take their time
-    bool keep = false;    // do not remove the root at the end
-    std::string reader;   // the program kestlog; empty: the logs are not read with it
+    unsigned rate = 500;                    // KB/s for each CP
+    std::map<std::string, unsigned> rates;  // for those of a rate of their own
+    bool sd = true;                         // the SD card comes and goes
+    bool card_in = false;                   // without scenes: the card is there from the start
+    bool fast = false;                      // the scenes do not take their time
+    bool keep = false;                      // do not remove the root at the end
+    std::string reader;  // the program kestlog; empty: the logs are not read with it
+    bool serve = false;  // no scenes, no end
+    std::string replay;  // the recorded card
+    double speed = 1;    // of the replay, 1 as recorded, 0 as fast as it goes
 };
+
+// The end of a handset's root: it is removed, or kept and shown where somebody has named it or
+// wants it, or where something that was started was not good.
+void end_root(SimHandset& handset, const DemoOptions& options, bool started, bool good);
 
 class DemoStage {
 public:
@@ -52,6 +62,7 @@ public:
     bool wait_for(const std::function<void()>& work);
     // KB/s from each CP, as far as its device takes them; 0 for what the options say.
     void set_rate(unsigned rate) { m_rate = rate > 0 ? rate : m_options.rate; }
+    unsigned rate_of(const std::string& cp_name) const;
     // Interrupted, or the service ended by itself.
     bool over();
 

@@ -20,6 +20,20 @@ std::string extended_variable(const std::string& name, const std::string& added)
     return name + "=" + (old && *old ? old + std::string(":") : "") + added;
 }
 
+// Beside the program, or where packages place it. -1 with errno set on failure.
+int open_drivers() {
+    std::error_code ec;
+    const std::filesystem::path dir =
+        std::filesystem::read_symlink("/proc/self/exe", ec).parent_path();
+    int library = -1;
+    for (const char* place : {".", "../lib/kestmodem"}) {
+        if (library < 0) {
+            library = open((dir / place / "libkestsim_devices.so").c_str(), O_RDONLY | O_CLOEXEC);
+        }
+    }
+    return library;
+}
+
 }  // namespace
 
 bool ServiceProcess::start(const std::string& program, const SimHandset& handset,
@@ -35,11 +49,7 @@ bool ServiceProcess::start(const std::string& program, const SimHandset& handset
            "SECONDARY_STORAGE=" + handset.sd_root()};
     int library = -1;
     if (handset.needs_drivers()) {
-        std::error_code ec;
-        const std::string path = std::filesystem::read_symlink("/proc/self/exe", ec)
-                                     .replace_filename("libkestsim_devices.so")
-                                     .string();
-        library = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+        library = open_drivers();
         if (library < 0) {
             return false;
         }

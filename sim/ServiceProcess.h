@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // One run of the service against a simulated handset: started with the handset's root and
 // SD card in its environment, what it prints and logs in the file "kestmodem.log" of the
-// root. When the handset has devices that need drivers, the library kestsim_devices beside
-// this program is preloaded into it.
+// root. When the handset has devices that need drivers, the library kestsim_devices, which is
+// beside this program or in ../lib/kestmodem, is preloaded into it.
 #ifndef SIM_SERVICEPROCESS_H_
 #define SIM_SERVICEPROCESS_H_
 

@@ -35,6 +35,12 @@ const CpKind CP_KINDS[] = {
     {"cp_gnss", nullptr, "ro.modem.gnss.diag", nullptr},
 };
 
+const CpKind* find_kind(const std::string& name) {
+    const CpKind* kind = std::find_if(std::begin(CP_KINDS), std::end(CP_KINDS),
+                                      [&](const CpKind& k) { return name == k.name; });
+    return kind == std::end(CP_KINDS) ? nullptr : kind;
+}
+
 const char SD_STATE_PROP[] = "init.svc.fuse_sdcard0";
 
 // Readers never see half a file: it is written beside the old one and moved over it.
@@ -108,10 +114,15 @@ bool SimHandset::create(const std::string& dir, const SimSizes& sizes) {
            write_config();
 }
 
+bool SimHandset::knows_cp(const std::string& name, bool* modem) {
+    const CpKind* kind = find_kind(name);
+    *modem = kind && kind->log_prop;
+    return kind != nullptr;
+}
+
 SimCp* SimHandset::add_cp(const std::string& name, bool terminal) {
-    const CpKind* kind = std::find_if(std::begin(CP_KINDS), std::end(CP_KINDS),
-                                      [&](const CpKind& k) { return name == k.name; });
-    if (kind == std::end(CP_KINDS)) {
+    const CpKind* kind = find_kind(name);
+    if (!kind) {
         m_error = "no CP is called " + name;
         return nullptr;
     }

@@ -61,6 +61,8 @@ public:
     // terminal its log device is one that can also be read, for requests or a dump
     // through the device that a CP other than a modem has for both.
     SimCp* add_cp(const std::string& name, bool terminal = false);
+    // Whether a CP of this name can be added, and whether it is a modem.
+    static bool knows_cp(const std::string& name, bool* modem);
     // Adds the audio DSP ("agdsp"), its devices and its line in the default configuration;
     // its log is no stream like the CPs'. False with error() set on failure.
     bool add_audio_dsp();

@@ -178,3 +178,11 @@ std::string show_bytes_line(const std::string& bytes) {
     }
     return line;
 }
+
+std::string show_name(const std::string& name) {
+    std::string text;
+    for (const char byte : name) {
+        text += show_byte(byte);
+    }
+    return text;
+}

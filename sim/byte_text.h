@@ -21,4 +21,8 @@ std::vector<std::string> show_bytes(const std::string& bytes);
 // The same as a single line.
 std::string show_bytes_line(const std::string& bytes);
 
+// A name or path for a line of text: bytes as they are, or as their escapes where they are no
+// printable ASCII.
+std::string show_name(const std::string& name);
+
 #endif  // SIM_BYTE_TEXT_H_

@@ -1,13 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
-// kestsim: shows the service at work on a simulated handset and checks what it saves.
+// kestsim: shows the service at work on a simulated handset and checks what it saves, plays a
+// recorded card again, or just serves.
 #include <getopt.h>
 #include <signal.h>
 #include <stdio.h>
 #include <stdlib.h>
+#include <string.h>
 
 #include <filesystem>
 
 #include "sim/Demo.h"
+#include "sim/Replay.h"
+#include "sim/Serve.h"
+#include "sim/SimHandset.h"
 
 namespace fs = std::filesystem;
 
@@ -34,6 +39,9 @@ enum Option {
     OPT_SD,
     OPT_NO_SD,
     OPT_KEEP,
+    OPT_REPLAY,
+    OPT_SPEED,
+    OPT_SERVE,
     OPT_HELP
 };
 
@@ -47,6 +55,9 @@ const option OPTIONS[] = {
     {"sd", no_argument, nullptr, OPT_SD},
     {"no-sd", no_argument, nullptr, OPT_NO_SD},
     {"keep", no_argument, nullptr, OPT_KEEP},
+    {"replay", required_argument, nullptr, OPT_REPLAY},
+    {"speed", required_argument, nullptr, OPT_SPEED},
+    {"serve", no_argument, nullptr, OPT_SERVE},
     {"help", no_argument, nullptr, OPT_HELP},
     {nullptr, 0, nullptr, 0},
 };
@@ -58,11 +69,32 @@ bool parse_number(const char* text, double max, double* value) {
     return end != text && *end == '\0' && *value > 0 && *value <= max;
 }
 
+// "KB", for all, or "CP=KB", 0 for a silent one.
+bool parse_rate(const std::string& text, DemoOptions& options) {
+    const size_t at = text.find('=');
+    const std::string cp = at == std::string::npos ? "" : text.substr(0, at);
+    const std::string kb = at == std::string::npos ? text : text.substr(at + 1);
+    double number = 0;
+    const bool silent = !cp.empty() && kb == "0";
+    if (!silent && (!parse_number(kb.c_str(), 1e6, &number) || number < 1)) {
+        return false;
+    }
+    bool modem;
+    if (at == std::string::npos) {
+        options.rate = static_cast<unsigned>(number);
+    } else if (cp == "agdsp" || SimHandset::knows_cp(cp, &modem)) {
+        options.rates[cp] = static_cast<unsigned>(number);
+    } else {
+        return false;
+    }
+    return true;
+}
+
 // 0 to go on, otherwise the exit status plus 1.
 int parse_options(int argc, char** argv, DemoOptions& options) {
-    double number = 0;
     for (int opt; (opt = getopt_long(argc, argv, "", OPTIONS, nullptr)) != -1;) {
         bool good = true;
+        double number = 0;
         switch (opt) {
             case OPT_PROGRAM:
                 options.program = optarg;
@@ -79,8 +111,18 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 options.seconds = number;
                 break;
             case OPT_RATE:
-                good = parse_number(optarg, 1e6, &number) && number >= 1;
-                options.rate = static_cast<unsigned>(number);
+                good = parse_rate(optarg, options);
+                break;
+            case OPT_REPLAY:
+                options.replay = optarg;
+                good = !options.replay.empty();
+                break;
+            case OPT_SPEED:
+                good = strcmp(optarg, "max") == 0 || parse_number(optarg, 1e6, &number);
+                options.speed = number;
+                break;
+            case OPT_SERVE:
+                options.serve = true;
                 break;
             case OPT_FAST:
                 options.seconds = 12;
@@ -89,7 +131,7 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 break;
             case OPT_SD:
             case OPT_NO_SD:
-                options.sd = opt == OPT_SD;
+                options.sd = options.card_in = opt == OPT_SD;
                 break;
             case OPT_KEEP:
                 options.keep = true;
@@ -105,7 +147,7 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
             return 3;
         }
     }
-    if (optind < argc) {
+    if (optind < argc || (options.serve && !options.replay.empty())) {
         fputs(USAGE, stderr);
         return 3;
     }
@@ -124,6 +166,10 @@ int main(int argc, char** argv) {
     const fs::path self = fs::read_symlink("/proc/self/exe", ec);
     if (options.program.empty()) {
         options.program = fs::path(self).replace_filename("kestmodem").string();
+        // As packages place them.
+        if (!fs::exists(options.program, ec)) {
+            options.program = (self.parent_path().parent_path() / "sbin/kestmodem").string();
+        }
     }
     const fs::path reader = fs::path(self).replace_filename("kestlog");
     if (options.reader.empty() && fs::exists(reader, ec)) {
@@ -136,5 +182,11 @@ int main(int argc, char** argv) {
     sigaction(SIGTERM, &action, nullptr);
     sigaction(SIGHUP, &action, nullptr);  // the terminal was closed: still clear up
     signal(SIGPIPE, SIG_IGN);
+    if (!options.replay.empty()) {
+        return Replay(options, &s_interrupted).run();
+    }
+    if (options.serve) {
+        return Serve(options, &s_interrupted).run();
+    }
     return Demo(options, &s_interrupted).run();
 }

@@ -1,0 +1,93 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "sim/Serve.h"
+
+#include <stdio.h>
+
+#include <algorithm>
+#include <cmath>
+
+namespace {
+
+using Diag = SimDiagResponder;
+
+const double STEP_S = 0.01;
+const int CONNECT_MS = 20000;
+const uint8_t DSP_STREAM = 0xD0;
+const size_t DSP_PIECE = 16 << 10;
+
+}  // namespace
+
+Serve::Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
+    : m_options(options),
+      m_interrupted(interrupted),
+      m_stage(options, interrupted),
+      m_dsp_stream(DSP_STREAM) {}
+
+int Serve::run() {
+    const bool started = m_stage.set_up();
+    if (started) {
+        // The three places for clients are for others.
+        if (m_stage.client().connect(m_stage.handset().root(), CONNECT_MS)) {
+            m_stage.client().disconnect();
+            show_place();
+        }
+        Diag::Plan refusal;
+        refusal.mode = Diag::REFUSE;  // only the modem keeps a ring buffer and a sleep log
+        m_stage.wcn_diag().set_plan(Diag::RING_BUFFER, refusal);
+        m_stage.wcn_diag().set_plan(Diag::SLEEP_LOG, refusal);
+        while (m_stage.wait(STEP_S)) {
+            feed_audio_dsp();
+            mind_wcn();
+        }
+        m_stage.clear_line();
+        if (!*m_interrupted) {
+            fprintf(stderr, "kestsim: the service ended by itself (%s); its last messages:\n%s\n",
+                    m_stage.service().status_text().c_str(),
+                    m_stage.service().last_log_lines(10).c_str());
+        }
+    }
+    m_stage.service().stop();
+    m_stage.take_down();
+    const bool good = started && *m_interrupted;
+    end_root(m_stage.handset(), m_options, started, good);
+    return good ? 0 : 1;
+}
+
+void Serve::show_place() {
+    const SimHandset& handset = m_stage.handset();
+    const char* root = handset.root().c_str();
+    printf(
+        "The control socket is ready: local stream socket, abstract, \"kestmodem@%s\".\n"
+        "    KESTMODEM_ROOT=%s kestctl status\n"
+        "    KESTMODEM_ROOT=%s kestctl watch\n"
+        "    kestlog ls %s\n"
+        "The service's messages are in %s.\n"
+        "Ctrl-C ends it.\n\n",
+        root, root, root, m_stage.logs().media()[handset.sd_inserted() ? 1 : 0].log_root.c_str(),
+        handset.path("kestmodem.log").c_str());
+    fflush(stdout);
+}
+
+void Serve::feed_audio_dsp() {
+    // As the others: what the device does not take comes later.
+    const double due = m_stage.now() * m_stage.rate_of("agdsp") * 1024;
+    uint8_t bytes[DSP_PIECE];
+    while (static_cast<double>(m_dsp_fed) < due) {
+        const size_t len = static_cast<size_t>(
+            std::min(std::ceil(due - static_cast<double>(m_dsp_fed)), double{DSP_PIECE}));
+        m_dsp_stream.fill(m_dsp_fed, bytes, len);
+        const ssize_t taken = m_stage.handset().audio_dsp().log().feed(bytes, len);
+        if (taken <= 0) {
+            break;
+        }
+        m_dsp_fed += static_cast<uint64_t>(taken);
+    }
+}
+
+// The chip's log and its answers come through one device: the log waits for them.
+void Serve::mind_wcn() {
+    const Diag& diag = m_stage.wcn_diag();
+    m_stage.wcn().running = diag.requests(Diag::RING_BUFFER) == diag.finished(Diag::RING_BUFFER) &&
+                            diag.requests(Diag::SLEEP_LOG) == diag.finished(Diag::SLEEP_LOG);
+}

@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+// The simulated handset without scenes, for authors of control clients: the service runs in it,
+// the CPs log, answer requests for ring buffers and sleep logs, and that is all, until somebody
+// ends it. Says where the control socket is.
+#ifndef SIM_SERVE_H_
+#define SIM_SERVE_H_
+
+#include <signal.h>
+
+#include <chrono>
+
+#include "sim/DemoStage.h"
+
+class Serve {
+public:
+    // Ends when *interrupted becomes other than 0.
+    Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupted);
+
+    // The exit status: 0 when it was interrupted, 1 when it could not start or the service
+    // ended by itself.
+    int run();
+
+private:
+    void show_place();
+    void feed_audio_dsp();
+    void mind_wcn();
+
+    const DemoOptions& m_options;
+    const volatile sig_atomic_t* m_interrupted;
+    DemoStage m_stage;
+    const SimStream m_dsp_stream;
+    uint64_t m_dsp_fed = 0;
+};
+
+#endif  // SIM_SERVE_H_
