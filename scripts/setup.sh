@@ -17,6 +17,7 @@ kest_has() {
         runit) command -v svlogd >/dev/null ;;
         daemontools) command -v multilog >/dev/null ;;
         apache2-utils) command -v rotatelogs >/dev/null ;;
+        dpkg-dev) command -v dpkg-shlibdeps >/dev/null ;;
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libarchive-dev) kest_includes archive.h ;;
@@ -102,4 +103,21 @@ kest_build() {
         echo "The build in $dir failed; the messages above are in $log." >&2
         return 1
     fi
+}
+
+# kest_clean_system PACKAGES SCRIPT: runs a shell script of this tree as root in a new minimal
+# system of this release, below $TMPDIR or /tmp, which also has these packages (a,b,c). What is in
+# build-clean is in /tmp/clean there, and the script beside it. The system is removed at the end.
+kest_clean_system() {
+    local packages=$1 script=$2 release
+    kest_need mmdebstrap
+    release=$(. /etc/os-release && echo "$VERSION_CODENAME")
+    cp "$script" build-clean/script
+    # The hooks know the system's directory as $1.
+    KEST_CLEAN="$PWD/build-clean" mmdebstrap --quiet --variant=minbase \
+        --format=null ${packages:+"--include=$packages"} \
+        --customize-hook='cp -r "$KEST_CLEAN" "$1/tmp/clean"' \
+        --customize-hook='chroot "$1" env -i PATH="/usr/sbin:/usr/bin:/sbin:/bin" \
+            ${http_proxy:+http_proxy="$http_proxy"} sh /tmp/clean/script' \
+        "$release" -
 }
