@@ -45,6 +45,11 @@ def cmake_tools(top):
             for kind, name, srcs in found}
 
 
+def programs(text):
+    """Names of the programs of an Android.bp."""
+    return set(re.findall(r'^cc_binary \{\n\s+name: "([^"]+)"', text, re.M))
+
+
 def differ(what, bp, cmake):
     for name in sorted(bp - cmake):
         print(f"{what}: {name} is in Android.bp only")
@@ -56,12 +61,14 @@ def differ(what, bp, cmake):
 def main():
     top = sys.argv[1]
     with open(os.path.join(top, "Android.bp")) as f:
-        modules = bp_modules(f.read())
+        text = f.read()
+    modules = bp_modules(text)
     library = cmake_library(top)
     there = {os.path.relpath(p, top) for p in glob.glob(os.path.join(top, "src/*/*.cpp"))}
     bad = differ("libkest", modules["libkest"], {f for f in library if not f.startswith(HOST_ONLY)})
     bad |= differ("src", library | {"src/core/main.cpp"}, there)
     bad |= differ("kestmodem", modules["kestmodem"], {"src/core/main.cpp"})
+    bad |= differ("programs", programs(text), {"kestmodem", "kestctl"})
     for name, srcs in cmake_tools(top).items():
         bad |= differ(name, modules.get(name, set()), set() if name == WORKSTATION_ONLY else srcs)
     return 1 if bad else 0
