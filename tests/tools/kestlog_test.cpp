@@ -115,10 +115,11 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     // It waits for an archive from a pipe when it is ended.
     ASSERT_EQ(mkfifo(m_root.path("pipe").c_str(), 0600), 0);
     for (const std::string signal : {"INT", "TERM", "KILL"}) {
-        const std::string script = "env --default-signal=INT '" KESTLOG
-                                   "' ls - <>pipe & "
-                                   "until ls temp | grep -q kestlog; do :; done; kill -" +
-                                   signal + " $!";
+        const std::string script =
+            "env --default-signal=INT '" KESTLOG
+            "' ls - <>pipe & "
+            "timeout 60 sh -c 'until ls temp | grep -q kestlog; do :; done'; kill -" +
+            signal + " $!";
         EXPECT_EQ(system(("cd " + m_root.root() + "; " + script).c_str()), 0);
         EXPECT_TRUE(wait_until([&] { return m_root.list("temp").empty(); })) << signal;
     }
