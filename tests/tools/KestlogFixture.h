@@ -73,7 +73,7 @@ protected:
             write(MODEM + head + STAMP + ".log", "x");
         }
         write(MODEM + "cp_wcdma_memory_" + STAMP + ".mem", "x");
-        write(MODEM + "cp_wcdma_wiq_" + STAMP + ".bin", "x");
+        write(MODEM + "cp_wcdma_wiq_" + STAMP + ".bin", "iqiq");
         write(MODEM + "mini_dump_" + STAMP + ".bin", "x");
         write(WCN_LOG, LOG_DATA);
         write(WCN + "cp_wcn_memory_" + STAMP + ".dmp", LOG_DATA);

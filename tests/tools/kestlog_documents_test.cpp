@@ -101,11 +101,18 @@ const struct {
     {"split", {"-o . " + OLD_DSP_LOG}},
     {"export", {"-o capture ."}},
     {"follow", {CHANGES}},
+    {"join", {"--cp agdsp -o all ."}},
+    {"extract", {"-o images ."}},
+#ifdef KEST_WAV
+    {"wav", {"--rate 8000 --channels 1 --format s16le -o sound.wav ."}},
+#endif
+    {"sigmf", {"--datatype ci16_le --rate 1 --frequency 1 -o meta iq"}},
 };
 
 TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
     write_good_tree();
     write(DSP_LOG, "no chunks");
+    write("iq", "12345");
     for (uint32_t lost = 1; lost < 30; ++lost) {
         m_root.write_file(DSP_LOG, m_root.read_file(DSP_LOG) + chunk(2 * lost, LOG, "x"));
     }
@@ -141,6 +148,9 @@ TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
         EXPECT_EQ(tables.count(command), 1u) << command << " is not described";
         tables.erase(command);
     }
+#ifndef KEST_WAV
+    tables.erase("wav");
+#endif
     EXPECT_TRUE(tables.empty()) << tables.begin()->first << " is no command";
 }
 
@@ -184,6 +194,9 @@ TEST_F(KestlogDocuments, TheManualPageHasEveryCommandAndOption) {
             EXPECT_NE(all.find(usage), std::string::npos) << usage << " is not described";
         }
     }
+#ifndef KEST_WAV
+    headings.erase("wav FILE|ROOT...");
+#endif
     EXPECT_TRUE(headings.empty()) << *headings.begin() << " is no command";
 }
 
@@ -230,6 +243,11 @@ TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
         section =
             line[0] == '.' && line.compare(0, 3, ".SH") == 0 ? line == ".SH EXAMPLES" : section;
         example = line == ".nf" || (example && line != ".fi");
+#ifndef KEST_WAV
+        if (line.compare(0, 11, "kestlog wav") == 0) {
+            continue;
+        }
+#endif
         if (section && example && line[0] != '.') {
             ++examples;
             write("example", std::regex_replace(line, std::regex("(^|[ =:])/(?!dev/)"),

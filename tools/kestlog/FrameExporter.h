@@ -27,7 +27,7 @@ public:
         uint64_t files = 0;    // that could be opened
         uint64_t packets = 0;  // written
         uint64_t broken = 0;   // how many of them are
-        uint64_t other = 0;    // bytes that are outside frames and chunks, or in broken ones
+        uint64_t other = 0;    // bytes outside frames and chunks, or in broken ones left out
     };
 
     FrameExporter(const ExportPlan& plan, PcapngWriter* writer, const Wanted& wanted)

@@ -49,8 +49,7 @@ void print_summary(FILE* to, bool json, const std::string& path, const ExportPla
         return;
     }
     const auto number = [](uint64_t value) { return static_cast<unsigned long long>(value); };
-    fprintf(to,
-            "%s: %llu packets on %zu interfaces from %llu files; %llu bytes in no intact frame\n",
+    fprintf(to, "%s: %llu packets on %zu interfaces from %llu files, %llu other bytes\n",
             escape_text(path).c_str(), number(totals.packets), plan.interfaces.size(),
             number(totals.files), number(totals.other));
 }
