@@ -252,7 +252,7 @@ bool Follower::finish() {
     take_changes();
     settle();
     m_tree.check_open();
-    draw(true);
+    draw(false);  // a part of a second has no rate
     m_output.leave();
     return write_out();
 }
