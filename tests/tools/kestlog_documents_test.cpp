@@ -98,6 +98,8 @@ const struct {
     {"info", {WCN_LOG + " " + DSP_LOG, MODEM_LOG, MODEM_DUMP, MODEM + "cp_wcdma.version"}},
     {"verify", {"."}},
     {"frames", {MODEM_LOG, "--hex " + OLD_DSP_LOG + " " + WCN_LOG}},
+    {"report", {". nowhere", "--iq-rate 1e6 --iq-format ci8 --pcm-rate 8000 --pcm-format s8 ."}},
+    {"bundle", {"--crash 2016-03-01 -o crash.tar ."}},
     {"split", {"-o . " + OLD_DSP_LOG}},
     {"export", {"-o capture ."}},
     {"follow", {CHANGES}},
@@ -114,7 +116,7 @@ TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
     write(DSP_LOG, "no chunks");
     write("iq", "12345");
     for (uint32_t lost = 1; lost < 30; ++lost) {
-        m_root.write_file(DSP_LOG, m_root.read_file(DSP_LOG) + chunk(2 * lost, LOG, "x"));
+        m_root.write_file(DSP_LOG, m_root.read_file(DSP_LOG) + chunk(2 * lost, PCM, "x"));
     }
     std::map<std::string, std::vector<Table>> tables = read_tables();
     for (const auto& command : RUNS) {
