@@ -280,4 +280,61 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
         << dom.substr(dom.find("<title>"), 400);
 }
 
+TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
+    write_day();
+    // Another CP at the time; the library is on the other medium only.
+    const std::string wcn = HANDSET + "modem_log/2016-03-01-08-00-00/cp_wcn/";
+    write(wcn + "0-cp_wcn-2016-03-01_09-04-00.log", "around");
+    write(wcn + "cp_wcn_memory_2016-03-01_09-06-30.dmp", "of another crash");
+    write(wcn + "cp_wcn_sleeplog_2016-03-01_09-20-00.log", "much later");
+    write(CARD + "modem_db.gz", "db");
+    write(CARD + "sha1.txt", std::string(40, 'A'));
+    EXPECT_EQ(run("bundle handset --crash 09:05 --minutes 2 -o crash.tar"), 0) << m_err;
+    EXPECT_EQ(m_out,
+              "crash.tar: 2016-03-01 09:06:00 cp_wcdma on internal: mini dump, IPC record, memory "
+              "dump; 9 files, 3116 bytes\n");
+    m_root.make_dir("unpacked");
+    ASSERT_EQ(
+        system(("tar xf " + m_root.path("crash.tar") + " -C " + m_root.path("unpacked")).c_str()),
+        0);
+    const std::string modem = "data/modem_log/2016-03-01-08-00-00/cp_wcdma/";
+    const std::vector<std::string> FILES = {
+        modem + log_at(2, "09-05-00"),
+        modem + log_at(3, "09-00-00"),
+        modem + "cp_wcdma.version",
+        modem + "cp_wcdma_memory_2016-03-01_09-06-02.dmp",
+        modem + "mini_dump_2016-03-01_09-06-00.bin",
+        modem + "smsg_2016-03-01_09-06-01.log",
+        "data/modem_log/2016-03-01-08-00-00/cp_wcn/0-cp_wcn-2016-03-01_09-04-00.log",
+        "data/modem_log/modem_db.gz",
+        "data/modem_log/sha1.txt",
+        "report.html",
+    };
+    EXPECT_EQ(m_root.tree("unpacked"), FILES);
+    for (size_t i = 0; i < 7; ++i) {
+        EXPECT_EQ(m_root.read_file("unpacked/" + FILES[i]),
+                  m_root.read_file("handset/" + FILES[i]));
+    }
+    // Its own report is that of the crash, and of the tree in the tar.
+    const Json inside = data_of(m_root.read_file("unpacked/report.html"));
+    EXPECT_EQ(inside["totals"]["files"], 9);
+    EXPECT_EQ(inside["crashes"].size(), 1u);
+    const Json again = report("crash.tar", 3);
+    EXPECT_EQ(again["crashes"], inside["crashes"]);
+    EXPECT_EQ(only(again["timeline"], {{"kind", "log"}, {"cp", "cp_wcdma"}, {"size", 3000}}),
+              only(inside["timeline"], {{"kind", "log"}, {"cp", "cp_wcdma"}, {"size", 3000}}));
+
+    EXPECT_EQ(run("bundle handset --crash 09:05 -o crash.tar"), 4);
+    EXPECT_EQ(run("bundle handset --crash 2016-03-03 -o none.tar"), 2);
+    EXPECT_NE(m_err.find("no crash within a day of 2016-03-03 00:00:00; there are:\n"
+                         "kestlog: 2016-03-01 09:06:00 cp_wcdma on internal: mini dump, "),
+              std::string::npos)
+        << m_err;
+    EXPECT_FALSE(m_root.exists("none.tar"));
+    for (const char* wrong :
+         {"-o x", "--crash noon -o x", "--crash 9:06", "--crash 9:06 -o x --minutes 9999"}) {
+        EXPECT_EQ(run("bundle handset " + std::string(wrong)), 1) << wrong;
+    }
+}
+
 }  // namespace

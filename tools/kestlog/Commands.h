@@ -10,6 +10,7 @@ int run_ls(const CommandLine& line);
 int run_info(const CommandLine& line);
 int run_verify(const CommandLine& line);
 int run_frames(const CommandLine& line);
+int run_bundle(const CommandLine& line);
 int run_extract(const CommandLine& line);
 int run_follow(const CommandLine& line);
 int run_join(const CommandLine& line);

@@ -16,9 +16,6 @@
 
 namespace {
 
-constexpr char INTERNAL[] = "internal";
-constexpr char CARD[] = "card";
-
 bool is_dir(const std::string& path) {
     struct stat st;
     return stat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
@@ -159,7 +156,7 @@ bool LogTree::add_archive(const std::string& path) {
 bool LogTree::add_card(const std::string& path) {
     m_card_given = true;
     m_alias = {};
-    return add_medium(path, CARD);
+    return add_medium(path, MEDIUM_CARD);
 }
 
 // What a handset's root or a medium's top directory holds. False when path is neither.
@@ -168,8 +165,8 @@ bool LogTree::add_media(const std::string& path) {
     const std::string name = m_medium;
     const std::string handset = m_roots++ ? name + " " : "";
     const bool medium = add_medium(path, name);
-    const bool internal = add_medium(path + PATH_DATA_PARTITION, handset + INTERNAL);
-    const bool card = !m_card_given && add_medium(path + CARD_IN_ROOT, handset + CARD);
+    const bool internal = add_medium(path + PATH_DATA_PARTITION, handset + MEDIUM_INTERNAL);
+    const bool card = !m_card_given && add_medium(path + CARD_IN_ROOT, handset + MEDIUM_CARD);
     return medium || internal || card;
 }
 

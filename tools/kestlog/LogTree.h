@@ -20,6 +20,9 @@
 
 // Where a handset's root has its card: the mount point that the simulated handset uses, too.
 constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
+// What the media of a handset are called.
+constexpr char MEDIUM_INTERNAL[] = "internal";
+constexpr char MEDIUM_CARD[] = "card";
 
 // A directory with files of the tree. Both end with "/".
 struct TreeDir {

@@ -31,6 +31,7 @@ constexpr Command COMMANDS[] = {
     {"follow", "ROOT...", 1, ANY, run_follow, "tell what grows, until Ctrl-C: files, crashes, damage"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
     {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
+    {"bundle", "ROOT...", 1, ANY, run_bundle, "write all that belongs to a crash into a tar, for a bug report"},
     {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
     {"extract", "FILE|ROOT...", 1, ANY, run_extract,
      "write what is in frames to files: memory images, ring buffers, the payloads of a type"},
@@ -43,11 +44,11 @@ constexpr Command COMMANDS[] = {
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify report join extract wav export";
+constexpr char TREES[] = "ls verify report bundle join extract wav export";
 // Those and the one that waits for what is still to come.
-constexpr char CARDS[] = "ls verify follow report join extract wav export";
+constexpr char CARDS[] = "ls verify follow report bundle join extract wav export";
 // The commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report join extract wav export";
+constexpr char TIMES[] = "ls verify frames report bundle join extract wav export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -73,13 +74,15 @@ constexpr Option OPTIONS[] = {
     {"format",       "FORMAT", "wav",  "of a sample: u8, s16le, s16be, s24le ... s32be, f32le, f32be"},
     {"fill-gaps",    nullptr, "wav",   "put silence where chunks are missing"},
 #endif
+    {"crash",        "T",     "bundle", "the crash nearest to T"},
+    {"minutes",      "N",     "bundle", "with the logs of so many minutes around it (default: 5)"},
     {"iq-rate",      "HZ",    "report", "draw the spectra of I/Q captures with this sample rate"},
     {"iq-format",    "F",     "report", "and this format: ci8, ci16_le, ci32_le, cf32_le"},
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "export extract join report sigmf split wav", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "export extract join report sigmf split wav", "replace files that exist"},
+    {"output",       "PATH",  "bundle export extract join report sigmf split wav", "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, "bundle export extract join report sigmf split wav", "replace files that exist"},
 };
 // clang-format on
 

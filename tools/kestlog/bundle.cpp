@@ -1,0 +1,180 @@
+// SPDX-License-Identifier: Apache-2.0
+// kestlog bundle.
+#include <stdio.h>
+#include <stdlib.h>
+
+#include <algorithm>
+#include <set>
+
+#include "common/text.h"
+#include "kestlog/BundleWriter.h"
+#include "kestlog/CardReport.h"
+#include "kestlog/Commands.h"
+#include "kestlog/ExitStatus.h"
+#include "kestlog/Progress.h"
+#include "kestlog/ReportPage.h"
+#include "kestlog/TreeInput.h"
+
+namespace {
+
+constexpr int64_t DAY_SECONDS = 24 * 60 * 60;
+constexpr size_t MAX_CRASHES = 20;  // that an error lists
+
+std::string crash_line(const Crash& crash) {
+    return time_text(crash.time) + " " + crash.cp->name + " on " + crash.set->medium + ": " +
+           crash_text(crash);
+}
+
+// The crash nearest to the time; null, after printing which there are, when none is near.
+const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time) {
+    const auto distance = [&time](const Crash& crash) {
+        return std::abs(seconds_of(crash.time) - seconds_of(time));
+    };
+    const auto nearest =
+        std::min_element(crashes.begin(), crashes.end(),
+                         [&](const Crash& a, const Crash& b) { return distance(a) < distance(b); });
+    if (nearest != crashes.end() && distance(*nearest) <= DAY_SECONDS) {
+        return &*nearest;
+    }
+    failure(ES_UNREADABLE, "no crash within a day of " + time_text(time) +
+                               (crashes.empty() ? "; there is none at all" : "; there are:"));
+    for (size_t i = 0; i < std::min(crashes.size(), MAX_CRASHES); ++i) {
+        failure(ES_UNREADABLE, crash_line(crashes[i]));
+    }
+    if (crashes.size() > MAX_CRASHES) {
+        failure(ES_UNREADABLE, "and " + std::to_string(crashes.size() - MAX_CRASHES) + " more");
+    }
+    return nullptr;
+}
+
+template <typename T, typename Test>
+void erase_if(std::vector<T>* list, Test test) {
+    list->erase(std::remove_if(list->begin(), list->end(), test), list->end());
+}
+
+// The set beside which the file lies; null without one.
+const TreeSet* set_beside(const LogTree& tree, const TreeFile& root_file) {
+    const auto found = std::find_if(
+        tree.sets.begin(), tree.sets.end(),
+        [&root_file](const TreeSet& set) { return set.shown == root_file.dir->shown + set.name; });
+    return found == tree.sets.end() ? nullptr : &*found;
+}
+
+// Leaves the parsing library of the media of the sets or, when they have none, of the first.
+void reduce_databases(LogTree* tree) {
+    std::vector<TreeFile>& files = tree->root_files;
+    const auto beside = [tree](const TreeFile& file) { return set_beside(*tree, file); };
+    if (std::any_of(files.begin(), files.end(), beside)) {
+        erase_if(&files, [&](const TreeFile& file) { return !beside(file); });
+    } else if (!files.empty()) {
+        const std::shared_ptr<const TreeDir> first = files[0].dir;
+        erase_if(&files, [&first](const TreeFile& file) { return file.dir != first; });
+    }
+}
+
+// Leaves in the tree what belongs to the crash, which is part of it and no more valid then.
+void reduce(const Crash& crash, int64_t seconds, LogTree* tree) {
+    std::set<std::string> own;
+    for (const TreeFile* file : crash.files) {
+        own.insert(file->path());
+    }
+    const LogTime since = time_of(seconds_of(crash.time) - seconds);
+    const LogTime until = time_of(seconds_of(crash.files.back()->name.time) + seconds);
+    const auto belongs = [&](const TreeFile& file) {
+        const LogType type = file.name.type;
+        const bool around = type == LT_LOG || type == LT_RINGBUF || type == LT_SLEEP_LOG;
+        return own.count(file.path()) > 0 || type == LT_VERSION ||
+               (around && !(file.end < since) && !(until < file.name.time));
+    };
+    const auto only_version = [](const TreeCp& cp) {
+        return std::all_of(cp.files.begin(), cp.files.end(),
+                           [](const TreeFile& file) { return file.name.type == LT_VERSION; });
+    };
+    for (TreeSet& set : tree->sets) {
+        for (TreeCp& cp : set.cps) {
+            erase_if(&cp.files, [&](const TreeFile& file) { return !belongs(file); });
+        }
+        erase_if(&set.cps, only_version);
+    }
+    erase_if(&tree->sets, [](const TreeSet& set) { return set.cps.empty(); });
+    reduce_databases(tree);
+    tree->strays.clear();
+    tree->foreign.clear();
+}
+
+bool write_bundle(const LogTree& tree, const std::string& page, BundleWriter* bundle) {
+    bool good = bundle->add_text("report.html", page);
+    for (const TreeFile& file : tree.root_files) {
+        const TreeSet* const set = set_beside(tree, file);
+        good = good && bundle->add_root_file(set ? *set : tree.sets[0], file);
+    }
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                good = good && bundle->add_file(set, cp, file);
+            }
+        }
+    }
+    return good && bundle->finish();
+}
+
+}  // namespace
+
+int run_bundle(const CommandLine& line) {
+    const std::string minutes = line.value("minutes", "5");
+    char* rest;
+    const long length = strtol(minutes.c_str(), &rest, 10);
+    if (minutes.empty() || *rest || length < 0 || length > DAY_SECONDS / 60) {
+        return line.usage_error("--minutes: '" + minutes + "' is not a number up to 1440");
+    }
+    for (const char* option : {"crash", "output"}) {
+        if (!line.has(option)) {
+            return line.usage_error("--" + std::string(option) + " is missing");
+        }
+    }
+    LogTree tree;
+    int status;
+    if (!open_tree(line, &tree, &status)) {
+        return status;
+    }
+    LogTime time;
+    if (!parse_time(line.value("crash", ""), tree.newest(), false, &time)) {
+        return line.usage_error("--crash: '" + line.value("crash", "") + "' is not a time");
+    }
+    const std::vector<Crash> crashes = find_crashes(tree);
+    const Crash* const crash = find_crash(crashes, time);
+    if (!crash) {
+        tell_failures(tree);
+        return ES_UNREADABLE;
+    }
+    OutputFile out;
+    if (!out.open(line.value("output", ""), line.has("force"))) {
+        return out.failed();
+    }
+    const std::string about = crash_line(*crash);
+    reduce(*crash, length * 60, &tree);
+    const Progress progress(2 * tree.size());  // for the report, and into the tar
+    ReportOptions options;
+    options.whole = false;
+    CardReport report(tree, options);
+    report.set_roots({about});
+    BundleWriter bundle(out);
+    if (!write_bundle(tree, report_page(report.json()), &bundle) || !out.close()) {
+        return out.failed();
+    }
+    Progress::clear();
+    if (out.path() == "-") {
+        // The tar is there.
+    } else if (line.has("json")) {
+        print_json({{"path", json_text(out.path())},
+                    {"crash", json_text(about)},
+                    {"files", bundle.files()},
+                    {"size", bundle.bytes()},
+                    {"unreadable", bundle.unreadable()}});
+    } else {
+        printf("%s: %s; %llu files, %llu bytes\n", escape_text(out.path()).c_str(),
+               escape_text(about).c_str(), static_cast<unsigned long long>(bundle.files()),
+               static_cast<unsigned long long>(bundle.bytes()));
+    }
+    return bundle.unreadable() || !tree.failures.empty() ? ES_UNREADABLE : ES_OK;
+}
