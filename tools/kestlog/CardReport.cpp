@@ -10,8 +10,9 @@
 
 namespace {
 
-// Logs that pause for longer are shown as a gap.
-constexpr int64_t PAUSE_SECONDS = 10;
+// Logs that pause for longer are shown as a gap. Files follow each other at once where the stream
+// went on; their times have a resolution of a second.
+constexpr int64_t PAUSE_SECONDS = 2;
 
 int64_t seconds_between(const LogTime& from, const LogTime& to) {
     return has_time(from) && has_time(to) ? seconds_of(to) - seconds_of(from) : 0;

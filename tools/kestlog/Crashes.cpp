@@ -12,6 +12,8 @@ namespace {
 
 // A dump of a whole memory may take minutes before its substitute is begun.
 constexpr int64_t MAX_PAUSE_SECONDS = 300;
+// More than the service ever writes.
+constexpr size_t MAX_FILES = 100;
 
 // The name without its time: what a crash has only once.
 std::string kind_key(const FileName& name) {
@@ -38,7 +40,7 @@ void find_in(const TreeSet& set, const TreeCp& cp, std::vector<Crash>* crashes) 
         }
         const LogTime& time = file.name.time;
         if (!crash.files.empty() &&
-            (kinds.count(kind_key(file.name)) > 0 ||
+            (kinds.count(kind_key(file.name)) > 0 || crash.files.size() == MAX_FILES ||
              seconds_of(time) - seconds_of(crash.files.back()->name.time) > MAX_PAUSE_SECONDS)) {
             finish();
         }

@@ -64,14 +64,14 @@ const items = data.timeline
     .sort((a, b) => rank(a) - rank(b) || a.t0 - b.t0);
 const byTime = items.slice().sort((a, b) => a.t0 - b.t0);
 const sets = data.sets.filter((set) => seconds(set.time) >= 0);
-const best = {};  // the highest rate of a lane
+const best = Object.create(null);  // the highest rate of a lane
 for (const item of items) {
     best[item.cp] = Math.max(best[item.cp] || 1, item.kind === 'log' && item.rate || 0);
 }
-let first = seconds(data.from), last = seconds(data.to);
-if (!(first >= 0 && last >= first)) {
-    first = last = 0;
-}
+// A wrong clock may have left times that are none: what is drawn decides.
+const starts = items.map((item) => item.t0).concat(sets.map((set) => seconds(set.time)));
+let first = starts.length ? starts.reduce((a, b) => Math.min(a, b)) : 0;
+let last = items.map((item) => item.t1).concat(starts).reduce((a, b) => Math.max(a, b), first);
 const margin = Math.max(5, (last - first) * 0.02);
 first -= margin;
 last += margin;
@@ -199,7 +199,7 @@ function draw() {
             }
         } else if (SPANS.includes(item.kind)) {
             shape = node(group, 'rect', {x: left, y: top, height: BAR, class: item.kind,
-                width: Math.max(4, cut(item.t1) - left), fill: 'url(#hatch-' + item.kind + ')'});
+                width: Math.max(item.kind === 'missing' ? 4 : 1.5, cut(item.t1) - left), fill: 'url(#hatch-' + item.kind + ')'});
         } else {
             shape = symbol(group, item.kind, left, top - 10);
         }
