@@ -119,7 +119,9 @@ bool Demo::finish() {
     printf("\nWhat is in the root now:\n");
     print_tree(m_stage.handset().root(), "    ");
     const bool read = read_logs();
-    return show_verdict() && read && good;
+    const bool verdict = show_verdict();
+    const bool reported = write_report();
+    return verdict && read && reported && good;
 }
 
 bool Demo::read_logs() {
@@ -142,6 +144,24 @@ bool Demo::read_logs() {
         }
     }
     return good;
+}
+
+bool Demo::write_report() {
+    if (m_options.reader.empty() || m_options.report.empty()) {
+        return true;
+    }
+    std::string text;
+    const int status = run_program(
+        {m_options.reader, "report", "--force", "-o", m_options.report, m_stage.handset().root()},
+        &text);
+    std::error_code ec;
+    const std::string path = fs::absolute(m_options.report, ec).string();
+    if (status == 0) {
+        printf("A page of all this for your browser: %s\n", path.c_str());
+    } else {
+        printf("FAILED: kestlog report, exit status %d: %s\n", status, text.c_str());
+    }
+    return status == 0;
 }
 
 bool Demo::show_verdict() {

@@ -22,6 +22,7 @@ private:
     void play();
     bool finish();
     bool read_logs();
+    bool write_report();
     bool show_verdict();
 
     const DemoOptions m_options;

@@ -33,6 +33,7 @@ struct DemoOptions {
     bool fast = false;                      // the scenes do not take their time
     bool keep = false;                      // do not remove the root at the end
     std::string reader;  // the program kestlog; empty: the logs are not read with it
+    std::string report;  // where it writes a page of all logs; empty: nowhere
     bool serve = false;  // no scenes, no end
     std::string replay;  // the recorded card
     double speed = 1;    // of the replay, 1 as recorded, 0 as fast as it goes

@@ -32,6 +32,7 @@ const char USAGE[] =
 enum Option {
     OPT_PROGRAM = 1,
     OPT_READER,
+    OPT_REPORT,
     OPT_ROOT,
     OPT_SECONDS,
     OPT_RATE,
@@ -48,6 +49,7 @@ enum Option {
 const option OPTIONS[] = {
     {"kestmodem", required_argument, nullptr, OPT_PROGRAM},
     {"kestlog", required_argument, nullptr, OPT_READER},
+    {"report", required_argument, nullptr, OPT_REPORT},
     {"root", required_argument, nullptr, OPT_ROOT},
     {"seconds", required_argument, nullptr, OPT_SECONDS},
     {"rate", required_argument, nullptr, OPT_RATE},
@@ -101,6 +103,9 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 break;
             case OPT_READER:
                 options.reader = optarg;
+                break;
+            case OPT_REPORT:
+                options.report = optarg;
                 break;
             case OPT_ROOT:
                 options.root = optarg;

@@ -48,7 +48,7 @@ constexpr char TREES[] = "ls verify report bundle join extract wav export";
 // Those and the one that waits for what is still to come.
 constexpr char CARDS[] = "ls verify follow report bundle join extract wav export";
 // The commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report bundle join extract wav export";
+constexpr char TIMES[] = "ls verify frames report join extract wav export";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
