@@ -2,6 +2,8 @@
 
 #include "kestlog/LiveTree.h"
 
+#include <limits.h>
+#include <stdlib.h>
 #include <sys/stat.h>
 
 #include "common/text.h"
@@ -34,7 +36,7 @@ void LiveTree::created(Dir& dir, const std::string& name) {
     if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name)) {
         return;
     }
-    add(dir, {FileName(name), there ? static_cast<uint64_t>(st.st_size) : 0}, true);
+    add(dir, name, {there ? static_cast<uint64_t>(st.st_size) : 0}, true);
 }
 
 void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
@@ -45,21 +47,19 @@ void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
         closed(dir, to);
         return;
     }
-    File file = it->second;
-    const bool was_exact = file.name.exact;
-    file.name = FileName(to);
+    const File file = it->second;
     dir.files.erase(it);
     for (std::set<Place>* places : {&m_closed, &m_written}) {
         if (places->erase({&dir, from})) {
             places->insert({&dir, to});
         }
     }
-    if (was_exact) {
+    if (FileName(from).exact) {
         dir.files[to] = file;  // the service counts its files up
     } else {
         // What copies a tree gives a file its name when it is whole.
         dir.files.erase(to);
-        add(dir, file, true);
+        add(dir, to, file, true);
         closed(dir, to);
     }
 }
@@ -97,61 +97,71 @@ void LiveTree::database_written(const std::string& root) {
     m_tell(event);
 }
 
-void LiveTree::add(Dir& dir, const File& file, bool tell) {
-    const auto [it, is_new] = dir.files.insert({file.name.text, file});
+void LiveTree::add(Dir& dir, const std::string& name, const File& file, bool tell) {
+    const auto [it, is_new] = dir.files.insert({name, file});
     if (is_new && tell) {
         it->second.unchecked = true;
-        m_written.insert({&dir, file.name.text});
-        m_sums[cp_of(dir, file)].grown += file.size;
-        tell_new(dir, file);
+        m_written.insert({&dir, name});
+        m_sums[cp_of(dir, name)].grown += file.size;
+        tell_new(dir, FileName(name));
     }
 }
 
-void LiveTree::tell_new(Dir& dir, const File& file) {
-    const FileName& name = file.name;
+void LiveTree::tell_new(Dir& dir, const FileName& name) {
     const std::string shown = escape_text(name.text);
     if (name.type == LT_DUMP) {
-        tell("crash", dir, file, std::string(name.kind) + " begins: " + shown,
+        tell("crash", dir, name, std::string(name.kind) + " begins: " + shown,
              {{"state", "begins"}});
         return;
     }
     if (name.is_crash() || !name.exact) {
         return;  // told when it is complete
     }
-    File* before = nullptr;
-    for (auto& [other_name, other] : dir.files) {
-        if (name.is_log() && name.number == 0 && other.name.is_log() && other.name.number > 0 &&
-            (!before || other.name.number < before->name.number)) {
-            before = &other;
+    // The one that was counted up to make room for it.
+    std::string before;
+    unsigned long lowest = ULONG_MAX;
+    for (const auto& [other, file] : dir.files) {
+        if (!name.is_log() || name.number != 0) {
+            break;
+        }
+        const unsigned long number = strtoul(other.c_str(), nullptr, 10);
+        if (number > 0 && number < lowest && FileName(other).is_log()) {
+            lowest = number;
+            before = other;
         }
     }
-    if (!before) {
-        tell("file", dir, file, std::string("new ") + name.kind + ": " + shown, Json::object());
+    if (before.empty()) {
+        tell("file", dir, name, std::string("new ") + name.kind + ": " + shown, Json::object());
         return;
     }
-    look(dir, *before);
-    tell("rotation", dir, file,
-         "rotation: " + shown + " follows " + escape_text(before->name.text) + ", " +
-             size_text(before->size),
-         {{"before", json_text(before->name.text)}, {"before_size", before->size}});
+    look(dir, before);
+    const uint64_t size = dir.files.at(before).size;
+    tell("rotation", dir, name,
+         "rotation: " + shown + " follows " + escape_text(before) + ", " + size_text(size),
+         {{"before", json_text(before)}, {"before_size", size}});
 }
 
-void LiveTree::tell(const char* event, const Dir& dir, const File& file, const std::string& words,
-                    const Json& more) {
-    const std::string& cp = cp_of(dir, file);
+std::string LiveTree::cp_of(const Dir& dir, const std::string& name) {
+    const std::string cp = cp_type_of(dir.cp) == CT_UNKNOWN ? FileName(name).cp : dir.cp;
+    return cp.empty() ? dir.cp : cp;
+}
+
+void LiveTree::tell(const char* event, const Dir& dir, const FileName& name,
+                    const std::string& words, const Json& more) {
+    const std::string cp = cp_of(dir, name.text);
     LiveEvent told(event, dir.medium + " " + cp, words);
     told.json.update({{"medium", json_text(dir.medium)},
                       {"set", json_text(dir.set)},
                       {"cp", json_text(cp)},
-                      {"file", json_text(file.name.text)},
-                      {"kind", file.name.kind},
-                      {"size", file.size}});
+                      {"file", json_text(name.text)},
+                      {"kind", name.kind},
+                      {"size", dir.files.at(name.text).size}});
     told.json.update(more);
     m_tell(told);
 }
 
-void LiveTree::tell_damage(const Dir& dir, const File& file, const Finding& finding) {
-    tell("damage", dir, file, escape_text(file.name.text) + ": " + finding_text(finding),
+void LiveTree::tell_damage(const Dir& dir, const FileName& name, const Finding& finding) {
+    tell("damage", dir, name, escape_text(name.text) + ": " + finding_text(finding),
          finding_json(finding));
 }
 

@@ -21,10 +21,11 @@
 
 class LiveTree {
 public:
+    // There may be very many: what its name says is read again when it is asked for.
     struct File {
-        FileName name{""};
         uint64_t size = 0;
         bool unchecked = false;         // written to since it was last checked
+        bool seen = false;              // while the tree is taken
         uint64_t checked = UINT64_MAX;  // its size when it was checked after it was closed
     };
     // A CP's directory. One that is gone is kept: a card that comes back is no news.
@@ -40,8 +41,8 @@ public:
     struct Sum {
         uint64_t files = 0;
         uint64_t size = 0;
-        uint64_t grown = 0;   // bytes since the last sums
-        FileName newest{""};  // of the log files
+        uint64_t grown = 0;  // bytes since the last sums
+        std::string newest;  // of the log files
     };
 
     // A check of a file's content ends early when *stop becomes other than 0.
@@ -75,23 +76,21 @@ public:
 
 private:
     // That a file belongs to: in a renamed directory its own name tells.
-    static const std::string& cp_of(const Dir& dir, const File& file) {
-        return cp_type_of(dir.cp) == CT_UNKNOWN && !file.name.cp.empty() ? file.name.cp : dir.cp;
-    }
+    static std::string cp_of(const Dir& dir, const std::string& name);
     typedef std::pair<Dir*, std::string> Place;  // a file's directory and name
 
     void take_roots(const std::set<std::string>& roots, bool tell);
     void leave(const std::set<std::string>& sets, const std::set<std::string>& dirs);
     void tell_set(const TreeSet& set);
-    void take_files(Dir& dir, const std::vector<TreeFile>& files, bool tell);
-    void add(Dir& dir, const File& file, bool tell);
-    void tell_new(Dir& dir, const File& file);
+    void take_files(Dir& dir, const std::vector<const TreeFile*>& files, bool tell);
+    void add(Dir& dir, const std::string& name, const File& file, bool tell);
+    void tell_new(Dir& dir, const FileName& name);
     void tell_deleted(Dir& dir);
-    void tell(const char* event, const Dir& dir, const File& file, const std::string& words,
+    void tell(const char* event, const Dir& dir, const FileName& name, const std::string& words,
               const Json& more);
-    void tell_damage(const Dir& dir, const File& file, const Finding& finding);
-    bool check(Dir& dir, File& file, bool is_closed);
-    void look(Dir& dir, File& file);
+    void tell_damage(const Dir& dir, const FileName& name, const Finding& finding);
+    bool check(Dir& dir, const FileName& name, bool is_closed);
+    void look(Dir& dir, const std::string& name);
 
     const std::function<void(const LiveEvent&)> m_tell;
     const volatile sig_atomic_t& m_stop;

@@ -26,8 +26,7 @@ void judge_closed(const FileName& name, Finding* finding) {
 
 void LiveTree::settle() {
     for (auto it = m_closed.begin(); it != m_closed.end() && !m_stop;) {
-        Dir& dir = *it->first;
-        it = check(dir, dir.files.at(it->second), true) ? m_closed.erase(it) : std::next(it);
+        it = check(*it->first, FileName(it->second), true) ? m_closed.erase(it) : std::next(it);
     }
     for (auto& [path, dir] : m_dirs) {
         if (dir.deleted) {
@@ -38,91 +37,99 @@ void LiveTree::settle() {
 
 void LiveTree::check_open() {
     for (auto& [path, dir] : m_dirs) {
-        for (auto& [name, file] : dir.files) {
+        for (const auto& [name, file] : dir.files) {
             if (dir.present && file.unchecked && !m_stop) {
-                check(dir, file, false);
+                check(dir, FileName(name), false);
             }
         }
     }
 }
 
 // False when the file has another name already, which the next change tells.
-bool LiveTree::check(Dir& dir, File& file, bool is_closed) {
+bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
     LogReader in;
-    if (!file.name.exact && is_closed) {
+    File& file = dir.files.at(name.text);
+    const std::string path = dir.path + "/" + name.text;
+    if (!name.exact && is_closed) {
         return true;  // whoever copies a file here gives it its name at the end
     }
-    if (!in.open(dir.path + "/" + file.name.text, false)) {
+    if (!in.open(path, false)) {
         if (errno != ENOENT) {
-            m_tell(LiveEvent::notice(dir.path + "/" + file.name.text + ": " + strerror(errno)));
+            m_tell(LiveEvent::notice(path + ": " + strerror(errno)));
         }
         return errno != ENOENT;
     }
     if (is_closed && in.size() == file.checked) {
         return true;
     }
-    if (!file.name.exact) {
-        tell_damage(dir, file, {true, "name", "not a file name the service creates", -1});
+    if (!name.exact) {
+        tell_damage(dir, name, {true, "name", "not a file name the service creates", -1});
     }
     FileReport report;
     scan_file(
-        in, file.name, [this](const Piece&) { return !m_stop; }, &report);
+        in, name, [this](const Piece&) { return !m_stop; }, &report);
     if (m_stop) {
         return true;
     }
     if (in.error()) {
-        m_tell(LiveEvent::notice(dir.path + "/" + file.name.text + ": " + strerror(in.error())));
+        m_tell(LiveEvent::notice(path + ": " + strerror(in.error())));
     }
-    look(dir, file);
+    look(dir, name.text);
     file.unchecked = false;
     for (Finding finding : report.findings) {
         if (is_closed) {
-            judge_closed(file.name, &finding);
+            judge_closed(name, &finding);
         }
         if (finding.damage) {
-            tell_damage(dir, file, finding);
+            tell_damage(dir, name, finding);
         }
     }
     if (is_closed) {
         file.checked = in.size();
     }
-    if (file.name.is_crash() && is_closed && (!file.name.framed_dump || report.end_marker)) {
-        tell("crash", dir, file,
-             std::string(file.name.kind) + " is complete: " + escape_text(file.name.text) + ", " +
+    if (name.is_crash() && is_closed && (!name.framed_dump || report.end_marker)) {
+        tell("crash", dir, name,
+             std::string(name.kind) + " is complete: " + escape_text(name.text) + ", " +
                  size_text(file.size),
              {{"state", "complete"}});
     }
     return true;
 }
 
-void LiveTree::look(Dir& dir, File& file) {
+void LiveTree::look(Dir& dir, const std::string& name) {
     struct stat st;
-    if (lstat((dir.path + "/" + file.name.text).c_str(), &st) == 0) {
+    if (lstat((dir.path + "/" + name).c_str(), &st) == 0) {
         const uint64_t size = static_cast<uint64_t>(st.st_size);
-        m_sums[cp_of(dir, file)].grown += size - std::min(size, file.size);
-        file.size = size;
+        uint64_t& known = dir.files.at(name).size;
+        m_sums[cp_of(dir, name)].grown += size - std::min(size, known);
+        known = size;
     }
 }
 
 std::map<std::string, LiveTree::Sum> LiveTree::sums() {
     for (const auto& [dir, name] : m_written) {
-        look(*dir, dir->files.at(name));
+        look(*dir, name);
     }
     m_written.clear();
     std::map<std::string, Sum> sums = m_sums;
     for (auto& [cp, sum] : m_sums) {
         sum.grown = 0;
     }
+    std::map<std::string, LogTime> newest;  // of each CP
     for (const auto& [path, dir] : m_dirs) {
-        if (dir.present) {
-            for (const auto& [text, file] : dir.files) {
-                const FileName& name = file.name;
-                Sum& sum = sums[cp_of(dir, file)];
-                ++sum.files;
-                sum.size += file.size;
-                if (name.is_log() &&
-                    (sum.newest.time < name.time ||
-                     (!(name.time < sum.newest.time) && name.number < sum.newest.number))) {
+        const bool named = cp_type_of(dir.cp) != CT_UNKNOWN;
+        for (const auto& [name, file] : dir.files) {
+            if (!dir.present) {
+                break;
+            }
+            const std::string& cp = named ? dir.cp : cp_of(dir, name);
+            Sum& sum = sums[cp];
+            ++sum.files;
+            sum.size += file.size;
+            if (name.compare(0, 2, "0-") == 0) {
+                const FileName log(name);
+                if (log.is_log() && newest[cp] < log.time) {
+                    newest[cp] = log.time;
                     sum.newest = name;
                 }
             }

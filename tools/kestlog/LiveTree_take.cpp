@@ -39,10 +39,12 @@ void LiveTree::take(const LogTree& tree, const std::set<std::string>& roots) {
             tell_set(set);
         }
         // A renamed directory may hold the files of several CPs.
-        std::map<std::string, std::vector<TreeFile>> files;
+        std::map<std::string, std::vector<const TreeFile*>> files;
         for (const TreeCp& cp : set.cps) {
-            std::vector<TreeFile>& all = files[cp.shown];
-            all.insert(all.end(), cp.files.begin(), cp.files.end());
+            std::vector<const TreeFile*>& all = files[cp.shown];
+            for (const TreeFile& file : cp.files) {
+                all.push_back(&file);
+            }
         }
         for (const auto& [path, all] : files) {
             Dir& dir = m_dirs[path];
@@ -123,56 +125,59 @@ void LiveTree::tell_set(const TreeSet& set) {
 }
 
 // The service may have renamed, deleted and created files since they were looked at.
-void LiveTree::take_files(Dir& dir, const std::vector<TreeFile>& files, bool tell) {
-    std::map<std::string, std::vector<File>> known;  // by lasting name, the newest last
-    for (const auto& [name, file] : dir.files) {
-        known[lasting_name(file.name)].push_back(file);
-    }
-    for (auto& [name, list] : known) {
-        std::sort(list.begin(), list.end(),
-                  [](const File& a, const File& b) { return a.name.number > b.name.number; });
-    }
-    std::vector<File> fresh;
-    std::map<std::string, File> before;
-    before.swap(dir.files);
-    for (const TreeFile& seen : files) {  // oldest first
-        std::vector<File>& list = known[lasting_name(seen.name)];
-        if (list.empty()) {
-            fresh.push_back({seen.name, seen.size});
+void LiveTree::take_files(Dir& dir, const std::vector<const TreeFile*>& files, bool tell) {
+    std::vector<const TreeFile*> unknown;  // oldest first
+    for (const TreeFile* seen : files) {
+        const auto it = dir.files.find(seen->name.text);
+        if (it == dir.files.end()) {
+            unknown.push_back(seen);
             continue;
         }
-        File file = list.front();
-        list.erase(list.begin());
-        for (std::set<Place>* places : {&m_closed, &m_written}) {
-            if (file.name.text != seen.name.text && places->erase({&dir, file.name.text})) {
-                places->insert({&dir, seen.name.text});
-            }
-        }
-        const bool counted_up = file.name.number == 0 && seen.name.number > 0;
-        file.name = seen.name;
-        dir.files[seen.name.text] = file;
-        if (file.size != seen.size) {
-            written(dir, seen.name.text);
-        }
-        if (counted_up && dir.files[seen.name.text].unchecked) {
-            closed(dir, seen.name.text);
+        it->second.seen = true;
+        if (it->second.size != seen->size) {
+            written(dir, seen->name.text);
         }
     }
-    for (const auto& [name, list] : known) {
-        for (const File& file : list) {
-            ++dir.deleted;
-            dir.deleted_size += file.size;
-            m_closed.erase({&dir, file.name.text});
-            m_written.erase({&dir, file.name.text});
+    std::map<std::string, std::vector<FileName>> lost;  // by lasting name
+    for (auto& [name, file] : dir.files) {
+        if (!file.seen) {
+            const FileName file_name(name);
+            lost[lasting_name(file_name)].push_back(file_name);
+        }
+        file.seen = false;
+    }
+    for (auto& [name, list] : lost) {  // the oldest last
+        std::sort(list.begin(), list.end(),
+                  [](const FileName& a, const FileName& b) { return a.number < b.number; });
+    }
+    std::vector<const TreeFile*> fresh;
+    for (const TreeFile* seen : unknown) {
+        const std::string& name = seen->name.text;
+        std::vector<FileName>& list = lost[lasting_name(seen->name)];
+        if (list.empty()) {
+            fresh.push_back(seen);
+            continue;
+        }
+        moved(dir, list.back().text, name);
+        const bool counted_up = list.back().number == 0 && seen->name.number > 0;
+        list.pop_back();
+        written(dir, name);
+        if (counted_up) {
+            closed(dir, name);
         }
     }
-    for (const File& file : fresh) {
-        add(dir, file, tell);
+    for (const auto& [name, list] : lost) {
+        for (const FileName& file : list) {
+            removed(dir, file.text);
+        }
+    }
+    for (const TreeFile* seen : fresh) {
+        add(dir, seen->name.text, {seen->size}, tell);
         // Whether it was closed meanwhile is not known; a file that the service has counted up,
         // or writes in one go, was.
-        if (tell && file.size > 0 &&
-            (file.name.is_log() ? file.name.number > 0 : file.name.type != LT_DUMP)) {
-            closed(dir, file.name.text);
+        if (tell && seen->size > 0 &&
+            (seen->name.is_log() ? seen->name.number > 0 : seen->name.type != LT_DUMP)) {
+            closed(dir, seen->name.text);
         }
     }
 }

@@ -13,7 +13,7 @@ std::string row(const std::string& cp, const LiveTree::Sum& sum, int64_t ms) {
     snprintf(text, sizeof(text), "%-12.64s %8llu %12s %12s/s  %.100s", escape_text(cp).c_str(),
              static_cast<unsigned long long>(sum.files), size_text(sum.size).c_str(),
              size_text(sum.grown * 1000 / static_cast<uint64_t>(ms)).c_str(),
-             escape_text(sum.newest.text).c_str());
+             escape_text(sum.newest).c_str());
     return text;
 }
 
