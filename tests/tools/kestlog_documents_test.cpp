@@ -69,7 +69,7 @@ void flatten(const std::string& name, const Json& json, std::map<std::string, st
         for (const Json& each : json) {
             flatten(name + "[]", each, out);
         }
-    } else {
+    } else if (!json.is_null()) {  // as if it were missing
         (*out)[name] = json.is_number_integer() ? "integer" : json.type_name();
     }
 }
@@ -102,13 +102,13 @@ const struct {
     {"bundle", {"--crash 2016-03-01 -o crash.tar ."}},
     {"split", {"-o . " + OLD_DSP_LOG}},
     {"export", {"-o capture ."}},
-    {"follow", {CHANGES}},
     {"join", {"--cp agdsp -o all ."}},
     {"extract", {"-o images ."}},
 #ifdef KEST_WAV
     {"wav", {"--rate 8000 --channels 1 --format s16le -o sound.wav ."}},
 #endif
     {"sigmf", {"--datatype ci16_le --rate 1 --frequency 1 -o meta iq"}},
+    {"follow", {CHANGES}},  // the last: it deletes
 };
 
 TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {

@@ -135,11 +135,12 @@ FileName::FileName(const std::string& name) : text(name) {
 }
 
 bool is_foreign_name(const std::string& name) {
+    std::string stem = name;
     static const char* const NAMES[] = {
         ".DS_Store",   ".Trashes",  ".fseventsd", ".Spotlight-V100",           "$RECYCLE.BIN",
         "desktop.ini", "Thumbs.db", "LOST.DIR",   "System Volume Information", "lost+found",
     };
-    return name.compare(0, 2, "._") == 0 ||
+    return name.compare(0, 2, "._") == 0 || cut_tail(&stem, ".sigmf-meta") ||
            std::any_of(std::begin(NAMES), std::end(NAMES), [&](const char* foreign) {
                return strcasecmp(foreign, name.c_str()) == 0;  // as on a FAT
            });

@@ -38,7 +38,8 @@ bool has_time(const LogTime& time);
 // "2016-03-01 09:15:00", or "-" without a time.
 std::string time_text(const LogTime& time);
 
-// Whether it is a file or directory that a PC leaves on every card.
+// Whether it is a file or directory that a PC leaves on every card, or a meta file that kestlog
+// has written beside a capture.
 bool is_foreign_name(const std::string& name);
 
 // Whether it is the name of a set directory; stores its time.
