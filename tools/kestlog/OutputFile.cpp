@@ -14,12 +14,13 @@
 #include <vector>
 
 #include "kestlog/ExitStatus.h"
+#include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 
 namespace {
 
 constexpr size_t COPY_BUFFER = 256 * 1024;
-constexpr uint64_t COPY_STEP = 1 << 30;
+constexpr uint64_t COPY_STEP = 16 * 1024 * 1024;
 constexpr int TEMPORARY_NAMES = 100;
 
 bool written_as_it_is(const std::string& path) {
@@ -42,6 +43,7 @@ uint64_t copy_in_kernel(int from, int to, uint64_t limit) {
             break;
         }
         copied += static_cast<uint64_t>(n);
+        Progress::advance(static_cast<uint64_t>(n));
     }
     return copied;
 }
@@ -147,6 +149,7 @@ bool OutputFile::copy_from(int fd, uint64_t limit, uint64_t* copied, int* read_e
             return false;
         }
         *copied += len;
+        Progress::advance(len);
     }
     return note_error(fflush(m_file) == 0);
 }

@@ -20,6 +20,7 @@
 #include "kestlog/ExitStatus.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
+#include "kestlog/Progress.h"
 #include "kestlog/TreeInput.h"
 
 namespace {
@@ -313,6 +314,7 @@ int run_extract(const CommandLine& line) {
         !open_tree(line, &tree, &status, LogTree::FILES_TOO)) {
         return status;
     }
+    const Progress progress(tree.size(), true);
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
             for (const TreeFile& file : cp.files) {

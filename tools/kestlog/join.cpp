@@ -16,6 +16,7 @@
 #include "kestlog/ExitStatus.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
+#include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/StreamPlan.h"
 #include "kestlog/TreeInput.h"
@@ -187,6 +188,11 @@ int run_join(const CommandLine& line) {
     if (!out.open(line.value("output", "-"), line.has("force"))) {
         return out.failed();
     }
+    uint64_t size = 0;
+    for (const StreamFile& each : stream->files) {
+        size += each.file->size;
+    }
+    const Progress progress(size, out.is_standard());
     Joiner joiner(line, &out);
     if (!joiner.join(plan_stream(*stream)) || !out.close()) {
         return out.failed();

@@ -15,6 +15,7 @@
 #include "kestlog/ExitStatus.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
+#include "kestlog/Progress.h"
 #include "kestlog/StreamPlan.h"
 #include "kestlog/TreeInput.h"
 #include "kestlog/WavFile.h"
@@ -258,6 +259,7 @@ int run_wav(const CommandLine& line) {
     if (!recorder.open()) {
         return ES_OUTPUT;
     }
+    const Progress progress(0);
     for (const Input& input : choose_files(tree, log_streams(tree))) {
         if (!recorder.take(input)) {
             return ES_OUTPUT;
