@@ -219,7 +219,8 @@ std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
         return chunk_payload(bytes, CHUNK_KINDS[stream]);
     }
     // Of a record that a full medium cut off, there may be less than its mark.
-    if (memcmp(bytes.data(), RECORD_MAGIC, std::min(bytes.size(), sizeof(RECORD_MAGIC))) == 0) {
+    if (!bytes.empty() &&
+        memcmp(bytes.data(), RECORD_MAGIC, std::min(bytes.size(), sizeof(RECORD_MAGIC))) == 0) {
         bytes.erase(bytes.begin(),
                     bytes.begin() + static_cast<ptrdiff_t>(std::min(RECORD_LEN, bytes.size())));
     }

@@ -115,7 +115,9 @@ void Media::insert_card(Card card) {
         rename((m_root + "/cards/" + std::to_string(state.card)).c_str(),
                (m_root + "/card").c_str());
     }
-    state.tampered |= card != SAME && !state.pulled_seen;  // it is taken for the last one
+    if (card != SAME && !state.pulled_seen) {
+        state.tampered = state.scan_failed = true;  // it is taken for the last one
+    }
     state.card_in = true;
 }
 

@@ -138,7 +138,7 @@ struct State {
     int64_t card_failed_ns;  // when it last took nothing: it may rest for ten minutes
     bool full_seen;          // a full medium took nothing, at any time
     uint64_t card_bytes;     // read before it came
-    bool scan_failed;        // by a rule: what was not read may not be counted
+    bool scan_failed;        // or left out: what was not read may not be counted
     bool tampered;           // files were deleted or made by others: names need not be contiguous
     bool killed;
     bool faulted;  // fault_seen, at any time in the run
