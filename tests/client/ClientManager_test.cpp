@@ -2,10 +2,6 @@
 
 #include "client/ClientManager.h"
 
-#include <errno.h>
-
-#include <list>
-
 #include "support/ControlFixture.h"
 #include "support/faults.h"
 
@@ -34,6 +30,12 @@ TEST_F(ClientManagerTest, FullLoop) {
     // It listens as soon as there is room.
     Client client(TEST_SERVER);
     talk(client, "GET_LOG_FILE_SIZE\n", "OK 5\n");
+    client.hang_up();
+    EXPECT_TRUE(pump([&] {
+        return log.has(
+            "void ClientManager::process_client_disconn(ClientHandler*): client "
+            "disconnected, remaining 0 clients\n");
+    }));
 }
 
 }  // namespace

@@ -27,8 +27,6 @@ protected:
     void talk(Client& client, const std::string& request, const std::string& expected) {
         EXPECT_EQ(ask(client, request, expected), expected) << request;
     }
-    // Passes enough for whatever is there to be handled.
-    void settle() { pass(5); }
 
     std::unique_ptr<ClientManager> manager;
 };
