@@ -93,24 +93,6 @@ TEST_F(CpStorageTest, SparedFilesDoNotEndTheLogging) {
     EXPECT_FALSE(log.has(forced));
 }
 
-// A medium whose log root somebody deleted while it was not in use was never taken again.
-TEST_F(CpStorageTest, LogRootIsMadeAgain) {
-    plug_card();
-    EXPECT_EQ(write_later("1"), 1);
-    m_mgr.clear_all();
-    remove_tree(m_root.path("sd/modem_log").c_str());
-    EXPECT_EQ(write_later("2"), 1);
-    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
-    // The card's place is empty for a while, though it counts as mounted.
-    m_mgr.clear_all();
-    ASSERT_EQ(rename(m_root.path("sd").c_str(), m_root.path("pulled").c_str()), 0);
-    EXPECT_EQ(write_later("3"), 1);
-    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
-    ASSERT_EQ(rename(m_root.path("pulled").c_str(), m_root.path("sd").c_str()), 0);
-    EXPECT_EQ(write_later("4"), 1);
-    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
-}
-
 // One run through everything that makes, moves, fills and deletes files.
 class Scenario : public CpStorageTest {
 public:
