@@ -11,12 +11,11 @@ const struct Kind {
     std::string request;
     std::string file;
     int type;
-    const char* not_served;
     const char* timeout;
 } KINDS[] = {
-    {"SAVE_RINGBUF WCDMA\n", "data:cp_wcdma_ringbuf", 0x3A, "ERROR 7\n",
+    {"SAVE_RINGBUF WCDMA\n", "data:cp_wcdma_ringbuf", 0x3A,
      "static void CpRingBufConsumer::ring_buffer_read_timeout(void*): read ring buffer timeout ["},
-    {"SAVE_SLEEP_LOG WCDMA\n", "data:cp_wcdma_sleeplog", 0x3B, "ERROR 6\n",
+    {"SAVE_SLEEP_LOG WCDMA\n", "data:cp_wcdma_sleeplog", 0x3B,
      "static void CpSleepLogConsumer::sleep_log_read_timeout(void*): read sleep log timeout ["},
 };
 

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The real program as a child process: its exit statuses, its log lines, the files that
 // it leaves and the system calls that a block of log data costs.
-#include <signal.h>
 
 #include <map>
 #include <sstream>

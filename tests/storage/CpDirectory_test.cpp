@@ -2,10 +2,7 @@
 
 #include "storage/CpDirectory.h"
 
-#include <dirent.h>
 #include <errno.h>
-
-#include <algorithm>
 
 #include "storage/StorageFixture.h"
 

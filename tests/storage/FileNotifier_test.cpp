@@ -5,13 +5,10 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <string.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <memory>
 #include <string>
-#include <vector>
 
 #include "core/Multiplexer.h"
 #include "core/system_paths.h"

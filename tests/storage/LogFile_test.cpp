@@ -4,8 +4,6 @@
 
 #include <errno.h>
 
-#include <algorithm>
-
 #include "storage/StorageFixture.h"
 
 namespace {

@@ -2,8 +2,6 @@
 
 #include "storage/MediaStorage.h"
 
-#include <errno.h>
-
 #include "storage/StorageFixture.h"
 #include "storage/paths.h"
 

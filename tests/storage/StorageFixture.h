@@ -105,10 +105,8 @@ protected:
         return m_store->write(data.data(), data.size());
     }
 
-    // Every size is the sum of the sizes below. extra: bytes known to be left in the totals
-    // above, by a file or directory that vanished.
-    static void check_sums(const MediaStorage& media, uint64_t set_extra = 0,
-                           uint64_t media_extra = 0) {
+    // Every size is the sum of the sizes below.
+    static void check_sums(const MediaStorage& media) {
         uint64_t sets = 0;
         for (const CpSetDirectory* set : media.sets()) {
             uint64_t dirs = 0;
@@ -120,10 +118,10 @@ protected:
                 EXPECT_EQ(dir->size(), files) << dir->path().string();
                 dirs += dir->size();
             }
-            EXPECT_EQ(set->size(), dirs + set_extra) << set->path().string();
+            EXPECT_EQ(set->size(), dirs) << set->path().string();
             sets += set->size();
         }
-        EXPECT_EQ(media.size(), sets + media_extra);
+        EXPECT_EQ(media.size(), sets);
     }
 
     TestRoot m_root;

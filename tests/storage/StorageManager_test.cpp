@@ -2,8 +2,6 @@
 
 #include "storage/StorageManager.h"
 
-#include <errno.h>
-
 #include <functional>
 
 #include "storage/StorageFixture.h"

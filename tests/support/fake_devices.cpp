@@ -139,14 +139,6 @@ size_t FakeDevice::reads_left() {
     return m_reads.size();
 }
 
-void FakeDevice::hang_up() {
-    const Lock lock(m_mutex);
-    m_buffers.clear();
-    set_ready(false);
-    close(m_fd);
-    m_fd = -1;
-}
-
 void FakeDevice::fill(uint32_t offset, uint32_t len, const std::string& content) {
     std::copy(content.begin(), content.end(), m_memory + offset);
     const Lock lock(m_mutex);

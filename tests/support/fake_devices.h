@@ -31,8 +31,6 @@ public:
     // Readable until every step was taken; an end of file follows the last one.
     void script_reads(const Steps& steps);
     size_t reads_left();
-    // The driver goes: an end of file and a hang-up from now on, and no buffer.
-    void hang_up();
     // A filled I/Q buffer, reported until it is released. Content is put there, if any.
     void fill(uint32_t offset, uint32_t len, const std::string& content = "");
     // These fail with the error from now on; 0: they work.

@@ -24,7 +24,6 @@ struct Fault {
 Fault s_faults[faults::NUM_CALLS];
 time_t s_time;
 std::string s_part = "/modem_log";
-std::vector<std::string> s_commands;
 
 enum { REAL, FROZEN, FAILING } s_boot_clock = REAL;
 timespec s_boot_time = {1000, 999999999};
@@ -79,11 +78,6 @@ ssize_t writev(int fd, const iovec* pieces, int num) {
     return len < all.size() ? real::write(fd, all.data(), len) : real::writev(fd, pieces, num);
 }
 
-int system(const char* command) {
-    s_commands.push_back(command);
-    return real::system(command);
-}
-
 time_t time(time_t* result) {
     const time_t now = s_time ? s_time : real::time(nullptr);
     return result ? *result = now : now;
@@ -114,7 +108,6 @@ void reset() {
     }
     s_time = 0;
     s_part = "/modem_log";
-    s_commands.clear();
 }
 
 void fail(Call call, int nth, int error, int times) {
@@ -144,10 +137,6 @@ bool hit(Call call) {
 
 void set_time(time_t now) {
     s_time = now;
-}
-
-const std::vector<std::string>& commands() {
-    return s_commands;
 }
 
 }  // namespace faults

@@ -39,8 +39,6 @@ int calls(Call call);
 bool hit(Call call);
 // What time() returns from now on; 0: the real time; -1: it fails.
 void set_time(time_t now);
-// The commands given to system() since the last reset; they are really run.
-const std::vector<std::string>& commands();
 
 // Functions of the test's that run instead, as long as they are set.
 struct Instead {
