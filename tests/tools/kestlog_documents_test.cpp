@@ -69,7 +69,7 @@ void flatten(const std::string& name, const Json& json, std::map<std::string, st
         for (const Json& each : json) {
             flatten(name + "[]", each, out);
         }
-    } else if (!json.is_null()) {  // as if it were missing
+    } else {
         (*out)[name] = json.is_number_integer() ? "integer" : json.type_name();
     }
 }

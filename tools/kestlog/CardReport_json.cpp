@@ -11,8 +11,11 @@ namespace {
 // Types of a CP that are listed one by one.
 constexpr size_t MAX_TYPES = 100;
 
-Json rate(uint64_t amount, uint64_t seconds) {
-    return seconds ? Json(amount / seconds) : Json(nullptr);
+// Where it took no time there is no rate.
+void add_rate(Json* json, uint64_t amount, uint64_t seconds) {
+    if (seconds) {
+        (*json)["rate"] = amount / seconds;
+    }
 }
 
 }  // namespace
@@ -87,29 +90,20 @@ Json CardReport::cp_json(const std::string& name, const CpSum& sum) const {
             types.push_back({{"type", type / 256},
                              {"sub_type", type % 256},
                              {"count", amount.count},
-                             {"bytes", amount.bytes},
-                             {"rate", rate(amount.bytes, sum.seconds)}});
+                             {"bytes", amount.bytes}});
+            add_rate(&types.back(), amount.bytes, sum.seconds);
         } else {
             ++more;
         }
     }
-    Json json = {{"cp", json_text(name)},
-                 {"files", sum.files},
-                 {"size", sum.size},
-                 {"logs", sum.logs},
-                 {"log_size", sum.log_size},
-                 {"seconds", sum.seconds},
-                 {"rate", rate(sum.log_size, sum.seconds)},
-                 {"frames", sum.frames},
-                 {"chunks", sum.chunks},
-                 {"broken", sum.broken},
-                 {"payload", sum.payload},
-                 {"other_bytes", sum.other},
-                 {"sequence_gaps", sum.sequence_gaps},
-                 {"missing", sum.missing},
-                 {"damages", sum.damages},
-                 {"notes", sum.notes},
-                 {"types", types}};
+    Json json = {
+        {"cp", json_text(name)},  {"files", sum.files},       {"size", sum.size},
+        {"logs", sum.logs},       {"log_size", sum.log_size}, {"seconds", sum.seconds},
+        {"frames", sum.frames},   {"chunks", sum.chunks},     {"broken", sum.broken},
+        {"payload", sum.payload}, {"other_bytes", sum.other}, {"sequence_gaps", sum.sequence_gaps},
+        {"missing", sum.missing}, {"damages", sum.damages},   {"notes", sum.notes},
+        {"types", types}};
+    add_rate(&json, sum.log_size, sum.seconds);
     if (more) {
         json["more_types"] = more;
     }
