@@ -79,7 +79,7 @@ void Follower::watch_root(const std::string& root, const std::vector<const char*
                 watch(root + way.substr(0, at), DirWatches::PLACE,
                       way.substr(at + 1, next - at - 1));
             }
-            const std::string log_root = root + medium + logs;
+            const std::string log_root = std::string(root).append(medium).append(logs);
             if (is_dir(log_root)) {
                 m_log_roots.insert(log_root);
                 watch(log_root, DirWatches::LOGS);
