@@ -228,7 +228,8 @@ TEST_F(KestctlTest, WatchRunsACommandForEachEventInTheirOrder) {
     EXPECT_EQ(err().find("kestctl: " + action + ": exit status 1\nkestctl: the service closed"), 0u)
         << err();
     struct tm time;
-    const char* const rest = strptime(out().c_str(), "%Y-%m-%dT%H:%M:%S%z", &time);
+    const std::string printed = out();
+    const char* const rest = strptime(printed.c_str(), "%Y-%m-%dT%H:%M:%S%z", &time);
     EXPECT_TRUE(rest && strncmp(rest, " CP_DUMP_START $(id)", 20) == 0) << out();
     EXPECT_EQ(exchange("watch wcn --exec /nowhere", replies), 4);
     EXPECT_NE(err().find("/nowhere: No such file"), std::string::npos) << err();

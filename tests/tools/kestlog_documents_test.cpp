@@ -81,9 +81,12 @@ const std::string CHANGES = R"(modem_log | {
     cd modem_log && touch sha1.txt && cp -r 2016-03-01-09-15-00 2016-03-01-09-16-00
     upto '"event":"set"'
     cd 2016-03-01-09-15-00/agdsp && echo x >0-agdsp-2016-03-01_09-16-00.log
+    upto '"offset":'
     echo x >agdsp_memory_2016-03-01_09-15-00.mem
     upto complete
-    ln -s x link && mv -T link 1-agdsp-2016-03-01_09-00-00.log && rm 0*
+    ln -s x link && mv -T link 1-agdsp-2016-03-01_09-00-00.log
+    upto '"event":"notice"'
+    rm 0*
     upto deleted
     mv ../../2016-03-01-09-16-00 ../../gone
     upto '"event":"gone"'
