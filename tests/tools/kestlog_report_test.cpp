@@ -271,7 +271,7 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
           "payload", "other_bytes", "sequence_gaps", "missing", "damages", "notes"}) {
         cells += "<td class=\"number\">" + grouped(json["cps"][0][key]) + "</td>";
     }
-    EXPECT_NE(dom.find("<td class=\"\">cp_wcdma</td>" + cells), std::string::npos) << cells;
+    EXPECT_NE(dom.find("<td class=\"cp\">cp_wcdma</td>" + cells), std::string::npos) << cells;
     EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size());
     EXPECT_NE(dom.find(">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<"),
               std::string::npos);

@@ -45,7 +45,7 @@ for (const [key, name] of [['from', 'first'], ['to', 'last']]) {
 }
 
 // ---- the time line
-const LABELS = 110, TOP = 34, LANE = 58, BAR = 30;
+const LABELS = 110, TOP = 46, LANE = 58, BAR = 30;
 const SPANS = ['trimmed', 'silence', 'missing'];
 const ORDER = ['log'].concat(SPANS);
 const LETTERS = {'ring buffer': 'R', 'sleep log': 'S', 'I/Q samples': 'Q', firmware: 'F'};
@@ -72,7 +72,7 @@ for (const item of items) {
 const starts = items.map((item) => item.t0).concat(sets.map((set) => seconds(set.time)));
 let first = starts.length ? starts.reduce((a, b) => Math.min(a, b)) : 0;
 let last = items.map((item) => item.t1).concat(starts).reduce((a, b) => Math.max(a, b), first);
-const margin = Math.max(5, (last - first) * 0.02);
+const margin = Math.max(1, (last - first) * 0.02);
 first -= margin;
 last += margin;
 let view = [first, last];
@@ -157,20 +157,23 @@ function draw() {
     const by = step(view[1] - view[0], (width - LABELS) / 110);
     let day = '';
     for (let t = Math.ceil(view[0] / by) * by; t <= view[1]; t += by) {
-        node(inside, 'line', {x1: x(t), x2: x(t), y1: 18, y2: height, class: 'grid'});
+        node(inside, 'line', {x1: x(t), x2: x(t), y1: 30, y2: height, class: 'grid'});
         const text = clock(t);
-        const label = text.slice(11, by < 60 ? 19 : 16);
-        const dated = text.slice(0, 10) !== day;
-        day = text.slice(0, 10);
-        node(inside, 'text', {x: x(t) + 3, y: 12, class: 'soft'},
-            by >= 86400 ? day : dated ? day + ' ' + label : label);
+        if (text.slice(0, 10) !== day) {
+            day = text.slice(0, 10);
+            node(inside, 'text', {x: x(t) + 3, y: 13, class: 'soft'}, day);
+        }
+        if (by < 86400) {
+            node(inside, 'text', {x: x(t) + 3, y: 27, class: 'soft'},
+                text.slice(11, by < 60 ? 19 : 16));
+        }
     }
     for (const set of sets) {
         const at = seconds(set.time);
         if (at >= view[0] && at <= view[1]) {
             const group = node(inside, 'g', {class: 'start'});
-            node(group, 'line', {x1: x(at), x2: x(at), y1: 20, y2: height, class: 'set'});
-            node(group, 'rect', {x: x(at), y: 20, width: 10, height: 9, class: medium(set)});
+            node(group, 'line', {x1: x(at), x2: x(at), y1: 32, y2: height, class: 'set'});
+            node(group, 'rect', {x: x(at), y: 32, width: 10, height: 9, class: medium(set)});
             node(group, 'title', {}, 'set ' + set.set + ' on ' + set.medium);
         }
     }
@@ -198,8 +201,9 @@ function draw() {
                 node(group, 'text', {x: from + 4, y: top + 13}, scaled(item.rate, 'B/s'));
             }
         } else if (SPANS.includes(item.kind)) {
-            shape = node(group, 'rect', {x: left, y: top, height: BAR, class: item.kind,
-                width: Math.max(item.kind === 'missing' ? 4 : 1.5, cut(item.t1) - left), fill: 'url(#hatch-' + item.kind + ')'});
+            const wide = Math.max(item.kind === 'missing' ? 4 : 1.5, cut(item.t1) - left);
+            shape = node(group, 'rect', {x: left, y: top, width: wide, height: BAR,
+                class: item.kind, fill: 'url(#hatch-' + item.kind + ')'});
         } else {
             shape = symbol(group, item.kind, left, top - 10);
         }
@@ -387,14 +391,15 @@ function table(list, caption, rows, columns) {
     const value = (row, key) => typeof key === 'function' ? key(row) : row[key];
     const columnIsNumber = columns.map(([, key]) =>
         rows.every((row) => ['number', 'undefined'].includes(typeof (value(row, key) || 0))));
-    columns.forEach(([name], i) =>
-        node(head, 'th', {scope: 'col', class: columnIsNumber[i] ? 'number' : ''}, name));
+    const classes = columns.map(([, key], i) =>
+        columnIsNumber[i] ? 'number' : typeof key === 'string' ? key : '');
+    columns.forEach(([name], i) => node(head, 'th', {scope: 'col', class: classes[i]}, name));
     const body = node(made, 'tbody');
     for (const row of rows) {
         const line = node(body, 'tr');
         columns.forEach(([, key], i) => {
             const content = value(row, key);
-            const cell = node(line, 'td', {class: columnIsNumber[i] ? 'number' : ''},
+            const cell = node(line, 'td', {class: classes[i]},
                 columnIsNumber[i] ? number(content) : content === null ? '-' : content);
             if (key === 'time' && list === 'crashes') {
                 const button = node(cell, 'button', {type: 'button', title: 'Show it'}, '↑');
@@ -412,7 +417,8 @@ function table(list, caption, rows, columns) {
 const WHERE = [['medium', 'medium'], ['set', 'set']];
 const hex = (n) => '0x' + n.toString(16).padStart(2, '0');
 table('crashes', 'Crashes', data.crashes, [['time', 'time'], ['co-processor', 'cp'],
-    ['left', 'what'], ['bytes', 'size'], ['damages', 'damages'], ['files', (row) => row.files.join(' ')], ...WHERE]);
+    ['left', 'what'], ['bytes', 'size'], ['damages', 'damages'],
+    ['files', (row) => row.files.join('\n')], ...WHERE]);
 table('cps', 'Co-processors', data.cps, [['co-processor', 'cp'], ['files', 'files'],
     ['bytes', 'size'], ['log files', 'logs'], ['bytes of logs', 'log_size'],
     ['seconds', 'seconds'], ['bytes/s', 'rate'], ['frames', 'frames'], ['chunks', 'chunks'],
