@@ -202,6 +202,26 @@ std::string CommandLine::nearest_command(const std::string& name) const {
     return nearest;
 }
 
+namespace {
+
+// The text in lines that end before column 100, all but the first behind an indent.
+std::string wrapped(const std::string& text, size_t indent) {
+    const size_t room = indent < 60 ? 100 - indent : 40;
+    std::string lines;
+    size_t start = 0;
+    while (text.size() - start > room) {
+        size_t blank = text.rfind(' ', start + room);
+        if (blank == std::string::npos || blank <= start) {
+            break;
+        }
+        lines += text.substr(start, blank - start) + "\n" + std::string(indent, ' ');
+        start = blank + 1;
+    }
+    return lines + text.substr(start);
+}
+
+}  // namespace
+
 void CommandLine::print_help() const {
     const std::vector<Option> options = all_options(m_syntax);
     size_t longest = 0;
@@ -216,8 +236,9 @@ void CommandLine::print_help() const {
            m_syntax.operands.c_str(), m_syntax.purpose.c_str());
     for (const Option& option : options) {
         const std::string owners = option_owners(option);
-        printf("  %-*s  %s%s%s\n", width, option_usage(option).c_str(), owners.c_str(),
-               owners.empty() ? "" : ": ", option.help);
+        const std::string text = (owners.empty() ? "" : owners + ": ") + option.help;
+        printf("  %-*s  %s\n", width, option_usage(option).c_str(),
+               wrapped(text, longest + 4).c_str());
     }
     printf("\nCommands:\n");
     for (const Syntax::Command& command : m_syntax.commands) {

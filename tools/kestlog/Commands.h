@@ -10,14 +10,14 @@ int run_ls(const CommandLine& line);
 int run_info(const CommandLine& line);
 int run_verify(const CommandLine& line);
 int run_frames(const CommandLine& line);
-int run_bundle(const CommandLine& line);
-int run_extract(const CommandLine& line);
 int run_follow(const CommandLine& line);
-int run_join(const CommandLine& line);
 int run_report(const CommandLine& line);
-int run_sigmf(const CommandLine& line);
+int run_bundle(const CommandLine& line);
+int run_join(const CommandLine& line);
+int run_extract(const CommandLine& line);
 int run_split(const CommandLine& line);
 int run_export(const CommandLine& line);
 int run_wav(const CommandLine& line);  // only with libsndfile
+int run_sigmf(const CommandLine& line);
 
 #endif  // KESTLOG_COMMANDS_H_

@@ -25,30 +25,34 @@ struct Command {
 
 // clang-format off
 constexpr Command COMMANDS[] = {
+    // what is there
     {"ls",     "ROOT...", 1, ANY, run_ls,     "list sets, CPs and files with sizes and time spans"},
     {"info",   "FILE...", 1, ANY, run_info,   "print what a file is, its time record, frames and damage"},
     {"verify", "ROOT...", 1, ANY, run_verify, "check names, numbers, headers and frames of all files"},
-    {"follow", "ROOT...", 1, ANY, run_follow, "tell what grows, until Ctrl-C: files, crashes, damage"},
     {"frames", "FILE...", 1, ANY, run_frames, "list the frames, or the chunks of an audio DSP log"},
-    {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of them over time"},
+    {"follow", "ROOT...", 1, ANY, run_follow, "tell what grows, until Ctrl-C: files, crashes, damage"},
+    // for others to look at
+    {"report", "ROOT...", 1, ANY, run_report, "write a page for a browser that shows all of it over time"},
     {"bundle", "ROOT...", 1, ANY, run_bundle, "write all that belongs to a crash into a tar, for a bug report"},
+    // for other programs
     {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
-    {"extract", "FILE|ROOT...", 1, ANY, run_extract,
-     "write what is in frames to files: memory images, ring buffers, the payloads of a type"},
+    {"extract", "FILE|ROOT...", 1, ANY, run_extract, "write memory images, ring buffers or the payloads of a type to files"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
-    {"sigmf",  "FILE",    1, 1,   run_sigmf,  "write a SigMF meta file beside an I/Q capture"},
+    {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 #ifdef KEST_WAV
     {"wav",    "FILE|ROOT...", 1, ANY, run_wav, "write the PCM data of an audio DSP log to a WAV file"},
 #endif
-    {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
+    {"sigmf",  "FILE",    1, 1,   run_sigmf,  "write a SigMF meta file beside an I/Q capture"},
 };
 
 // The commands that take a ROOT.
-constexpr char TREES[] = "ls verify report bundle join extract wav export";
+constexpr char TREES[] = "ls verify report bundle join extract export wav";
 // Those and the one that waits for what is still to come.
-constexpr char CARDS[] = "ls verify follow report bundle join extract wav export";
+constexpr char CARDS[] = "ls verify follow report bundle join extract export wav";
 // The commands for which files are chosen by their time.
-constexpr char TIMES[] = "ls verify frames report join extract wav export";
+constexpr char TIMES[] = "ls verify frames report join extract export wav";
+// The commands that write files.
+constexpr char WRITERS[] = "report bundle join extract split export wav sigmf";
 
 constexpr Option OPTIONS[] = {
     {"json",         nullptr, nullptr, "print results as JSON, one object per line"},
@@ -56,33 +60,33 @@ constexpr Option OPTIONS[] = {
     {"since",        "T",     TIMES,   "leave out files that end before T"},
     {"until",        "T",     TIMES,   "leave out files that begin after T"},
     {"unpack-limit", "MIB",   TREES,   "the most that an archive may take (default: what is free)"},
+    {"output",       "PATH",  WRITERS, "the directory, or the file (-: standard output), to write to", 'o'},
+    {"force",        nullptr, WRITERS, "replace files that exist"},
     {"tree",         nullptr, "ls",    "draw the directories as a tree"},
-    {"cp",           "NAME",  "export", "only this co-processor"},
-    {"cp",           "NAME",  "join",  "the CP, when there are several"},
-    {"records",      nullptr, "join",  "keep the time records"},
-    {"kind",         "KIND",  "join",  "of an audio DSP's log only the data of chunks: log, pcm, dump"},
-    {"type",         "N",     "export extract frames", "only frames of this type: 0x9d, 157"},
-    {"sub-type",     "N",     "extract frames", "only frames of this sub-type"},
+    {"type",         "N",     "frames extract export", "only frames of this type: 0x9d, 157"},
+    {"sub-type",     "N",     "frames extract", "only frames of this sub-type"},
     {"limit",        "N",     "frames", "stop after that many"},
     {"hex",          nullptr, "frames", "print the payload, too"},
-    {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
-    {"rate",         "HZ",    "sigmf wav", "samples per second"},
-    {"datatype",     "TYPE",  "sigmf", "of a sample, in SigMF's words: ci16_le, cf32_le, ..."},
-    {"frequency",    "HZ",    "sigmf", "the frequency of the middle of the band"},
-#ifdef KEST_WAV
-    {"channels",     "N",     "wav",   "samples of one moment"},
-    {"format",       "FORMAT", "wav",  "of a sample: u8, s16le, s16be, s24le ... s32be, f32le, f32be"},
-    {"fill-gaps",    nullptr, "wav",   "put silence where chunks are missing"},
-#endif
-    {"crash",        "T",     "bundle", "the crash nearest to T"},
-    {"minutes",      "N",     "bundle", "with the logs of so many minutes around it (default: 5)"},
     {"iq-rate",      "HZ",    "report", "draw the spectra of I/Q captures with this sample rate"},
     {"iq-format",    "F",     "report", "and this format: ci8, ci16_le, ci32_le, cf32_le"},
     {"pcm-rate",     "HZ",    "report", "draw the PCM data of an audio DSP with this sample rate"},
     {"pcm-channels", "N",     "report", "and so many channels (default: 1)"},
     {"pcm-format",   "F",     "report", "and this format: s8, s16le, s32le, f32le"},
-    {"output",       "PATH",  "bundle export extract join report sigmf split wav", "the directory, or the file (-: standard output), to write to", 'o'},
-    {"force",        nullptr, "bundle export extract join report sigmf split wav", "replace files that exist"},
+    {"crash",        "T",     "bundle", "the crash nearest to T"},
+    {"minutes",      "N",     "bundle", "with the logs of so many minutes around it (default: 5)"},
+    {"cp",           "NAME",  "join",  "the CP, when there are several"},
+    {"records",      nullptr, "join",  "keep the time records"},
+    {"kind",         "KIND",  "join",  "of an audio DSP's log only the data of chunks: log, pcm, dump"},
+    {"cp",           "NAME",  "export", "only this CP"},
+    {"broken",       nullptr, "export", "also what stands between flags and is no intact frame"},
+    {"rate",         "HZ",    "wav sigmf", "samples per second"},
+#ifdef KEST_WAV
+    {"channels",     "N",     "wav",   "samples of one moment"},
+    {"format",       "FORMAT", "wav",  "of a sample: u8, s16le, s16be, s24le ... s32be, f32le, f32be"},
+    {"fill-gaps",    nullptr, "wav",   "put silence where chunks are missing"},
+#endif
+    {"datatype",     "TYPE",  "sigmf", "of a sample, in SigMF's words: ci16_le, cf32_le, ..."},
+    {"frequency",    "HZ",    "sigmf", "the frequency of the middle of the band"},
 };
 // clang-format on
 
