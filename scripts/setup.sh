@@ -13,6 +13,7 @@ kest_has() {
     case "$1" in
         g++) command -v c++ >/dev/null ;;
         clang) command -v clang++ >/dev/null ;;
+        chromium) command -v chromium >/dev/null || command -v chromium-browser >/dev/null ;;
         s6) command -v s6-log >/dev/null ;;
         runit) command -v svlogd >/dev/null ;;
         daemontools) command -v multilog >/dev/null ;;
