@@ -14,8 +14,9 @@ urgency=medium\n\n  * Built from the sources; CHANGELOG.md there has the changes
     foreach(text IN LISTS texts)
         execute_process(COMMAND gzip -9nf ${text} COMMAND_ERROR_IS_FATAL ANY)
     endforeach()
-    # Where Debian's zsh looks for completions.
-    if(EXISTS ${share}/zsh/site-functions)
-        file(RENAME ${share}/zsh/site-functions ${share}/zsh/vendor-completions)
+    # The documents of the reader, which a plain install puts beside those of the service.
+    if(component STREQUAL tools)
+        file(COPY ${share}/doc/kestmodem/ DESTINATION ${share}/doc/${package})
+        file(REMOVE_RECURSE ${share}/doc/kestmodem)
     endif()
 endforeach()

@@ -38,6 +38,10 @@ apt-get -qq install --no-install-recommends "$here"/*.deb >"$here/apt.log" 2>&1 
 for page in man1/kestctl.1 man1/kestlog.1 man5/kest_modem.conf.5 man8/kestmodem.8; do
     gzip -t "/usr/share/man/$page.gz" || [ -f /etc/dpkg/dpkg.cfg.d/excludes ]
 done
+for file in doc/kestmodem-tools/reading-logs.md doc/kestmodem-tools/json.md \
+    zsh/vendor-completions/_kestlog kestmodem/wireshark/kestdiag.lua; do
+    test -f "/usr/share/$file" || fail "there is no /usr/share/$file"
+done
 
 echo "-- the simulated handset serves"
 kestsim --serve --rate 200 --root "$root" >"$here/serve.log" 2>&1 &
@@ -53,6 +57,8 @@ wait "$pid" || fail "kestsim --serve: exit status $?"
 pid=
 kestlog ls "$root/data/modem_log" | grep 'ring buffer'
 kestlog verify "$root/data/modem_log"
+kestlog report "$root" -o - | grep -q '</html>' || fail "kestlog report"
+kestlog wav "$root" --rate 48000 --channels 1 --format s16le -o "$here/sound.wav"
 
 echo "-- what it logged is played again"
 kestsim --replay "$root" --speed max
