@@ -58,7 +58,6 @@ pid=
 kestlog ls "$root/data/modem_log" | grep 'ring buffer'
 kestlog verify "$root/data/modem_log"
 kestlog report "$root" -o - | grep -q '</html>' || fail "kestlog report"
-kestlog wav "$root" --rate 48000 --channels 1 --format s16le -o "$here/sound.wav"
 
 echo "-- what it logged is played again"
 kestsim --replay "$root" --speed max
