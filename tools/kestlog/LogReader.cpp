@@ -19,6 +19,11 @@ constexpr uint64_t LARGE = 8 * 1024 * 1024;
 
 }  // namespace
 
+time_t modified_time(const struct stat& st) {
+    constexpr time_t LAST = 253402214400;  // a day before the year 10000: zones differ
+    return std::clamp<time_t>(st.st_mtime, 0, LAST);
+}
+
 LogReader::~LogReader() {
     m_ahead.reset();  // before its descriptor is closed
     if (m_fd >= 0) {
@@ -48,7 +53,7 @@ bool LogReader::open(const std::string& path, bool follow) {
     const off_t start = m_piped ? 0 : std::max<off_t>(lseek(m_fd, 0, SEEK_CUR), 0);
     m_size = static_cast<uint64_t>(std::max<off_t>(st.st_size - start, 0));
     m_left = m_piped ? UINT64_MAX : m_size;
-    m_modified = st.st_mtime;
+    m_modified = modified_time(st);
     if (!m_piped && m_size >= LARGE) {
         m_ahead = std::make_unique<ReadAhead>();
         if (m_ahead->start(m_fd, m_size)) {

@@ -14,6 +14,12 @@
 
 #include "kestlog/ReadAhead.h"
 
+struct stat;
+
+// When a file was written to last. A file system from anywhere may say anything: what is before
+// 1970 or after 9999 becomes the nearest of these, so that times can be reckoned with.
+time_t modified_time(const struct stat& st);
+
 class LogReader {
 public:
     // Larger than any frame or chunk.

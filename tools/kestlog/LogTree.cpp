@@ -8,11 +8,13 @@
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 
 #include "core/system_paths.h"
 #include "kestlog/Archive.h"
+#include "kestlog/LogReader.h"
 
 namespace {
 
@@ -26,6 +28,26 @@ std::string base_name(const std::string& path) {
     const std::string full = real ? real : path;
     free(real);
     return full.substr(full.rfind('/') + 1);
+}
+
+// Standard input, whose first bytes are needed twice: what comes from a pipe is copied to a file
+// without a name. Where it stands, or -1.
+off_t rewindable_input() {
+    const off_t start = lseek(STDIN_FILENO, 0, SEEK_CUR);
+    std::string name = TempDir::parent() + "/kestlog-XXXXXX";
+    const int copy = start < 0 ? mkostemp(name.data(), O_CLOEXEC) : -1;
+    if (copy < 0) {
+        return start;
+    }
+    unlink(name.c_str());
+    bool good = true;
+    std::vector<char> bytes(256 * 1024);
+    for (ssize_t n; good && (n = read(STDIN_FILENO, bytes.data(), bytes.size())) != 0;) {
+        good = n > 0 ? write(copy, bytes.data(), static_cast<size_t>(n)) == n : errno == EINTR;
+    }
+    good = good && lseek(copy, 0, SEEK_SET) == 0 && dup2(copy, STDIN_FILENO) >= 0;
+    close(copy);
+    return good ? 0 : -1;
 }
 
 // The CP of that name in the set, which may be new.
@@ -56,7 +78,7 @@ bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
             foreign.push_back(shown(path) + "/" + entry->d_name);
         } else if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
             entries->push_back({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
-                                static_cast<uint64_t>(st.st_size), st.st_mtime});
+                                static_cast<uint64_t>(st.st_size), modified_time(st)});
         }
     }
     closedir(dir);
@@ -85,10 +107,12 @@ bool LogTree::add(const std::string& path, Files files) {
     struct stat st;
     m_medium = base_name(path);
     if (path == "-" || (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode))) {
+        const bool both = path == "-" && files == FILES_TOO;
+        const off_t start = both ? rewindable_input() : 0;
         if (add_archive(path)) {
             return true;
         }
-        if (files == DIRECTORIES_ONLY || path == "-") {
+        if (files == DIRECTORIES_ONLY || (both && lseek(STDIN_FILENO, start, SEEK_SET) < 0)) {
             return false;
         }
         add_file(path);
@@ -100,13 +124,13 @@ bool LogTree::add(const std::string& path, Files files) {
 
 void LogTree::add_file(const std::string& path) {
     struct stat st = {};
-    stat(path.c_str(), &st);
+    path == "-" ? fstat(STDIN_FILENO, &st) : stat(path.c_str(), &st);
     const size_t slash = path.rfind('/') + 1;
     const std::string dir = path.substr(0, slash);
     const FileName name(path.substr(slash));
     sets.push_back({"", path, m_medium, {}, {{name.cp, path, {}}}});
     sets.back().cps[0].files.push_back({name, std::make_shared<TreeDir>(TreeDir{dir, dir}),
-                                        static_cast<uint64_t>(st.st_size), st.st_mtime});
+                                        static_cast<uint64_t>(st.st_size), modified_time(st)});
 }
 
 bool LogTree::add_archive(const std::string& path) {

@@ -4,6 +4,7 @@
 
 #include <errno.h>
 #include <fcntl.h>
+#include <limits.h>
 #include <signal.h>
 #include <string.h>
 #include <sys/stat.h>
@@ -49,6 +50,10 @@ uint64_t copy_in_kernel(int from, int to, uint64_t limit) {
 }
 
 }  // namespace
+
+std::string output_name(const std::string& stem, const std::string& suffix) {
+    return stem.substr(0, NAME_MAX - std::min<size_t>(NAME_MAX, suffix.size())) + suffix;
+}
 
 OutputFile* OutputFile::s_first = nullptr;
 

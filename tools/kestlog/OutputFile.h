@@ -12,6 +12,9 @@
 
 #include <string>
 
+// The stem with the suffix, as the name of a file: a long stem is cut to what a file system takes.
+std::string output_name(const std::string& stem, const std::string& suffix);
+
 class OutputFile {
 public:
     OutputFile() = default;

@@ -138,7 +138,8 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
         if (tree->add(root, files)) {
             any = true;
         } else {
-            tree->failures.push_back(root + ": not a log tree");
+            tree->failures.push_back(
+                root + (root == "-" ? ": no archive of a log tree" : ": not a log tree"));
         }
     }
     tree->finish();

@@ -138,14 +138,14 @@ private:
 
     // Where it goes: no two outputs of one run have the same name.
     std::string output_path(const TreeFile& file, const std::string& suffix) {
-        const std::string& name = file.name.text;
+        const std::string name = file.name.text == "-" ? "stdin" : file.name.text;
         const size_t dot = name.rfind('.');
-        const std::string stem = m_dir + "/" + (dot == 0 ? name : name.substr(0, dot)) + suffix;
-        std::string path = stem + ".bin";
-        for (int i = 1; !m_outputs.insert(path).second; ++i) {
-            path = stem + "-" + std::to_string(i) + ".bin";
+        const std::string stem = dot == 0 ? name : name.substr(0, dot);
+        std::string output = output_name(stem, suffix + ".bin");
+        for (int i = 1; !m_outputs.insert(output).second; ++i) {
+            output = output_name(stem, suffix + "-" + std::to_string(i) + ".bin");
         }
-        return path;
+        return m_dir + "/" + output;
     }
 
     bool open(const TreeFile& file, const std::string& suffix, OutputFile* out) {

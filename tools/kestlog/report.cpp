@@ -102,7 +102,7 @@ int run_report(const CommandLine& line) {
     if (!out.write(text.data(), text.size()) || !out.close()) {
         return out.failed();
     }
-    if (line.value("output", "-") != "-") {
+    if (!json && line.value("output", "-") != "-") {
         Progress::clear();
         printf("%s: %s\n", escape_text(out.path()).c_str(), report.words().c_str());
     }

@@ -169,6 +169,9 @@ int run_sigmf(const CommandLine& line) {
         return status;
     }
     const std::string& path = line.params()[0];
+    if (path == "-") {
+        return line.usage_error("the meta file names the capture; give its path");
+    }
     LogReader in;
     if ((status = open_input(in, path)) != ES_OK) {
         return status;

@@ -62,7 +62,7 @@ int split(const CommandLine& line, const std::string& path) {
     }
     OutputFile parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {
-        const std::string part = stem + "." + CHUNK_KINDS[i] + ".bin";
+        const std::string part = output_name(stem, std::string(".") + CHUNK_KINDS[i] + ".bin");
         if (!parts[i].open(line.value("output", ".") + "/" + part, line.has("force"))) {
             return parts[i].failed();
         }
