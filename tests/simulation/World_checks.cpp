@@ -13,7 +13,7 @@ namespace {
 
 void check_total(const char* of, uint64_t total, uint64_t sum) {
     if (total != sum) {
-        fail_run("total", "%s: %llu, its parts %llu", of, number(total), number(sum));
+        fail_run("total", "%s: %llu, its entries %llu", of, number(total), number(sum));
     }
 }
 
