@@ -7,13 +7,19 @@
 
 #include <filesystem>
 #include <fstream>
-#include <sstream>
+#include <system_error>
 
 std::string read_text_file(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    std::ostringstream text;
-    text << in.rdbuf();  // in blocks: files may have many megabytes
-    return text.str();
+    std::string text;
+    std::error_code ec;
+    const auto size = std::filesystem::file_size(path, ec);
+    text.reserve(ec ? 0 : static_cast<size_t>(size));
+    char block[65536];  // files may have many megabytes
+    while (in.read(block, sizeof(block)), in.gcount() > 0) {
+        text.append(block, static_cast<size_t>(in.gcount()));
+    }
+    return text;
 }
 
 std::string temp_dir() {

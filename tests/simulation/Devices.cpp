@@ -4,6 +4,7 @@
 
 #include <errno.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <string.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -116,13 +117,24 @@ void Devices::pull(unsigned stream) {
 }
 
 void Devices::pump() {
+    // One look at all: a read that finds nothing costs more.
+    struct pollfd fds[STREAM_COUNT * 2];
     for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
-        for (End* end : {&m_log[stream], &m_diag[stream]}) {
-            if (end->peer >= 0) {
-                take_requests(*end, stream);
-                pump_answers(*end);
-            }
+        fds[stream] = {m_log[stream].peer, POLLIN, 0};
+        fds[STREAM_COUNT + stream] = {m_diag[stream].peer, POLLIN, 0};
+    }
+    poll(fds, STREAM_COUNT * 2, 0);
+    for (unsigned i = 0; i < STREAM_COUNT * 2; ++i) {
+        const unsigned stream = i % STREAM_COUNT;
+        End& end = i < STREAM_COUNT ? m_log[stream] : m_diag[stream];
+        if (fds[i].revents) {
+            take_requests(end, stream);
         }
+        if (end.peer >= 0) {
+            pump_answers(end);
+        }
+    }
+    for (unsigned stream = 0; stream < STREAM_COUNT; ++stream) {
         pump_stream(stream);
     }
 }

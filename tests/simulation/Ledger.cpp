@@ -214,17 +214,13 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes, uint8_t ki
 // The stream's bytes of a whole log file.
 std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
     const std::string text = read_text_file(path);
-    std::vector<uint8_t> bytes(text.begin(), text.end());
-    if (CHUNK_KINDS[stream]) {
-        return chunk_payload(bytes, CHUNK_KINDS[stream]);
-    }
+    const uint8_t kind = CHUNK_KINDS[stream];
     // Of a record that a full medium cut off, there may be less than its mark.
-    if (!bytes.empty() &&
-        memcmp(bytes.data(), RECORD_MAGIC, std::min(bytes.size(), sizeof(RECORD_MAGIC))) == 0) {
-        bytes.erase(bytes.begin(),
-                    bytes.begin() + static_cast<ptrdiff_t>(std::min(RECORD_LEN, bytes.size())));
-    }
-    return bytes;
+    const bool has_record = !kind && memcmp(text.data(), RECORD_MAGIC,
+                                            std::min(text.size(), sizeof(RECORD_MAGIC))) == 0;
+    const size_t begin = has_record ? std::min(RECORD_LEN, text.size()) : 0;
+    const std::vector<uint8_t> bytes(text.begin() + static_cast<ptrdiff_t>(begin), text.end());
+    return kind ? chunk_payload(bytes, kind) : bytes;
 }
 
 }  // namespace

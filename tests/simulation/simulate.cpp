@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The simulation on the command line: runs seeds, or one plan from a file, and shows what was
 // found, shortened.
+#include <malloc.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
@@ -141,5 +142,10 @@ int main(int argc, char** argv) {
         fputs("see scripts/simulate --help\n", stderr);
         return 2;
     }
+#ifdef __GLIBC__
+    // Memory that went back to the system after each look at a file costs a third of the time.
+    mallopt(M_MMAP_THRESHOLD, 1 << 30);
+    mallopt(M_TRIM_THRESHOLD, 1 << 30);
+#endif
     return options.plan ? run_file(options) : run_seeds(options);
 }
