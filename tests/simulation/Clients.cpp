@@ -138,12 +138,13 @@ std::vector<std::pair<Setting*, unsigned>> set_by(const Request& request) {
 }
 
 // Compares a value with what was set when it was asked for; one that was uncertain is known
-// from now on.
-bool agrees(Setting& setting, unsigned value, const Setting& expected, bool contested) {
+// from now on, if it is the newest.
+bool agrees(Setting& setting, unsigned value, const Setting& expected, bool contested,
+            bool newest) {
     if (!expected.uncertain && !contested) {
         return value == expected.value;
     }
-    if (setting.uncertain && !contested) {
+    if (setting.uncertain && !contested && newest) {
         setting.value = value;
         setting.uncertain = false;
     }
@@ -151,7 +152,7 @@ bool agrees(Setting& setting, unsigned value, const Setting& expected, bool cont
 }
 
 bool acceptable(const Request& request, const std::string& line, const Setting& expected,
-                bool contested) {
+                bool contested, bool newest) {
     switch (request.kind) {
         case DOES:
         case SETS:
@@ -167,7 +168,7 @@ bool acceptable(const Request& request, const std::string& line, const Setting& 
         case GETS: {
             const unsigned value = value_of(request.what, line);
             return line == value_text(request.what, value) &&
-                   agrees(*setting_of(request.what), value, expected, contested);
+                   agrees(*setting_of(request.what), value, expected, contested, newest);
         }
     }
     return false;
@@ -341,7 +342,11 @@ void Clients::take_line(Client& client, const std::string& line) {
         client.asked.pop_front();
         request = request_of(asked.index).text;
         const Request& done = request_of(asked.index);
-        if (acceptable(done, line, asked.expected, asked.contested)) {
+        // What is still to be carried out may change the value that was asked for.
+        const bool newest = std::none_of(
+            client.asked.begin(), client.asked.end(),
+            [](const Asked& later) { return !set_by(request_of(later.index)).empty(); });
+        if (acceptable(done, line, asked.expected, asked.contested, newest)) {
             if (done.kind == SAVES && line == "OK") {
                 world().check_saved(done.what, done.text.compare(0, 12, "SAVE_RINGBUF") == 0
                                                    ? "_ringbuf_"
