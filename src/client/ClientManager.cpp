@@ -1,16 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 
+// For accept4 and struct ucred, which are Linux's own. C++ compilers define it, C++ does not say
+// so.
+#ifndef _GNU_SOURCE
+#define _GNU_SOURCE
+#endif
+
 #include "client/ClientManager.h"
 
+#include <cutils/properties.h>
 #include <cutils/sockets.h>
 #include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/socket.h>
+#include <unistd.h>
 
 #include <memory>
 
 #include "client/ClientHandler.h"
+#include "client/uid_list.h"
+#include "config/property_names.h"
 #include "core/Multiplexer.h"
 #include "core/SavedErrno.h"
 #include "core/log.h"
@@ -50,10 +60,41 @@ int ClientManager::init(const char* name) {
     return 0;
 }
 
+// Whether the user at the other end may be served. The property is read for each client, so that
+// a change holds from the next one on.
+bool ClientManager::may_connect(int fd) {
+    char uids[PROPERTY_VALUE_MAX];
+    property_get(PROP_CONTROL_UIDS, uids, "");
+    if (!uids[0]) {
+        return true;
+    }
+    // The ids that the other end had when it connected, from the kernel.
+    struct ucred peer;
+    socklen_t len = sizeof(peer);
+    if (getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &peer, &len) < 0) {
+        err_log("can not tell the user of a client, closing it");
+        return false;
+    }
+    const UidMatch match = find_uid(uids, peer.uid);
+    if (match == UidMatch::NO_LIST) {
+        info_log("%s is no list of user ids, only root is served", PROP_CONTROL_UIDS);
+    }
+    if (peer.uid == 0 || match == UidMatch::NAMED) {
+        return true;
+    }
+    info_log("user %u, process %d: may not use the control socket, closing it", peer.uid, peer.pid);
+    return false;
+}
+
 void ClientManager::process(int /*events*/) {
     const int fd = accept4(m_fd, nullptr, nullptr, SOCK_CLOEXEC);
     if (fd < 0) {
         note_idle("server socket");
+        return;
+    }
+    if (!may_connect(fd)) {
+        ::close(fd);
+        note_alive();  // strangers must not make the socket rest for those who may connect
         return;
     }
     if (set_nonblock(fd) < 0) {

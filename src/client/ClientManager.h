@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The control server: owns the listening socket and the handler of every connected
-// client, and serves a limited number of clients at once; further ones wait unaccepted.
+// client, and serves a limited number of clients at once; further ones wait unaccepted. Who is
+// served at all is for the platform's policy to say and, if set, for PROP_CONTROL_UIDS.
 //
 // Owned by the LogController, which does without one when init fails. Loop thread only.
 #ifndef CLIENT_CLIENTMANAGER_H_
@@ -27,7 +28,7 @@ public:
     int init(const char* name);
 
     // Accepts one connection. A refusal, for want of descriptors say, leaves the client
-    // waiting.
+    // waiting. A client who may not be served is disconnected without a reply.
     void process(int events) override;
 
     // Destroys the handler of a connection that has ended; its code must return at once.
@@ -41,6 +42,7 @@ public:
 private:
     bool full() const { return m_max_clients && m_clients.size() >= m_max_clients; }
     void resume_listening();
+    static bool may_connect(int fd);
 
     const size_t m_max_clients;
     android::List<ClientHandler*> m_clients;

@@ -51,4 +51,8 @@
 #define PROP_SD_SERVICE "init.svc.fuse_sdcard0"
 #define SD_SERVICE_RUNNING "running"
 
+// Ids of the users, besides root, whom the control socket serves: decimal, with commas between
+// them. Unset or empty: everyone who can connect.
+#define PROP_CONTROL_UIDS "persist.kestmodem.control.uids"
+
 #endif  // CONFIG_PROPERTY_NAMES_H_
