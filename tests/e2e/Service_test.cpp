@@ -6,6 +6,7 @@
 #include <sstream>
 
 #include "sim/ChildProcess.h"
+#include "sim/SimModemImage.h"
 #include "sim/SimSupervisor.h"
 #include "support/ServiceFixture.h"
 
@@ -18,8 +19,8 @@ protected:
     ServiceTest() { set_zone("UTC0"); }
 
     // Runs a command with its output in the file "log".
-    void run(std::vector<std::string> args = {KESTMODEM_BIN}) {
-        const mode_t mask = umask(077);
+    void run(std::vector<std::string> args = {KESTMODEM_BIN}, mode_t new_mask = 077) {
+        const mode_t mask = umask(new_mask);
         EXPECT_TRUE(process.start({std::move(args), root.path("log"), "", false, {}, -1}));
         umask(mask);
     }
@@ -66,24 +67,37 @@ TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
 TEST_F(ServiceTest, WhatItMakesHasItsModeInSpiteOfTheParentsMask) {
     const std::string settings = "stream cp_wcdma on 5 3\n";  // the system's, to be copied
     root.write_file("system/etc/kest_modem.conf", settings);
-    root.make_dir("data/local/tmp/kestmodem");
     root.set_prop("gsm.version.baseband", "BB_1");
+    root.set_prop("ro.product.partitionpath", root.path("part/"));
+    root.set_prop("persist.modem.w.nvp", "nv_w");
+    const std::vector<uint8_t> image = SimModemImage(1000, 1).bytes();
+    root.write_file("part/nv_wmodem", std::string(image.begin(), image.end()));
     const Fifo modem(root.path("log_w"));
-    run();
-    // Two blocks fill the staging buffer.
-    ASSERT_TRUE(feed(modem, pattern_bytes(32768, 1)) && feed(modem, pattern_bytes(32768, 2)));
-    ASSERT_TRUE(wait_until([&] { return content("cp_wcdma").size() == 65536; }));
-    EXPECT_EQ(root.read_file(CONFIG), settings);
-    const std::vector<std::string> files = root.tree("data/modem_log");
-    EXPECT_EQ(files.size(), 2u) << "the log and the version";
-    for (const std::string& name : files) {
-        const std::filesystem::path path = root.path("data/modem_log/" + name);
-        EXPECT_EQ(std::filesystem::status(path).permissions(), std::filesystem::perms(0644));
-        EXPECT_EQ(std::filesystem::status(path.parent_path()).permissions(),
-                  std::filesystem::perms(0775));
+    for (const mode_t mask : {mode_t{077}, mode_t{0}}) {
+        remove_tree("data");
+        root.make_dir("data/local/tmp/kestmodem");
+        run({KESTMODEM_BIN, "-s"}, mask);
+        // Two blocks fill the staging buffer.
+        ASSERT_TRUE(feed(modem, pattern_bytes(32768, 1)) && feed(modem, pattern_bytes(32768, 2)));
+        ASSERT_TRUE(wait_until([&] {
+            return log_content(root, log_files(root, "data/kest/modem_log", "cp_wcdma")).size() ==
+                   65536;
+        }));
+        EXPECT_EQ(root.read_file(CONFIG), settings);
+        EXPECT_EQ(root.tree("data").size(), 5u) << "settings, log, version, library, digest";
+        for (const auto& entry : std::filesystem::recursive_directory_iterator(root.path("data"))) {
+            EXPECT_TRUE(entry.path().string().find("/data/local") != std::string::npos ||
+                        !entry.is_directory() ||
+                        entry.status().permissions() == std::filesystem::perms(0775))
+                << entry.path();
+            EXPECT_TRUE(entry.is_directory() ||
+                        entry.status().permissions() == std::filesystem::perms(0644))
+                << entry.path();
+        }
+        EXPECT_FALSE(logged("save log"));
+        EXPECT_FALSE(logged("kestcp: open "));
+        process.stop();
     }
-    EXPECT_FALSE(logged("save log"));
-    EXPECT_FALSE(logged("kestcp: open "));
 }
 
 // Between two marked blocks, the system calls are those of the log path and no others.
