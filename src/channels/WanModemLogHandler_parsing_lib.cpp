@@ -222,7 +222,7 @@ int WanModemLogHandler::save_log_parsing_lib(MediaStorage& media) {
 
 void WanModemLogHandler::save_current_parsing_lib() {
     MediaStorage* media = stor_mgr()->get_media_stor();
-    if (media) {
+    if (media && !media->leads_away()) {
         save_log_parsing_lib(*media);
     }
 }

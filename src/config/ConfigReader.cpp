@@ -14,7 +14,7 @@ ConfigReader::~ConfigReader() {
 }
 
 int ConfigReader::open(const char* path) {
-    const int fd = open_to_read(path, Links::FOLLOW);
+    const int fd = open_to_read(path, Links::REFUSE);
     if (fd < 0) {
         return -1;
     }

@@ -3,7 +3,7 @@
 // closes the file in the end.
 //
 // The file may be anything that somebody put in its place: nothing but a file with an end is
-// opened, and a read error is told apart from that end.
+// opened, no link is followed, and a read error is told apart from that end.
 #ifndef CONFIG_CONFIGREADER_H_
 #define CONFIG_CONFIGREADER_H_
 

@@ -102,7 +102,7 @@ bool begins_like(int whole_fd, int part_fd) {
 // Whether the file at path is the beginning of the default, with a length that is a
 // multiple of unit.
 bool is_cut_default(const char* path, const char* default_path, off_t unit) {
-    const int fd = open_to_read(path, Links::FOLLOW);
+    const int fd = open_to_read(path, Links::REFUSE);
     const int default_fd = open_to_read(default_path, Links::FOLLOW);
     struct stat st;
     struct stat default_st;
@@ -126,7 +126,7 @@ bool is_empty(const char* path) {
 }  // namespace
 
 int put_settings(const char* path, const String8& text) {
-    const int fd = open_to_write(path, O_RDWR | O_CREAT, Links::FOLLOW);
+    const int fd = open_to_write(path, O_RDWR | O_CREAT, Links::REFUSE);
     if (fd < 0) {
         return -1;
     }

@@ -17,7 +17,9 @@ int refuse(int fd, int error) {
 
 int open_checked(const char* path, int flags, Links links, bool block_device_too) {
     const int no_follow = links == Links::REFUSE ? O_NOFOLLOW : 0;
-    const int fd = open(path, flags | no_follow | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, 0644);
+    // Nothing is cut before it is known what was opened.
+    const int fd =
+        open(path, (flags & ~O_TRUNC) | no_follow | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, 0644);
     if (fd < 0) {
         return -1;
     }
@@ -27,6 +29,13 @@ int open_checked(const char* path, int flags, Links links, bool block_device_too
     }
     if (!S_ISREG(st.st_mode) && !(block_device_too && S_ISBLK(st.st_mode))) {
         return refuse(fd, S_ISDIR(st.st_mode) ? EISDIR : EINVAL);
+    }
+    const bool writes = (flags & O_ACCMODE) != O_RDONLY;
+    if (writes && links == Links::REFUSE && st.st_nlink > 1) {
+        return refuse(fd, EMLINK);
+    }
+    if ((flags & O_TRUNC) && st.st_size > 0 && ftruncate(fd, 0) < 0) {
+        return refuse(fd, errno);
     }
     // Only the opening must not wait. A file of the kernel may take the flag for a wish to
     // get a part of its content instead of all.

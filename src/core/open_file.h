@@ -6,8 +6,9 @@
 #ifndef CORE_OPEN_FILE_H_
 #define CORE_OPEN_FILE_H_
 
-// Whether a symbolic link as the last part of the path is followed. Never inside a log tree:
-// a link on a card must not lead out of it.
+// Whether a link as the last part of the path is taken: a symbolic one and, for writing, a second
+// name of a file (a hard link). Never where others than root may make files, on a card or below
+// /data/local/tmp: it may be another file's.
 enum class Links { FOLLOW, REFUSE };
 
 // Opens a regular file or a block device for reading, with the blocking mode of an ordinary
@@ -16,7 +17,8 @@ enum class Links { FOLLOW, REFUSE };
 int open_to_read(const char* path, Links links);
 
 // Opens a regular file for writing; flags are those of open() (O_RDWR or O_WRONLY, with
-// O_CREAT, O_TRUNC and so on), a file made has mode 0644. Result as above; ENXIO for a FIFO.
+// O_CREAT, O_TRUNC and so on), a file made has mode 0644. Result as above; ENXIO for a FIFO,
+// EMLINK for a second name refused.
 int open_to_write(const char* path, int flags, Links links);
 
 #endif  // CORE_OPEN_FILE_H_

@@ -209,6 +209,9 @@ uint64_t CpDirectory::trim(uint64_t wanted) {
 // deleted, stuck, with its errno. Returns the bytes removed; the sizes stay.
 uint64_t CpDirectory::delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck) {
     uint64_t removed = 0;
+    if (is_link(m_path)) {
+        return removed;
+    }
     FileIter it = m_files.begin();
     while (it != m_files.end()) {
         LogFile* file = *it;

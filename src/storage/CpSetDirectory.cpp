@@ -114,6 +114,9 @@ void CpSetDirectory::recount() {
 
 uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted) {
     uint64_t removed = 0;
+    if (is_link(m_path)) {
+        return removed;
+    }
     android::List<CpDirectory*>::iterator it = m_dirs.begin();
     while (it != m_dirs.end()) {
         CpDirectory* dir = *it;

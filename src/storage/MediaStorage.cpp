@@ -45,10 +45,15 @@ void MediaStorage::forget_sets() {
 
 // The kest directory belongs to another service, which may not have made it yet.
 int MediaStorage::prepare_top_dir() const {
-    if (!m_manager->kest_layout() || access(m_top_dir.string(), F_OK) == 0) {
+    if (!m_manager->kest_layout() ||
+        (access(m_top_dir.string(), F_OK) == 0 && !is_link(m_top_dir))) {
         return 0;
     }
     return make_log_dir(m_top_dir);
+}
+
+bool MediaStorage::leads_away() const {
+    return is_link(m_log_root) || (m_manager->kest_layout() && is_link(m_top_dir));
 }
 
 int MediaStorage::stat() {
@@ -112,8 +117,8 @@ CpSetDirectory* MediaStorage::create_cp_set() {
     }
     android::String8 path(m_log_root);
     path.appendFormat("/%s", LogTime::from_tm(t).set_stamp().string());
-    if (make_log_dir(path) < 0 &&
-        (errno != ENOENT || remake_log_root() < 0 || make_log_dir(path) < 0)) {
+    if (leads_away() || (make_log_dir(path) < 0 &&
+                         (errno != ENOENT || remake_log_root() < 0 || make_log_dir(path) < 0))) {
         err_log("create CP set %s failed", path.string());
         return nullptr;
     }
@@ -210,5 +215,9 @@ void MediaStorage::clear() {
 void MediaStorage::clear_all() {
     forget_sets();
     m_rescan = true;  // what could not be deleted, of a card that is out, say, still counts
+    if (leads_away()) {
+        err_log("%s is left alone", m_log_root.string());
+        return;
+    }
     remove_numbered_entries(m_log_root);
 }

@@ -67,6 +67,10 @@ public:
     // The CP's directory in the working set, or null.
     CpDirectory* get_cp_dir(const android::String8& cp_name) const;
 
+    // Whether the log root, or the kest directory above it, has become a symbolic link. Then
+    // nothing below it is made, scanned or deleted: on a card it could lead anywhere.
+    bool leads_away() const;
+
     // True when a file can be made in the log root and written now: makes one and deletes it.
     bool can_make_files() const;
 
@@ -94,7 +98,7 @@ public:
 
     // Forgets all sets, so that the next use scans again; nothing on the medium changes.
     void clear();
-    // Deletes all sets, on the medium too.
+    // Deletes all sets, on the medium too unless that leads away.
     void clear_all();
 
 private:

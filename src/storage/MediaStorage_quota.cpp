@@ -18,6 +18,9 @@ constexpr unsigned int CHECKS_PER_RECOUNT = 16;
 
 uint64_t MediaStorage::trim(uint64_t wanted) {
     uint64_t removed = 0;
+    if (leads_away()) {
+        return removed;
+    }
     android::List<CpSetDirectory*>::iterator it = m_sets.begin();
     while (it != m_sets.end()) {
         CpSetDirectory* set = *it;

@@ -24,7 +24,7 @@ int copy_file(const char* src, const char* dst) {
         err_log("open source file %s failed", src);
         return -1;
     }
-    const int dst_fd = open_to_write(dst, O_WRONLY | O_CREAT | O_TRUNC, Links::FOLLOW);
+    const int dst_fd = open_to_write(dst, O_WRONLY | O_CREAT | O_TRUNC, Links::REFUSE);
     if (dst_fd < 0) {
         err_log("open dest file %s failed", dst);
         close(src_fd);

@@ -74,8 +74,20 @@ int remove_numbered_entries(const android::String8& dir) {
     return system(command.string());
 }
 
+bool is_link(const android::String8& path) {
+    struct stat st;
+    if (lstat(path.string(), &st) < 0 || !S_ISLNK(st.st_mode)) {
+        return false;
+    }
+    errno = ELOOP;
+    return true;
+}
+
 int make_log_dir(const android::String8& path) {
-    return mkdir(path.string(), 0775) == 0 || errno == EEXIST ? 0 : -1;
+    if (mkdir(path.string(), 0775) == 0) {
+        return 0;
+    }
+    return errno == EEXIST && !is_link(path) ? 0 : -1;
 }
 
 bool means_vanished(int error) {
@@ -92,7 +104,8 @@ bool means_vanished(int error) {
 }
 
 bool dir_usable(const android::String8& path) {
-    return access(path.string(), R_OK | W_OK | X_OK) == 0 || !means_vanished(errno);
+    return !is_link(path) &&
+           (access(path.string(), R_OK | W_OK | X_OK) == 0 || !means_vanished(errno));
 }
 
 int rename_to_free_name(const char* old_path, const char* new_path) {

@@ -30,15 +30,20 @@ int remove_tree(const android::String8& path);
 // above.
 int remove_numbered_entries(const android::String8& dir);
 
-// mkdir with mode 0775; 0 when the directory was made or something of this name
-// exists already, else -1.
+// Whether the path names a symbolic link, which may lead out of the log tree: a directory of
+// the tree that has become one is neither entered nor written to. Sets errno to ELOOP if so.
+bool is_link(const android::String8& path);
+
+// mkdir with mode 0775; 0 when the directory was made or something of this name exists
+// already, else -1. A link is never taken for the directory: ELOOP.
 int make_log_dir(const android::String8& path);
 
 // True when this errno of a failed access means that the file or directory is not there any
 // more, for us at least. Any other failure may be a passing one.
 bool means_vanished(int error);
 
-// False when the directory vanished: it cannot be read, written and searched any more.
+// False when the directory vanished: it is a link now, or cannot be read, written and searched
+// any more.
 bool dir_usable(const android::String8& path);
 
 // rename() that never replaces anything: EEXIST when new_path exists. 0 or -1.

@@ -7,6 +7,7 @@
 #include <algorithm>
 
 #include "config/ConfigFixture.h"
+#include "config/settings_file.h"
 #include "support/faults.h"
 
 namespace {
@@ -86,10 +87,24 @@ TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
     root.write_file("system/etc/kest_modem.conf", "stream cp_wcn on 1 2\n");
     ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
     EXPECT_TRUE(refused("22") && unlink(file.c_str()) == 0) << "a FIFO, which stays";
-    ASSERT_EQ(symlink("/proc/self/mem", file.c_str()), 0);
-    EXPECT_TRUE(refused("5")) << "a read error is no end";
+    // Who may make files beside it could make the service read and write others with a link.
+    const std::string victim = root.path("victim");
+    for (const auto make : {symlink, link}) {
+        root.write_file("victim", "stream cp_gnss on 1 2\n");
+        ASSERT_EQ(make(victim.c_str(), file.c_str()), 0);
+        EXPECT_TRUE(make == link || refused("40"));
+        EXPECT_EQ(put_settings(file.c_str(), "new"), -1);
+        root.write_file("victim", "");  // to be replaced by the default
+        EXPECT_TRUE(make == link || refused("40"));
+        copy_default_settings(root.path("system/etc/kest_modem.conf").c_str(), file.c_str());
+        EXPECT_EQ(root.read_file("victim"), "");
+        EXPECT_TRUE(log.has(make == link ? "[31(" : "[40("));
+        unlink(file.c_str());
+    }
+    LogConfig unreadable("/proc/self/mem");
+    EXPECT_EQ(read(unreadable), -1);
+    EXPECT_TRUE(log.has("can not open /proc/self/mem [5(")) << "a read error is no end";
     // A default that cannot be read: it left an empty file, that is, settings without streams.
-    unlink(file.c_str());
     faults::only_on("");
     faults::fail(faults::READ, 1, EIO, faults::FOREVER);
     EXPECT_TRUE(refused("2"));

@@ -139,10 +139,11 @@ TEST_F(ControlOperationsTest, AReloadThatChangesNothingOrCannotBeSavedOrRead) {
     EXPECT_EQ(ctrl->reload_kest_conf(), 0);
     EXPECT_TRUE(log.has(begin + "save config failed [21("));
     remove_tree(path);
-    ASSERT_EQ(symlink("/proc/self/mem", root.path(path).c_str()), 0);
+    root.write_file("elsewhere", "enable\nstream cp_gnss off 5 3\n");
+    ASSERT_EQ(symlink(root.path("elsewhere").c_str(), root.path(path).c_str()), 0);
     EXPECT_EQ(ctrl->reload_kest_conf(), -1);
     EXPECT_TRUE(log.has("int KestConfig::read_config(const char*): can not open "));
-    EXPECT_TRUE(log.has(begin + "load kest.conf failed [5("));
+    EXPECT_TRUE(log.has(begin + "load kest.conf failed [40("));
     EXPECT_EQ(enabled(), "gnss ");
 }
 

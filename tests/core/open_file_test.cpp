@@ -20,6 +20,8 @@ TEST(OpenFile, TakesOnlyWhatCanBeReadToAnEnd) {
     root.write_file("file", "content");
     root.make_dir("dir");
     ASSERT_EQ(mkfifo(root.path("fifo").c_str(), 0600), 0);
+    root.write_file("twice", "content");
+    ASSERT_EQ(link(root.path("twice").c_str(), root.path("hard").c_str()), 0);
     ASSERT_EQ(symlink("file", root.path("link").c_str()), 0);
     ASSERT_EQ(symlink("/dev/zero", root.path("device").c_str()), 0);
     const struct {
@@ -31,6 +33,7 @@ TEST(OpenFile, TakesOnlyWhatCanBeReadToAnEnd) {
         {"file", Links::REFUSE, 0, 0},          {"link", Links::FOLLOW, 0, 0},
         {"link", Links::REFUSE, ELOOP, ELOOP},  {"dir", Links::FOLLOW, EISDIR, EISDIR},
         {"fifo", Links::FOLLOW, EINVAL, ENXIO}, {"device", Links::FOLLOW, EINVAL, EINVAL},
+        {"hard", Links::REFUSE, 0, EMLINK},     {"hard", Links::FOLLOW, 0, 0},
     };
     const size_t descriptors = open_descriptors();
     for (const auto& row : table) {
@@ -44,9 +47,13 @@ TEST(OpenFile, TakesOnlyWhatCanBeReadToAnEnd) {
         if (in >= 0) {
             EXPECT_EQ(fcntl(in, F_GETFL) & O_NONBLOCK, 0) << row.name;
             close(in);
+        }
+        if (out >= 0) {
             close(out);
         }
     }
+    EXPECT_EQ(open_to_write(root.path("hard").c_str(), O_WRONLY | O_TRUNC, Links::REFUSE), -1);
+    EXPECT_EQ(root.read_file("twice"), "content") << "not cut before it was refused";
     const mode_t mask = umask(0);
     const int made =
         open_to_write(root.path("made").c_str(), O_RDWR | O_CREAT | O_TRUNC, Links::REFUSE);

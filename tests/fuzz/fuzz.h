@@ -38,7 +38,7 @@ int fuzz_read(Config& config) {
     return config.read_config(1, argv);
 }
 
-// In memory, as every input writes it again.
+// In memory, as every input writes it again. That is a link; what must be none names its path.
 struct FuzzFile {
     void write(const std::string& text) const { std::ofstream(path, std::ios::binary) << text; }
     const std::string path = "/proc/self/fd/" + std::to_string(memfd_create("fuzz", MFD_CLOEXEC));

@@ -29,7 +29,7 @@ struct Root : TestRoot {
         }
         write_file("data/local/tmp/kest/kest.conf", "enable\nstream cp_wcdma on 0 0\n");
     }
-    FuzzFile file;
+    FuzzFile file{path("settings")};
 };
 
 bool is_reply(const std::string& line, const std::string& keyword) {

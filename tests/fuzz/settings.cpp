@@ -23,12 +23,10 @@ struct Handset {
         root.set_prop("persist.modem.w.enable", "1");
         root.set_prop("persist.storage.type", "1");
         setenv("EXTERNAL_STORAGE", root.path("sdcard").c_str(), 1);
-        const std::filesystem::path path = system_path(PATH_CONFIG_FILE).string();
-        std::filesystem::create_directories(path.parent_path());
-        std::filesystem::create_symlink(file.path, path);
+        std::filesystem::create_directories(std::filesystem::path(file.path).parent_path());
     }
     TestRoot root;
-    FuzzFile file;
+    FuzzFile file{system_path(PATH_CONFIG_FILE).string()};
     std::string text() const {
         std::ostringstream out;
         out << std::ifstream(file.path).rdbuf();

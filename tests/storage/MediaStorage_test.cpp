@@ -2,6 +2,9 @@
 
 #include "storage/MediaStorage.h"
 
+#include <algorithm>
+#include <filesystem>
+
 #include "storage/StorageFixture.h"
 #include "storage/paths.h"
 
@@ -52,6 +55,55 @@ TEST_F(MediaStorageTest, WhatVanishedLeavesTheTotals) {
         }
         EXPECT_LT(checks, 20);
         check_sums(internal());
+    }
+}
+
+// Somebody made a directory of the tree a link, to one that has the same names: nothing is made
+// or deleted there, neither by what is known of the medium nor after a new scan.
+TEST_F(MediaStorageTest, NoLinkLeadsOutOfTheTree) {
+    for (const bool kest : {false, true}) {
+        m_mgr.set_kest_layout(kest);
+        init();
+        const std::string top = kest ? "data/kest" : "data/modem_log";
+        const std::string log_root = kest ? top + "/modem_log" : top;
+        const std::string old_set = log_root + "/2016-02-01-00-00-00";
+        const std::string set = log_root + "/" + TODAY;
+        for (const std::string& linked :
+             {top, log_root, old_set, old_set + "/cp", set, set + "/cp"}) {
+            SCOPED_TRACE(linked);
+            internal().clear();
+            ::remove_tree(m_root.path(top).c_str());
+            m_root.write_file(old_set + "/cp/f", "12345678");
+            m_root.make_dir(log_root + "/2016-02-02-00-00-00");
+            ASSERT_EQ(internal().stat(), 0);
+            make("cp");
+            make("cp", LT_DUMP, "dump")->write("123", 3);
+            const std::string path = m_root.path(linked), away = m_root.path("away");
+            ASSERT_EQ(rename(path.c_str(), away.c_str()) + symlink(away.c_str(), path.c_str()), 0);
+            const auto names = [&] {
+                Names all;
+                for (const auto& entry : std::filesystem::recursive_directory_iterator(away)) {
+                    all.push_back(entry.path());
+                }
+                std::sort(all.begin(), all.end());
+                return all;
+            };
+            const Names before = names();
+            for (const bool scanned : {false, true}) {
+                internal().trim(1000);
+                make("cp", LT_DUMP, "another");
+                internal().create_cp_set();
+                EXPECT_EQ(names(), before) << scanned;
+                EXPECT_EQ(internal().can_make_files(), linked != top && linked != log_root);
+                internal().clear();
+                EXPECT_EQ(internal().stat(), linked != top && linked != log_root ? 0 : -1);
+                EXPECT_EQ(names(), before) << scanned;
+            }
+            internal().clear_all();
+            EXPECT_EQ(names(), before) << "after a clear";
+            unlink(path.c_str());
+            ::remove_tree(away.c_str());
+        }
     }
 }
 
