@@ -28,7 +28,8 @@ MediaStorage::~MediaStorage() {
     forget_sets();
 }
 
-void MediaStorage::set_dirs(const android::String8& top_dir) {
+void MediaStorage::set_dirs(const android::String8& top_dir, Links root_links) {
+    m_root_links = root_links;
     m_top_dir = top_dir;
     m_log_root = top_dir;
     m_log_root.append(DIR_MODEM_LOG);
@@ -53,11 +54,12 @@ int MediaStorage::prepare_top_dir() const {
 }
 
 bool MediaStorage::leads_away() const {
-    return is_link(m_log_root) || (m_manager->kest_layout() && is_link(m_top_dir));
+    return (m_root_links == Links::REFUSE && is_link(m_log_root)) ||
+           (m_manager->kest_layout() && is_link(m_top_dir));
 }
 
 int MediaStorage::stat() {
-    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0 || scan_sets() < 0) {
+    if (prepare_top_dir() < 0 || make_log_dir(m_log_root, m_root_links) < 0 || scan_sets() < 0) {
         return -1;
     }
     m_scanned = true;
@@ -140,7 +142,7 @@ int MediaStorage::remake_log_root() {
     m_manager->media_vanished(this);
     forget_sets();
     m_rescan = true;  // it may have been there all the time
-    return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root);
+    return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root, m_root_links);
 }
 
 CpSetDirectory* MediaStorage::prepare_cur_set() {
@@ -148,11 +150,11 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
         err_log("create parent dir error");
         return nullptr;
     }
-    if (!dir_usable(m_log_root)) {
+    if (!dir_usable(m_log_root, m_root_links)) {
         m_manager->media_vanished(this);
         forget_sets();
         m_rescan = true;
-        if (make_log_dir(m_log_root) < 0) {
+        if (make_log_dir(m_log_root, m_root_links) < 0) {
             err_log("create top dir error");
             return nullptr;
         }
@@ -192,7 +194,7 @@ CpDirectory* MediaStorage::get_cp_dir(const android::String8& cp_name) const {
 }
 
 bool MediaStorage::can_make_files() const {
-    if (prepare_top_dir() < 0 || make_log_dir(m_log_root) < 0) {
+    if (prepare_top_dir() < 0 || make_log_dir(m_log_root, m_root_links) < 0) {
         return false;
     }
     const JoinedPath probe(m_log_root, android::String8(".write_test"));

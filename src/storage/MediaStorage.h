@@ -18,6 +18,7 @@
 
 #include <memory>
 
+#include "core/open_file.h"
 #include "storage/LogType.h"
 
 class CpDirectory;
@@ -33,8 +34,9 @@ public:
     MediaStorage(const MediaStorage&) = delete;
     MediaStorage& operator=(const MediaStorage&) = delete;
 
-    // Sets the top directory and, below it, the log root.
-    void set_dirs(const android::String8& top_dir);
+    // Sets the top directory and, below it, the log root, and whether that may be a link: not
+    // where others than root could have made it.
+    void set_dirs(const android::String8& top_dir, Links root_links);
     // Limits, in bytes. A quota of 0 means no limit. They apply from the next check.
     void set_quota(uint64_t quota) { m_quota = quota; }
     void set_file_size(uint32_t size) { m_file_size = size; }
@@ -120,6 +122,7 @@ private:
     bool m_overwrite = true;
     android::String8 m_top_dir;
     android::String8 m_log_root;
+    Links m_root_links = Links::REFUSE;
     android::List<CpSetDirectory*> m_sets;
     CpSetDirectory* m_working_set = nullptr;
     uint64_t m_size = 0;

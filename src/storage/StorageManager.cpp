@@ -41,8 +41,9 @@ int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*
         external_top.append(DIR_KEST);
         info_log("modem log in store manager in kest/modem_log!!!");
     }
-    m_internal.set_dirs(internal_top);
-    m_external.set_dirs(external_top);
+    // A link in the data partition itself is the administrator's, to a larger partition say.
+    m_internal.set_dirs(internal_top, m_kest_layout ? Links::REFUSE : Links::FOLLOW);
+    m_external.set_dirs(external_top, Links::REFUSE);
     if (m_internal.stat() < 0) {
         return -1;
     }

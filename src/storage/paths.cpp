@@ -83,11 +83,11 @@ bool is_link(const android::String8& path) {
     return true;
 }
 
-int make_log_dir(const android::String8& path) {
+int make_log_dir(const android::String8& path, Links links) {
     if (mkdir(path.string(), 0775) == 0) {
         return 0;
     }
-    return errno == EEXIST && !is_link(path) ? 0 : -1;
+    return errno == EEXIST && (links == Links::FOLLOW || !is_link(path)) ? 0 : -1;
 }
 
 bool means_vanished(int error) {
@@ -103,8 +103,8 @@ bool means_vanished(int error) {
     }
 }
 
-bool dir_usable(const android::String8& path) {
-    return !is_link(path) &&
+bool dir_usable(const android::String8& path, Links links) {
+    return (links == Links::FOLLOW || !is_link(path)) &&
            (access(path.string(), R_OK | W_OK | X_OK) == 0 || !means_vanished(errno));
 }
 

@@ -6,6 +6,8 @@
 #include <limits.h>
 #include <utils/String8.h>
 
+#include "core/open_file.h"
+
 // dir + "/" + name on the stack. A path that does not fit becomes "", which no file
 // system call accepts.
 class JoinedPath {
@@ -35,16 +37,16 @@ int remove_numbered_entries(const android::String8& dir);
 bool is_link(const android::String8& path);
 
 // mkdir with mode 0775; 0 when the directory was made or something of this name exists
-// already, else -1. A link is never taken for the directory: ELOOP.
-int make_log_dir(const android::String8& path);
+// already, else -1. A link that is not to be followed is not taken for the directory: ELOOP.
+int make_log_dir(const android::String8& path, Links links = Links::REFUSE);
 
 // True when this errno of a failed access means that the file or directory is not there any
 // more, for us at least. Any other failure may be a passing one.
 bool means_vanished(int error);
 
-// False when the directory vanished: it is a link now, or cannot be read, written and searched
-// any more.
-bool dir_usable(const android::String8& path);
+// False when the directory vanished: it is a link now that is not to be followed, or cannot be
+// read, written and searched any more.
+bool dir_usable(const android::String8& path, Links links = Links::REFUSE);
 
 // rename() that never replaces anything: EEXIST when new_path exists. 0 or -1.
 int rename_to_free_name(const char* old_path, const char* new_path);

@@ -68,8 +68,11 @@ TEST_F(MediaStorageTest, NoLinkLeadsOutOfTheTree) {
         const std::string log_root = kest ? top + "/modem_log" : top;
         const std::string old_set = log_root + "/2016-02-01-00-00-00";
         const std::string set = log_root + "/" + TODAY;
-        for (const std::string& linked :
-             {top, log_root, old_set, old_set + "/cp", set, set + "/cp"}) {
+        Names places = {old_set, old_set + "/cp", set, set + "/cp"};
+        if (kest) {
+            places.insert(places.end(), {top, log_root});
+        }
+        for (const std::string& linked : places) {
             SCOPED_TRACE(linked);
             internal().clear();
             ::remove_tree(m_root.path(top).c_str());
@@ -105,6 +108,19 @@ TEST_F(MediaStorageTest, NoLinkLeadsOutOfTheTree) {
             ::remove_tree(away.c_str());
         }
     }
+}
+
+// Where only the administrator makes links, the log root may be one.
+TEST_F(MediaStorageTest, LogsGoWhereTheAdministratorWantsThem) {
+    m_root.make_dir("large/2016-02-01-00-00-00/cp");
+    m_root.make_dir("data");
+    ASSERT_EQ(symlink("../large", m_root.path("data/modem_log").c_str()), 0);
+    init();
+    ASSERT_TRUE(make("cp"));
+    EXPECT_EQ(internal().sets().size(), 2u);
+    EXPECT_TRUE(internal().can_make_files());
+    internal().clear_all();
+    EXPECT_EQ(m_root.list("large"), Names());
 }
 
 }  // namespace

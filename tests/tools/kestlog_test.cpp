@@ -330,7 +330,7 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
 TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     StorageManager manager;
     MediaStorage media(&manager);
-    media.set_dirs(android::String8(m_root.path("data").c_str()));
+    media.set_dirs(android::String8(m_root.path("data").c_str()), Links::REFUSE);
     ASSERT_EQ(media.stat(), 0);
     ASSERT_NE(media.create_cp_set(), nullptr);
     const android::String8 gnss("cp_gnss");
