@@ -66,15 +66,15 @@ void check_set_name(const std::string& name) {
 
 void check_file_name(const std::string& name) {
     const FileName file(name);
-    FUZZ_CHECK(file.text == name && (file.exact || (!file.aside && !has_time(file.time))));
+    FUZZ_CHECK(file.text() == name && (file.exact || (!file.aside() && !has_time(file.time()))));
     if (!file.exact || !file.is_log()) {
         return;
     }
     const std::string own =
-        std::to_string(file.number) + "-" + file.cp + "-" + file.time.file_stamp().string();
-    FUZZ_CHECK(file.cp == cp_type_to_name(file.cp_type) && name.compare(0, own.size(), own) == 0);
+        std::to_string(file.number) + "-" + file.cp() + "-" + file.time().file_stamp().string();
+    FUZZ_CHECK(file.cp() == cp_type_to_name(file.cp_type) && name.compare(0, own.size(), own) == 0);
     FUZZ_CHECK(std::regex_match(name.substr(own.size()),
-                                std::regex(file.aside ? "-[1-9]\\d*\\.log" : "\\.log")));
+                                std::regex(file.aside() ? "-[1-9]\\d*\\.log" : "\\.log")));
 }
 
 }  // namespace

@@ -41,8 +41,9 @@ std::string set_name(const TreeSet& set) {
 // A copied directory may have any name; those of its files tell the CP.
 std::string cp_name(const TreeCp& cp) {
     const auto named = std::find_if(cp.files.begin(), cp.files.end(),
-                                    [](const TreeFile& file) { return !file.name.cp.empty(); });
-    return cp_type_of(cp.name) != CT_UNKNOWN || named == cp.files.end() ? cp.name : named->name.cp;
+                                    [](const TreeFile& file) { return !file.name.cp().empty(); });
+    return cp_type_of(cp.name) != CT_UNKNOWN || named == cp.files.end() ? cp.name
+                                                                        : named->name.cp();
 }
 
 }  // namespace
@@ -78,11 +79,12 @@ bool BundleWriter::add_text(const std::string& name, const std::string& text) {
 }
 
 bool BundleWriter::add_file(const TreeSet& set, const TreeCp& cp, const TreeFile& file) {
-    return copy(log_root_of(set) + set_name(set) + "/" + cp_name(cp) + "/" + file.name.text, file);
+    return copy(log_root_of(set) + set_name(set) + "/" + cp_name(cp) + "/" + file.name.text(),
+                file);
 }
 
 bool BundleWriter::add_root_file(const TreeSet& set, const TreeFile& file) {
-    return copy(log_root_of(set) + file.name.text, file);
+    return copy(log_root_of(set) + file.name.text(), file);
 }
 
 bool BundleWriter::copy(const std::string& name, const TreeFile& file) {

@@ -22,7 +22,7 @@ int64_t seconds_between(const LogTime& from, const LogTime& to) {
 bool has_own_times(const TreeCp& cp) {
     constexpr time_t TOLERANCE = 60;
     return std::none_of(cp.files.begin(), cp.files.end(), [](const TreeFile& file) {
-        return file.name.is_log() && file.end < local_time(file.modified - TOLERANCE);
+        return file.name.is_log() && file.end.time() < local_time(file.modified - TOLERANCE);
     });
 }
 
@@ -136,10 +136,10 @@ LogTime CardReport::last_byte(const FilePlace& place) {
         m_timed_cp = place.cp;
         m_own_times = has_own_times(*place.cp);
     }
-    const LogTime& start = log.name.time;
-    const LogTime written = m_own_times ? local_time(log.modified) : log.end;
+    const LogTime& start = log.name.time();
+    const LogTime written = m_own_times ? local_time(log.modified) : log.end.time();
     const bool newest = log.name.number == 0;
-    LogTime last = written < start || log.end < written ? log.end : written;
+    LogTime last = written < start || log.end.time() < written ? log.end.time() : written;
     if (newest && !m_own_times) {
         last = start;
     }
@@ -182,9 +182,9 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
     ++set.files;
     set.size += file.size;
     set.damages += m_file_damages;
-    if (has_time(file.name.time)) {
-        set.from = has_time(set.from) ? std::min(set.from, file.name.time) : file.name.time;
-        set.to = std::max(set.to, file.name.is_log() ? last_byte(place) : file.name.time);
+    if (has_time(file.name.time())) {
+        set.from = has_time(set.from) ? std::min(set.from, file.name.time()) : file.name.time();
+        set.to = std::max(set.to, file.name.is_log() ? last_byte(place) : file.name.time());
     }
     const LogType type = file.name.type;
     if (type == LT_LOG) {
@@ -193,13 +193,13 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
         add_version(place, &cp);
     } else if (type == LT_RINGBUF || type == LT_SLEEP_LOG || type == LT_WCDMA_IQ) {
         TimelineItem item;
-        item.from = item.to = file.name.time;
+        item.from = item.to = file.name.time();
         item.files = 1;
         item.size = file.size;
         item.damages = m_file_damages;
         item.set = place.set;
-        item.name = file.name.text;
-        m_timeline.add(place.cp->name, file.name.kind, item);
+        item.name = file.name.text();
+        m_timeline.add(place.cp->name, file.name.kind(), item);
     }
     if (of_crash(file) && m_file_damages) {
         m_damaged[&file] = m_file_damages;
@@ -213,14 +213,14 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
 void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum* cp) {
     const TreeFile& log = *place.file;
     TimelineItem item;
-    item.from = log.name.time;
+    item.from = log.name.time();
     item.to = last_byte(place);
     item.files = 1;
     item.size = log.size;
     item.seconds = static_cast<uint64_t>(std::max<int64_t>(0, seconds_between(item.from, item.to)));
     item.damages = m_file_damages;
     item.set = place.set;
-    item.name = log.name.text;
+    item.name = log.name.text();
     m_timeline.add(place.cp->name, TK_LOG, item);
     add_gaps(place, item.to, cp);
 
@@ -242,7 +242,7 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) 
     const TreeFile& log = *place.file;
     TimelineItem gap;
     gap.set = place.set;
-    LogTime first = log.name.time;
+    LogTime first = log.name.time();
     if (m_options.whole && cp->last_set != place.set && !place.set->name.empty() &&
         seconds_between(place.set->time, first) > PAUSE_SECONDS) {
         gap.from = place.set->time;
@@ -259,12 +259,12 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) 
     }
     if (log.missing) {
         gap.from = to;
-        gap.to = log.end;
+        gap.to = log.end.time();
         gap.words = missing_text(log);
         m_timeline.add(place.cp->name, TK_MISSING, gap);
     }
     cp->last_set = place.set;
-    cp->last_byte = std::max(cp->last_byte, log.missing ? log.end : to);
+    cp->last_byte = std::max(cp->last_byte, log.missing ? log.end.time() : to);
 }
 
 void CardReport::add_version(const FilePlace& place, CpSum* cp) {
@@ -288,7 +288,7 @@ void CardReport::add_version(const FilePlace& place, CpSum* cp) {
 
 void CardReport::add_database(const TreeFile& file) {
     Json row = {{"path", json_text(file.shown())}, {"size", file.size}};
-    if (file.name.text == DIGEST_NAME) {
+    if (file.name.text() == DIGEST_NAME) {
         row["digest"] = json_text(small_content(file));
     }
     add_row("databases", MAX_ROWS, row);
@@ -309,8 +309,8 @@ void CardReport::add_spectrum(const FilePlace& place) {
     }
     add_row("spectra", MAX_PICTURES,
             {{"cp", json_text(place.cp->name)},
-             {"name", json_text(place.file->name.text)},
-             {"time", time_text(place.file->name.time)},
+             {"name", json_text(place.file->name.text())},
+             {"time", time_text(place.file->name.time())},
              {"format", m_options.iq->iq},
              {"rate", m_options.iq_rate},
              {"samples", spectrum.samples},
@@ -326,15 +326,15 @@ void CardReport::add_crashes() {
         Json files = Json::array();
         item.from = crash.time;
         item.set = crash.set;
-        item.name = crash.files[0]->name.text;
+        item.name = crash.files[0]->name.text();
         item.words = crash_text(crash);
         for (const TreeFile* file : crash.files) {
             ++item.files;
             item.size += file->size;
-            item.to = file->name.time;
+            item.to = file->name.time();
             const auto damaged = m_damaged.find(file);
             item.damages += damaged == m_damaged.end() ? 0 : damaged->second;
-            files.push_back(json_text(file->name.text));
+            files.push_back(json_text(file->name.text()));
         }
         m_timeline.add(crash.cp->name, TK_CRASH, item);
         add_row("crashes", MAX_ROWS,

@@ -17,8 +17,8 @@ constexpr size_t MAX_FILES = 100;
 
 // The name without its time: what a crash has only once.
 std::string kind_key(const FileName& name) {
-    std::string key = name.text;
-    const std::string stamp = name.time.file_stamp().string();
+    std::string key = name.text();
+    const std::string stamp = name.time().file_stamp().string();
     const size_t at = key.find(stamp);
     // What was set aside was there before: "-1" stays in the key.
     return at == std::string::npos ? key : key.erase(at, stamp.size());
@@ -38,10 +38,10 @@ void find_in(const TreeSet& set, const TreeCp& cp, std::vector<Crash>* crashes) 
         if (!of_crash(file)) {
             continue;
         }
-        const LogTime& time = file.name.time;
+        const LogTime& time = file.name.time();
         if (!crash.files.empty() &&
             (kinds.count(kind_key(file.name)) > 0 || crash.files.size() == MAX_FILES ||
-             seconds_of(time) - seconds_of(crash.files.back()->name.time) > MAX_PAUSE_SECONDS)) {
+             seconds_of(time) - seconds_of(crash.files.back()->name.time()) > MAX_PAUSE_SECONDS)) {
             finish();
         }
         crash.time = crash.files.empty() ? time : crash.time;
@@ -62,10 +62,10 @@ std::string crash_text(const Crash& crash) {
     std::vector<std::pair<std::string, int>> kinds;
     for (const TreeFile* file : crash.files) {
         const auto found = std::find_if(kinds.begin(), kinds.end(), [file](const auto& kind) {
-            return kind.first == file->name.kind;
+            return kind.first == file->name.kind();
         });
         if (found == kinds.end()) {
-            kinds.push_back({file->name.kind, 1});
+            kinds.push_back({file->name.kind(), 1});
         } else {
             ++found->second;
         }

@@ -26,9 +26,9 @@ bool has_frames(const TreeFile& file, bool given) {
 
 // The version that stands beside the file; "" without one.
 std::string firmware_of(const ExportSource& source) {
-    const FileName name(source.file->name.cp + ".version");
+    const FileName name(source.file->name.cp() + ".version");
     LogReader in;
-    if (name.type != LT_VERSION || !in.open(source.file->dir->path + name.text, false)) {
+    if (name.type != LT_VERSION || !in.open(source.file->dir->path + name.text(), false)) {
         return "";
     }
     size_t got;
@@ -43,7 +43,7 @@ ExportInterface interface_of(const ExportSource& source) {
     std::string description =
         set.name.empty() ? set.shown : "set " + set.name + " on " + set.medium;
     description += version.empty() ? "" : ", firmware " + version;
-    return {escape_text(source.cp.empty() ? source.file->name.text : source.cp),
+    return {escape_text(source.cp->name.empty() ? source.file->name.text() : source.cp->name),
             escape_text(description), 1};
 }
 
@@ -51,9 +51,10 @@ ExportInterface interface_of(const ExportSource& source) {
 
 ExportPlan::ExportPlan(const LogTree& tree, const std::string& cp) {
     find_sources(tree, cp);
-    std::stable_sort(
-        sources.begin(), sources.end(),
-        [](const ExportSource& a, const ExportSource& b) { return a.order < b.order; });
+    std::stable_sort(sources.begin(), sources.end(),
+                     [](const ExportSource& a, const ExportSource& b) {
+                         return a.order.time() < b.order.time();
+                     });
     find_interfaces();
 }
 
@@ -66,12 +67,20 @@ uint64_t ExportPlan::size() const {
 }
 
 void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
+    // A list that grows takes its space twice.
+    size_t files = 0;
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& dir : set.cps) {
+            files += dir.files.size();
+        }
+    }
+    sources.reserve(files);
     for (const LogStream& stream : log_streams(tree)) {
         LogTime order;
         for (const StreamFile& log : stream.files) {
-            order = std::max(order, log.file->name.time);
+            order = std::max(order, log.file->name.time());
             if (is_wanted(stream.cp, cp)) {
-                sources.push_back({log.set, log.file, stream.cp, order});
+                sources.push_back({log.set, log.cp, log.file, ShortTime(order)});
             }
         }
     }
@@ -81,7 +90,7 @@ void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
                 if (file.name.is_log() || !is_wanted(dir.name, cp)) {
                     continue;
                 }
-                const ExportSource source = {&set, &file, dir.name, file.name.time};
+                const ExportSource source = {&set, &dir, &file, ShortTime(file.name.time())};
                 if (has_frames(file, source.given())) {
                     sources.push_back(source);
                 } else {
@@ -97,7 +106,7 @@ void ExportPlan::find_interfaces() {
     std::vector<ExportSource*> last_logs;  // of each interface
     for (ExportSource& source : sources) {
         const auto next = static_cast<uint32_t>(interfaces.size());
-        const auto [it, is_new] = numbers.insert({{source.set, source.cp}, next});
+        const auto [it, is_new] = numbers.insert({{source.set, source.cp->name}, next});
         source.interface = it->second;
         if (is_new) {
             interfaces.push_back(interface_of(source));

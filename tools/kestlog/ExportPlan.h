@@ -13,9 +13,9 @@
 // A file with frames or chunks.
 struct ExportSource {
     const TreeSet* set;
+    const TreeCp* cp;
     const TreeFile* file;
-    std::string cp;
-    LogTime order;           // the sources are sorted by it
+    ShortTime order;         // the sources are sorted by it
     uint32_t interface = 0;  // in ExportPlan::interfaces
     uint32_t queue = 0;      // on it: 0 is the log, and each other file has its own
     bool continued = false;  // the next log file on the interface goes on where this one ends

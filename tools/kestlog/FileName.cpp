@@ -7,10 +7,12 @@
 #include <strings.h>
 
 #include <algorithm>
+#include <charconv>
 
 namespace {
 
 constexpr size_t STAMP_LEN = 19;
+constexpr char DIGITS[] = "0123456789";
 
 struct Form {
     LogType type;
@@ -23,6 +25,7 @@ struct Form {
 
 // clang-format off
 constexpr Form FORMS[] = {
+    {LT_UNKNOWN,   "unknown",     "",           "",         false, false},  // any other name
     {LT_LOG,       "log",         "-",          ".log",     true,  true},
     {LT_DUMP,      "memory dump", "_memory_",   ".dmp",     true,  true},
     {LT_DUMP,      "memory copy", "_memory_",   ".mem",     true,  true},
@@ -34,6 +37,8 @@ constexpr Form FORMS[] = {
     {LT_IPC_INFO,  "IPC record",  "smsg_",      ".log",     false, true},
     {LT_IPC_INFO,  "IPC record",  "sbuf_",      ".log",     false, true},
     {LT_IPC_INFO,  "IPC record",  "sblock_",    ".log",     false, true},
+    {LT_UNKNOWN, "parsing database", DATABASE_NAME, "",     false, false},
+    {LT_UNKNOWN, "database digest",  DIGEST_NAME,   "",     false, false},
 };
 // clang-format on
 
@@ -78,60 +83,83 @@ bool cut_stamp(std::string* text, LogTime* time) {
     return true;
 }
 
-// Removes the "-N" of a file that was set aside for a newer namesake from the end.
-bool cut_aside(std::string* text) {
-    const size_t dash = text->find_last_not_of("0123456789");
+// Removes the "-N" of a file that was set aside for a newer namesake from the end. An N that is
+// too large for 32 bits becomes the largest.
+bool cut_aside(std::string* text, uint32_t* aside) {
+    const size_t dash = text->find_last_not_of(DIGITS);
     if (dash == std::string::npos || (*text)[dash] != '-' || dash + 1 == text->size() ||
         (*text)[dash + 1] == '0') {
         return false;
+    }
+    const char* const end = text->data() + text->size();
+    if (std::from_chars(text->data() + dash + 1, end, *aside).ec != std::errc()) {
+        *aside = UINT32_MAX;
     }
     text->resize(dash);
     return true;
 }
 
-bool match(const Form& form, FileName* name) {
-    std::string rest = name->text;
+}  // namespace
+
+ShortTime::ShortTime(const LogTime& time)
+    : m_year(static_cast<int16_t>(std::clamp<int>(time.year, INT16_MIN, INT16_MAX))),
+      m_month(static_cast<uint8_t>(time.month)),
+      m_day(static_cast<uint8_t>(time.day)),
+      m_hour(static_cast<uint8_t>(time.hour)),
+      m_minute(static_cast<uint8_t>(time.minute)),
+      m_second(static_cast<uint8_t>(time.second)) {}
+
+FileName::FileName(const std::string& name) {
+    for (size_t form = 1; form < std::size(FORMS) && !exact; ++form) {
+        exact = match(form, name);
+    }
+    if (own_text() != name) {
+        m_text = std::make_shared<const std::string>(name);
+    }
+}
+
+bool FileName::match(size_t index, const std::string& name) {
+    const Form& form = FORMS[index];
+    std::string rest = name;
     LogTime time;
     if (!cut_tail(&rest, form.tail)) {
         return false;
     }
-    bool aside = false;
-    if (form.stamp && !cut_stamp(&rest, &time)) {
-        aside = cut_aside(&rest);
-        if (!aside || !cut_stamp(&rest, &time)) {
-            return false;
-        }
+    uint32_t aside = 0;
+    if (form.stamp && !cut_stamp(&rest, &time) &&
+        (!cut_aside(&rest, &aside) || !cut_stamp(&rest, &time))) {
+        return false;
     }
-    uint32_t number = 0;
-    if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &number)) ||
+    uint32_t log_number = 0;
+    if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &log_number)) ||
         (form.cp ? cp_type_of(rest) == CT_UNKNOWN : !rest.empty())) {
         return false;
     }
-    name->aside = aside;
-    name->type = form.type;
-    name->kind = form.kind;
-    name->cp = rest;
-    name->cp_type = cp_type_of(rest);
-    name->number = number;
-    name->time = time;
+    m_form = static_cast<uint8_t>(index);
+    m_time = ShortTime(time);
+    m_aside = aside;
+    type = form.type;
+    cp_type = cp_type_of(rest);
+    number = log_number;
+    framed_dump = of_modem() && strcmp(form.tail, ".dmp") == 0;
     return true;
 }
 
-}  // namespace
+std::string FileName::own_text() const {
+    const Form& form = FORMS[m_form];
+    std::string name = form.type == LT_LOG ? std::to_string(number) + "-" : "";
+    name.append(cp()).append(form.head);
+    name += form.stamp ? time().file_stamp().string() : "";
+    name += m_aside ? "-" + std::to_string(m_aside) : "";
+    return name + form.tail;
+}
 
-FileName::FileName(const std::string& name) : text(name) {
-    if (name == DATABASE_NAME || name == DIGEST_NAME) {
-        kind = name == DIGEST_NAME ? "database digest" : "parsing database";
-        exact = true;
-        return;
-    }
-    for (const Form& form : FORMS) {
-        if (match(form, this)) {
-            exact = true;
-            framed_dump = of_modem() && strcmp(form.tail, ".dmp") == 0;
-            return;
-        }
-    }
+const char* FileName::kind() const {
+    return FORMS[m_form].kind;
+}
+
+std::string FileName::cp() const {
+    return FORMS[m_form].cp ? cp_type_to_name(cp_type) : "";
 }
 
 bool is_foreign_name(const std::string& name) {

@@ -5,6 +5,10 @@
 #ifndef KESTLOG_FILENAME_H_
 #define KESTLOG_FILENAME_H_
 
+#include <stddef.h>
+#include <stdint.h>
+
+#include <memory>
 #include <string>
 
 #include "config/CpType.h"
@@ -13,8 +17,30 @@
 constexpr char DATABASE_NAME[] = "modem_db.gz";
 constexpr char DIGEST_NAME[] = "sha1.txt";
 
-struct FileName {
+// A LogTime in a third of its space.
+class ShortTime {
+public:
+    ShortTime() = default;
+    explicit ShortTime(const LogTime& time);
+    LogTime time() const { return {m_year, m_month, m_day, m_hour, m_minute, m_second}; }
+
+private:
+    int16_t m_year = 0;
+    uint8_t m_month = 0, m_day = 0, m_hour = 0, m_minute = 0, m_second = 0;
+};
+
+// Small, as there is one for every file of a tree: a name that the service creates is not kept
+// but put together again when it is asked for.
+class FileName {
+public:
     explicit FileName(const std::string& name);
+
+    std::string text() const { return m_text ? *m_text : own_text(); }
+    const char* kind() const;  // in words; a memory dump and its substitute differ
+    std::string cp() const;    // the CP's name in it, or ""
+    LogTime time() const { return m_time.time(); }
+    // Has the "-N" of a file that was set aside for a namesake.
+    bool aside() const { return m_aside != 0; }
 
     // A modem's log files begin with a time record, and its dump consists of frames.
     bool of_modem() const { return cp_type >= CT_WCDMA && cp_type <= CT_5MODE; }
@@ -22,16 +48,20 @@ struct FileName {
     // Something that is saved when a CP crashes.
     bool is_crash() const { return type == LT_DUMP || type == LT_MINI_DUMP || type == LT_IPC_INFO; }
 
-    std::string text;
-    bool exact = false;  // the name is one that the service creates
-    bool aside = false;  // has the "-N" of a file that was set aside for a namesake
     LogType type = LT_UNKNOWN;
-    const char* kind = "unknown";  // in words; a memory dump and its substitute differ
-    bool framed_dump = false;      // a memory dump as received over the diag device
-    std::string cp;                // name in it, or ""
     CpType cp_type = CT_UNKNOWN;
-    uint32_t number = 0;  // of a log file
-    LogTime time;
+    uint32_t number = 0;       // of a log file
+    bool exact = false;        // the name is one that the service creates
+    bool framed_dump = false;  // a memory dump as received over the diag device
+
+private:
+    bool match(size_t form, const std::string& name);
+    std::string own_text() const;
+
+    uint8_t m_form = 0;
+    ShortTime m_time;
+    uint32_t m_aside = 0;                       // N, or 0
+    std::shared_ptr<const std::string> m_text;  // of any other name
 };
 
 bool has_time(const LogTime& time);

@@ -78,9 +78,9 @@ public:
         if (got == 0) {
             m_report.add(false, "empty", "the file is empty");
         }
-        const bool raw = strcmp(m_name.kind, "memory copy") == 0 || m_name.type == LT_MINI_DUMP ||
+        const bool raw = strcmp(m_name.kind(), "memory copy") == 0 || m_name.type == LT_MINI_DUMP ||
                          m_name.type == LT_IPC_INFO || m_name.type == LT_WCDMA_IQ ||
-                         m_name.text == DATABASE_NAME ||
+                         m_name.text() == DATABASE_NAME ||
                          (m_name.type == LT_DUMP && !m_name.framed_dump);
         m_report.chunked = is_chunked(m_in, m_name);
         if (got == 0 || raw) {
@@ -88,7 +88,7 @@ public:
         }
         if (m_name.type == LT_VERSION) {
             check_version();
-        } else if (m_name.text == DIGEST_NAME) {
+        } else if (m_name.text() == DIGEST_NAME) {
             check_digest();
         } else {
             take_record();

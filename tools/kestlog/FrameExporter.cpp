@@ -64,7 +64,7 @@ int FrameExporter::add(const ExportSource& source) {
 
 // Before the first piece, which begins at that offset; or at the end of a file without one.
 void FrameExporter::begin(uint64_t first) {
-    const LogTime& named = m_source->file->name.time;
+    const LogTime& named = m_source->file->name.time();
     m_begun = true;
     m_time = has_time(named) ? seconds_of(named) : 0;
     m_end = m_tail = 0;
@@ -134,9 +134,9 @@ bool FrameExporter::take(const Piece& piece) {
     }
     if (!m_named) {
         m_named = true;
-        const char* const source = m_report->has_record                  ? "time of its record"
-                                   : has_time(m_source->file->name.time) ? "time of its name"
-                                                                         : "time unknown";
+        const char* const source = m_report->has_record                    ? "time of its record"
+                                   : has_time(m_source->file->name.time()) ? "time of its name"
+                                                                           : "time unknown";
         m_writer.comment(escape_text(file_name()) + ": " + source);
     }
     if (!piece.intact) {
@@ -163,15 +163,15 @@ void FrameExporter::end(const LogReader& in) {
         line().tail = read_at(file.path(), m_tail, static_cast<size_t>(tail));
         line().tail_other = left;
         line().tail_time = m_time;
-        line().tail_file = file.name.text;
+        line().tail_file = file.name.text();
     } else if (left > 0) {
-        remark_last(outside(left, "at the end of " + file.name.text));
+        remark_last(outside(left, "at the end of " + file.name.text()));
     }
     if (file.name.framed_dump && !m_report->end_marker) {
         remark_last("the memory dump ends without its end marker");
     }
     if (file.missing > 0) {
-        remark_last("log files are missing after " + file.name.text + ": " + missing_text(file));
+        remark_last("log files are missing after " + file.name.text() + ": " + missing_text(file));
     }
 }
 

@@ -48,7 +48,7 @@ private:
     };
 
     Line& line() { return m_lines[m_source->interface]; }
-    const std::string& file_name() const { return m_source->file->name.text; }
+    std::string file_name() const { return m_source->file->name.text(); }
     void begin(uint64_t first);
     bool take(const Piece& piece);
     void end(const LogReader& in);

@@ -108,9 +108,9 @@ void LiveTree::add(Dir& dir, const std::string& name, const File& file, bool tel
 }
 
 void LiveTree::tell_new(Dir& dir, const FileName& name) {
-    const std::string shown = escape_text(name.text);
+    const std::string shown = escape_text(name.text());
     if (name.type == LT_DUMP) {
-        tell("crash", dir, name, std::string(name.kind) + " begins: " + shown,
+        tell("crash", dir, name, std::string(name.kind()) + " begins: " + shown,
              {{"state", "begins"}});
         return;
     }
@@ -131,7 +131,7 @@ void LiveTree::tell_new(Dir& dir, const FileName& name) {
         }
     }
     if (before.empty()) {
-        tell("file", dir, name, std::string("new ") + name.kind + ": " + shown, Json::object());
+        tell("file", dir, name, std::string("new ") + name.kind() + ": " + shown, Json::object());
         return;
     }
     look(dir, before);
@@ -142,26 +142,26 @@ void LiveTree::tell_new(Dir& dir, const FileName& name) {
 }
 
 std::string LiveTree::cp_of(const Dir& dir, const std::string& name) {
-    const std::string cp = cp_type_of(dir.cp) == CT_UNKNOWN ? FileName(name).cp : dir.cp;
+    const std::string cp = cp_type_of(dir.cp) == CT_UNKNOWN ? FileName(name).cp() : dir.cp;
     return cp.empty() ? dir.cp : cp;
 }
 
 void LiveTree::tell(const char* event, const Dir& dir, const FileName& name,
                     const std::string& words, const Json& more) {
-    const std::string cp = cp_of(dir, name.text);
+    const std::string cp = cp_of(dir, name.text());
     LiveEvent told(event, dir.medium + " " + cp, words);
     told.json.update({{"medium", json_text(dir.medium)},
                       {"set", json_text(dir.set)},
                       {"cp", json_text(cp)},
-                      {"file", json_text(name.text)},
-                      {"kind", name.kind},
-                      {"size", dir.files.at(name.text).size}});
+                      {"file", json_text(name.text())},
+                      {"kind", name.kind()},
+                      {"size", dir.files.at(name.text()).size}});
     told.json.update(more);
     m_tell(told);
 }
 
 void LiveTree::tell_damage(const Dir& dir, const FileName& name, const Finding& finding) {
-    tell("damage", dir, name, escape_text(name.text) + ": " + finding_text(finding),
+    tell("damage", dir, name, escape_text(name.text()) + ": " + finding_text(finding),
          finding_json(finding));
 }
 

@@ -51,8 +51,8 @@ public:
 
     // The tree, and the log roots and ROOTs, as they are now. Tells what is new, but nothing the
     // first time; of a medium that appears with old sets only the sets, and the files of the
-    // newest.
-    void take(const LogTree& tree, const std::set<std::string>& roots);
+    // newest. The tree's files are given up on the way, as there may be very many.
+    void take(LogTree& tree, const std::set<std::string>& roots);
     // What is known of all files: for the first line.
     LiveEvent ready() const;
 

@@ -48,8 +48,8 @@ void LiveTree::check_open() {
 // False when the file has another name already, which the next change tells.
 bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
     LogReader in;
-    File& file = dir.files.at(name.text);
-    const std::string path = dir.path + "/" + name.text;
+    File& file = dir.files.at(name.text());
+    const std::string path = dir.path + "/" + name.text();
     if (!name.exact && is_closed) {
         return true;  // whoever copies a file here gives it its name at the end
     }
@@ -74,7 +74,7 @@ bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
     if (in.error()) {
         m_tell(LiveEvent::notice(path + ": " + strerror(in.error())));
     }
-    look(dir, name.text);
+    look(dir, name.text());
     file.unchecked = false;
     for (Finding finding : report.findings) {
         if (is_closed) {
@@ -89,7 +89,7 @@ bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
     }
     if (name.is_crash() && is_closed && (!name.framed_dump || report.end_marker)) {
         tell("crash", dir, name,
-             std::string(name.kind) + " is complete: " + escape_text(name.text) + ", " +
+             std::string(name.kind()) + " is complete: " + escape_text(name.text()) + ", " +
                  size_text(file.size),
              {{"state", "complete"}});
     }
@@ -128,8 +128,8 @@ std::map<std::string, LiveTree::Sum> LiveTree::sums() {
             sum.size += file.size;
             if (name.compare(0, 2, "0-") == 0) {
                 const FileName log(name);
-                if (log.is_log() && newest[cp] < log.time) {
-                    newest[cp] = log.time;
+                if (log.is_log() && newest[cp] < log.time()) {
+                    newest[cp] = log.time();
                     sum.newest = name;
                 }
             }

@@ -13,12 +13,12 @@ std::string parent(const std::string& path) {
 
 // Log files are told apart by what the service's counting up leaves as it is.
 std::string lasting_name(const FileName& name) {
-    return name.is_log() ? name.text.substr(name.text.find('-')) : name.text;
+    return name.is_log() ? name.text().substr(name.text().find('-')) : name.text();
 }
 
 }  // namespace
 
-void LiveTree::take(const LogTree& tree, const std::set<std::string>& roots) {
+void LiveTree::take(LogTree& tree, const std::set<std::string>& roots) {
     const bool tell = m_taken;
     m_taken = true;
     std::set<std::string> sets, dirs;
@@ -32,7 +32,7 @@ void LiveTree::take(const LogTree& tree, const std::set<std::string>& roots) {
     }
     take_roots(roots, tell);
     leave(sets, dirs);
-    for (const TreeSet& set : tree.sets) {
+    for (TreeSet& set : tree.sets) {
         const bool is_new = m_sets.count(set.shown) == 0;
         m_sets[set.shown] = true;
         if (is_new && tell) {
@@ -54,6 +54,9 @@ void LiveTree::take(const LogTree& tree, const std::set<std::string>& roots) {
             dir.cp = file_part(path);
             dir.present = true;
             take_files(dir, all, tell && (!is_new || newest[parent(set.shown)] == set.shown));
+        }
+        for (TreeCp& cp : set.cps) {
+            cp.files = std::vector<TreeFile>();
         }
     }
 }
@@ -128,14 +131,14 @@ void LiveTree::tell_set(const TreeSet& set) {
 void LiveTree::take_files(Dir& dir, const std::vector<const TreeFile*>& files, bool tell) {
     std::vector<const TreeFile*> unknown;  // oldest first
     for (const TreeFile* seen : files) {
-        const auto it = dir.files.find(seen->name.text);
+        const auto it = dir.files.find(seen->name.text());
         if (it == dir.files.end()) {
             unknown.push_back(seen);
             continue;
         }
         it->second.seen = true;
         if (it->second.size != seen->size) {
-            written(dir, seen->name.text);
+            written(dir, seen->name.text());
         }
     }
     std::map<std::string, std::vector<FileName>> lost;  // by lasting name
@@ -152,13 +155,13 @@ void LiveTree::take_files(Dir& dir, const std::vector<const TreeFile*>& files, b
     }
     std::vector<const TreeFile*> fresh;
     for (const TreeFile* seen : unknown) {
-        const std::string& name = seen->name.text;
+        const std::string& name = seen->name.text();
         std::vector<FileName>& list = lost[lasting_name(seen->name)];
         if (list.empty()) {
             fresh.push_back(seen);
             continue;
         }
-        moved(dir, list.back().text, name);
+        moved(dir, list.back().text(), name);
         const bool counted_up = list.back().number == 0 && seen->name.number > 0;
         list.pop_back();
         written(dir, name);
@@ -168,16 +171,16 @@ void LiveTree::take_files(Dir& dir, const std::vector<const TreeFile*>& files, b
     }
     for (const auto& [name, list] : lost) {
         for (const FileName& file : list) {
-            removed(dir, file.text);
+            removed(dir, file.text());
         }
     }
     for (const TreeFile* seen : fresh) {
-        add(dir, seen->name.text, {seen->size}, tell);
+        add(dir, seen->name.text(), {seen->size}, tell);
         // Whether it was closed meanwhile is not known; a file that the service has counted up,
         // or writes in one go, was.
         if (tell && seen->size > 0 &&
             (seen->name.is_log() ? seen->name.number > 0 : seen->name.type != LT_DUMP)) {
-            closed(dir, seen->name.text);
+            closed(dir, seen->name.text());
         }
     }
 }

@@ -8,7 +8,7 @@
 namespace {
 
 struct Place {
-    LogTime time;  // never earlier than that of an older file in the same directory
+    ShortTime time;  // never earlier than that of an older file in the same directory
     StreamFile file;
 };
 
@@ -24,8 +24,8 @@ void add_directory(const TreeSet& set, const TreeCp& cp, std::vector<Place>* pla
     });
     LogTime time;
     for (const TreeFile* log : logs) {
-        time = std::max(time, log->name.time);
-        places->push_back({time, {&set, log}});
+        time = std::max(time, log->name.time());
+        places->push_back({ShortTime(time), {&set, &cp, log}});
     }
 }
 
@@ -40,15 +40,18 @@ std::vector<LogStream> log_streams(const LogTree& tree) {
     }
     std::vector<LogStream> streams;
     for (auto& [cp, places] : cps) {
-        std::stable_sort(places.begin(), places.end(),
-                         [](const Place& a, const Place& b) { return a.time < b.time; });
-        LogStream stream = {cp, {}};
+        if (places.empty()) {
+            continue;
+        }
+        std::stable_sort(places.begin(), places.end(), [](const Place& a, const Place& b) {
+            return a.time.time() < b.time.time();
+        });
+        streams.push_back({cp, {}});
+        streams.back().files.reserve(places.size());
         for (const Place& place : places) {
-            stream.files.push_back(place.file);
+            streams.back().files.push_back(place.file);
         }
-        if (!places.empty()) {
-            streams.push_back(stream);
-        }
+        places = std::vector<Place>();  // there may be very many
     }
     return streams;
 }

@@ -11,6 +11,7 @@
 
 struct StreamFile {
     const TreeSet* set;
+    const TreeCp* cp;
     const TreeFile* file;
 };
 

@@ -61,9 +61,21 @@ TreeCp* cp_of(TreeSet* set, const std::string& name, const std::string& dir) {
     return &set->cps.back();
 }
 
+size_t count_entries(const std::string& path) {
+    size_t count = 0;
+    DIR* const dir = opendir(path.c_str());
+    while (dir && readdir(dir)) {
+        ++count;
+    }
+    if (dir) {
+        closedir(dir);
+    }
+    return count;
+}
+
 }  // namespace
 
-bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
+bool LogTree::visit_dir(const std::string& path, const std::function<void(const Entry&)>& visit) {
     DIR* dir = opendir(path.c_str());
     if (!dir) {
         failures.push_back(shown(path) + ": " + strerror(errno));
@@ -77,14 +89,20 @@ bool LogTree::list_dir(const std::string& path, std::vector<Entry>* entries) {
         if (is_foreign_name(entry->d_name)) {
             foreign.push_back(shown(path) + "/" + entry->d_name);
         } else if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
-            entries->push_back({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
-                                static_cast<uint64_t>(st.st_size), modified_time(st)});
+            visit({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
+                   static_cast<uint64_t>(st.st_size), modified_time(st)});
         }
     }
     closedir(dir);
-    std::sort(entries->begin(), entries->end(),
-              [](const Entry& a, const Entry& b) { return a.name < b.name; });
     return true;
+}
+
+std::vector<LogTree::Entry> LogTree::list_dir(const std::string& path) {
+    std::vector<Entry> entries;
+    visit_dir(path, [&entries](const Entry& entry) { entries.push_back(entry); });
+    std::sort(entries.begin(), entries.end(),
+              [](const Entry& a, const Entry& b) { return a.name < b.name; });
+    return entries;
 }
 
 std::string LogTree::shown(const std::string& path) const {
@@ -94,8 +112,9 @@ std::string LogTree::shown(const std::string& path) const {
                : path;
 }
 
-std::shared_ptr<const TreeDir> LogTree::tree_dir(const std::string& path) const {
-    return std::make_shared<TreeDir>(TreeDir{path + "/", shown(path) + "/"});
+const TreeDir* LogTree::tree_dir(const std::string& path) {
+    m_dirs.push_back({path + "/", shown(path) + "/"});
+    return &m_dirs.back();
 }
 
 bool LogTree::first_visit(const std::string& path) {
@@ -128,9 +147,10 @@ void LogTree::add_file(const std::string& path) {
     const size_t slash = path.rfind('/') + 1;
     const std::string dir = path.substr(0, slash);
     const FileName name(path.substr(slash));
-    sets.push_back({"", path, m_medium, {}, {{name.cp, path, {}}}});
-    sets.back().cps[0].files.push_back({name, std::make_shared<TreeDir>(TreeDir{dir, dir}),
-                                        static_cast<uint64_t>(st.st_size), modified_time(st)});
+    m_dirs.push_back({dir, dir});
+    sets.push_back({"", path, m_medium, {}, {{name.cp(), path, {}}}});
+    sets.back().cps[0].files.push_back(
+        {name, &m_dirs.back(), static_cast<uint64_t>(st.st_size), modified_time(st)});
 }
 
 bool LogTree::add_archive(const std::string& path) {
@@ -167,8 +187,7 @@ bool LogTree::add_archive(const std::string& path) {
     m_alias = {dir, path};
     // It may have been packed together with the directories above it.
     while (!add_media(dir) && !add_directory(dir)) {
-        std::vector<Entry> entries;
-        list_dir(dir, &entries);
+        const std::vector<Entry> entries = list_dir(dir);
         if (entries.size() != 1 || !entries[0].dir) {
             return false;
         }
@@ -207,31 +226,27 @@ bool LogTree::add_medium(const std::string& path, const std::string& name) {
 }
 
 bool LogTree::add_directory(const std::string& path) {
-    std::vector<Entry> entries;
-    const size_t foreign_before = foreign.size();
-    if (!list_dir(path, &entries)) {
-        return true;
-    }
-    foreign.resize(foreign_before);  // the directory is read again below
     // The directory's own name shows what it is or, in a renamed copy, the names inside it.
     const std::string name = base_name(path);
     LogTime time;
-    const auto any = [&entries](bool (*test)(const Entry&)) {
-        return std::any_of(entries.begin(), entries.end(), test);
-    };
-    const auto is_set = [](const Entry& e) {
-        LogTime t;
-        return e.dir && parse_set_name(e.name, &t);
-    };
-    const auto is_cp = [](const Entry& e) { return e.dir && cp_type_of(e.name) != CT_UNKNOWN; };
-    const auto is_ours = [](const Entry& e) {
-        return e.file && FileName(e.name).type != LT_UNKNOWN;
-    };
-    if (name == &DIR_MODEM_LOG[1] || any(is_set)) {
+    bool any_set = false;
+    bool any_cp = false;
+    bool any_file = false;
+    const size_t foreign_before = foreign.size();
+    const bool readable = visit_dir(path, [&](const Entry& entry) {
+        any_set |= entry.dir && parse_set_name(entry.name, &time);
+        any_cp |= entry.dir && cp_type_of(entry.name) != CT_UNKNOWN;
+        any_file |= entry.file && (any_file || FileName(entry.name).type != LT_UNKNOWN);
+    });
+    if (!readable) {
+        return true;
+    }
+    foreign.resize(foreign_before);  // the directory is read again below
+    if (name == &DIR_MODEM_LOG[1] || any_set) {
         read_root(path);
-    } else if (parse_set_name(name, &time) || any(is_cp)) {
+    } else if (parse_set_name(name, &time) || any_cp) {
         read_set(path, name);
-    } else if (cp_type_of(name) != CT_UNKNOWN || any(is_ours)) {
+    } else if (cp_type_of(name) != CT_UNKNOWN || any_file) {
         sets.push_back({"", shown(path), m_medium, {}, {}});
         read_cp(path, name, &sets.back());
     } else {
@@ -241,13 +256,11 @@ bool LogTree::add_directory(const std::string& path) {
 }
 
 void LogTree::read_root(const std::string& path) {
-    std::vector<Entry> entries;
     if (!first_visit(path)) {
         return;
     }
-    list_dir(path, &entries);
-    const std::shared_ptr<const TreeDir> dir = tree_dir(path);
-    for (const Entry& entry : entries) {
+    const TreeDir* const dir = tree_dir(path);
+    for (const Entry& entry : list_dir(path)) {
         const std::string full = path + "/" + entry.name;
         LogTime time;
         if (entry.dir && parse_set_name(entry.name, &time)) {
@@ -261,14 +274,12 @@ void LogTree::read_root(const std::string& path) {
 }
 
 void LogTree::read_set(const std::string& path, const std::string& name) {
-    std::vector<Entry> entries;
     if (!first_visit(path)) {
         return;
     }
-    list_dir(path, &entries);
     sets.push_back({name, shown(path), m_medium, {}, {}});
     parse_set_name(name, &sets.back().time);
-    for (const Entry& entry : entries) {
+    for (const Entry& entry : list_dir(path)) {
         if (entry.dir && cp_type_of(entry.name) != CT_UNKNOWN) {
             read_cp(path + "/" + entry.name, entry.name, &sets.back());
         } else {
@@ -278,23 +289,31 @@ void LogTree::read_set(const std::string& path, const std::string& name) {
 }
 
 void LogTree::read_cp(const std::string& path, const std::string& name, TreeSet* set) {
-    std::vector<Entry> entries;
     if (!first_visit(path)) {
         return;
     }
-    list_dir(path, &entries);
-    const std::shared_ptr<const TreeDir> dir = tree_dir(path);
+    const TreeDir* const dir = tree_dir(path);
     const bool renamed = cp_type_of(name) == CT_UNKNOWN;
+    const size_t strays_before = strays.size();
     TreeCp* cp = renamed ? nullptr : cp_of(set, name, dir->shown);
-    for (const Entry& entry : entries) {
-        const FileName file(entry.name);
+    if (cp) {
+        // A list that grows takes its space twice.
+        cp->files.reserve(cp->files.size() + count_entries(path));
+    }
+    visit_dir(path, [&](const Entry& entry) {
         if (!entry.file) {
             strays.push_back(dir->shown + entry.name);
-            continue;
+            return;
         }
+        const FileName file(entry.name);
         if (renamed) {
-            cp = cp_of(set, file.cp.empty() ? name : file.cp, dir->shown);
+            cp = cp_of(set, file.cp().empty() ? name : file.cp(), dir->shown);
         }
         cp->files.push_back({file, dir, entry.size, entry.modified});
+    });
+    std::sort(strays.begin() + static_cast<ptrdiff_t>(strays_before), strays.end());
+    if (renamed) {
+        std::sort(set->cps.begin(), set->cps.end(),
+                  [](const TreeCp& a, const TreeCp& b) { return a.name < b.name; });
     }
 }

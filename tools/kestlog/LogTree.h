@@ -9,6 +9,8 @@
 #include <sys/types.h>
 #include <time.h>
 
+#include <deque>
+#include <functional>
 #include <memory>
 #include <set>
 #include <string>
@@ -30,25 +32,27 @@ struct TreeDir {
     std::string shown;  // the same for humans: a path in an archive begins with its name
 };
 
+// There may be several hundred thousand.
 struct TreeFile {
     FileName name;
-    std::shared_ptr<const TreeDir> dir;
+    const TreeDir* dir;  // the tree's
     uint64_t size;
     time_t modified;
     // Of a log file: the time of the next newer one or, of the newest, when it was written to
     // last. Of any other the time in its name.
-    LogTime end{};
+    ShortTime end{};
     // Of a log file: the numbers between it and the next newer one (down to 0 from the newest)
-    // that are missing. They count from first_missing up.
+    // that are missing.
     uint32_t missing = 0;
-    uint32_t first_missing = 0;
     bool doubled = false;     // a log file beside it has the same number
     bool set_aside = false;   // but one of the two was set aside, as it is allowed to be
     bool disordered = false;  // by its number it is older than a log file with an earlier time
 
-    std::string path() const { return dir->path + name.text; }
-    std::string shown() const { return dir->shown + name.text; }
+    uint32_t first_missing() const { return name.number - missing; }
+    std::string path() const { return dir->path + name.text(); }
+    std::string shown() const { return dir->shown + name.text(); }
 };
+static_assert(sizeof(TreeFile) <= 96, "a tree of 100,000 files stays small");
 
 struct TreeCp {
     std::string name;
@@ -112,10 +116,12 @@ private:
         time_t modified;
     };
 
-    // Lists a directory by name, without foreign entries. False, with an entry in failures,
-    // when it cannot be read.
-    bool list_dir(const std::string& path, std::vector<Entry>* entries);
-    std::shared_ptr<const TreeDir> tree_dir(const std::string& path) const;
+    // Calls visit for what is in a directory, in no order, and puts foreign entries aside. False,
+    // with an entry in failures, when it cannot be read.
+    bool visit_dir(const std::string& path, const std::function<void(const Entry&)>& visit);
+    // The same by name.
+    std::vector<Entry> list_dir(const std::string& path);
+    const TreeDir* tree_dir(const std::string& path);
     std::string shown(const std::string& path) const;
     bool first_visit(const std::string& path);
     bool add_archive(const std::string& path);
@@ -133,6 +139,7 @@ private:
     bool m_card_given = false;
     size_t m_roots = 0;
     size_t m_archives = 0;
+    std::deque<TreeDir> m_dirs;  // which stay where they are
     uint64_t m_unpack_limit = 0;
     std::unique_ptr<TempDir> m_unpacked;  // with a directory for each archive
 };

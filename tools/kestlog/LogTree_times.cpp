@@ -7,18 +7,19 @@
 namespace {
 
 bool older(const TreeFile& a, const TreeFile& b) {
-    if (a.name.time < b.name.time || b.name.time < a.name.time) {
-        return a.name.time < b.name.time;
+    const LogTime times[] = {a.name.time(), b.name.time()};
+    if (times[0] < times[1] || times[1] < times[0]) {
+        return times[0] < times[1];
     }
     return a.name.number != b.name.number ? a.name.number > b.name.number
-                                          : a.name.text < b.name.text;
+                                          : a.name.text() < b.name.text();
 }
 
 // The newest log file has number 0, and each older one the next number.
 void find_missing(std::vector<TreeFile>* files) {
     std::vector<TreeFile*> logs;
     for (TreeFile& file : *files) {
-        file.end = file.name.time;
+        file.end = ShortTime(file.name.time());
         if (file.name.is_log()) {
             logs.push_back(&file);
         }
@@ -33,14 +34,15 @@ void find_missing(std::vector<TreeFile>* files) {
         if (newer && newer->name.number == number) {
             // A file that was set aside keeps its number until the next renumbering.
             log->doubled = true;
-            log->set_aside = log->name.aside || newer->name.aside;
+            log->set_aside = log->name.aside() || newer->name.aside();
         } else {
             // Trimming may delete the file that has just been closed.
-            log->first_missing = due;
             log->missing = number - due;
         }
-        log->disordered = newer && newer->name.number < number && newer->name.time < log->name.time;
-        log->end = std::max(log->name.time, newer ? newer->name.time : local_time(log->modified));
+        log->disordered =
+            newer && newer->name.number < number && newer->name.time() < log->name.time();
+        log->end = ShortTime(
+            std::max(log->name.time(), newer ? newer->name.time() : local_time(log->modified)));
         due = number + 1;
         newer = log;
     }
@@ -54,7 +56,7 @@ LogTime local_time(time_t seconds) {
 }
 
 std::string missing_text(const TreeFile& log) {
-    const std::string first = std::to_string(log.first_missing);
+    const std::string first = std::to_string(log.first_missing());
     return log.missing == 1
                ? "number " + first + " is missing"
                : "numbers " + first + " to " + std::to_string(log.name.number - 1) + " are missing";
@@ -67,8 +69,8 @@ void LogTree::finish() {
             std::sort(cp.files.begin(), cp.files.end(), older);
             find_missing(&cp.files);
             for (const TreeFile& file : cp.files) {
-                if (has_time(file.name.time)) {
-                    first = has_time(first) ? std::min(first, file.name.time) : file.name.time;
+                if (has_time(file.name.time())) {
+                    first = has_time(first) ? std::min(first, file.name.time()) : file.name.time();
                 }
             }
         }
@@ -80,8 +82,8 @@ void LogTree::finish() {
 
 void LogTree::cut(const LogTime& since, const LogTime& until) {
     const auto outside = [&](const TreeFile& file) {
-        return has_time(file.name.time) && ((has_time(since) && file.end < since) ||
-                                            (has_time(until) && until < file.name.time));
+        return has_time(file.name.time()) && ((has_time(since) && file.end.time() < since) ||
+                                              (has_time(until) && until < file.name.time()));
     };
     for (TreeSet& set : sets) {
         for (TreeCp& cp : set.cps) {
@@ -97,7 +99,7 @@ LogTime LogTree::newest() const {
         last = std::max(last, set.time);
         for (const TreeCp& cp : set.cps) {
             for (const TreeFile& file : cp.files) {
-                last = std::max(last, file.end);
+                last = std::max(last, file.end.time());
             }
         }
     }

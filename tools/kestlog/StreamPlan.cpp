@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <map>
+#include <set>
 
 #include "kestlog/ExitStatus.h"
 #include "kestlog/LogReader.h"
@@ -37,10 +38,11 @@ bool same_beginning(const TreeFile& a, const TreeFile& b) {
     }
 }
 
-// What two copies of a file have in common, even when one was renumbered since.
-std::string identity(const StreamFile& place) {
-    const std::string& name = place.file->name.text;
-    return place.set->name + "/" + name.substr(std::min(name.find('-'), name.size()));
+// What two copies of a file in sets of the same name have in common, even when one was
+// renumbered since.
+std::string identity(const TreeFile& file) {
+    const std::string name = file.name.text();
+    return name.substr(std::min(name.find('-'), name.size()));
 }
 
 void leave_out(PlannedFile* file, const char* code, const std::string& words) {
@@ -48,16 +50,12 @@ void leave_out(PlannedFile* file, const char* code, const std::string& words) {
     file->findings.push_back({true, code, words + "; left out", -1});
 }
 
-void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
-    std::map<std::string, size_t> known;
-    for (size_t i = 0; i < plan->size(); ++i) {
-        const StreamFile& place = stream.files[i];
-        if (place.set->name.empty()) {
-            continue;
-        }
-        const auto [it, fresh] = known.insert({identity(place), i});
-        PlannedFile* older = &(*plan)[it->second];
-        PlannedFile* newer = &(*plan)[i];
+// Looks for copies among the files, which are from sets of the same name.
+void find_copies_in(const std::vector<PlannedFile*>& files) {
+    std::map<std::string, PlannedFile*> known;
+    for (PlannedFile* newer : files) {
+        const auto [it, fresh] = known.insert({identity(*newer->file), newer});
+        PlannedFile* const older = it->second;
         if (fresh || older->file->dir == newer->file->dir) {
             continue;
         }
@@ -68,7 +66,7 @@ void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
                                        -1});
         } else if (older->file->size < newer->file->size) {
             leave_out(older, "copy", "the beginning of " + newer->file->shown());
-            it->second = i;
+            it->second = newer;
         } else {
             leave_out(
                 newer, "copy",
@@ -78,12 +76,29 @@ void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
     }
 }
 
+// Set by set, as there may be very many files: mostly a name is that of a single set.
+void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
+    std::map<std::string, std::set<const TreeSet*>> sets;
+    for (const StreamFile& place : stream.files) {
+        sets[place.set->name].insert(place.set);
+    }
+    for (const auto& [name, same] : sets) {
+        std::vector<PlannedFile*> files;
+        for (size_t i = 0; i < plan->size() && same.size() > 1 && !name.empty(); ++i) {
+            if (same.count(stream.files[i].set)) {
+                files.push_back(&(*plan)[i]);
+            }
+        }
+        find_copies_in(files);
+    }
+}
+
 void find_gaps(std::vector<PlannedFile>* plan) {
     std::map<const TreeDir*, size_t> newest;  // of each directory
     size_t last = 0;
     for (size_t i = 0; i < plan->size(); ++i) {
         if (!(*plan)[i].left_out) {
-            newest[(*plan)[i].file->dir.get()] = last = i;
+            newest[(*plan)[i].file->dir] = last = i;
         }
     }
     for (size_t i = 0; i < plan->size(); ++i) {
@@ -98,8 +113,8 @@ void find_gaps(std::vector<PlannedFile>* plan) {
         }
         // What follows a file of the stream is missing only when something newer is there; what
         // --until has cut off is not missing.
-        const bool ends = file.first_missing == 0;
-        if (file.missing > 0 && (ends || newest[file.dir.get()] != i)) {
+        const bool ends = file.first_missing() == 0;
+        if (file.missing > 0 && (ends || newest[file.dir] != i)) {
             each.findings.push_back(
                 {!(ends && each.last), "gap", "after it " + missing_text(file), -1});
         }

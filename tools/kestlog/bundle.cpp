@@ -67,8 +67,8 @@ void reduce_databases(LogTree* tree) {
     if (std::any_of(files.begin(), files.end(), beside)) {
         erase_if(&files, [&](const TreeFile& file) { return !beside(file); });
     } else if (!files.empty()) {
-        const std::shared_ptr<const TreeDir> first = files[0].dir;
-        erase_if(&files, [&first](const TreeFile& file) { return file.dir != first; });
+        const TreeDir* const first = files[0].dir;
+        erase_if(&files, [first](const TreeFile& file) { return file.dir != first; });
     }
 }
 
@@ -79,12 +79,12 @@ void reduce(const Crash& crash, int64_t seconds, LogTree* tree) {
         own.insert(file->path());
     }
     const LogTime since = time_of(seconds_of(crash.time) - seconds);
-    const LogTime until = time_of(seconds_of(crash.files.back()->name.time) + seconds);
+    const LogTime until = time_of(seconds_of(crash.files.back()->name.time()) + seconds);
     const auto belongs = [&](const TreeFile& file) {
         const LogType type = file.name.type;
         const bool around = type == LT_LOG || type == LT_RINGBUF || type == LT_SLEEP_LOG;
         return own.count(file.path()) > 0 || type == LT_VERSION ||
-               (around && !(file.end < since) && !(until < file.name.time));
+               (around && !(file.end.time() < since) && !(until < file.name.time()));
     };
     const auto only_version = [](const TreeCp& cp) {
         return std::all_of(cp.files.begin(), cp.files.end(),

@@ -11,7 +11,7 @@
 #include <algorithm>
 #include <deque>
 #include <nlohmann/json.hpp>
-#include <set>
+#include <unordered_set>
 
 #include "channels/modem_dump_end.h"
 #include "common/text.h"
@@ -136,13 +136,14 @@ private:
         return {{"memory image", name.exact ? "" : ".image", ANY, ANY, nullptr}};
     }
 
-    // Where it goes: no two outputs of one run have the same name.
+    // Where it goes: no two outputs of one run have the same name. Of the names only hashes are
+    // kept; where two have the same, the worst is a number that was not needed.
     std::string output_path(const TreeFile& file, const std::string& suffix) {
-        const std::string name = file.name.text == "-" ? "stdin" : file.name.text;
+        const std::string name = file.name.text() == "-" ? "stdin" : file.name.text();
         const size_t dot = name.rfind('.');
         const std::string stem = dot == 0 ? name : name.substr(0, dot);
         std::string output = output_name(stem, suffix + ".bin");
-        for (int i = 1; !m_outputs.insert(output).second; ++i) {
+        for (int i = 1; !m_outputs.insert(std::hash<std::string>()(output)).second; ++i) {
             output = output_name(stem, suffix + "-" + std::to_string(i) + ".bin");
         }
         return m_dir + "/" + output;
@@ -247,12 +248,12 @@ private:
         if (m_problems.json()) {
             m_problems.print({{"file", json_text(path)},
                               {"output", json_text(out.path())},
-                              {"content", file.name.kind},
+                              {"content", file.name.kind()},
                               {"framed", false},
                               {"bytes", copied}});
         } else {
             printf("%s: %s, %llu bytes; it has no frames, nothing was left out\n",
-                   escape_text(out.path()).c_str(), file.name.kind,
+                   escape_text(out.path()).c_str(), file.name.kind(),
                    static_cast<unsigned long long>(copied));
         }
         tell(path, FileReport(), error);
@@ -301,7 +302,7 @@ private:
     Problems m_problems;
     int m_type = ANY;
     int m_sub_type = ANY;
-    std::set<std::string> m_outputs;
+    std::unordered_set<size_t> m_outputs;
 };
 
 }  // namespace

@@ -107,15 +107,15 @@ int info(const CommandLine& line, const std::string& path) {
     in.drain();  // the size of a pipe shows at its end
     Facts facts(line.has("json"));
     facts.add("file", path);
-    facts.add("kind", std::string(name.kind));
-    if (!name.cp.empty()) {
-        facts.add("cp", name.cp);
+    facts.add("kind", std::string(name.kind()));
+    if (!name.cp().empty()) {
+        facts.add("cp", name.cp());
     }
     if (name.is_log()) {
         facts.add("number", uint64_t{name.number});
     }
-    if (has_time(name.time)) {
-        facts.add("started", time_text(name.time));
+    if (has_time(name.time())) {
+        facts.add("started", time_text(name.time()));
     }
     facts.add("size", in.size());
     add_content(&facts, name, report);

@@ -3,7 +3,9 @@
 #include <stdio.h>
 
 #include <algorithm>
+#include <map>
 #include <nlohmann/json.hpp>
+#include <set>
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
@@ -20,9 +22,9 @@ struct Sum {
     void add(const TreeFile& file) {
         ++files;
         size += file.size;
-        if (has_time(file.name.time)) {
-            first = has_time(first) ? std::min(first, file.name.time) : file.name.time;
-            last = std::max(last, file.name.time);
+        if (has_time(file.name.time())) {
+            first = has_time(first) ? std::min(first, file.name.time()) : file.name.time();
+            last = std::max(last, file.name.time());
         }
     }
 };
@@ -59,68 +61,58 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
                       {"medium", json_text(set->medium)},
                       {"cp", json_text(cp->name)}};
         }
-        object["file"] = json_text(file.name.text);
-        object["kind"] = file.name.kind;
+        object["file"] = json_text(file.name.text());
+        object["kind"] = file.name.kind();
         if (file.name.is_log()) {
             object["number"] = file.name.number;
         }
         object["size"] = file.size;
-        object["time"] = time_text(file.name.time);
+        object["time"] = time_text(file.name.time());
         print_json(object);
         return;
     }
     printf("%s%12llu  %-16s %s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),
-           file.name.kind, escape_text(file.name.text).c_str());
+           file.name.kind(), escape_text(file.name.text()).c_str());
 }
 
-// What stands on a line of the tree, and what hangs below it.
-struct Branch {
-    std::string text;
-    std::vector<Branch> below;
-};
+// A line of the tree; the margin of the lines below it.
+std::string print_branch(const std::string& margin, bool last, const std::string& text) {
+    printf("%s%s %s\n", margin.c_str(), last ? "`--" : "|--", escape_text(text).c_str());
+    return margin + (last ? "    " : "|   ");
+}
 
-void print_branch(const Branch& branch, const std::string& margin) {
-    for (const Branch& each : branch.below) {
-        const bool last = &each == &branch.below.back();
-        printf("%s%s %s\n", margin.c_str(), last ? "`--" : "|--", escape_text(each.text).c_str());
-        print_branch(each, margin + (last ? "    " : "|   "));
+void print_set(const TreeSet& set, bool last) {
+    const std::string below = print_branch("", last, set.name.empty() ? set.shown : set.name);
+    for (const TreeCp& cp : set.cps) {
+        const std::string margin = print_branch(below, &cp == &set.cps.back(), cp.name);
+        for (const TreeFile& file : cp.files) {
+            print_branch(margin, &file == &cp.files.back(),
+                         file.name.text() + "  " + std::to_string(file.size));
+        }
     }
-}
-
-std::string file_line(const TreeFile& file) {
-    return file.name.text + "  " + std::to_string(file.size);
 }
 
 // By media, which a list is not: there the sets of all media are in the order of their times.
 void print_tree(const LogTree& tree) {
-    Branch root;
-    std::vector<std::string> done;
+    std::map<std::string, const TreeSet*> last;  // of each medium
     for (const TreeFile& file : tree.root_files) {
         printf("%s  %llu\n", escape_text(file.shown()).c_str(),
                static_cast<unsigned long long>(file.size));
     }
+    for (const TreeSet& set : tree.sets) {
+        last[set.medium] = &set;
+    }
+    std::set<std::string> done;
     for (const TreeSet& first : tree.sets) {
-        if (std::find(done.begin(), done.end(), first.medium) != done.end()) {
+        if (!done.insert(first.medium).second) {
             continue;
         }
-        done.push_back(first.medium);
-        Branch medium;
-        for (const TreeSet& set : tree.sets) {
-            if (set.medium != first.medium) {
-                continue;
-            }
-            Branch cps = {set.name.empty() ? set.shown : set.name, {}};
-            for (const TreeCp& cp : set.cps) {
-                Branch files = {cp.name, {}};
-                for (const TreeFile& file : cp.files) {
-                    files.below.push_back({file_line(file), {}});
-                }
-                cps.below.push_back(files);
-            }
-            medium.below.push_back(cps);
-        }
         printf("%s\n", escape_text(first.medium).c_str());
-        print_branch(medium, "");
+        for (const TreeSet& set : tree.sets) {
+            if (set.medium == first.medium) {
+                print_set(set, &set == last[set.medium]);
+            }
+        }
     }
 }
 

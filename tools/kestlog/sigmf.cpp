@@ -89,9 +89,9 @@ Json number(double value) {
 // The version record of the CP beside the capture; "" when there is none.
 std::string firmware_version(const Capture& capture, Problems* problems) {
     const std::string dir = capture.path.substr(0, capture.path.rfind('/') + 1);
-    const std::string path = dir + capture.name.cp + ".version";
+    const std::string path = dir + capture.name.cp() + ".version";
     LogReader in;
-    if (capture.name.cp.empty()) {
+    if (capture.name.cp().empty()) {
         return "";
     }
     if (!in.open(path, false)) {
@@ -122,18 +122,19 @@ Json make_meta(const Capture& capture, const Settings& settings, const std::stri
                    {"core:datatype", settings.datatype},
                    {"core:sample_rate", number(settings.rate)},
                    {"core:num_channels", 1},
-                   {"core:dataset", dataset_name(name.text)}};
+                   {"core:dataset", dataset_name(name.text())}};
     if (const uint64_t rest = capture.size % settings.sample_bytes) {
         global["core:trailing_bytes"] = rest;
     }
     global["core:recorder"] = "kestmodem";
-    if (!name.cp.empty()) {
-        description += " of " + name.cp;
-        global["core:hw"] = json_text(name.cp + (firmware.empty() ? "" : ", firmware " + firmware));
+    if (!name.cp().empty()) {
+        description += " of " + name.cp();
+        global["core:hw"] =
+            json_text(name.cp() + (firmware.empty() ? "" : ", firmware " + firmware));
     }
     // SigMF times are in UTC, and a name does not say the zone: so there is no core:datetime.
-    if (has_time(name.time)) {
-        description += ", begun to be saved at " + time_text(name.time) +
+    if (has_time(name.time())) {
+        description += ", begun to be saved at " + time_text(name.time()) +
                        " local time of the handset (its time zone is not known)";
     }
     global["core:description"] = description;

@@ -53,7 +53,7 @@ int split(const CommandLine& line, const std::string& path) {
         return status;
     }
     const FileName name(file_part(path));
-    std::string stem = path == "-" ? "stdin" : name.text;
+    std::string stem = path == "-" ? "stdin" : name.text();
     if (stem.size() > 4 && stem.compare(stem.size() - 4, 4, ".log") == 0) {
         stem.resize(stem.size() - 4);
     }
