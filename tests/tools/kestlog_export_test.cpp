@@ -189,7 +189,7 @@ TEST_F(KestlogExportTest, TheOutputIsRefusedOrGivenUpWithAReason) {
         {"export . -o /dev/full", 4, "/dev/full: "},
         {"export . >/dev/full 2>err; exit $?; true", 4, ""},
         {"export . --cp cp_gnss -o new", 2, "no file with frames"},
-        {"export . --type 256 -o new", 1, "not a type"},
+        {"export . --type 256 -o new", 1, "a number from 0 to 255"},
         {"export nowhere -o new", 2, "nowhere: "},
     };
     for (const auto& c : CASES) {

@@ -40,3 +40,12 @@ std::string json_string(const std::string& text) {
     }
     return result + "\"";
 }
+
+bool cut_ending(std::string* text, const std::string& ending) {
+    if (text->size() < ending.size() ||
+        text->compare(text->size() - ending.size(), ending.size(), ending) != 0) {
+        return false;
+    }
+    text->resize(text->size() - ending.size());
+    return true;
+}

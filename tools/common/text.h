@@ -13,4 +13,7 @@ std::string escape_text(const std::string& text);
 // of that number, \u00NN.
 std::string json_string(const std::string& text);
 
+// Removes the ending from the text; false when it has another one.
+bool cut_ending(std::string* text, const std::string& ending);
+
 #endif  // COMMON_TEXT_H_

@@ -9,6 +9,7 @@
 
 #include <algorithm>
 
+#include "common/text.h"
 #include "core/system_paths.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
@@ -19,17 +20,13 @@ la_ssize_t write_out(struct archive*, void* out, const void* data, size_t len) {
     return static_cast<OutputFile*>(out)->write(data, len) ? static_cast<la_ssize_t>(len) : -1;
 }
 
-bool ends_with(const std::string& text, const std::string& end) {
-    return text.size() >= end.size() &&
-           text.compare(text.size() - end.size(), end.size(), end) == 0;
-}
-
 // "data/modem_log/".
 std::string log_root_of(const TreeSet& set) {
     // Of several handsets the medium has the handset's name before its own.
-    std::string path = ends_with(set.medium, MEDIUM_INTERNAL) ? PATH_DATA_PARTITION
-                       : ends_with(set.medium, MEDIUM_CARD)   ? CARD_IN_ROOT
-                                                              : "";
+    std::string medium = set.medium;
+    std::string path = cut_ending(&medium, MEDIUM_INTERNAL) ? PATH_DATA_PARTITION
+                       : cut_ending(&medium, MEDIUM_CARD)   ? CARD_IN_ROOT
+                                                            : "";
     path += DIR_MODEM_LOG;
     return path.substr(1) + "/";
 }

@@ -4,9 +4,11 @@
 
 #include <algorithm>
 
+#include "channels/ModemImage.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Spectrum.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/small_files.h"
 
 namespace {
 
@@ -24,18 +26,6 @@ bool has_own_times(const TreeCp& cp) {
     return std::none_of(cp.files.begin(), cp.files.end(), [](const TreeFile& file) {
         return file.name.is_log() && file.end.time() < local_time(file.modified - TOLERANCE);
     });
-}
-
-// The first bytes of a small file.
-std::string small_content(const TreeFile& file) {
-    LogReader in;
-    size_t got = 0;
-    const uint8_t* data = nullptr;
-    constexpr size_t MOST = 200;
-    if (in.open(file.path(), false)) {
-        data = in.peek(MOST, got);
-    }
-    return std::string(data, data + std::min(got, MOST));
 }
 
 std::string base64(const std::vector<uint8_t>& bytes) {
@@ -268,7 +258,8 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) 
 }
 
 void CardReport::add_version(const FilePlace& place, CpSum* cp) {
-    const std::string version = small_content(*place.file);
+    int ignored;  // the check has told it
+    const std::string version = read_version(place.file->path(), &ignored);
     const bool changed = !cp->version.empty() && cp->version != version;
     if (changed) {
         TimelineItem item;
@@ -289,7 +280,8 @@ void CardReport::add_version(const FilePlace& place, CpSum* cp) {
 void CardReport::add_database(const TreeFile& file) {
     Json row = {{"path", json_text(file.shown())}, {"size", file.size}};
     if (file.name.text() == DIGEST_NAME) {
-        row["digest"] = json_text(small_content(file));
+        int ignored;
+        row["digest"] = json_text(read_small(file.path(), SHA1_HEX_LEN, &ignored));
     }
     add_row("databases", MAX_ROWS, row);
 }

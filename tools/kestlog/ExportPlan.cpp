@@ -2,7 +2,6 @@
 
 #include "kestlog/ExportPlan.h"
 
-#include <cutils/properties.h>
 #include <strings.h>
 
 #include <algorithm>
@@ -10,8 +9,8 @@
 #include <utility>
 
 #include "common/text.h"
-#include "kestlog/LogReader.h"
 #include "kestlog/LogStream.h"
+#include "kestlog/small_files.h"
 
 namespace {
 
@@ -24,22 +23,13 @@ bool has_frames(const TreeFile& file, bool given) {
     return file.name.framed_dump || (given && !file.name.exact);
 }
 
-// The version that stands beside the file; "" without one.
-std::string firmware_of(const ExportSource& source) {
-    const FileName name(source.file->name.cp() + ".version");
-    LogReader in;
-    if (name.type != LT_VERSION || !in.open(source.file->dir->path + name.text(), false)) {
-        return "";
-    }
-    size_t got;
-    const uint8_t* data = in.peek(1, got);
-    const std::string text(data, data + std::min<size_t>(got, PROPERTY_VALUE_MAX));
-    return text.substr(0, text.find_last_not_of("\r\n") + 1);
-}
-
 ExportInterface interface_of(const ExportSource& source) {
     const TreeSet& set = *source.set;
-    const std::string version = firmware_of(source);
+    // That stands beside the file; "" without one.
+    int ignored;
+    const std::string cp = source.file->name.cp();
+    const std::string version =
+        cp.empty() ? "" : read_version(version_path(source.file->dir->path, cp), &ignored);
     std::string description =
         set.name.empty() ? set.shown : "set " + set.name + " on " + set.medium;
     description += version.empty() ? "" : ", firmware " + version;

@@ -9,6 +9,8 @@
 #include <algorithm>
 #include <charconv>
 
+#include "common/text.h"
+
 namespace {
 
 constexpr size_t STAMP_LEN = 19;
@@ -26,13 +28,13 @@ struct Form {
 // clang-format off
 constexpr Form FORMS[] = {
     {LT_UNKNOWN,   "unknown",     "",           "",         false, false},  // any other name
-    {LT_LOG,       "log",         "-",          ".log",     true,  true},
+    {LT_LOG,       "log",         "-",          LOG_ENDING,     true,  true},
     {LT_DUMP,      "memory dump", "_memory_",   ".dmp",     true,  true},
     {LT_DUMP,      "memory copy", "_memory_",   ".mem",     true,  true},
     {LT_RINGBUF,   "ring buffer", "_ringbuf_",  ".log",     true,  true},
     {LT_SLEEP_LOG, "sleep log",   "_sleeplog_", ".log",     true,  true},
     {LT_WCDMA_IQ,  "I/Q samples", "_wiq_",      ".bin",     true,  true},
-    {LT_VERSION,   "version",     "",           ".version", true,  false},
+    {LT_VERSION,   "version",     "",           VERSION_ENDING, true,  false},
     {LT_MINI_DUMP, "mini dump",   "mini_dump_", ".bin",     false, true},
     {LT_IPC_INFO,  "IPC record",  "smsg_",      ".log",     false, true},
     {LT_IPC_INFO,  "IPC record",  "sbuf_",      ".log",     false, true},
@@ -51,15 +53,6 @@ bool in_calendar(const LogTime& t) {
 bool parse_stamp(const std::string& text, LogTime* time) {
     const std::string name = "0-" + text;
     return parse_log_name(name.data(), name.size(), *time) == LT_LOG;
-}
-
-bool cut_tail(std::string* text, const std::string& tail) {
-    if (text->size() < tail.size() ||
-        text->compare(text->size() - tail.size(), tail.size(), tail) != 0) {
-        return false;
-    }
-    text->resize(text->size() - tail.size());
-    return true;
 }
 
 // Removes the rotation number from the start.
@@ -122,7 +115,7 @@ bool FileName::match(size_t index, const std::string& name) {
     const Form& form = FORMS[index];
     std::string rest = name;
     LogTime time;
-    if (!cut_tail(&rest, form.tail)) {
+    if (!cut_ending(&rest, form.tail)) {
         return false;
     }
     uint32_t aside = 0;
@@ -131,7 +124,7 @@ bool FileName::match(size_t index, const std::string& name) {
         return false;
     }
     uint32_t log_number = 0;
-    if (!cut_tail(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &log_number)) ||
+    if (!cut_ending(&rest, form.head) || (form.type == LT_LOG && !cut_number(&rest, &log_number)) ||
         (form.cp ? cp_type_of(rest) == CT_UNKNOWN : !rest.empty())) {
         return false;
     }
@@ -168,7 +161,7 @@ bool is_foreign_name(const std::string& name) {
         ".DS_Store",   ".Trashes",  ".fseventsd", ".Spotlight-V100",           "$RECYCLE.BIN",
         "desktop.ini", "Thumbs.db", "LOST.DIR",   "System Volume Information", "lost+found",
     };
-    return name.compare(0, 2, "._") == 0 || cut_tail(&stem, ".sigmf-meta") ||
+    return name.compare(0, 2, "._") == 0 || cut_ending(&stem, SIGMF_ENDING) ||
            std::any_of(std::begin(NAMES), std::end(NAMES), [&](const char* foreign) {
                return strcasecmp(foreign, name.c_str()) == 0;  // as on a FAT
            });

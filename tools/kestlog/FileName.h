@@ -16,6 +16,10 @@
 
 constexpr char DATABASE_NAME[] = "modem_db.gz";
 constexpr char DIGEST_NAME[] = "sha1.txt";
+// What the names of some files end with.
+constexpr char LOG_ENDING[] = ".log";
+constexpr char VERSION_ENDING[] = ".version";
+constexpr char SIGMF_ENDING[] = ".sigmf-meta";
 
 // A LogTime in a third of its space.
 class ShortTime {

@@ -12,6 +12,7 @@
 
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -122,12 +123,12 @@ bool open_tree(const CommandLine& line, LogTree* tree, int* status, LogTree::Fil
 
 bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* status,
                LogTree::Files files) {
-    const std::string limit = line.value("unpack-limit", "0");
-    if (limit.empty() || limit.size() > 9 || limit.find_first_not_of(DIGITS) != std::string::npos) {
-        *status = line.usage_error("--unpack-limit: '" + limit + "' is not a number of MiB");
+    constexpr uint64_t MIB = 1024 * 1024;
+    uint64_t limit = 0;
+    if (!read_whole(line, "unpack-limit", 0, UINT64_MAX / MIB, &limit, status)) {
         return false;
     }
-    tree->limit_archives(std::stoull(limit) * 1024 * 1024);
+    tree->limit_archives(limit * MIB);
     const std::string card = line.value("card", "");
     if (line.has("card") && !tree->add_card(card)) {
         *status = failure(ES_UNREADABLE, card + ": holds no logs");

@@ -14,6 +14,7 @@
 #include "kestlog/Progress.h"
 #include "kestlog/ReportPage.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -121,11 +122,10 @@ bool write_bundle(const LogTree& tree, const std::string& page, BundleWriter* bu
 }  // namespace
 
 int run_bundle(const CommandLine& line) {
-    const std::string minutes = line.value("minutes", "5");
-    char* rest;
-    const long length = strtol(minutes.c_str(), &rest, 10);
-    if (minutes.empty() || *rest || length < 0 || length > DAY_SECONDS / 60) {
-        return line.usage_error("--minutes: '" + minutes + "' is not a number up to 1440");
+    uint64_t minutes = 5;
+    int status;
+    if (!read_whole(line, "minutes", 0, DAY_SECONDS / 60, &minutes, &status)) {
+        return status;
     }
     for (const char* option : {"crash", "output"}) {
         if (!line.has(option)) {
@@ -133,7 +133,6 @@ int run_bundle(const CommandLine& line) {
         }
     }
     LogTree tree;
-    int status;
     if (!open_tree(line, &tree, &status)) {
         return status;
     }
@@ -152,7 +151,7 @@ int run_bundle(const CommandLine& line) {
         return out.failed();
     }
     const std::string about = crash_line(*crash);
-    reduce(*crash, length * 60, &tree);
+    reduce(*crash, static_cast<int64_t>(minutes) * 60, &tree);
     const Progress progress(2 * tree.size());  // for the report, and into the tar
     ReportOptions options;
     options.whole = false;

@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog export.
-#include <ctype.h>
 #include <stdio.h>
-#include <stdlib.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -18,6 +16,7 @@
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -26,17 +25,6 @@ constexpr char ABOUT_TIMES[] =
     "the file's name. Both are local times of the handset in whole seconds. Show them as UTC.";
 
 constexpr size_t BUFFER_SIZE = 256 * 1024;
-
-bool read_type(const CommandLine& line, FrameExporter::Wanted* wanted) {
-    const std::string text = line.value("type", "");
-    char* end;
-    const unsigned long value = strtoul(text.c_str(), &end, 0);
-    if (!line.has("type")) {
-        return true;
-    }
-    wanted->type = static_cast<int>(value);
-    return isdigit(static_cast<unsigned char>(text[0])) && !*end && value <= UINT8_MAX;
-}
 
 void print_summary(FILE* to, bool json, const std::string& path, const ExportPlan& plan,
                    const FrameExporter::Totals& totals) {
@@ -59,8 +47,9 @@ void print_summary(FILE* to, bool json, const std::string& path, const ExportPla
 int run_export(const CommandLine& line) {
     FrameExporter::Wanted wanted;
     wanted.broken = line.has("broken");
-    if (!read_type(line, &wanted)) {
-        return line.usage_error("--type: '" + line.value("type", "") + "' is not a type of frames");
+    int status = ES_OK;
+    if (!read_type(line, "type", &wanted.type, &status)) {
+        return status;
     }
     const std::string path = line.value("output", "-");
     const bool piped = path == "-";
@@ -68,7 +57,6 @@ int run_export(const CommandLine& line) {
         return line.usage_error("the terminal cannot show a capture; give --output or a pipe");
     }
     LogTree tree;
-    int status = ES_OK;
     if (!open_tree(line, &tree, &status, LogTree::FILES_TOO)) {
         return status;
     }

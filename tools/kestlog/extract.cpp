@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog extract.
-#include <ctype.h>
 #include <errno.h>
 #include <stdio.h>
-#include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -22,6 +20,7 @@
 #include "kestlog/Problems.h"
 #include "kestlog/Progress.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -98,22 +97,6 @@ public:
     int status() const { return m_problems.status(); }
 
 private:
-    static bool read_type(const CommandLine& line, const char* option, int* type, int* status) {
-        const std::string text = line.value(option, "");
-        char* end;
-        const unsigned long value = strtoul(text.c_str(), &end, 0);
-        if (!line.has(option)) {
-            return true;
-        }
-        if (text.empty() || !isdigit(static_cast<unsigned char>(text[0])) || *end || value > 0xff) {
-            *status = line.usage_error("--" + std::string(option) + ": '" + text +
-                                       "' is not a number from 0 to 255");
-            return false;
-        }
-        *type = static_cast<int>(value);
-        return true;
-    }
-
     std::vector<Content> contents(const FileName& name, bool chunked) const {
         if (m_type != ANY || m_sub_type != ANY) {
             char suffix[40] = "";

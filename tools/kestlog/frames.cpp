@@ -1,11 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog frames.
-#include <ctype.h>
 #include <stdio.h>
-#include <stdlib.h>
 
 #include <algorithm>
-#include <utility>
 
 #include "common/text.h"
 #include "kestlog/Commands.h"
@@ -14,6 +11,7 @@
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -26,33 +24,6 @@ struct Wanted {
     bool json = false;
     bool several = false;  // files
 };
-
-bool parse_number(const CommandLine& line, const char* option, uint64_t largest, uint64_t* value) {
-    const std::string text = line.value(option, "");
-    char* end;
-    *value = strtoull(text.c_str(), &end, 0);
-    return !text.empty() && isdigit(static_cast<unsigned char>(text[0])) && !*end &&
-           *value <= largest;
-}
-
-// False, with the name of the option in wrong, when a number cannot be read.
-bool read_options(const CommandLine& line, Wanted* wanted, std::string* wrong) {
-    uint64_t value;
-    wanted->hex = line.has("hex");
-    wanted->json = line.has("json");
-    for (auto [option, target] :
-         {std::pair<const char*, int*>{"type", &wanted->type}, {"sub-type", &wanted->sub_type}}) {
-        if (line.has(option)) {
-            *wrong = option;
-            if (!parse_number(line, option, UINT8_MAX, &value)) {
-                return false;
-            }
-            *target = static_cast<int>(value);
-        }
-    }
-    *wrong = "limit";
-    return !line.has("limit") || parse_number(line, "limit", UINT64_MAX, &wanted->limit);
-}
 
 class FramePrinter {
 public:
@@ -187,14 +158,14 @@ int frames(const std::string& path, Wanted* wanted) {
 
 int run_frames(const CommandLine& line) {
     Wanted wanted;
-    std::string wrong;
-    if (!read_options(line, &wanted, &wrong)) {
-        return line.usage_error("--" + wrong + ": '" + line.value(wrong, "") +
-                                "' is not a number that it can be");
-    }
     Args files;
     int status = ES_OK;
-    if (!select_files(line, &files, &status)) {
+    wanted.hex = line.has("hex");
+    wanted.json = line.has("json");
+    if (!read_type(line, "type", &wanted.type, &status) ||
+        !read_type(line, "sub-type", &wanted.sub_type, &status) ||
+        !read_whole(line, "limit", 0, UINT64_MAX, &wanted.limit, &status) ||
+        !select_files(line, &files, &status)) {
         return status;
     }
     wanted.several = line.params().size() > 1;

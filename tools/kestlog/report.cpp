@@ -2,9 +2,6 @@
 // kestlog report.
 #include <errno.h>
 #include <stdio.h>
-#include <stdlib.h>
-
-#include <cmath>
 
 #include "common/text.h"
 #include "kestlog/CardReport.h"
@@ -14,21 +11,9 @@
 #include "kestlog/Progress.h"
 #include "kestlog/ReportPage.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
-
-// A number above 0.
-bool read_number(const CommandLine& line, const char* option, double* value, int* status) {
-    const std::string text = line.value(option, "");
-    char* end;
-    *value = strtod(text.c_str(), &end);
-    if (text.empty() || *end || !std::isfinite(*value) || *value <= 0) {
-        *status = line.usage_error("--" + std::string(option) + ": '" + text +
-                                   "' is not a number above 0");
-        return false;
-    }
-    return true;
-}
 
 bool read_format(const CommandLine& line, const char* option, const SampleFormat* format,
                  const std::string& names, int* status) {
@@ -53,24 +38,18 @@ bool read_options(const CommandLine& line, ReportOptions* options, int* status) 
     if (line.has("iq-rate")) {
         options->iq = iq_format(line.value("iq-format", ""));
         if (!read_format(line, "iq-format", options->iq, iq_format_names(), status) ||
-            !read_number(line, "iq-rate", &options->iq_rate, status)) {
+            !read_hertz(line, "iq-rate", true, &options->iq_rate, status)) {
             return false;
         }
     }
-    double channels = 1;
+    uint64_t channels = 1;
     if (line.has("pcm-rate")) {
         options->pcm = pcm_format(line.value("pcm-format", ""));
         if (!read_format(line, "pcm-format", options->pcm, pcm_format_names(), status) ||
-            !read_number(line, "pcm-rate", &options->pcm_rate, status) ||
-            (line.has("pcm-channels") && !read_number(line, "pcm-channels", &channels, status))) {
+            !read_hertz(line, "pcm-rate", true, &options->pcm_rate, status) ||
+            !read_whole(line, "pcm-channels", 1, Waveform::MAX_CHANNELS, &channels, status)) {
             return false;
         }
-    }
-    if (channels > static_cast<double>(Waveform::MAX_CHANNELS) ||
-        channels != std::floor(channels)) {
-        *status = line.usage_error("--pcm-channels: a number from 1 to " +
-                                   std::to_string(Waveform::MAX_CHANNELS));
-        return false;
     }
     options->pcm_channels = static_cast<size_t>(channels);
     return true;

@@ -3,7 +3,6 @@
 // "non-conforming dataset" that core:dataset names, so that nothing large is copied.
 #include <errno.h>
 #include <stdio.h>
-#include <stdlib.h>
 
 #include <algorithm>
 #include <nlohmann/json.hpp>
@@ -14,12 +13,12 @@
 #include "kestlog/ExitStatus.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
+#include "kestlog/option_numbers.h"
+#include "kestlog/small_files.h"
 
 namespace {
 
 constexpr char SIGMF_VERSION[] = "1.0.0";
-constexpr double MAX_HERTZ = 1e12;        // of the core namespace
-constexpr size_t MAX_VERSION_LEN = 4096;  // a record of the service is much shorter
 
 struct Settings {
     std::string datatype;
@@ -56,18 +55,6 @@ uint64_t sample_bytes(const std::string& datatype) {
     return 0;
 }
 
-bool read_hertz(const CommandLine& line, const char* option, double least, double* hertz,
-                int* status) {
-    const std::string text = line.value(option, "");
-    char* end;
-    *hertz = strtod(text.c_str(), &end);
-    if (!text.empty() && *end == '\0' && *hertz >= least && *hertz <= MAX_HERTZ) {
-        return true;
-    }
-    *status = line.usage_error("--" + std::string(option) + ": give it in Hz, up to 1e12");
-    return false;
-}
-
 bool read_settings(const CommandLine& line, Settings* settings, int* status) {
     settings->datatype = line.value("datatype", "");
     settings->sample_bytes = sample_bytes(settings->datatype);
@@ -75,9 +62,15 @@ bool read_settings(const CommandLine& line, Settings* settings, int* status) {
         *status = line.usage_error("--datatype: give one of SigMF, such as ci16_le or cf32_le");
         return false;
     }
+    for (const char* option : {"rate", "frequency"}) {
+        if (!line.has(option)) {
+            *status = line.usage_error("--" + std::string(option) + " is missing");
+            return false;
+        }
+    }
     // No rate is 0, a frequency may be.
-    return read_hertz(line, "rate", 1e-6, &settings->rate, status) &&
-           read_hertz(line, "frequency", 0, &settings->frequency, status);
+    return read_hertz(line, "rate", true, &settings->rate, status) &&
+           read_hertz(line, "frequency", false, &settings->frequency, status);
 }
 
 // A whole number without a fraction.
@@ -88,24 +81,17 @@ Json number(double value) {
 
 // The version record of the CP beside the capture; "" when there is none.
 std::string firmware_version(const Capture& capture, Problems* problems) {
-    const std::string dir = capture.path.substr(0, capture.path.rfind('/') + 1);
-    const std::string path = dir + capture.name.cp() + ".version";
-    LogReader in;
     if (capture.name.cp().empty()) {
         return "";
     }
-    if (!in.open(path, false)) {
-        if (errno != ENOENT) {
-            problems->unreadable(path, errno);
-        }
-        return "";
+    const std::string dir = capture.path.substr(0, capture.path.rfind('/') + 1);
+    const std::string path = version_path(dir, capture.name.cp());
+    int error;
+    const std::string version = read_version(path, &error);
+    if (error && error != ENOENT) {
+        problems->unreadable(path, error);
     }
-    size_t got;
-    const uint8_t* const data = in.peek(MAX_VERSION_LEN, got);
-    if (in.error()) {
-        problems->unreadable(path, in.error());
-    }
-    return std::string(reinterpret_cast<const char*>(data), std::min(got, MAX_VERSION_LEN));
+    return version;
 }
 
 // The dataset's name as it is, if JSON can hold it.
@@ -186,7 +172,7 @@ int run_sigmf(const CommandLine& line) {
     }
     const size_t dot = path.rfind('.');
     const bool extension = dot != std::string::npos && dot > path.rfind('/') + 1;
-    const std::string beside = path.substr(0, extension ? dot : path.size()) + ".sigmf-meta";
+    const std::string beside = path.substr(0, extension ? dot : path.size()) + SIGMF_ENDING;
     OutputFile out;
     if (!out.open(line.value("output", beside), line.has("force"))) {
         return out.failed();

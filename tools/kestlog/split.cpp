@@ -54,8 +54,8 @@ int split(const CommandLine& line, const std::string& path) {
     }
     const FileName name(file_part(path));
     std::string stem = path == "-" ? "stdin" : name.text();
-    if (stem.size() > 4 && stem.compare(stem.size() - 4, 4, ".log") == 0) {
-        stem.resize(stem.size() - 4);
+    if (stem != LOG_ENDING) {
+        cut_ending(&stem, LOG_ENDING);
     }
     if (!is_chunked(in, name)) {
         return failure(ES_UNREADABLE, path + ": not a log of the audio DSP");

@@ -19,6 +19,7 @@
 #include "kestlog/StreamPlan.h"
 #include "kestlog/TreeInput.h"
 #include "kestlog/WavFile.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -33,18 +34,16 @@ struct Sound {
 };
 
 bool read_number(const CommandLine& line, const char* option, int most, int* number, int* status) {
-    const std::string text = line.value(option, "");
-    *number = 0;
-    if (!text.empty() && text.size() < 8 &&
-        text.find_first_not_of("0123456789") == std::string::npos) {
-        *number = std::stoi(text);
+    uint64_t value;
+    if (!line.has(option)) {
+        *status = line.usage_error("--" + std::string(option) + " is missing");
+        return false;
     }
-    if (*number >= 1 && *number <= most) {
-        return true;
+    if (!read_whole(line, option, 1, static_cast<uint64_t>(most), &value, status)) {
+        return false;
     }
-    *status = line.usage_error("--" + std::string(option) + ": give a number from 1 to " +
-                               std::to_string(most));
-    return false;
+    *number = static_cast<int>(value);
+    return true;
 }
 
 bool read_sound(const CommandLine& line, Sound* sound, int* status) {

@@ -1,0 +1,32 @@
+// SPDX-License-Identifier: Apache-2.0
+
+#include "kestlog/small_files.h"
+
+#include <cutils/properties.h>
+#include <errno.h>
+
+#include <algorithm>
+
+#include "kestlog/FileName.h"
+#include "kestlog/LogReader.h"
+
+std::string read_small(const std::string& path, size_t most, int* error) {
+    LogReader in;
+    if (!in.open(path, false)) {
+        *error = errno;
+        return "";
+    }
+    size_t got;
+    const uint8_t* const data = in.peek(most, got);
+    *error = in.error();
+    return std::string(data, data + std::min(got, most));
+}
+
+std::string read_version(const std::string& path, int* error) {
+    const std::string text = read_small(path, PROPERTY_VALUE_MAX, error);
+    return text.substr(0, text.find_last_not_of("\r\n") + 1);
+}
+
+std::string version_path(const std::string& dir, const std::string& cp) {
+    return dir + cp + VERSION_ENDING;
+}
