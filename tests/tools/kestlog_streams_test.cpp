@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // What kestlog takes out of log trees: streams, memory images, sound and I/Q captures.
+#include <signal.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <nlohmann/json.hpp>
 #include <regex>
 
@@ -372,6 +374,60 @@ TEST_F(KestlogStreamsTest, SigmfDescribesACaptureThatStaysWhereItIs) {
         EXPECT_EQ(run("sigmf tiny" + told + " " + wrong), 1) << wrong;
     }
     EXPECT_EQ(run("sigmf tiny --datatype ci8 --frequency 1"), 1);
+}
+
+// Each command that writes its result to standard output.
+TEST_F(KestlogStreamsTest, AFullOutputIsToldOnce) {
+    write_good_tree();
+    write("iq", "iqiq");
+    for (const char* args :
+         {"ls .", "ls --tree .", "--json ls .", "verify .", "report --json .", "report . -o -",
+          "bundle . --crash 2016-03-01 -o -", "join . --cp cp_wcn", "export .",
+          "wav modem_log/*/agdsp/0-* --rate 8000 --channels 1 --format u8 -o -",
+          "sigmf iq --datatype ci8 --rate 1 --frequency 1 -o -"}) {
+        EXPECT_EQ(run(std::string(args) + " >/dev/full 2>err; exit $?; true"), 4) << args;
+        m_err = m_root.read_file("err");
+        EXPECT_EQ(m_err, "kestlog: standard output: No space left on device\n") << args;
+    }
+    for (const std::string& args : {std::string("extract . -o -"), "split -o - " + DSP_LOG}) {
+        EXPECT_EQ(run(args), 1);
+        EXPECT_TRUE(complained("not standard output")) << m_err;
+    }
+}
+
+TEST_F(KestlogStreamsTest, ASignalLeavesNoHalfFile) {
+    const std::string data(50000, 'x');  // more than stays in memory
+    const std::string chunks = chunk(1, LOG, data) + chunk(2, PCM, data) + chunk(3, DUMP, data);
+    const auto files = [this](uintmax_t least) {
+        size_t count = 0;
+        for (const auto& entry : std::filesystem::directory_iterator(m_root.path("parts"))) {
+            std::error_code gone;
+            count += std::filesystem::file_size(entry, gone) >= least ? 1 : 0;
+        }
+        return count;
+    };
+    std::filesystem::create_directory(m_root.path("parts"));
+    for (const int signo : {SIGINT, SIGTERM, SIGHUP}) {
+        int in[2];
+        ASSERT_EQ(pipe2(in, O_CLOEXEC), 0);
+        const pid_t pid = fork();
+        if (pid == 0) {
+            signal(signo, SIG_DFL);
+            dup2(in[0], STDIN_FILENO);
+            execl(KESTLOG, "kestlog", "split", "-", "-o", m_root.path("parts").c_str(), nullptr);
+            _exit(127);
+        }
+        EXPECT_EQ(::write(in[1], chunks.data(), chunks.size()),
+                  static_cast<ssize_t>(chunks.size()));
+        EXPECT_TRUE(wait_until([&] { return files(1) == 3u; }));
+        kill(pid, signo);
+        int status = 0;
+        waitpid(pid, &status, 0);
+        EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == signo) << status;
+        EXPECT_EQ(files(0), 0u) << signo;
+        close(in[0]);
+        close(in[1]);
+    }
 }
 
 }  // namespace

@@ -80,6 +80,10 @@ public:
             *status = line.usage_error("-o DIR is missing");
             return false;
         }
+        if (m_dir == "-") {
+            *status = line.usage_error("extract writes files, not standard output: give -o DIR");
+            return false;
+        }
         return read_type(line, "type", &m_type, status) &&
                read_type(line, "sub-type", &m_sub_type, status);
     }

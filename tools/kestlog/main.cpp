@@ -145,7 +145,8 @@ int main(int argc, char** argv) {
     const Syntax syntax = make_syntax();
     CommandLine line(syntax);
     const int status = line.parse(argc, argv) ? run(line) : line.status();
-    if (fflush(stdout) != 0 || ferror(stdout)) {
+    // A command whose own output this is has told it.
+    if ((fflush(stdout) != 0 || ferror(stdout)) && status != ES_OUTPUT) {
         perror("kestlog: standard output");
         return ES_OUTPUT;
     }

@@ -97,5 +97,8 @@ int split(const CommandLine& line, const std::string& path) {
 }  // namespace
 
 int run_split(const CommandLine& line) {
+    if (line.value("output", "") == "-") {
+        return line.usage_error("split writes files, not standard output: give -o DIR");
+    }
     return for_each_file(line, split);
 }
