@@ -9,7 +9,6 @@
 #include <stdio.h>
 #include <string.h>
 #include <sys/eventfd.h>
-
 #include <time.h>
 #include <unistd.h>
 
