@@ -4,10 +4,13 @@
 #include <cutils/properties.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <stdint.h>
 #include <stdio.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include <algorithm>
 
 #include "channels/ModemImage.h"
 #include "channels/WanModemLogHandler.h"
@@ -142,7 +145,8 @@ int WanModemLogHandler::check_cur_parsing_lib(const android::String8& db_path,
         err_log("read SHA-1 file error: %d", static_cast<int>(n));
         return -1;
     }
-    size = static_cast<size_t>(st.st_size);
+    // A length that size cannot tell must not become that of a database.
+    size = static_cast<size_t>(std::min<uint64_t>(static_cast<uint64_t>(st.st_size), SIZE_MAX));
     return 0;
 }
 

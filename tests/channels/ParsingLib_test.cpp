@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The modem's log parsing database, taken from the firmware image to the log root.
 #include <sys/resource.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 
 #include "channels/ModemImage.h"
@@ -104,6 +105,18 @@ TEST_F(ParsingLibTest, AnImageThatIsReadButNotFromThePlaceWantedIsNone) {
     EXPECT_TRUE(log.has("size_t&, size_t&): lseek MODEM image error [29(")) << log.text();
     close(fds[0]);
     close(fds[1]);
+}
+
+TEST_F(ParsingLibTest, ADatabaseThatIs4GiBTooLongIsSavedAnew) {
+    boot_modem(false);
+    ASSERT_TRUE(write_log());
+    const std::string path = root.path(std::string("data/modem_log/") + DB);
+    ASSERT_EQ(truncate(path.c_str(), (off_t{4} << 30) + static_cast<off_t>(db.size())), 0);
+    restart();
+    struct stat st;
+    ASSERT_EQ(stat(path.c_str(), &st), 0);
+    ASSERT_EQ(st.st_size, static_cast<off_t>(db.size()));
+    expect_saved(db);
 }
 
 TEST_F(ParsingLibTest, ASaveThatIsCutOffCountsAsNone) {
