@@ -21,7 +21,7 @@ namespace {
 
 // Bytes fed at a time to a CP, and to all of them between two looks at the logs: well
 // below the size of a log file.
-const uint64_t FEED_STEP = 128 << 10;
+const double FEED_STEP = 128 << 10;
 const uint64_t WATCH_STEP = 512 << 10;
 
 const unsigned LIFTED_QUOTA = 2000;  // MB
@@ -186,7 +186,7 @@ void DemoStage::feed(double seconds) {
         SimCp& cp = *m_handset.cps()[i];
         if (cp.running) {
             m_due[i] += seconds * rate_of(cp.name) * 1024;
-            const uint64_t fed = cp.feed(std::min(static_cast<uint64_t>(m_due[i]), FEED_STEP));
+            const uint64_t fed = cp.feed(static_cast<size_t>(std::min(m_due[i], FEED_STEP)));
             m_due[i] -= static_cast<double>(fed);
             m_unwatched += fed;
         }

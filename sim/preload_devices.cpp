@@ -19,6 +19,7 @@
 
 #include <algorithm>
 
+#include "sim/calls.h"
 #include "sim/device_control.h"
 
 namespace {
@@ -34,13 +35,13 @@ Function next_symbol(const char* name) {
 }
 
 int real_ioctl(int fd, unsigned long request, void* arg) {
-    static const auto function = next_symbol<int (*)(int, unsigned long, ...)>("ioctl");
+    static const auto function = next_symbol<int (*)(int, unsigned long, ...)>(IOCTL_CALL("ioctl"));
     return function(fd, request, arg);
 }
 
 void* real_mmap(void* addr, size_t len, int prot, int flags, int fd, off_t offset) {
     static const auto function =
-        next_symbol<void* (*)(void*, size_t, int, int, int, off_t)>("mmap");
+        next_symbol<void* (*)(void*, size_t, int, int, int, off_t)>(FILE_CALL("mmap"));
     return function(addr, len, prot, flags, fd, offset);
 }
 
@@ -200,9 +201,11 @@ void* mmap(void* addr, size_t len, int prot, int flags, int fd, off_t offset) no
     return device_mmap(addr, len, prot, flags, fd, offset);
 }
 
+#ifndef __USE_FILE_OFFSET64  // where it is asked for, mmap has this name already
 void* mmap64(void* addr, size_t len, int prot, int flags, int fd, off64_t offset) noexcept {
     return device_mmap(addr, len, prot, flags, fd, static_cast<off_t>(offset));
 }
+#endif
 
 ssize_t read(int fd, void* buf, size_t len) {
     return belongs_to(fd, s_dsp) ? dsp_read(buf, len) : real_read(fd, buf, len);

@@ -16,6 +16,7 @@
 #include <bitset>
 
 #include "sim/FaultPlan.h"
+#include "sim/to_timespec.h"
 
 using faults::Call;
 
@@ -119,7 +120,7 @@ void note_result(Result result, First first, Rest... /*rest*/) {
 }
 
 timespec faster(int64_t ns) {
-    return {ns / FAULT_CLOCK_SPEED / 1000000000, ns / FAULT_CLOCK_SPEED % 1000000000};
+    return to_timespec(ns / FAULT_CLOCK_SPEED);
 }
 
 // How each call is made; most of them plainly.
@@ -188,8 +189,8 @@ struct Make<faults::CLOCK_GETTIME> {
         if (result == 0 && id == CLOCK_BOOTTIME) {
             const int64_t ns = (now->tv_sec - s_start.tv_sec) * int64_t{1000000000} + now->tv_nsec -
                                s_start.tv_nsec;
-            const int64_t fast = s_start.tv_nsec + ns * FAULT_CLOCK_SPEED;
-            *now = {s_start.tv_sec + fast / 1000000000, fast % 1000000000};
+            *now = to_timespec(s_start.tv_sec * int64_t{1000000000} + s_start.tv_nsec +
+                               ns * FAULT_CLOCK_SPEED);
         }
         return result;
     }
@@ -226,19 +227,12 @@ Function* next_symbol(const char* name) {
 }  // namespace
 
 // Under other names, as the headers declare some of them otherwise.
-#define DEFINE(NAME, name, bits, result, params, args)                      \
-    extern "C" result kest_##name params __asm__(#name bits);               \
+#define DEFINE(NAME, name, kind, result, params, args)                      \
+    extern "C" result kest_##name params __asm__(kind(#name));              \
     extern "C" result kest_##name params {                                  \
-        static auto* const real = next_symbol<result params>(#name bits);   \
+        static auto* const real = next_symbol<result params>(kind(#name));  \
         const void* caller = __builtin_return_address(0);                   \
         return pass_on<faults::NAME, result>(caller, real, ARGUMENTS args); \
     }
 #define ARGUMENTS(...) __VA_ARGS__
 KEST_CALLS(DEFINE, DEFINE)
-
-// Where an off_t has 64 bits anyway, the calls have two names.
-#ifndef _FILE_OFFSET_BITS
-#define ALIAS(NAME, name, bits, result, params, args) \
-    extern "C" result kest_##name##64 params __asm__(#name "64") __attribute__((alias(#name)));
-KEST_CALLS(ALIAS, ALIAS)
-#endif

@@ -87,9 +87,10 @@ void check_chunks(const Scanned& scan, const std::string& content) {
     uint64_t end = head(scan.report);
     uint64_t payload = 0;
     for (const ScannedPiece& piece : scan.pieces) {
+        const auto at = static_cast<size_t>(piece.offset);
         FUZZ_CHECK(piece.intact && piece.offset >= end);
-        FUZZ_CHECK(content.compare(piece.offset, 4, "~~~~") == 0);
-        FUZZ_CHECK(content.compare(piece.offset + 20, piece.data.size(), piece.data) == 0);
+        FUZZ_CHECK(content.compare(at, 4, "~~~~") == 0);
+        FUZZ_CHECK(content.compare(at + 20, piece.data.size(), piece.data) == 0);
         end = piece.offset + 20 + piece.data.size();
         bytes += 20 + piece.data.size();
         payload += piece.data.size();
@@ -103,14 +104,14 @@ void check_frames(const Scanned& scan, const std::string& content) {
     uint64_t payload = 0;
     uint64_t start = 0;
     for (const ScannedPiece& piece : scan.pieces) {
+        const auto at = static_cast<size_t>(piece.offset);
         FUZZ_CHECK(piece.offset >= start && piece.offset < content.size());
-        FUZZ_CHECK(content[piece.offset] == '~' || escapes);
+        FUZZ_CHECK(content[at] == '~' || escapes);
         start = piece.offset + 1;
         intact += piece.intact;
         payload += piece.intact ? piece.data.size() : 0;
         if (piece.intact && !escapes) {
-            FUZZ_CHECK(content.compare(piece.offset + 9, piece.data.size() + 1, piece.data + "~") ==
-                       0);
+            FUZZ_CHECK(content.compare(at + 9, piece.data.size() + 1, piece.data + "~") == 0);
         }
     }
     FUZZ_CHECK(scan.report.frames == intact && scan.report.payload == payload);

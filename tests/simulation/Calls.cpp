@@ -23,6 +23,7 @@
 
 #include "core/SavedErrno.h"
 #include "sim/calls.h"
+#include "sim/to_timespec.h"
 #include "simulation/Ledger.h"
 #include "simulation/SavingThread.h"
 #include "simulation/World.h"
@@ -32,7 +33,11 @@ State* g_state;
 __thread bool g_inside;
 bool g_plan_over;
 
-extern "C" ssize_t __real_write(int fd, const void* data, size_t len);
+// With the symbols that the C library has for them.
+#define DECLARE(NAME, name, kind, result, params, args)                    \
+    extern "C" result __real_##name params __asm__("__real_" kind(#name)); \
+    extern "C" result __wrap_##name params __asm__("__wrap_" kind(#name));
+KEST_CALLS(DECLARE, DECLARE)
 
 namespace {
 
@@ -179,7 +184,7 @@ ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
         return failed(EIO);
     }
     if (fault == SHORT_COUNT && len > 1) {
-        len = 1 + state.counters.calls % (len - 1);
+        len = 1 + static_cast<size_t>(state.counters.calls % (len - 1));
     }
     if (!info.removed) {
         if (const int error = refusal(info.place, true)) {
@@ -190,7 +195,7 @@ ssize_t taken_by_medium(const FdInfo& info, size_t len, int fault) {
             if (room < len) {
                 state.fault_in_step = true;
                 ledger::excuse_all();
-                len = room;
+                len = static_cast<size_t>(room);
             }
             room -= len;
         }
@@ -330,13 +335,12 @@ void fail_run(const char* failure_class, const char* format, ...) {
 
 INSIDE(int, clock_gettime, (clock, now), clockid_t clock, struct timespec* now) {
     const int64_t ns = g_state->boot_ns + (clock == CLOCK_REALTIME ? g_state->wall_ns : 0);
-    now->tv_sec = ns / 1000000000;
-    now->tv_nsec = ns % 1000000000;
+    *now = to_timespec(ns);
     return 0;
 }
 
 INSIDE(time_t, time, (result), time_t* result) {
-    const time_t now = (g_state->boot_ns + g_state->wall_ns) / 1000000000;
+    const time_t now = to_timespec(g_state->boot_ns + g_state->wall_ns).tv_sec;
     if (result) {
         *result = now;
     }
@@ -382,19 +386,7 @@ INSIDE(int, poll, (fds, count, timeout), struct pollfd* fds, nfds_t count, int t
 
 // ---- Descriptors
 
-extern "C" int __real_open(const char* path, int flags, mode_t mode);
-extern "C" int __wrap_open(const char* path, int flags, ...);
-extern "C" int __wrap_open(const char* path, int flags, ...) {
-    mode_t mode = 0;
-    if (flags & O_CREAT) {
-        va_list args;
-        va_start(args, flags);
-        mode = va_arg(args, mode_t);
-        va_end(args);
-    }
-    if (!g_inside) {
-        return __real_open(path, flags, mode);
-    }
+INSIDE(int, open, (path, flags, mode), const char* path, int flags, mode_t mode) {
     const Place place = world().place_of(path);
     if (const int error = begin(CALL_OPEN, place)) {
         return result_of("open", path, failed(error == SHORT_COUNT ? EMFILE : error));
@@ -435,7 +427,7 @@ FALLIBLE(ssize_t, read, CALL_READ, place_of_fd(fd), (fd, data, len), int fd, voi
         return failed(EIO);
     }
     if (fault == SHORT_COUNT && len > 1) {
-        len = 1 + g_state->counters.calls % std::min<size_t>(len - 1, 100);
+        len = 1 + static_cast<size_t>(g_state->counters.calls % std::min<size_t>(len - 1, 100));
     }
     ssize_t n = __real_read(fd, data, len);
     const int error = errno;
@@ -494,7 +486,7 @@ FALLIBLE(ssize_t, pwrite, CALL_WRITE, place_of_fd(fd), (fd, data, len, offset), 
 
 WITH_FAULTS(ftruncate, CALL_TRUNCATE, place_of_fd(fd), (fd, len), int fd, off_t len)
 WITH_FAULTS(fcntl, CALL_FCNTL, place_of_fd(fd), (fd, command, argument), int fd, int command,
-            long argument)
+            unsigned long argument)
 
 INSIDE(int, fclose, (file), FILE* file) {
     const int fault = begin(CALL_CLOSE, place_of_fd(fileno(file)));

@@ -104,7 +104,7 @@ constexpr int64_t MAX_WAIT_NS = int64_t{300} * 1000000000;
 constexpr int64_t MAX_DUMP_NS = int64_t{120} * 1000000000;
 
 const Request& request_of(uint64_t index) {
-    return REQUESTS[index % REQUESTS.size()];
+    return REQUESTS[static_cast<size_t>(index % REQUESTS.size())];
 }
 
 std::string value_text(unsigned which, unsigned value) {
@@ -185,7 +185,7 @@ std::string Clients::request_text(uint64_t index) {
 }
 
 uint64_t Clients::request_named(const char* text) {
-    for (uint64_t index = 0; index < REQUESTS.size(); ++index) {
+    for (size_t index = 0; index < REQUESTS.size(); ++index) {
         if (REQUESTS[index].text == text) {
             return index;
         }

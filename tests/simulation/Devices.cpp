@@ -25,8 +25,8 @@ const char* const DIAG_PATHS[STREAM_COUNT] = {"/sim/wcdma_diag", "", "", "", "",
 
 enum Answers : uint8_t { WELL, WELL_TOO, SLOWLY, REFUSING, WRONGLY, NEVER, CUT_OFF, ANSWERS_COUNT };
 
-std::vector<uint8_t> noise(Chance& chance, size_t len) {
-    std::vector<uint8_t> bytes(len);
+std::vector<uint8_t> noise(Chance& chance, uint64_t len) {
+    std::vector<uint8_t> bytes(static_cast<size_t>(len));
     for (uint8_t& byte : bytes) {
         byte = static_cast<uint8_t>(chance.next());
     }
@@ -254,8 +254,8 @@ void Devices::answer(End& end, unsigned stream, uint8_t type, bool dump) {
     if (how == REFUSING && !dump) {
         return add(frame(type, SUB_REFUSED, {}), 0);
     }
-    const size_t frames = 1 + chance.below(20);
-    for (size_t i = 0; i < frames; ++i) {
+    const uint64_t frames = 1 + chance.below(20);
+    for (uint64_t i = 0; i < frames; ++i) {
         const int64_t pause = how == SLOWLY ? static_cast<int64_t>(chance.below(2500)) : 0;
         const std::vector<uint8_t> payload = noise(chance, chance.below(3000));
         const std::vector<uint8_t> bytes = frame(dump ? 0x10 : type, SUB_DATA, payload);
@@ -287,8 +287,8 @@ void Devices::push_memory(unsigned stream, uint64_t seed) {
     Chance chance(seed);
     int64_t due = g_state->boot_ns;
     const uint8_t how = g_state->streams[stream].answers % ANSWERS_COUNT;
-    const size_t pieces = 1 + chance.below(20);
-    for (size_t i = 0; i < pieces && how != NEVER; ++i) {
+    const uint64_t pieces = 1 + chance.below(20);
+    for (uint64_t i = 0; i < pieces && how != NEVER; ++i) {
         due += static_cast<int64_t>(how == SLOWLY ? chance.below(2500) : 1) * NS_PER_MS;
         end.answers.push_back({due, noise(chance, 1 + chance.below(8000))});
     }

@@ -52,7 +52,7 @@ std::vector<fs::path> dirs(const fs::path& dir) {
 
 template <typename T>
 const T* pick(const std::vector<T>& all, Chance& chance) {
-    return all.empty() ? nullptr : &all[chance.below(all.size())];
+    return all.empty() ? nullptr : &all[static_cast<size_t>(chance.below(all.size()))];
 }
 
 }  // namespace
@@ -306,7 +306,7 @@ void Media::install_image(uint64_t number, uint64_t how) {
     std::vector<uint8_t> bytes = SimModemImage(IMAGE_SIZE, static_cast<uint32_t>(number)).bytes();
     g_state->image = kind == GOOD ? static_cast<uint32_t>(number) : 0;
     if (kind == SHORT) {
-        bytes.resize(number % bytes.size());
+        bytes.resize(static_cast<size_t>(number % bytes.size()));
     } else if (kind == FOREIGN) {
         bytes[number % 16] ^= 0x20;
     }
@@ -383,10 +383,11 @@ void Media::check_names() const {
             if (dir.second.empty()) {
                 continue;
             }
-            const size_t missing = *dir.second.rbegin() + 1 - dir.second.size();
+            const uint64_t missing = *dir.second.rbegin() + 1 - dir.second.size();
             const bool no_zero = dir.second.count(0) == 0 && g_state->full_seen;
             if (missing > (g_state->killed ? 1u : 0u) + (no_zero ? 1u : 0u)) {
-                fail_run("numbers", "%s: %zu numbers are missing", dir.first.c_str(), missing);
+                fail_run("numbers", "%s: %llu numbers are missing", dir.first.c_str(),
+                         number(missing));
             }
         }
     }

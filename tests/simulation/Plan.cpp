@@ -180,7 +180,7 @@ void add_kest_conf(Plan& plan, uint64_t& at_ms, uint64_t conf) {
 
 }  // namespace
 
-Plan make_plan(uint64_t seed, Weather weather, size_t events) {
+Plan make_plan(uint64_t seed, Weather weather, uint64_t events) {
     Plan plan;
     uint64_t now = 0;
     if (seed % 5 == 0) {
@@ -190,7 +190,7 @@ Plan make_plan(uint64_t seed, Weather weather, size_t events) {
         add_kest_conf(plan, now, Chance(seed).below(8));
         add_requests(plan, now, 1000, 0, {"ENABLE_LOG WCDMA", "ENABLE_LOG WCN"});
     }
-    for (size_t i = 0; i < events; ++i) {
+    for (uint64_t i = 0; i < events; ++i) {
         Chance chance(seed, i);
         now += pause_ms(chance);
         const Event event = make_event(now, weather, chance);

@@ -81,7 +81,7 @@ enum Weather {
 };
 
 // events: how many; each plan ends in calm, with a last check.
-Plan make_plan(uint64_t seed, Weather weather, size_t events);
+Plan make_plan(uint64_t seed, Weather weather, uint64_t events);
 // The calm end alone, from that time on. rounds: how often each stream is fed in it.
 void append_end(Plan& plan, uint64_t at_ms, unsigned rounds);
 

@@ -7,6 +7,7 @@
 
 #include "channels/LogPipeHandler.h"
 #include "control/LogController.h"
+#include "sim/to_timespec.h"
 #include "simulation/Ledger.h"
 #include "simulation/World.h"
 
@@ -141,9 +142,7 @@ void World::set_times(const char* path, struct stat& st) const {
     if (path[0] && place_of(path) != PLACE_PROPS) {
         return;
     }
-    const int64_t ns = g_state->props_ns + g_state->wall_ns;
-    st.st_mtim.tv_sec = st.st_ctim.tv_sec = ns / 1000000000;
-    st.st_mtim.tv_nsec = st.st_ctim.tv_nsec = ns % 1000000000;
+    st.st_mtim = st.st_ctim = to_timespec(g_state->props_ns + g_state->wall_ns);
 }
 
 void World::message(const std::string& text) {

@@ -163,16 +163,17 @@ void fail() {
 
 }  // namespace boot_clock
 
-#define WRAP(usual, NAME, name, result, params, args)                               \
+#define WRAP(usual, NAME, name, kind, result, params, args)                         \
+    extern "C" result __wrap_##name params __asm__("__wrap_" kind(#name));          \
     extern "C" result __wrap_##name params {                                        \
         if (fails(faults::NAME, ARGUMENTS args)) {                                  \
             return faults::failure<result>();                                       \
         }                                                                           \
         return faults::instead.name ? faults::instead.name args : usual::name args; \
-    }                                                                               \
-    extern "C" result __wrap_##name##64 params __attribute__((alias("__wrap_" #name)));
+    }
 #define ARGUMENTS(...) __VA_ARGS__
-#define PLAIN(NAME, name, bits, result, params, args) WRAP(real, NAME, name, result, params, args)
-#define SPECIAL(NAME, name, bits, result, params, args) \
-    WRAP(special, NAME, name, result, params, args)
+#define PLAIN(NAME, name, kind, result, params, args) \
+    WRAP(real, NAME, name, kind, result, params, args)
+#define SPECIAL(NAME, name, kind, result, params, args) \
+    WRAP(special, NAME, name, kind, result, params, args)
 KEST_CALLS(PLAIN, SPECIAL)

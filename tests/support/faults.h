@@ -14,8 +14,8 @@
 
 // The C library's own.
 namespace real {
-#define DECLARE(NAME, name, bits, result, params, args) \
-    result name params __asm__("__real_" #name bits);
+#define DECLARE(NAME, name, kind, result, params, args) \
+    result name params __asm__("__real_" kind(#name));
 KEST_CALLS(DECLARE, DECLARE)
 #undef DECLARE
 }  // namespace real
@@ -42,7 +42,7 @@ void set_time(time_t now);
 
 // Functions of the test's that run instead, as long as they are set.
 struct Instead {
-#define MEMBER(NAME, name, bits, result, params, args) std::function<result params> name;
+#define MEMBER(NAME, name, kind, result, params, args) std::function<result params> name;
     KEST_CALLS(MEMBER, MEMBER)
 #undef MEMBER
 };

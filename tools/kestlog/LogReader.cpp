@@ -20,8 +20,8 @@ constexpr uint64_t LARGE = 8 * 1024 * 1024;
 }  // namespace
 
 time_t modified_time(const struct stat& st) {
-    constexpr time_t LAST = 253402214400;  // a day before the year 10000: zones differ
-    return std::clamp<time_t>(st.st_mtime, 0, LAST);
+    constexpr int64_t LAST = 253402214400;  // a day before the year 10000: zones differ
+    return static_cast<time_t>(std::clamp<int64_t>(st.st_mtime, 0, LAST));
 }
 
 LogReader::~LogReader() {
