@@ -19,6 +19,10 @@ kest_has() {
         daemontools) command -v multilog >/dev/null ;;
         apache2-utils) command -v rotatelogs >/dev/null ;;
         dpkg-dev) command -v dpkg-shlibdeps >/dev/null ;;
+        g++-*) command -v "${1#g++-}-g++" >/dev/null ;;
+        qemu-user-static) command -v qemu-arm-static >/dev/null || command -v qemu-arm >/dev/null ;;
+        musl-tools) command -v musl-gcc >/dev/null ;;
+        googletest) [ -e /usr/src/googletest/CMakeLists.txt ] ;;
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libarchive-dev) kest_includes archive.h ;;
