@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Included before everything: what the headers of libstdc++, which were configured for the GNU
-// C library, expect of that and musl does not have. The sources of the service get nothing from it.
+// C library, expect of that and musl does not have. None of it is anything the service calls.
 #ifndef TARGETS_MUSL_H_
 #define TARGETS_MUSL_H_
 
