@@ -47,6 +47,19 @@ void gap(unsigned stream, uint64_t to) {
     s.written = to;
 }
 
+// How many bytes, too few to tell, lie within a gap in front of some that can be placed: between
+// two exchanges, which read what the device has. 0 when there are none.
+size_t short_slice(unsigned stream, const uint8_t* data, size_t len) {
+    const StreamState& s = g_state->streams[stream];
+    for (size_t n = 1; n < LOCATABLE && n < len; ++n) {
+        uint64_t position;
+        if (coded_stream::locate(stream, data + n, len - n, &position)) {
+            return s.written + n <= position && position <= s.consumed ? n : 0;
+        }
+    }
+    return 0;
+}
+
 // Bytes of the stream that reached a file.
 void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
     StreamState& s = g_state->streams[stream];
@@ -80,6 +93,12 @@ void take(unsigned stream, const uint8_t* data, size_t len, bool removed) {
                 trace("%s: %zu bytes that cannot be placed", STREAM_NAMES[stream], len);
                 s.unplaced += len;
                 return;
+            }
+            if (const size_t n = short_slice(stream, data, len)) {
+                s.unplaced += n;
+                data += n;
+                len -= n;
+                continue;
             }
             fail_run("foreign",
                      "%s: %zu bytes behind %llu are not the stream's: %02x %02x %02x %02x ...",

@@ -203,8 +203,10 @@ void World::check_totals() const {
         const bool known = !external || (g_state->card_in && media->scanned());
         uint64_t staged = (STREAM_COUNT + 2) * 65536;
         if (external && g_state->card_fresh) {
-            // On a card that came empty no more than what came since, with its headers.
-            staged = std::min(staged, 2 * (g_state->counters.bytes - g_state->card_bytes));
+            // On a card that came empty no more than what came since, with its headers: one of 16
+            // bytes for a file, or of 20 for a chunk, which may have but one byte.
+            const uint64_t came = g_state->counters.bytes - g_state->card_bytes;
+            staged = std::min(staged, 21 * came + CHANNEL_COUNT * 16);
         }
         if (known && (sum < there || sum > there + staged)) {
             fail_run("total", "medium %d: %llu, on the medium %llu", type, number(sum),
