@@ -417,15 +417,21 @@ bool Clients::waiting() const {
 }
 
 void Clients::mark_uncertain() {
-    for (const Client& client : m_clients) {
+    for (Client& client : m_clients) {
         mark_uncertain(client);
     }
 }
 
-void Clients::mark_uncertain(const Client& client) {
+void Clients::mark_uncertain(Client& client) {
     for (const Asked& asked : client.asked) {
         for (const auto& set : set_by(request_of(asked.index))) {
             set.first->uncertain = true;
         }
+    }
+    // What was asked behind it has the value of before as well.
+    for (Asked& asked : client.asked) {
+        const Request& request = request_of(asked.index);
+        asked.expected.uncertain = asked.expected.uncertain ||
+                                   (request.kind == GETS && setting_of(request.what)->uncertain);
     }
 }

@@ -66,7 +66,7 @@ private:
     };
 
     int64_t connected_count() const;
-    static void mark_uncertain(const Client& client);
+    static void mark_uncertain(Client& client);
     bool may_ask(Client& client) const;
     void drop(Client& client);
     void ask(Client& client, uint64_t index);

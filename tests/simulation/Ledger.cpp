@@ -284,6 +284,7 @@ void consumed(unsigned stream, size_t len, bool diverted) {
 }
 
 void answer_logged(unsigned stream, size_t len) {
+    g_state->counters.bytes += len;
     // As many of the stream's own bytes in front of it may be taken for the answer's.
     g_state->streams[stream].answers_logged += len + LOCATABLE;
     g_state->streams[stream].answers_seen = true;
