@@ -85,16 +85,17 @@ def type_of(context):
     return context.split(":")[2]
 
 
-def file_type(specs, path):
+def file_type(patterns, path):
     """The last line that fits; one without special characters goes before all others."""
-    fits = [(not re.search(r"[.*+?()\[\]]", spec.replace("\\.", "")), i) for i, (spec, _) in enumerate(specs)
-            if re.fullmatch(spec, path)]
-    return type_of(specs[max(fits)[1]][1]) if fits else "unlabeled"
+    fits = [(not re.search(r"[.*+?()\[\]]", pattern.replace("\\.", "")), i) for i, (pattern, _) in enumerate(patterns)
+            if re.fullmatch(pattern, path)]
+    return type_of(patterns[max(fits)[1]][1]) if fits else "unlabeled"
 
 
-def property_type(specs, name):
-    fits = [spec for spec in specs if name == spec[0] or spec[0].endswith(".") and name.startswith(spec[0])]
-    return type_of(max(fits, key=lambda spec: len(spec[0]))[1]) if fits else "default_prop"
+def property_type(patterns, name):
+    fits = [pattern for pattern in patterns
+            if name == pattern[0] or pattern[0].endswith(".") and name.startswith(pattern[0])]
+    return type_of(max(fits, key=lambda pattern: len(pattern[0]))[1]) if fits else "default_prop"
 
 
 def genfs_type(text, path):
@@ -141,13 +142,13 @@ def check_paths(top, allowed, label):
         expect(re.search(rf"^    mkdir {path} 0..0 system", rc, re.M), f"kestmodem.rc does not make {path} for it alone")
 
 
-def check_properties(top, allowed, specs):
+def check_properties(top, allowed, patterns):
     props = defines(read(top, "src/config/property_names.h"), "PROP_")
     prefix = props.pop("PROP_MODEM_PREFIX")
     guide = read(top, "docs/handset.md")
     for name, prop in props.items():
         prop = prefix + prop if name.startswith("PROP_SUFFIX_") else prop
-        label = property_type(specs, prop)
+        label = property_type(patterns, prop)
         expect(label not in CATCH_ALL, f"property {prop} has no label of its own")
         expect(any((s, t) == ("kestmodem", label) and READ <= p for s, t, _, p in allowed),
                f"the service may not read {prop} ({label})")
