@@ -187,12 +187,6 @@ TEST_F(ParsingLibTest, NothingButItsOwnFilesIsTakenForTheLibrary) {
     }
     EXPECT_TRUE(root.read_file("other") == db);
     EXPECT_EQ(root.read_file("digest"), HEX);
-    // Nor is a log root that became a link.
-    const std::string away = root.path("away"), log_root = root.path("data/modem_log");
-    ASSERT_EQ(rename(log_root.c_str(), away.c_str()) + symlink(away.c_str(), log_root.c_str()), 0);
-    root.write_file("away/" + std::string(DB), "another's");
-    restart();
-    EXPECT_TRUE(saved(DB) == "another's");
 }
 
 TEST_F(ParsingLibTest, AnImageMustBeAFileWhosePathFits) {
