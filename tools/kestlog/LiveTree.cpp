@@ -31,7 +31,7 @@ LiveTree::Dir* LiveTree::dir(const std::string& path) {
 
 void LiveTree::created(Dir& dir, const std::string& name) {
     struct stat st;
-    // When it is gone the next change says where to.
+    // When it is gone the next change says where to, and its size is looked at there.
     const bool there = lstat((dir.path + "/" + name).c_str(), &st) == 0;
     if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name)) {
         return;
@@ -59,7 +59,7 @@ void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
     } else {
         // What copies a tree gives a file its name when it is whole.
         dir.files.erase(to);
-        add(dir, to, file, true);
+        created(dir, to);
         closed(dir, to);
     }
 }
