@@ -14,12 +14,12 @@ namespace {
 
 constexpr uint32_t SIZE = IQ_MEMORY_SIZE;
 
-struct Figures {
+struct SaveFigures {
     Samples cpu_ms;
     Samples wall_ms;
 };
 
-bool run_dd(const std::string& dir, const std::string& memory, Figures& figures) {
+bool run_dd(const std::string& dir, const std::string& memory, SaveFigures& figures) {
     const std::string out = dir + "/copy";
     ChildProcess dd;
     const double start = now();
@@ -37,7 +37,7 @@ bool run_dd(const std::string& dir, const std::string& memory, Figures& figures)
     return unlink(out.c_str()) == 0;
 }
 
-bool run_service(BenchService& service, Figures& figures) {
+bool run_service(BenchService& service, SaveFigures& figures) {
     SimIqDevice& iq = service.handset().iq_memory();
     const unsigned released = iq.released();
     const double cpu = service.cpu();
@@ -57,7 +57,8 @@ bool run_service(BenchService& service, Figures& figures) {
     return settled && service.request("kestctl clear");
 }
 
-void add_row(Table& table, const std::string& name, const Figures& figures, const Figures& dd) {
+void add_row(Table& table, const std::string& name, const SaveFigures& figures,
+             const SaveFigures& dd) {
     table.add_row({name, number_text(figures.cpu_ms.median(), 1),
                    number_text(figures.cpu_ms.over(dd.cpu_ms).median(), 2),
                    number_text(figures.wall_ms.median(), 1),
@@ -77,12 +78,12 @@ Outcome measure_iq_save(const Options& options, const std::string& dir) {
         return NOT_MEASURED;
     }
     service.handset().iq_memory().write_samples(0, SIZE, 1);
-    Figures saved;
-    Figures dd;
+    SaveFigures saved;
+    SaveFigures dd;
     for (int round = 0; round <= options.rounds; ++round) {
         progress("iq", round, options.rounds);
         if (round == 1) {
-            saved = dd = Figures();
+            saved = dd = SaveFigures();
         }
         if (!run_dd(dir, service.handset().path(IQ_MEMORY), dd) || !run_service(service, saved)) {
             return NOT_MEASURED;

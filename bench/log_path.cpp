@@ -28,7 +28,7 @@ namespace {
 constexpr double GOAL = 1.05;  // CPU of the service relative to the floor
 const char SERVICE[] = "kestmodem";
 
-struct Figures {
+struct LogFigures {
     Samples cpu;  // seconds for a GiB
     Samples speed;
     Samples block;  // KiB a read
@@ -51,7 +51,7 @@ LogRun run_service(const Options& options, BenchService& service, size_t block) 
     return run;
 }
 
-void add(Figures& figures, const LogRun& run, uint64_t mib) {
+void add(LogFigures& figures, const LogRun& run, uint64_t mib) {
     const double size = static_cast<double>(mib * MIB);
     const double gib = size / static_cast<double>(GIB);
     figures.cpu.add((run.cost.user_s + run.cost.system_s + run.deleting_s) / gib);
@@ -63,7 +63,7 @@ void add(Figures& figures, const LogRun& run, uint64_t mib) {
 // One round: the floor comes last but one, right before the service. False when something does
 // not run.
 bool run_all(const Options& options, const std::string& dir, size_t block,
-             const std::vector<LogProgram>& programs, std::map<std::string, Figures>& figures) {
+             const std::vector<LogProgram>& programs, std::map<std::string, LogFigures>& figures) {
     BenchService service(options, dir);
     if (!service.start()) {
         return false;
@@ -84,9 +84,9 @@ bool run_all(const Options& options, const std::string& dir, size_t block,
 }
 
 // Empty when something does not run.
-std::map<std::string, Figures> measure(const Options& options, const std::string& dir, size_t block,
-                                       const std::vector<LogProgram>& programs) {
-    std::map<std::string, Figures> figures;
+std::map<std::string, LogFigures> measure(const Options& options, const std::string& dir,
+                                          size_t block, const std::vector<LogProgram>& programs) {
+    std::map<std::string, LogFigures> figures;
     for (int round = 0; round <= options.rounds; ++round) {
         progress("log path, writes of " + std::to_string(block), round, options.rounds);
         if (round == 1) {
@@ -99,7 +99,8 @@ std::map<std::string, Figures> measure(const Options& options, const std::string
     return figures;
 }
 
-void add_row(Table& table, const std::string& name, const Figures& figures, const Figures& floor) {
+void add_row(Table& table, const std::string& name, const LogFigures& figures,
+             const LogFigures& floor) {
     table.add_row(
         {name, number_text(figures.cpu.median(), 3), number_text(figures.cpu.least(), 3),
          number_text(figures.cpu.over(floor.cpu).median(), 2), number_text(figures.speed.median()),
@@ -121,11 +122,11 @@ Outcome measure_log_path(const Options& options, const std::string& dir) {
     }
     Outcome outcome = REACHED;
     for (const size_t block : {static_cast<size_t>(32768), static_cast<size_t>(512)}) {
-        std::map<std::string, Figures> figures = measure(options, dir, block, programs);
+        std::map<std::string, LogFigures> figures = measure(options, dir, block, programs);
         if (figures.empty()) {
             return NOT_MEASURED;
         }
-        const Figures& floor = figures[programs[0].name];
+        const LogFigures& floor = figures[programs[0].name];
         Table table("Log path, writes of " + number_text(static_cast<double>(block)) + " bytes",
                     {"reader", "CPU s/GiB", "least", "x floor", "MB/s", "x floor", "KiB a read",
                      "peak MiB"});

@@ -16,7 +16,7 @@ namespace {
 
 constexpr unsigned ROTATIONS = 5;
 
-struct Figures {
+struct RotationFigures {
     Samples service_ms;  // CPU time of a rotation
     Samples rename_ms;
     Samples wall_ms;  // of the service
@@ -31,7 +31,7 @@ std::string set_name(time_t time) {
     return name;
 }
 
-bool run_rename(const std::string& dir, unsigned files, Figures& figures) {
+bool run_rename(const std::string& dir, unsigned files, RotationFigures& figures) {
     const OldLogs logs(dir + "/r", set_name(0), "cp_gnss", files, 4096);
     double cpu = 0;
     for (unsigned rotation = 0; rotation < ROTATIONS; ++rotation) {
@@ -47,7 +47,8 @@ bool run_rename(const std::string& dir, unsigned files, Figures& figures) {
     return logs.made();
 }
 
-bool run_service(const Options& options, const std::string& dir, unsigned files, Figures& figures) {
+bool run_service(const Options& options, const std::string& dir, unsigned files,
+                 RotationFigures& figures) {
     BenchService::Setup setup;
     setup.quota_mib = 0;
     BenchService service(options, dir, setup);
@@ -95,11 +96,11 @@ bool run_service(const Options& options, const std::string& dir, unsigned files,
 
 Outcome measure_rotation(const Options& options, const std::string& dir) {
     const unsigned files = static_cast<unsigned>(options.scaled(5000));
-    Figures figures;
+    RotationFigures figures;
     for (int round = 0; round <= options.rounds; ++round) {
         progress("rotate", round, options.rounds);
         if (round == 1) {
-            figures = Figures();
+            figures = RotationFigures();
         }
         if (!run_rename(dir, files, figures) || !run_service(options, dir, files, figures)) {
             return NOT_MEASURED;

@@ -10,12 +10,12 @@
 
 namespace {
 
-struct Figures {
+struct StartFigures {
     Samples cpu_ms;
     Samples wall_ms;
 };
 
-bool run_find(const std::string& dir, const std::string& root, Figures& figures) {
+bool run_find(const std::string& dir, const std::string& root, StartFigures& figures) {
     ChildProcess find;
     const double start = now();
     if (!find.start({{"find", root, "-type", "f", "-size", "+1000000k"},
@@ -33,7 +33,7 @@ bool run_find(const std::string& dir, const std::string& root, Figures& figures)
 }
 
 bool run_service(const Options& options, const std::string& dir, unsigned sets, unsigned files,
-                 Figures& service_figures, Figures& find_figures) {
+                 StartFigures& service_figures, StartFigures& find_figures) {
     BenchService::Setup setup;
     setup.quota_mib = 0;
     BenchService service(options, dir, setup);
@@ -55,7 +55,8 @@ bool run_service(const Options& options, const std::string& dir, unsigned sets, 
     return true;
 }
 
-void add_row(Table& table, const std::string& name, const Figures& figures, const Figures& find) {
+void add_row(Table& table, const std::string& name, const StartFigures& figures,
+             const StartFigures& find) {
     table.add_row({name, number_text(figures.cpu_ms.median(), 1),
                    number_text(figures.cpu_ms.least(), 1),
                    number_text(figures.cpu_ms.over(find.cpu_ms).median(), 2),
@@ -67,13 +68,13 @@ void add_row(Table& table, const std::string& name, const Figures& figures, cons
 Outcome measure_start(const Options& options, const std::string& dir) {
     constexpr unsigned SETS = 10;
     const unsigned files = static_cast<unsigned>(options.scaled(100000));
-    Figures empty;
-    Figures full;
-    Figures find;
+    StartFigures empty;
+    StartFigures full;
+    StartFigures find;
     for (int round = 0; round <= options.rounds; ++round) {
         progress("start", round, options.rounds);
         if (round == 1) {
-            empty = full = find = Figures();
+            empty = full = find = StartFigures();
         }
         if (!run_service(options, dir, SETS, 0, empty, find) ||
             !run_service(options, dir, SETS, files, full, find)) {

@@ -14,13 +14,13 @@ namespace {
 
 const char SET[] = "2016-03-01-09-15-00";
 
-struct Figures {
+struct TrimFigures {
     Samples service_us;  // CPU time a file
     Samples unlink_us;
     Samples wall_ms;  // of the service in all
 };
 
-bool run_unlink(const std::string& dir, unsigned files, Figures& figures) {
+bool run_unlink(const std::string& dir, unsigned files, TrimFigures& figures) {
     const OldLogs logs(dir + "/u", SET, "cp_gnss", files, MIB);
     const std::vector<std::string> paths = logs.paths();
     const double before = own_cpu();
@@ -31,7 +31,8 @@ bool run_unlink(const std::string& dir, unsigned files, Figures& figures) {
     return logs.made();
 }
 
-bool run_service(const Options& options, const std::string& dir, unsigned files, Figures& figures) {
+bool run_service(const Options& options, const std::string& dir, unsigned files,
+                 TrimFigures& figures) {
     BenchService::Setup setup;
     setup.quota_mib = 0;
     BenchService service(options, dir, setup);
@@ -65,11 +66,11 @@ Outcome measure_trimming(const Options& options, const std::string& dir) {
                 {"files", "kestmodem", "least", "unlink", "x unlink", "kestmodem: ms in all"});
     for (const unsigned full : {1000u, 10000u, 100000u}) {
         const unsigned files = static_cast<unsigned>(options.scaled(full));
-        Figures figures;
+        TrimFigures figures;
         for (int round = 0; round <= options.rounds; ++round) {
             progress("trim " + std::to_string(files), round, options.rounds);
             if (round == 1) {
-                figures = Figures();
+                figures = TrimFigures();
             }
             if (!run_unlink(dir, files, figures) || !run_service(options, dir, files, figures)) {
                 return NOT_MEASURED;

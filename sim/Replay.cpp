@@ -19,7 +19,6 @@ namespace {
 
 const uint64_t MB = 1 << 20;
 const int STEP_US = 1000;
-const int CONNECT_MS = 20000;
 // The service takes no byte for so long, with something there to be taken.
 const double PATIENCE_S = 60;
 // Pauses of the whole handset that are longer than this are left out.
@@ -124,7 +123,7 @@ bool Replay::set_up() {
     if (!m_service.start(m_options.program, m_handset)) {
         return fail("cannot run " + m_options.program + ": " + strerror(errno));
     }
-    return m_client.connect(root, CONNECT_MS) ||
+    return m_client.connect(root, SimControlClient::STARTING_MS) ||
            fail("the service does not answer; its last messages:\n" + m_service.last_log_lines(10));
 }
 

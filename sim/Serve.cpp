@@ -12,7 +12,6 @@ namespace {
 using Diag = SimDiagResponder;
 
 const double STEP_S = 0.01;
-const int CONNECT_MS = 20000;
 const uint8_t DSP_STREAM = 0xD0;
 const size_t DSP_PIECE = 16 << 10;
 
@@ -28,7 +27,7 @@ int Serve::run() {
     const bool started = m_stage.set_up();
     if (started) {
         // The three places for clients are for others.
-        if (m_stage.client().connect(m_stage.handset().root(), CONNECT_MS)) {
+        if (m_stage.client().connect(m_stage.handset().root(), SimControlClient::STARTING_MS)) {
             m_stage.client().disconnect();
             show_place();
         }

@@ -10,6 +10,8 @@
 
 class SimControlClient {
 public:
+    static constexpr int STARTING_MS = 20000;  // connecting to a service that was just started
+
     SimControlClient() = default;
     ~SimControlClient() { disconnect(); }
     SimControlClient(const SimControlClient&) = delete;

@@ -10,7 +10,6 @@
 
 namespace {
 
-const std::string SET = "2016-03-01-09-15-00/";
 const std::string INT = "data/modem_log/";
 
 class CpStorageTest : public StorageTest {

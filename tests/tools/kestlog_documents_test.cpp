@@ -13,7 +13,7 @@ namespace {
 
 class KestlogDocuments : public KestlogTest {};
 
-typedef nlohmann::ordered_json Json;
+using Json = nlohmann::ordered_json;
 
 // A kind of line as its table describes it.
 struct Table {

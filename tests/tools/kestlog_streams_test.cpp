@@ -11,7 +11,7 @@
 
 namespace {
 
-typedef nlohmann::json Json;
+using Json = nlohmann::ordered_json;
 
 class KestlogStreamsTest : public KestlogTest {
 protected:
@@ -25,7 +25,7 @@ protected:
 };
 
 const std::string INTERNAL = "data/modem_log/2016-03-01-09-00-00/";
-const std::string CARD = "storage/sdcard0/modem_log/2016-03-01-10-00-00/";
+const std::string CARD_SET = "storage/sdcard0/modem_log/2016-03-01-10-00-00/";
 
 // Both media, a record in each file, fed in pieces that end anywhere.
 TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
@@ -38,7 +38,7 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
         write_log(INTERNAL, "cp_wcdma", number, "09-20-0" + std::to_string(10 - number), "");
     }
     write_log(INTERNAL, "cp_wcdma", 0, "09-30-00", fed.substr(300002, 5));
-    write_log(CARD, "cp_wcdma", 0, "10-00-00", TIME_RECORD + fed.substr(300007));
+    write_log(CARD_SET, "cp_wcdma", 0, "10-00-00", TIME_RECORD + fed.substr(300007));
 
     EXPECT_EQ(run("join ."), 0) << m_err;
     EXPECT_EQ(m_out, fed);
@@ -64,7 +64,7 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     EXPECT_EQ(run("join . -o /dev/full"), 4);
     EXPECT_TRUE(m_root.find(".kestlog-").empty());
 
-    write_log(CARD, "cp_gnss", 0, "10-00-00", "gnss");
+    write_log(CARD_SET, "cp_gnss", 0, "10-00-00", "gnss");
     EXPECT_EQ(run("join ."), 1);
     EXPECT_TRUE(complained("choose one with --cp: cp_gnss, cp_wcdma\n")) << m_err;
     EXPECT_EQ(run("join . --cp cp_gnss"), 0);
@@ -103,12 +103,12 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
          "a",
          ""},
         // The oldest files are trimmed in each set; only the last file may lack a newer one.
-        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "a"}, {CARD, "cp_wcn", 4, "10-00-00", "b"}},
+        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "a"}, {CARD_SET, "cp_wcn", 4, "10-00-00", "b"}},
          "",
          3,
          "ab",
          "09-00-00.log: damage: after it number 0 is missing\n"},
-        {{{CARD, "cp_wcn", 1, "10-00-00", "b"}},
+        {{{CARD_SET, "cp_wcn", 1, "10-00-00", "b"}},
          "",
          0,
          "b",
@@ -155,7 +155,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
          three.substr(0, 50) + three,
          "damage: the last chunk is cut off (at byte 62)\n"},
         {{{INTERNAL, "agdsp", 0, "09-00-00", three.substr(0, 50)},
-          {CARD, "agdsp", 0, "10-00-00", three}},
+          {CARD_SET, "agdsp", 0, "10-00-00", three}},
          "--kind pcm",
          3,
          "twotwo",
