@@ -97,6 +97,8 @@ def main():
     with tempfile.TemporaryDirectory(prefix="kest_rights") as work:
         os.chmod(work, 0o755)
         program = shutil.copy(build + "/kestmodem", work)  # where every user may run it
+        if os.path.exists(build + "/kestmodem.elf"):  # what that runs in an emulator
+            shutil.copy(build + "/kestmodem.elf", work)
         starter = work + "/start"
         with open(starter, "w", encoding="utf-8") as f:
             f.write(f"#!/bin/sh\nexec python3 '{os.path.abspath(__file__)}' --start '{top}' '{program}'\n")

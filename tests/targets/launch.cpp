@@ -17,9 +17,10 @@ int main(int argc, char** argv) {
         return 126;
     }
     memcpy(program + len, SUFFIX, sizeof(SUFFIX));
+    // The system's own cache of libraries may name others for that processor.
     static char emulator[] = KEST_EMULATOR, prefix[] = "-L", libraries[] = KEST_LIBRARIES,
-                name[] = "-0";
-    std::vector<char*> args = {emulator, prefix, libraries, name, argv[0], program};
+                set[] = "-E", path[] = "LD_LIBRARY_PATH=" KEST_LIBRARIES "/lib", name[] = "-0";
+    std::vector<char*> args = {emulator, prefix, libraries, set, path, name, argv[0], program};
     args.insert(args.end(), argv + 1, argv + argc + 1);  // with the null
     execv(emulator, args.data());
     perror(emulator);
