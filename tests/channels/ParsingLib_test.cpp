@@ -187,6 +187,14 @@ TEST_F(ParsingLibTest, NothingButItsOwnFilesIsTakenForTheLibrary) {
     }
     EXPECT_TRUE(root.read_file("other") == db);
     EXPECT_EQ(root.read_file("digest"), HEX);
+    // Nor is a card's log root that became a link.
+    set_card(true);
+    ASSERT_TRUE(write_log());
+    const std::string away = root.path("away"), log_root = root.path("sd/modem_log");
+    ASSERT_EQ(rename(log_root.c_str(), away.c_str()) + symlink(away.c_str(), log_root.c_str()), 0);
+    root.write_file("away/" + std::string(DB), "another's");
+    restart();
+    EXPECT_EQ(saved(DB, "sd"), "another's");
 }
 
 TEST_F(ParsingLibTest, AnImageMustBeAFileWhosePathFits) {
