@@ -6,9 +6,9 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <fstream>
 #include <vector>
 
-#include "sim/files.h"
 #include "simulation/Calls.h"
 #include "simulation/CodedStream.h"
 #include "simulation/State.h"
@@ -184,11 +184,16 @@ size_t skip_record(FdInfo& file, const uint8_t* data, size_t len) {
                            : 0;
 }
 
+struct Bytes {
+    const uint8_t* data;
+    size_t size;
+};
+
 // For how many bytes a header that begins there goes on until another one begins: 0 when it is
 // whole.
-size_t cut_header(const std::vector<uint8_t>& bytes, size_t at) {
-    for (size_t len = 4; len < CHUNK_HEADER_LEN && at + len < bytes.size(); ++len) {
-        if (is_chunk_header(bytes.data() + at + len, bytes.size() - at - len)) {
+size_t cut_header(const Bytes& bytes, size_t at) {
+    for (size_t len = 4; len < CHUNK_HEADER_LEN && at + len < bytes.size; ++len) {
+        if (is_chunk_header(bytes.data + at + len, bytes.size - at - len)) {
             return len;
         }
     }
@@ -196,16 +201,18 @@ size_t cut_header(const std::vector<uint8_t>& bytes, size_t at) {
 }
 
 // Whether a chunk begins there, be it one that a full medium cut off within its header.
-bool chunk_begins(const std::vector<uint8_t>& bytes, size_t at) {
-    return bytes.size() - at >= 4 && memcmp(bytes.data() + at, "~~~~", 4) == 0 &&
-           (is_chunk_header(bytes.data() + at, bytes.size() - at) || cut_header(bytes, at) > 0 ||
-            bytes.size() - at < CHUNK_HEADER_LEN);
+bool chunk_begins(const Bytes& bytes, size_t at) {
+    return bytes.size - at >= 4 && memcmp(bytes.data + at, "~~~~", 4) == 0 &&
+           (is_chunk_header(bytes.data + at, bytes.size - at) || cut_header(bytes, at) > 0 ||
+            bytes.size - at < CHUNK_HEADER_LEN);
 }
 
-std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes, uint8_t kind) {
-    std::vector<uint8_t> payload;
-    for (size_t at = 0; at < bytes.size();) {
-        if (!is_chunk_header(bytes.data() + at, bytes.size() - at)) {
+// Valid until the next call.
+Bytes chunk_payload(const Bytes& bytes, uint8_t kind) {
+    static std::vector<uint8_t> payload;
+    payload.clear();
+    for (size_t at = 0; at < bytes.size;) {
+        if (!is_chunk_header(bytes.data + at, bytes.size - at)) {
             ++at;  // the rest of a header that was cut off
             continue;
         }
@@ -213,32 +220,46 @@ std::vector<uint8_t> chunk_payload(const std::vector<uint8_t>& bytes, uint8_t ki
             at += cut;
             continue;
         }
-        const size_t len = static_cast<size_t>(bytes[at + 4] | bytes[at + 5] << 8) - 16;
-        const bool wanted = bytes[at + 19] == kind;
+        const size_t len = static_cast<size_t>(bytes.data[at + 4] | bytes.data[at + 5] << 8) - 16;
+        const bool wanted = bytes.data[at + 19] == kind;
         const size_t from = at + CHUNK_HEADER_LEN;
-        const size_t end = std::min(from + len, bytes.size());
+        const size_t end = std::min(from + len, bytes.size);
         at = from;
         while (at < end && !chunk_begins(bytes, at)) {
-            const void* const flag = memchr(&bytes[at] + 1, '~', end - at - 1);
-            at = flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - bytes.data()) : end;
+            const void* const flag = memchr(bytes.data + at + 1, '~', end - at - 1);
+            at = flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - bytes.data) : end;
         }
         if (wanted) {
-            payload.insert(payload.end(), bytes.begin() + static_cast<ptrdiff_t>(from),
-                           bytes.begin() + static_cast<ptrdiff_t>(at));
+            payload.insert(payload.end(), bytes.data + from, bytes.data + at);
         }
     }
-    return payload;
+    return {payload.data(), payload.size()};
 }
 
-// The stream's bytes of a whole log file.
-std::vector<uint8_t> stream_part(const std::string& path, unsigned stream) {
-    const std::string text = read_text_file(path);
+// Of a whole file. Valid until the next call: after every step all files are read, and their
+// bytes would be in new memory each time.
+Bytes file_bytes(const std::string& path) {
+    static std::vector<uint8_t> buffer;
+    std::ifstream file(path, std::ios::binary | std::ios::ate);
+    const auto size = file ? static_cast<size_t>(file.tellg()) : 0;
+    if (size > buffer.size()) {
+        buffer.resize(size);
+    }
+    file.seekg(0);
+    file.read(reinterpret_cast<char*>(buffer.data()), static_cast<std::streamsize>(size));
+    return {buffer.data(), static_cast<size_t>(file.gcount())};
+}
+
+// The stream's bytes of a whole log file. Valid until the next call.
+Bytes stream_part(const std::string& path, unsigned stream) {
+    const Bytes all = file_bytes(path);
     const uint8_t kind = CHUNK_KINDS[stream];
     // Of a record that a full medium cut off, there may be less than its mark.
-    const bool has_record = !kind && memcmp(text.data(), RECORD_MAGIC,
-                                            std::min(text.size(), sizeof(RECORD_MAGIC))) == 0;
-    const size_t begin = has_record ? std::min(RECORD_LEN, text.size()) : 0;
-    const std::vector<uint8_t> bytes(text.begin() + static_cast<ptrdiff_t>(begin), text.end());
+    const bool has_record =
+        !kind && all.size > 0 &&
+        memcmp(all.data, RECORD_MAGIC, std::min(all.size, sizeof(RECORD_MAGIC))) == 0;
+    const size_t begin = has_record ? std::min(RECORD_LEN, all.size) : 0;
+    const Bytes bytes = {all.data + begin, all.size - begin};
     return kind ? chunk_payload(bytes, kind) : bytes;
 }
 
@@ -309,7 +330,7 @@ std::vector<unsigned> streams_in(unsigned channel) {
 
 void file_removed(const std::string& path, unsigned channel) {
     for (unsigned stream : streams_in(channel)) {
-        g_state->streams[stream].removed += stream_part(path, stream).size();
+        g_state->streams[stream].removed += stream_part(path, stream).size;
     }
     struct stat st;
     if (stat(path.c_str(), &st) != 0) {
@@ -358,12 +379,12 @@ void check_settled() {
 }
 
 uint64_t stream_bytes(const std::string& path, unsigned stream) {
-    const std::vector<uint8_t> bytes = stream_part(path, stream);
+    const Bytes bytes = stream_part(path, stream);
     uint64_t next = 0;
-    for (size_t at = 0; at < bytes.size();) {
+    for (size_t at = 0; at < bytes.size;) {
         uint64_t position;
-        if (!coded_stream::locate(stream, bytes.data() + at, bytes.size() - at, &position)) {
-            if (bytes.size() - at < LOCATABLE) {
+        if (!coded_stream::locate(stream, bytes.data + at, bytes.size - at, &position)) {
+            if (bytes.size - at < LOCATABLE) {
                 break;
             }
             ++at;  // a slice too short to tell
@@ -373,12 +394,11 @@ uint64_t stream_bytes(const std::string& path, unsigned stream) {
             fail_run("order", "%s: bytes of %llu behind %llu", path.c_str(), number(position),
                      number(next));
         }
-        const size_t same =
-            coded_stream::match(stream, position, bytes.data() + at, bytes.size() - at);
+        const size_t same = coded_stream::match(stream, position, bytes.data + at, bytes.size - at);
         at += same;
         next = position + same;
     }
-    return bytes.size();
+    return bytes.size;
 }
 
 }  // namespace ledger
