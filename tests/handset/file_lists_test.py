@@ -13,8 +13,8 @@ import sys
 
 # Built by CMake only: on a handset the platform's own libraries do this.
 HOST_ONLY = "src/platform/"
-# A program for workstations, which uses libraries that a handset does not have.
-WORKSTATION_ONLY = "kestlog"
+# A program for workstations, which uses libraries that a handset does not have, and its parts.
+WORKSTATION_ONLY = ("kestlog", "libkestlog_program")
 
 
 def bp_modules(text):
@@ -70,7 +70,7 @@ def main():
     bad |= differ("kestmodem", modules["kestmodem"], {"src/core/main.cpp"})
     bad |= differ("programs", programs(text), {"kestmodem", "kestctl"})
     for name, srcs in cmake_tools(top).items():
-        bad |= differ(name, modules.get(name, set()), set() if name == WORKSTATION_ONLY else srcs)
+        bad |= differ(name, modules.get(name, set()), set() if name in WORKSTATION_ONLY else srcs)
     return 1 if bad else 0
 
 

@@ -128,6 +128,7 @@ bool CommandLine::read_options(int argc, char** argv) {
     }
     known.push_back({nullptr, 0, nullptr, 0});
     int index = 0;
+    optind = 0;  // from the start, whatever was read before
     for (int opt; (opt = getopt_long(argc, argv, letters.c_str(), known.data(), &index)) != -1;) {
         if (opt == '?') {
             return end(usage_error(""));  // getopt_long has printed why

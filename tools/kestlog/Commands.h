@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // What the commands of kestlog do. Each reads its options and parameters from the command line,
-// prints everything and returns the exit status. The table in main.cpp has a row for each.
+// prints everything and returns the exit status. The table in program.cpp has a row for each.
 #ifndef KESTLOG_COMMANDS_H_
 #define KESTLOG_COMMANDS_H_
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-// kestlog: reads and checks what the service writes.
-#include <signal.h>
+
+#include "kestlog/program.h"
+
 #include <stdint.h>
 #include <stdio.h>
 
@@ -139,9 +140,7 @@ int run(const CommandLine& line) {
 
 }  // namespace
 
-int main(int argc, char** argv) {
-    // A reader of the output that has had enough ends the program without a word.
-    signal(SIGPIPE, SIG_DFL);
+int run_program(int argc, char** argv) {
     const Syntax syntax = make_syntax();
     CommandLine line(syntax);
     const int status = line.parse(argc, argv) ? run(line) : line.status();
