@@ -72,6 +72,7 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     EXPECT_EQ(run("join . --cp cp_wcn"), 2);
     EXPECT_EQ(run("join . --cp cp_gnss --kind pcm"), 1);
     EXPECT_EQ(run("join . --cp cp_gnss --until 2015-01-01"), 2);
+    EXPECT_EQ(m_err, "kestlog: no log files of that time\n");
 }
 
 TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {

@@ -307,7 +307,6 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
         want[seq % 3] += seq == 31 ? "" : data;  // that one is lost
     }
     write(OLD_DSP_LOG, text);
-    m_root.make_dir("to");
     EXPECT_EQ(run("split --output to " + OLD_DSP_LOG), 3) << m_err;
     const std::string stem = "to/1-agdsp-2016-03-01_09-00-00.";
     EXPECT_EQ(m_root.read_file(stem + "log.bin"), want[0]);

@@ -149,7 +149,8 @@ const LogStream* choose_stream(const CommandLine& line, const std::vector<LogStr
         names += (names.empty() ? "" : ", ") + stream.cp;
     }
     if (streams.empty()) {
-        *status = failure(ES_UNREADABLE, "no log files there");
+        const bool cut = line.has("since") || line.has("until");
+        *status = failure(ES_UNREADABLE, cut ? "no log files of that time" : "no log files there");
     } else if (line.has("cp")) {
         *status = failure(ES_UNREADABLE, "no log files of " + wanted + "; there are: " + names);
     } else {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog split.
 #include <stdio.h>
+#include <sys/stat.h>
 
 #include <nlohmann/json.hpp>
 
@@ -60,10 +61,12 @@ int split(const CommandLine& line, const std::string& path) {
     if (!is_chunked(in, name)) {
         return failure(ES_UNREADABLE, path + ": not a log of the audio DSP");
     }
+    const std::string dir = line.value("output", ".");
+    mkdir(dir.c_str(), 0777);  // if it cannot be made, the files in it cannot either
     OutputFile parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {
         const std::string part = output_name(stem, std::string(".") + CHUNK_KINDS[i] + ".bin");
-        if (!parts[i].open(line.value("output", ".") + "/" + part, line.has("force"))) {
+        if (!parts[i].open(dir + "/" + part, line.has("force"))) {
             return parts[i].failed();
         }
     }
