@@ -63,10 +63,11 @@ int split(const CommandLine& line, const std::string& path) {
     }
     const std::string dir = line.value("output", ".");
     mkdir(dir.c_str(), 0777);  // if it cannot be made, the files in it cannot either
+    const std::string before = dir + "/";
     OutputFile parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {
         const std::string part = output_name(stem, std::string(".") + CHUNK_KINDS[i] + ".bin");
-        if (!parts[i].open(dir + "/" + part, line.has("force"))) {
+        if (!parts[i].open(before + part, line.has("force"))) {
             return parts[i].failed();
         }
     }
