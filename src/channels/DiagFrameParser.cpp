@@ -4,6 +4,8 @@
 
 #include <string.h>
 
+#include <algorithm>
+
 namespace {
 
 constexpr uint8_t FLAG = 0x7E;
@@ -115,6 +117,47 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
     }
     consumed = len;
     return false;
+}
+
+size_t DiagFrameParser::measure(const uint8_t* data, size_t len, DiagHeader& header,
+                                size_t& body_len) {
+    const void* const flag = len > 1 && data[0] == FLAG
+                                 ? memchr(data + 1, FLAG, std::min(len - 1, MAX_FRAME * 2 + 1))
+                                 : nullptr;
+    if (!flag) {
+        return 0;
+    }
+    const uint8_t* const body = data + 1;
+    const size_t raw = static_cast<size_t>(static_cast<const uint8_t*>(flag) - body);
+    const uint8_t* const end = body + raw;
+    size_t escapes = 0;
+    const uint8_t* pos = body;
+    const uint8_t* first = end;  // escape
+    while (const void* const found = memchr(pos, ESCAPE, static_cast<size_t>(end - pos))) {
+        first = escapes++ ? first : static_cast<const uint8_t*>(found);
+        pos = static_cast<const uint8_t*>(found) + 2;
+        if (pos > end) {
+            return 0;  // the flag is escaped
+        }
+    }
+    body_len = raw - escapes;
+    if (body_len < sizeof(header) || body_len > MAX_FRAME) {
+        return 0;
+    }
+    if (first >= body + sizeof(header)) {
+        memcpy(&header, body, sizeof(header));
+        return raw + 2;
+    }
+    uint8_t head[sizeof(header)];
+    pos = body;
+    for (uint8_t& byte : head) {
+        const bool escaped = *pos == ESCAPE;
+        pos += escaped;
+        byte = escaped ? *pos ^ ESCAPE_XOR : *pos;
+        ++pos;
+    }
+    memcpy(&header, head, sizeof(header));
+    return raw + 2;
 }
 
 size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {

@@ -36,6 +36,12 @@ public:
     // The bytes that the last frame took before it was decoded, both flags included.
     size_t raw_size() const { return m_raw_size; }
 
+    // Looks at a frame without decoding more than its header, for who only counts: the bytes of
+    // the frame that begins with a flag at data, both flags included, its header and the length
+    // of its decoded body. 0 if the frame is not whole in len bytes, has no header or more than
+    // MAX_FRAME bytes, or begins with several flags: unescape() tells then.
+    static size_t measure(const uint8_t* data, size_t len, DiagHeader& header, size_t& body_len);
+
     // Escapes len bytes to dst, which has room for twice as many; the bytes written.
     static size_t escape(const uint8_t* src, size_t len, uint8_t* dst);
 

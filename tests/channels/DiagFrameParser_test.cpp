@@ -98,6 +98,35 @@ TEST_F(DiagFrameParserTest, DropsAnOverlongFrameWholeAndStaysInStep) {
     }
 }
 
+// Every end that four letters can make of a frame.
+TEST_F(DiagFrameParserTest, MeasuresWhatItWouldDecode) {
+    size_t measured = 0;
+    for (size_t i = 0; i < 65536; ++i) {
+        std::string input = "~abcd";
+        for (size_t rest = i, n = 0; n < 8; ++n, rest /= 4) {
+            input += "~}xy"[rest % 4];
+        }
+        const uint8_t* const data = reinterpret_cast<const uint8_t*>(input.data());
+        DiagHeader header;
+        size_t body_len;
+        const size_t size = DiagFrameParser::measure(data, input.size(), header, body_len);
+        parser->init();
+        uint8_t* frame;
+        size_t len;
+        size_t used;
+        const bool found = parser->unescape(data, input.size(), frame, len, used);
+        if (size == 0) {
+            EXPECT_TRUE(!found || len < sizeof(header) || input.find("}~") < used) << input;
+            continue;
+        }
+        ++measured;
+        ASSERT_TRUE(found) << input;
+        EXPECT_TRUE(size == used && body_len == len) << input;
+        EXPECT_EQ(memcmp(&header, frame, sizeof(header)), 0) << input;
+    }
+    EXPECT_GT(measured, 5000u);
+}
+
 TEST_F(DiagFrameParserTest, BuildsFramesWithEscapes) {
     EXPECT_EQ(build(0x7E, 0x7D, ""), std::string("\x7e\0\0\0\0\x08\0\x7d\x5e\x7d\x5d\x7e", 12));
     EXPECT_EQ(build(1, 2, "}a~"), std::string("\x7e\0\0\0\0\x0b\0\1\2}]a}^\x7e", 15));

@@ -32,6 +32,7 @@ struct ScannedPiece {
     uint64_t offset;
     uint32_t seq_num;
     bool intact;
+    size_t len;
     std::string kind;  // of a chunk
     std::string data;
 };
@@ -42,7 +43,8 @@ struct Scanned {
 };
 
 // The scan of a file of that name and content.
-Scanned fuzz_scan(const std::string& name, const std::string& content) {
+Scanned fuzz_scan(const std::string& name, const std::string& content,
+                  FramePayload payload = FP_DATA) {
     static const FuzzFile file;
     file.write(content);
     Scanned result;
@@ -52,11 +54,12 @@ Scanned fuzz_scan(const std::string& name, const std::string& content) {
         in, FileName(name),
         [&](const Piece& piece) {
             result.pieces.push_back(
-                {piece.offset, piece.seq_num, piece.intact, piece.kind ? piece.kind : "",
-                 piece.data_len > 0 ? fuzz_text(piece.data, piece.data_len) : std::string()});
+                {piece.offset, piece.seq_num, piece.intact, piece.data_len,
+                 piece.kind ? piece.kind : "",
+                 piece.data ? fuzz_text(piece.data, piece.data_len) : std::string()});
             return true;
         },
-        &result.report);
+        payload, &result.report);
     FUZZ_CHECK(in.error() == 0);
     return result;
 }
@@ -119,6 +122,20 @@ void check_frames(const Scanned& scan, const std::string& content) {
     FUZZ_CHECK(scan.report.other + payload + head(scan.report) <= content.size());
 }
 
+// Frames that are only measured are the same.
+void check_measured(const std::string& name, const std::string& content, const Scanned& decoded) {
+    const Scanned scan = fuzz_scan(name, content, FP_LENGTH);
+    const FileReport &a = scan.report, &b = decoded.report;
+    FUZZ_CHECK(a.frames == b.frames && a.broken == b.broken && a.payload == b.payload);
+    FUZZ_CHECK(a.other == b.other && a.end_marker == b.end_marker && a.damaged == b.damaged);
+    FUZZ_CHECK(scan.pieces.size() == decoded.pieces.size());
+    for (size_t i = 0; i < scan.pieces.size(); ++i) {
+        const ScannedPiece &c = scan.pieces[i], &d = decoded.pieces[i];
+        FUZZ_CHECK(c.offset == d.offset && c.seq_num == d.seq_num && c.len == d.len);
+        FUZZ_CHECK(c.intact == d.intact && c.kind == d.kind);
+    }
+}
+
 // Two bytes tell where the chunk is cut, one its kind and one its number.
 void check_own_chunk(const uint8_t* data, size_t size) {
     static constexpr uint8_t KINDS[] = {0, 2, 3};  // log, dump, PCM
@@ -158,6 +175,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         content += text;
     }
     const Scanned scan = fuzz_scan(name, content);
+    check_measured(name, content, scan);
     check_findings(scan.report, content);
     check_record(scan.report, content);
     const bool whole = name == "sha1.txt" || name == "cp_gnss.version" ||

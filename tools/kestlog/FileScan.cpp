@@ -69,8 +69,9 @@ const char* chunk_fault(const DspChunkHeader& header, size_t* data_len) {
 
 class Scanner {
 public:
-    Scanner(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report)
-        : m_in(in), m_name(name), m_visit(visit), m_report(*report) {}
+    Scanner(LogReader& in, const FileName& name, const PieceVisitor& visit, FramePayload payload,
+            FileReport* report)
+        : m_in(in), m_name(name), m_visit(visit), m_payload(payload), m_report(*report) {}
 
     void run() {
         size_t got;
@@ -143,15 +144,22 @@ private:
         uint64_t first_broken = 0;
         uint64_t framed = 0;
         const uint64_t start = m_in.offset();
+        bool between = true;  // frames: the parser holds nothing
         for (size_t got; !m_stop;) {
             const uint8_t* data = m_in.peek(1, got);
             if (got == 0) {
                 break;
             }
+            size_t used = between && m_payload == FP_LENGTH ? measure_frames(data, got) : 0;
+            if (used > 0) {
+                framed += used;
+                m_in.skip(used);
+                continue;
+            }
             uint8_t* body;
             size_t len;
-            size_t used;
-            if (!m_parser.unescape(data, got, body, len, used)) {
+            between = m_parser.unescape(data, got, body, len, used);
+            if (!between) {
                 m_in.skip(used);
                 continue;
             }
@@ -187,6 +195,27 @@ private:
         }
     }
 
+    // Takes the intact frames that these bytes begin with; the bytes used.
+    size_t measure_frames(const uint8_t* data, size_t len) {
+        size_t used = 0;
+        DiagHeader header;
+        for (size_t body_len; !m_stop;) {
+            const size_t size = DiagFrameParser::measure(data + used, len - used, header, body_len);
+            const bool end = m_name.framed_dump && is_end_len(body_len);
+            if (size == 0 || header.len != body_len || end) {
+                break;  // to be decoded
+            }
+            visit_frame(header, {m_in.offset() + used, size, 0, 0, 0, 0, nullptr,
+                                 body_len - sizeof(header), true, nullptr});
+            used += size;
+        }
+        return used;
+    }
+
+    static bool is_end_len(size_t body_len) {
+        return body_len == sizeof(DiagHeader) + MODEM_DUMP_END_LEN;
+    }
+
     // True for an intact frame.
     bool take_frame(uint64_t offset, size_t size, const uint8_t* body, size_t len) {
         DiagHeader header{};
@@ -197,21 +226,28 @@ private:
             memcpy(&header, body, sizeof(header));
             piece.data = body + sizeof(header);
             piece.data_len = len - sizeof(header);
-            const bool end = m_name.framed_dump && piece.data_len == MODEM_DUMP_END_LEN &&
+            const bool end = m_name.framed_dump && is_end_len(len) &&
                              memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0;
             m_report.end_marker |= end;
             piece.intact = header.len == len || end;
         }
-        piece.seq_num = header.seq_num;
-        piece.len_field = header.len;
-        piece.type = header.type;
-        piece.sub_type = header.sub_type;
+        visit_frame(header, piece);
+        return piece.intact;
+    }
+
+    // Of the piece, all but what its header says is set.
+    void visit_frame(const DiagHeader& header, Piece piece) {
         if (piece.intact) {
             ++m_report.frames;
             m_report.payload += piece.data_len;
         }
-        m_stop = m_visit && !m_visit(piece);
-        return piece.intact;
+        if (m_visit) {
+            piece.seq_num = header.seq_num;
+            piece.len_field = header.len;
+            piece.type = header.type;
+            piece.sub_type = header.sub_type;
+            m_stop = !m_visit(piece);
+        }
     }
 
     void scan_chunks() {
@@ -304,6 +340,7 @@ private:
     LogReader& m_in;
     const FileName& m_name;
     const PieceVisitor& m_visit;
+    const FramePayload m_payload;
     FileReport& m_report;
     bool m_stop = false;
     DiagFrameParser m_parser;
@@ -342,6 +379,7 @@ bool is_chunked(LogReader& in, const FileName& name) {
     return !chunk_fault(header, &len);
 }
 
-void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report) {
-    Scanner(in, name, visit, report).run();
+void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FramePayload payload,
+               FileReport* report) {
+    Scanner(in, name, visit, payload, report).run();
 }

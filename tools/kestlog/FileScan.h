@@ -28,7 +28,7 @@ struct Piece {
     size_t len_field;  // the length in the header
     uint8_t type;
     uint8_t sub_type;
-    const uint8_t* data;  // behind the header
+    const uint8_t* data;  // behind the header; of a frame null unless payload is wanted
     size_t data_len;
     bool intact;       // that length is right
     const char* kind;  // of a chunk, else null
@@ -71,7 +71,11 @@ bool is_chunked(LogReader& in, const FileName& name);
 // Called for every piece in order; returns false to end the scan. May be null.
 typedef std::function<bool(const Piece&)> PieceVisitor;
 
+// What a visitor wants to know of frames; it always gets the data of chunks.
+enum FramePayload { FP_LENGTH, FP_DATA };
+
 // Scans the open file. in.error() is set after a read error.
-void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FileReport* report);
+void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FramePayload payload,
+               FileReport* report);
 
 #endif  // KESTLOG_FILESCAN_H_

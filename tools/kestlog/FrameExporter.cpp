@@ -54,7 +54,7 @@ int FrameExporter::add(const ExportSource& source) {
     m_begun = m_any = m_named = false;
     ++m_totals.files;
     const PieceVisitor visit = [this](const Piece& piece) { return take(piece); };
-    scan_file(in, source.file->name, visit, &report);
+    scan_file(in, source.file->name, visit, FP_DATA, &report);
     if (m_writer.good()) {
         end(in);
     }

@@ -67,7 +67,7 @@ bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
     }
     FileReport report;
     scan_file(
-        in, name, [this](const Piece&) { return !m_stop; }, &report);
+        in, name, [this](const Piece&) { return !m_stop; }, FP_LENGTH, &report);
     if (m_stop) {
         return true;
     }

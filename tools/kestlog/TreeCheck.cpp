@@ -100,7 +100,7 @@ private:
             }
             return;
         }
-        scan_file(in, file.name, visit, report);
+        scan_file(in, file.name, visit, FP_LENGTH, report);
         if (in.error()) {
             m_visitor.unreadable(file.shown() + ": " + strerror(in.error()));
         }

@@ -20,7 +20,8 @@ class TreeVisitor {
 public:
     virtual ~TreeVisitor() = default;
 
-    // Before anything is found about the file. The result sees its frames or chunks.
+    // Before anything is found about the file. The result sees its frames,
+    // of which it does not get the payload, or chunks.
     virtual PieceVisitor begin(const FilePlace&) { return nullptr; }
     // The path is one for humans.
     virtual void find(const std::string& path, const Finding& finding) = 0;

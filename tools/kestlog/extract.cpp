@@ -186,7 +186,7 @@ private:
                 }
                 return !failed;
             },
-            &report);
+            FP_DATA, &report);
         for (Part& part : parts) {
             failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
         }

@@ -148,7 +148,7 @@ int frames(const std::string& path, Wanted* wanted) {
             }
             return more;
         };
-        scan_file(in, FileName(file_part(path)), print, &report);
+        scan_file(in, FileName(file_part(path)), print, wanted->hex ? FP_DATA : FP_LENGTH, &report);
     }
     tell_damage(path, report);
     return scan_status(in, path, report);

@@ -103,7 +103,7 @@ int info(const CommandLine& line, const std::string& path) {
     }
     const FileName name(file_part(path));
     FileReport report;
-    scan_file(in, name, nullptr, &report);
+    scan_file(in, name, nullptr, FP_LENGTH, &report);
     in.drain();  // the size of a pipe shows at its end
     Facts facts(line.has("json"));
     facts.add("file", path);

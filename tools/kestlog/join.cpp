@@ -135,7 +135,7 @@ private:
                 }
                 return good;
             },
-            &report);
+            FP_LENGTH, &report);
         for (Finding& finding : report.findings) {
             // Only the last file of all may still be written to.
             finding.damage |= strcmp(finding.code, "cut") == 0 && !each.last;

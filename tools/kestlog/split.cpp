@@ -78,7 +78,7 @@ int split(const CommandLine& line, const std::string& path) {
         return !failed;
     };
     FileReport report;
-    scan_file(in, name, write, &report);
+    scan_file(in, name, write, FP_LENGTH, &report);
     for (OutputFile& part : parts) {
         if (!failed && fflush(part.stream()) != 0) {
             failed = &part;

@@ -139,7 +139,7 @@ public:
                      (piece.kind != CHUNK_KINDS[CK_PCM] || sound(piece));
                 return ok;
             },
-            &report);
+            FP_LENGTH, &report);
         m_problems.add(path, report, in.error());
         return ok;
     }
