@@ -80,13 +80,13 @@ int LogFile::write_out() {
     return -1;
 }
 
-void LogFile::grow(size_t len) {
+void LogFile::grow(uint64_t len) {
     m_size += static_cast<uint32_t>(len);
     m_counted += len;
     m_dir->add_size(len);
 }
 
-void LogFile::shrink(size_t len) {
+void LogFile::shrink(uint64_t len) {
     m_size -= static_cast<uint32_t>(len);
     m_counted -= len;
     m_dir->dec_size(len);
@@ -198,7 +198,7 @@ int LogFile::copy(const char* source) {
     uint64_t copied;
     const int result = copy_bytes(src, m_fd, m_buffer.get(), m_capacity, UINT64_MAX, copied);
     const SavedErrno keep;
-    grow(static_cast<size_t>(copied));
+    grow(copied);
     ::close(src);
     return result;
 }

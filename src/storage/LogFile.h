@@ -109,8 +109,8 @@ public:
 private:
     ssize_t write_staged_with(const void* data, size_t len);
     size_t write_some(const void* data, size_t len);
-    void grow(size_t len);
-    void shrink(size_t len);
+    void grow(uint64_t len);
+    void shrink(uint64_t len);
 
     CpDirectory* m_dir;
     android::String8 m_name;
