@@ -71,8 +71,8 @@ public:
     void add_size(uint64_t num);
     void dec_size(uint64_t num);
     // Counts the listed files on the medium again and drops those that are gone.
-    // Only this directory's size changes.
-    void recount();
+    // Only this directory's size changes. Returns how many files it looked at.
+    size_t recount();
 
     // Deletes files from the front until at least the bytes wanted are gone (at least
     // one file is deleted, if there is one). Returns the bytes removed.

@@ -29,12 +29,14 @@ int CpDirectory::stat() {
     return result;
 }
 
-void CpDirectory::recount() {
+size_t CpDirectory::recount() {
+    size_t looked_at = 0;
     m_size = 0;
     FileIter it = m_files.begin();
     while (it != m_files.end()) {
         LogFile* file = *it;
         struct stat st;
+        ++looked_at;
         const bool known = lstat(JoinedPath(m_path, file->name()).string(), &st) == 0;
         if (!known && means_vanished(errno)) {
             it = drop(it);
@@ -46,6 +48,7 @@ void CpDirectory::recount() {
         m_size += file->counted();
         ++it;
     }
+    return looked_at;
 }
 
 // Puts a scan's files into the list order. They are sorted first, so that a directory

@@ -96,12 +96,13 @@ void CpSetDirectory::dec_size(uint64_t num) {
     m_media->dec_size(num);
 }
 
-void CpSetDirectory::recount() {
+size_t CpSetDirectory::recount() {
+    size_t looked_at = 0;
     m_size = 0;
     android::List<CpDirectory*>::iterator it = m_dirs.begin();
     while (it != m_dirs.end()) {
         CpDirectory* dir = *it;
-        dir->recount();
+        looked_at += dir->recount();
         if (dir_usable(dir->path())) {
             m_size += dir->size();
             ++it;
@@ -110,6 +111,7 @@ void CpSetDirectory::recount() {
             delete dir;
         }
     }
+    return looked_at;
 }
 
 uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted) {

@@ -53,8 +53,8 @@ public:
     void add_size(uint64_t num);
     void dec_size(uint64_t num);
     // Counts the listed directories again and drops those that are gone. Only this set's size
-    // changes.
-    void recount();
+    // changes. Returns how many files it looked at.
+    size_t recount();
 
     // Frees at least the bytes wanted, if possible, CP directory by CP directory,
     // removing those that become empty. Returns the bytes removed; the caller subtracts

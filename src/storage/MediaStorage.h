@@ -128,6 +128,7 @@ private:
     uint64_t m_size = 0;
     bool m_uncertain = false;         // something vanished since the last recount
     unsigned int m_refusals = 0;      // checks that failed in a row
+    size_t m_recounted = 0;           // files that the last recount looked at
     uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; enough at first
 };
 

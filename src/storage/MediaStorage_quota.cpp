@@ -2,6 +2,8 @@
 // The part of MediaStorage that keeps the medium within its limits.
 #include <errno.h>
 
+#include <algorithm>
+
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
@@ -11,8 +13,10 @@
 namespace {
 
 // A medium that stays above its quota is counted again at the first failing check and then at
-// one in this many: somebody may delete files at any time, but counting looks at every file.
-constexpr unsigned int CHECKS_PER_RECOUNT = 16;
+// one in this many, or in more where there are many files: somebody may delete files at any time,
+// but counting looks at every file, and a check is made for every block.
+constexpr size_t CHECKS_PER_RECOUNT = 16;
+constexpr size_t FILES_PER_CHECK = 32;
 
 }  // namespace
 
@@ -74,7 +78,7 @@ int MediaStorage::check_quota() {
 
 // True when counting again, after somebody else deleted files, finds the total within the quota.
 bool MediaStorage::recount_helps() {
-    if (m_refusals++ % CHECKS_PER_RECOUNT == 0) {
+    if (m_refusals++ % std::max(CHECKS_PER_RECOUNT, m_recounted / FILES_PER_CHECK) == 0) {
         recount();
     }
     return !above_quota();
@@ -85,10 +89,11 @@ bool MediaStorage::recount_helps() {
 void MediaStorage::recount() {
     m_uncertain = false;
     m_size = 0;
+    m_recounted = 0;
     android::List<CpSetDirectory*>::iterator it = m_sets.begin();
     while (it != m_sets.end()) {
         CpSetDirectory* set = *it;
-        set->recount();
+        m_recounted += set->recount();
         if (set == m_working_set || dir_usable(set->path())) {
             m_size += set->size();
             ++it;

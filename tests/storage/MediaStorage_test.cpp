@@ -58,6 +58,23 @@ TEST_F(MediaStorageTest, WhatVanishedLeavesTheTotals) {
     }
 }
 
+// Counting looks at every file, and a check is made for every block that is refused.
+TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
+    init();
+    m_mgr.set_overwrite(false);
+    internal().set_quota(10);
+    for (int i = 0; i < 1600; ++i) {
+        m_root.write_file(ROOT + "2016-02-01-00-00-00/cp/" + std::to_string(i), "x");
+    }
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    faults::reset();
+    for (int i = 0; i < 151; ++i) {
+        EXPECT_EQ(internal().check_quota(), -1);
+    }
+    EXPECT_LE(faults::calls(faults::LSTAT), 6500);  // four times
+}
+
 // Somebody made a directory of the tree a link, to one that has the same names: nothing is made
 // or deleted there, neither by what is known of the medium nor after a new scan.
 TEST_F(MediaStorageTest, NoLinkLeadsOutOfTheTree) {
