@@ -100,16 +100,20 @@ LogFile* CpDirectory::find(const android::String8& name) const {
     return find_named(m_files, &LogFile::name, name);
 }
 
-// A name that is free in the directory: the given one with "-N" before its extension.
+// A name that is free in the directory: the given one with "-N" before its extension. Of a
+// broken medium, which says of every name that it is taken, the last one that was tried.
 android::String8 CpDirectory::aside_name(const android::String8& name) {
     const char* dot = strrchr(name.string(), '.');
     const size_t stem_len = dot ? static_cast<size_t>(dot - name.string()) : name.length();
     android::String8 aside;
     struct stat st;
-    do {
+    for (int tries = 0; tries < MAX_NAMES; ++tries) {
         aside.setTo(name.string(), stem_len);
         aside.appendFormat("-%u%s", ++m_aside_num, name.string() + stem_len);
-    } while (find(aside) || lstat(JoinedPath(m_path, aside).string(), &st) == 0);
+        if (!find(aside) && lstat(JoinedPath(m_path, aside).string(), &st) < 0) {
+            break;
+        }
+    }
     return aside;
 }
 
@@ -152,13 +156,21 @@ LogFile* CpDirectory::create_file(const android::String8& name, LogType type) {
     return open_and_list(std::make_unique<LogFile>(free_name(name), this, type, 0), name);
 }
 
+// Whether this directory, its set or what holds the sets has become a symbolic link: what is
+// behind it is somebody else's.
+bool CpDirectory::leads_away() const {
+    return is_link(m_path) || is_link(m_set->path()) || m_set->media()->leads_away();
+}
+
 int CpDirectory::remove_file(LogFile* file) {
     FileIter it = find_object(m_files, file);
     if (it == m_files.end()) {
         return -1;
     }
     const SavedErrno keep;
-    file->remove(m_path);
+    if (!leads_away()) {
+        file->remove(m_path);
+    }
     dec_size(file->counted());
     drop(it);
     return 0;

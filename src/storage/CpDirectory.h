@@ -93,6 +93,7 @@ private:
     FileIter drop(FileIter it);
     uint64_t delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck);
     bool is_protected(const LogFile* file) const;
+    bool leads_away() const;
     void renumber_first_log();
     void insert_scanned(LogFile** files, size_t num);
 

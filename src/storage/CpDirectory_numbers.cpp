@@ -18,6 +18,9 @@
 
 namespace {
 
+// Names that a renumbering finds taken: a broken medium may say so of every one.
+constexpr int MAX_STRANGERS = 1000;
+
 struct Numbered {
     LogFile* file;
     uint32_t number;
@@ -53,6 +56,9 @@ void CpDirectory::rotate_logs() {
     if (!renumber) {
         return;  // 0 is free: the last new file could not be made
     }
+    if (leads_away()) {
+        return;
+    }
     std::set<std::string_view> listed;
     for (const LogFile* file : m_files) {
         listed.insert(file->name().string());
@@ -61,13 +67,15 @@ void CpDirectory::rotate_logs() {
     std::stable_sort(logs.begin(), logs.end(),
                      [](const Numbered& a, const Numbered& b) { return a.number < b.number; });
     uint64_t least = 0;
+    int strangers = 0;
     for (Numbered& log : logs) {
         log.target = std::max(uint64_t{log.number} + 1, least);
-        while (log.target <= UINT32_MAX &&
+        while (log.target <= UINT32_MAX && strangers < MAX_STRANGERS &&
                taken_by_stranger(
                    with_number(log.file->name(), static_cast<uint32_t>(log.target), log.digits),
                    listed)) {
             ++log.target;
+            ++strangers;
         }
         least = log.target + 1;
     }
@@ -86,7 +94,7 @@ void CpDirectory::rotate_logs() {
 
 // Keeps the numbers contiguous: the first log file gets the number after the oldest other one's.
 void CpDirectory::renumber_first_log() {
-    if (!m_first_log) {
+    if (!m_first_log || leads_away()) {
         return;
     }
     for (LogFile* file : m_files) {

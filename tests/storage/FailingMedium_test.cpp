@@ -43,6 +43,16 @@ TEST_F(FailingMediumTest, NamesAreNotTriedForEver) {
     EXPECT_EQ(lost_of(1, "x"), 1);
     faults::reset();
     EXPECT_EQ(lost_of(1, "x"), 0);
+    faults::instead.lstat = [](const char* path, struct stat* st) {
+        return strstr(path, ".log") ? real::lstat("/", st) : real::lstat(path, st);
+    };
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    m_store->stop();
+    EXPECT_EQ(lost_of(1, "x"), 0) << "what cannot be renamed stays where it is";
+    faults::instead = {};
+    m_store->stop();
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_EQ(m_root.find("0-cp_").size(), 1u);
 }
 
 // Only files that trimming spares are left on a full medium.

@@ -110,6 +110,10 @@ TEST_F(MediaStorageTest, NoLinkLeadsOutOfTheTree) {
             };
             const Names before = names();
             for (const bool scanned : {false, true}) {
+                if (CpDirectory* dir = internal().get_cp_dir("cp")) {
+                    dir->rotate_logs();
+                    EXPECT_EQ(dir->remove_file(*--dir->files().end()), 0);
+                }
                 internal().trim(1000);
                 make("cp", LT_DUMP, "another");
                 internal().create_cp_set();
