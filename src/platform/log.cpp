@@ -7,6 +7,8 @@
 #include <stdio.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 namespace {
 
 const size_t LINE_SIZE = 8192;
@@ -23,6 +25,11 @@ size_t stored(int result, size_t size) {
     }
     const size_t len = static_cast<size_t>(result);
     return len < size ? len : size - 1;
+}
+
+// Whether a terminal would take the byte for a command. Names of files on a card may hold any.
+bool is_control(char byte) {
+    return (static_cast<unsigned char>(byte) < ' ' && byte != '\n' && byte != '\t') || byte == 0x7f;
 }
 
 // A program started with standard error closed would open some file or device in its
@@ -51,6 +58,10 @@ int __android_log_print(int prio, const char* tag, const char* fmt, ...) {
     va_end(args);
     while (len > text_start && line[len - 1] == '\n') {
         --len;
+    }
+    char* const control = std::find_if(line, line + len, is_control);
+    if (control != line + len && isatty(STDERR_FILENO)) {
+        std::replace_if(control, line + len, is_control, '?');
     }
     // The last byte of a full line was the terminating NUL, so this always fits.
     line[len++] = '\n';

@@ -2,10 +2,13 @@
 
 #include <android/log.h>
 #include <errno.h>
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <stdlib.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <string>
 
 #include "core/log.h"
@@ -59,6 +62,24 @@ TEST_F(Log, OneWriteAndOneLineFeedAMessage) {
     }
     __android_log_print(ANDROID_LOG_WARN, "other", "%d", 5);
     EXPECT_EQ(next(), "W/other(" + std::to_string(getpid()) + "): 5\n");
+}
+
+// A name on a card may hold anything; a file gets it as it is.
+TEST_F(Log, NoControlCharacterReachesATerminal) {
+    const char* const text = "a\x1b[2J\tb\x7f\nc \xc3\xa9";
+    __android_log_print(ANDROID_LOG_ERROR, "KESTCP", "%s", text);
+    EXPECT_EQ(next(), m_head + text + "\n");
+    const int master = posix_openpt(O_RDWR | O_NOCTTY);
+    ASSERT_EQ(grantpt(master) + unlockpt(master), 0);
+    const int slave = open(ptsname(master), O_RDWR | O_NOCTTY);
+    dup2(slave, STDERR_FILENO);
+    close(slave);
+    __android_log_print(ANDROID_LOG_ERROR, "KESTCP", "%s", text);
+    std::string line = m_head + "a?[2J\tb?\r\nc \xc3\xa9\r\n";
+    std::string got(line.size(), '\0');
+    got.resize(static_cast<size_t>(std::max<ssize_t>(read(master, got.data(), got.size()), 0)));
+    EXPECT_EQ(got, line);
+    close(master);
 }
 
 TEST_F(Log, LongTextIsCutButStillALine) {
