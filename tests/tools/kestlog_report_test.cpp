@@ -194,6 +194,9 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
     EXPECT_EQ(waveform["channels"][1][1000], -1000);
     EXPECT_EQ(waveform["channels"][1].size(), 1500u);
     EXPECT_TRUE(report(".")["spectra"].empty());
+    EXPECT_EQ(m_err, "");
+    report(". --until 2000-01-01" + pictures);
+    EXPECT_EQ(m_err, "kestlog: no I/Q captures to show\nkestlog: no PCM chunks to show\n");
     for (const char* wrong :
          {"--iq-rate 1", "--iq-rate 0 --iq-format ci8", "--iq-rate 1 --iq-format s8",
           "--pcm-rate 1 --pcm-format s8 --pcm-channels 17", "--pcm-channels 2"}) {

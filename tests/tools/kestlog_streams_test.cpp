@@ -390,6 +390,8 @@ TEST_F(KestlogStreamsTest, AFullOutputIsToldOnce) {
         m_err = m_root.read_file("err");
         EXPECT_EQ(m_err, "kestlog: standard output: No space left on device\n") << args;
     }
+    EXPECT_EQ(run("wav . --rate 8000 --channels 1 --format u8 --force -o /dev/full"), 4);
+    EXPECT_EQ(m_err, "kestlog: /dev/full: No space left on device\n");
     for (const std::string& args : {std::string("extract . -o -"), "split -o - " + DSP_LOG}) {
         EXPECT_EQ(run(args), 1);
         EXPECT_TRUE(complained("not standard output")) << m_err;

@@ -2,6 +2,7 @@
 
 #include "kestlog/WavFile.h"
 
+#include <errno.h>
 #include <string.h>
 
 #include <algorithm>
@@ -43,8 +44,9 @@ std::string wav_format_names() {
     return names;
 }
 
-bool WavFile::fail() {
-    m_error = sf_strerror(m_file);
+// With the system's reason where there is one: the library puts words of its own before it.
+bool WavFile::fail(const char* words) {
+    m_error = errno != 0 ? strerror(errno) : words;
     return false;
 }
 
@@ -55,9 +57,10 @@ bool WavFile::open(int fd, const WavFormat& format, int rate, int channels) {
     info.format = SF_FORMAT_RF64 | format.wav_format;
     m_format = &format;
     m_frame_bytes = format.bytes * static_cast<size_t>(channels);
+    errno = 0;
     m_file = sf_open_fd(fd, SFM_WRITE, &info, SF_FALSE);
     if (!m_file) {
-        return fail();
+        return fail(sf_strerror(nullptr));
     }
     // A plain WAV file, if in the end it is small enough.
     sf_command(m_file, SFC_RF64_AUTO_DOWNGRADE, nullptr, SF_TRUE);
@@ -97,8 +100,9 @@ bool WavFile::put(uint8_t* data, size_t len) {
         }
     }
     const sf_count_t want = static_cast<sf_count_t>(len);
+    errno = 0;
     if (len > 0 && sf_write_raw(m_file, data, want) != want) {
-        return fail();
+        return fail(sf_strerror(m_file));
     }
     m_frames += len / m_frame_bytes;
     return true;
@@ -111,10 +115,8 @@ size_t WavFile::drop_unfinished() {
 }
 
 bool WavFile::close() {
+    errno = 0;
     const int result = m_file ? sf_close(m_file) : 0;
     m_file = nullptr;
-    if (result != 0) {
-        m_error = sf_error_number(result);
-    }
-    return result == 0;
+    return result == 0 || fail(sf_error_number(result));
 }

@@ -46,7 +46,7 @@ public:
 
 private:
     bool put(uint8_t* data, size_t len);
-    bool fail();
+    bool fail(const char* words);
 
     SNDFILE* m_file = nullptr;
     const WavFormat* m_format = nullptr;

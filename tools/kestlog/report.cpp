@@ -85,5 +85,11 @@ int run_report(const CommandLine& line) {
         Progress::clear();
         printf("%s: %s\n", escape_text(out.path()).c_str(), report.words().c_str());
     }
+    if (options.iq && report.json()["spectra"].empty()) {
+        failure(ES_OK, "no I/Q captures to show");
+    }
+    if (options.pcm && report.json()["waveforms"].empty()) {
+        failure(ES_OK, "no PCM chunks to show");
+    }
     return report.status();
 }
