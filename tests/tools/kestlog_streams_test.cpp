@@ -76,106 +76,63 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
 }
 
 TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
-    const std::string copied = "copy/modem_log/2016-03-01-09-00-00/";
     const std::string three = chunk(5, LOG, "one") + chunk(6, PCM, "two") + chunk(7, DUMP, "3");
     struct Log {
-        std::string set, cp;
+        std::string set;
         int number;
         std::string time, content;
     };
+    const auto in = [](int number, const char* time, const std::string& content) {
+        return Log{INTERNAL, number, time, content};
+    };
+    const auto on_card = [](int number, const std::string& content) {
+        return Log{CARD_SET, number, "10-00-00", content};
+    };
+    const auto copied = [](const std::string& content) {
+        return Log{"copy/modem_log/2016-03-01-09-00-00/", 0, "09-00-00", content};
+    };
     const struct {
+        std::string cp;
         std::vector<Log> logs;
         std::string args;
         int status;
         std::string stream, words;
     } CASES[] = {
-        {{{INTERNAL, "cp_wcn", 5, "09-00-00", "a"},
-          {INTERNAL, "cp_wcn", 2, "09-20-00", "b"},
-          {INTERNAL, "cp_wcn", 1, "09-30-00", "c"},
-          {INTERNAL, "cp_wcn", 0, "09-40-00", "d"}},
-         "",
-         3,
-         "abcd",
-         "-00-00.log: damage: after it numbers 3 to 4 are missing\n"},
+        // clang-format off
+        {"cp_wcn", {in(5, "09-00-00", "a"), in(2, "09-20-00", "b"), in(1, "09-30-00", "c"), in(0, "09-40-00", "d")},
+         "", 3, "abcd", "-00-00.log: damage: after it numbers 3 to 4 are missing\n"},
         // What --until cuts off is not missing, what --since leaves is.
-        {{{INTERNAL, "cp_wcn", 2, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-20-00", "b"}},
-         "--until 09:10",
-         0,
-         "a",
-         ""},
+        {"cp_wcn", {in(2, "09-00-00", "a"), in(0, "09-20-00", "b")}, "--until 09:10", 0, "a", ""},
         // The oldest files are trimmed in each set; only the last file may lack a newer one.
-        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "a"}, {CARD_SET, "cp_wcn", 4, "10-00-00", "b"}},
-         "",
-         3,
-         "ab",
-         "09-00-00.log: damage: after it number 0 is missing\n"},
-        {{{CARD_SET, "cp_wcn", 1, "10-00-00", "b"}},
-         "",
-         0,
-         "b",
-         "10-00-00.log: note: after it number 0 is missing\n"},
-        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-00-00-1", "b"}},
-         "",
-         0,
-         "ba",
-         ""},
-        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "a"}, {INTERNAL, "cp_wcn", 0, "09-20-00", "b"}},
-         "",
-         3,
-         "ab",
-         "damage: two log files with this number\n"},
+        {"cp_wcn", {in(1, "09-00-00", "a"), on_card(4, "b")},
+         "", 3, "ab", "09-00-00.log: damage: after it number 0 is missing\n"},
+        {"cp_wcn", {on_card(1, "b")}, "", 0, "b", "10-00-00.log: note: after it number 0 is missing\n"},
+        {"cp_wcn", {in(0, "09-00-00", "a"), in(0, "09-00-00-1", "b")}, "", 0, "ba", ""},
+        {"cp_wcn", {in(0, "09-00-00", "a"), in(0, "09-20-00", "b")},
+         "", 3, "ab", "damage: two log files with this number\n"},
         // Copied while it grew, and before it was renumbered.
-        {{{INTERNAL, "cp_wcn", 1, "09-00-00", "abc"},
-          {INTERNAL, "cp_wcn", 0, "09-20-00", "d"},
-          {copied, "cp_wcn", 0, "09-00-00", "ab"}},
-         "",
-         3,
-         "abcd",
-         "copy/modem_log/2016-03-01-09-00-00/cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log"
-         ": damage: the beginning of ./data/modem_log/2016-03-01-09-00-00/cp_wcn/1-cp_wcn-"
-         "2016-03-01_09-00-00.log; left out\n"},
-        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "ab"}, {copied, "cp_wcn", 0, "09-00-00", "ab"}},
-         "",
-         3,
-         "ab",
-         "damage: a copy of "},
-        {{{INTERNAL, "cp_wcn", 0, "09-00-00", "ab"}, {copied, "cp_wcn", 0, "09-00-00", "xyz"}},
-         "",
-         3,
-         "abxyz",
-         "damage: started at the same second as "},
-        {{{INTERNAL, "cp_wcdma", 0, "09-00-00", TIME_RECORD.substr(0, 15)}},
-         "",
-         3,
-         "",
-         "damage: the time record is cut off (at byte 0)\n"},
-        {{{INTERNAL, "agdsp", 1, "09-00-00", TIME_RECORD + three.substr(0, 50)},
-          {INTERNAL, "agdsp", 0, "09-10-00", three}},
-         "",
-         3,
-         three.substr(0, 50) + three,
-         "damage: the last chunk is cut off (at byte 62)\n"},
-        {{{INTERNAL, "agdsp", 0, "09-00-00", three.substr(0, 50)},
-          {CARD_SET, "agdsp", 0, "10-00-00", three}},
-         "--kind pcm",
-         3,
-         "twotwo",
-         "damage: the last chunk is unfinished (at byte 46)\n"},
-        {{{INTERNAL, "agdsp", 1, "09-00-00", three}, {INTERNAL, "agdsp", 0, "09-10-00", three}},
-         "--kind log",
-         0,
-         "oneone",
-         "note: chunk 5 where 8 was expected (at byte 0)\n"},
-        {{{INTERNAL, "agdsp", 0, "09-00-00", chunk(5, DUMP, "a") + "~~~~\x1b" + three}},
-         "--kind dump",
-         3,
-         "a3",
-         "damage: wrong chunk header: mark (at byte 21)\n"},
-        {{{INTERNAL, "agdsp", 0, "09-00-00", three}}, "--kind sms", 1, "", "not log, pcm or dump"},
+        {"cp_wcn", {in(1, "09-00-00", "abc"), in(0, "09-20-00", "d"), copied("ab")}, "", 3, "abcd",
+         "copy/modem_log/2016-03-01-09-00-00/cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log: damage: the beginning of "
+         "./data/modem_log/2016-03-01-09-00-00/cp_wcn/1-cp_wcn-2016-03-01_09-00-00.log; left out\n"},
+        {"cp_wcn", {in(0, "09-00-00", "ab"), copied("ab")}, "", 3, "ab", "damage: a copy of "},
+        {"cp_wcn", {in(0, "09-00-00", "ab"), copied("xyz")},
+         "", 3, "abxyz", "damage: started at the same second as "},
+        {"cp_wcdma", {in(0, "09-00-00", TIME_RECORD.substr(0, 15))},
+         "", 3, "", "damage: the time record is cut off (at byte 0)\n"},
+        {"agdsp", {in(1, "09-00-00", TIME_RECORD + three.substr(0, 50)), in(0, "09-10-00", three)},
+         "", 3, three.substr(0, 50) + three, "damage: the last chunk is cut off (at byte 62)\n"},
+        {"agdsp", {in(0, "09-00-00", three.substr(0, 50)), on_card(0, three)},
+         "--kind pcm", 3, "twotwo", "damage: the last chunk is unfinished (at byte 46)\n"},
+        {"agdsp", {in(1, "09-00-00", three), in(0, "09-10-00", three)},
+         "--kind log", 0, "oneone", "note: chunk 5 where 8 was expected (at byte 0)\n"},
+        {"agdsp", {in(0, "09-00-00", chunk(5, DUMP, "a") + "~~~~\x1b" + three)},
+         "--kind dump", 3, "a3", "damage: wrong chunk header: mark (at byte 21)\n"},
+        {"agdsp", {in(0, "09-00-00", three)}, "--kind sms", 1, "", "not log, pcm or dump"},
+        // clang-format on
     };
     for (const auto& c : CASES) {
         for (const Log& log : c.logs) {
-            write_log(log.set, log.cp, log.number, log.time, log.content);
+            write_log(log.set, c.cp, log.number, log.time, log.content);
         }
         const std::string roots = m_root.exists("copy") ? ". copy " : ". ";
         EXPECT_EQ(run("join " + roots + c.args), c.status) << c.words << m_err;
