@@ -25,7 +25,8 @@ DiagReplyConsumer::DiagReplyConsumer(const char* cp_name, CpStorage* storage,
     : DataConsumer(cp_name, storage),
       m_exchange(exchange),
       m_read_timer(nullptr, exchange.read_timeout, this),
-      m_reply_timer(nullptr, on_no_reply, this) {}
+      m_reply_timer(nullptr, on_no_reply, this),
+      m_whole_timer(nullptr, on_no_reply, this) {}
 
 DiagReplyConsumer::~DiagReplyConsumer() {
     close_file();
@@ -34,6 +35,7 @@ DiagReplyConsumer::~DiagReplyConsumer() {
 void DiagReplyConsumer::stop_timers() {
     m_read_timer.stop();
     m_reply_timer.stop();
+    m_whole_timer.stop();
 }
 
 bool DiagReplyConsumer::create_result_file(android::String8& name, LogFile*& file) {
@@ -64,8 +66,9 @@ int DiagReplyConsumer::start_exchange(LogFile* file) {
     // The time-outs first: no request leaves whose exchange nothing would end.
     m_read_timer.bind(m_handler->multiplexer()->timer_mgr());
     m_reply_timer.bind(m_handler->multiplexer()->timer_mgr());
+    m_whole_timer.bind(m_handler->multiplexer()->timer_mgr());
     if (m_read_timer.start(READ_TIMEOUT_MS) < 0 || m_reply_timer.start(REPLY_TIMEOUT_MS) < 0 ||
-        !send_request()) {
+        m_whole_timer.start(WHOLE_TIMEOUT_MS) < 0 || !send_request()) {
         stop_timers();
         discard_file();
         return -1;
@@ -118,11 +121,11 @@ bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
 DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame, size_t len) {
     DiagHeader header;
     if (len < sizeof(header)) {
-        return NOT_OURS;
+        return NOTHING;
     }
     memcpy(&header, frame, sizeof(header));
     if (header.type != m_exchange.diag_type) {
-        return NOT_OURS;
+        return NOTHING;
     }
     if (header.sub_type == REPLY_NOT_SERVED) {
         discard_file();
@@ -158,7 +161,7 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
         end(LPR_FAILURE);
         return ENDED;
     }
-    return TAKEN;
+    return payload > 0 ? TAKEN : NOTHING;
 }
 
 void DiagReplyConsumer::end(LogProcResult result) {
@@ -167,7 +170,8 @@ void DiagReplyConsumer::end(LogProcResult result) {
 }
 
 bool DiagReplyConsumer::end_by_timeout() {
-    if (m_reply_timer.pending() && goes_on(m_read_timer, READ_TIMEOUT_MS)) {
+    if (m_reply_timer.pending() && m_whole_timer.pending() &&
+        goes_on(m_read_timer, READ_TIMEOUT_MS)) {
         return false;
     }
     stop_timers();

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // What the ring buffer and the sleep log consumers share: one request frame to the CP,
 // the payload of its data frames into a file, until an end frame, a refusal, an error, a
-// silence of 3 seconds or 30 seconds of frames that are no answer. Owned by the channel for
-// one transaction.
+// silence of 3 seconds, 30 seconds of frames that are no answer, or 10 minutes. Owned by the
+// channel for one transaction.
 #ifndef CHANNELS_DIAGREPLYCONSUMER_H_
 #define CHANNELS_DIAGREPLYCONSUMER_H_
 
@@ -15,6 +15,8 @@ public:
     static constexpr unsigned int READ_TIMEOUT_MS = 3000;
     // A CP that logs on the same device may never fall silent and never answer.
     static constexpr unsigned int REPLY_TIMEOUT_MS = 30000;
+    // Nor is what never ends an answer.
+    static constexpr unsigned int WHOLE_TIMEOUT_MS = 10 * 60 * 1000;
 
     ~DiagReplyConsumer() override;
 
@@ -48,7 +50,7 @@ protected:
     bool end_by_timeout();
 
 private:
-    enum Outcome { NOT_OURS, TAKEN, ENDED };
+    enum Outcome { NOTHING, TAKEN, ENDED };
 
     static void on_no_reply(void* consumer);
 
@@ -61,6 +63,7 @@ private:
     DiagFrameParser m_parser;
     OneShotTimer m_read_timer;   // until the next chunk
     OneShotTimer m_reply_timer;  // until the next frame of this exchange
+    OneShotTimer m_whole_timer;  // until the end frame
     ObjectRef<LogFile> m_file;
 };
 

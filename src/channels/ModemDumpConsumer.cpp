@@ -21,16 +21,18 @@ ModemDumpConsumer::ModemDumpConsumer(const char* cp_name, CpStorage* storage,
                                      const struct tm& dump_time, const char* mem_path)
     : CpDumpConsumer(cp_name, storage, dump_time),
       m_mem_path(mem_path),
-      m_read_timer(nullptr, dump_read_timeout, this) {}
+      m_read_timer(nullptr, dump_read_timeout, this),
+      m_whole_timer(nullptr, dump_does_not_end, this) {}
 
 ModemDumpConsumer::~ModemDumpConsumer() {
     m_storage->unsubscribe_ext_stor_umount_evt(this);
 }
 
 int ModemDumpConsumer::start() {
-    // The time-out first: no request leaves whose dump nothing would end.
+    // The time-outs first: no request leaves whose dump nothing would end.
     m_read_timer.bind(m_handler->multiplexer()->timer_mgr());
-    if (m_read_timer.start(READ_TIMEOUT_MS) < 0) {
+    m_whole_timer.bind(m_handler->multiplexer()->timer_mgr());
+    if (m_read_timer.start(READ_TIMEOUT_MS) < 0 || m_whole_timer.start(WHOLE_TIMEOUT_MS) < 0) {
         return -1;
     }
     if (write(m_handler->fd(), DUMP_REQUEST, sizeof(DUMP_REQUEST)) !=
@@ -77,7 +79,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
         if (end) {
             m_handler->del_events(POLLIN);
             close_dump_file();
-            m_read_timer.stop();
+            stop_timers();
             notify_result(LPR_SUCCESS);
             info_log("dump complete");
         }
@@ -86,7 +88,7 @@ bool ModemDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     {
         const SavedErrno write_errno;
         discard_dump_file();
-        m_read_timer.stop();
+        stop_timers();
     }
     err_log("need to write %lu, write returns %d", static_cast<unsigned long>(len),
             static_cast<int>(written));
@@ -99,9 +101,23 @@ void ModemDumpConsumer::dump_read_timeout(void* param) {
     if (consumer->goes_on(consumer->m_read_timer, READ_TIMEOUT_MS)) {
         return;
     }
+    consumer->stop_timers();
     consumer->discard_dump_file();
     err_log("read timeout");
     consumer->notify_result(consumer->save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);
+}
+
+void ModemDumpConsumer::dump_does_not_end(void* param) {
+    ModemDumpConsumer* consumer = static_cast<ModemDumpConsumer*>(param);
+    consumer->m_read_timer.stop();
+    consumer->discard_dump_file();
+    err_log("no end of the dump");
+    consumer->notify_result(consumer->save_dump_file() ? LPR_SUCCESS : LPR_FAILURE);
+}
+
+void ModemDumpConsumer::stop_timers() {
+    m_read_timer.stop();
+    m_whole_timer.stop();
 }
 
 bool ModemDumpConsumer::save_dump_file() {
@@ -128,7 +144,7 @@ void ModemDumpConsumer::on_ext_stor_umount(void* param) {
     if (!consumer->dump_on_sd()) {
         return;
     }
-    consumer->m_read_timer.stop();
+    consumer->stop_timers();
     info_log("SD card is gone, the dump of %s ends", consumer->m_cp_name);
     consumer->notify_result(LPR_FAILURE);
 }

@@ -36,9 +36,10 @@ protected:
                pump([&] { return diag_dev.received() == frame(kind.type, 0); });
     }
     // The CP's log goes on over the diag device, once a second.
-    void log_for(int seconds) {
+    void log_for(int seconds) { send_for(seconds, frame(0x98, 'd', "log")); }
+    void send_for(int seconds, const std::string& what) {
         for (int i = 0; i < seconds; ++i) {
-            EXPECT_TRUE(supply(diag_dev, frame(0x98, 'd', "log")));
+            EXPECT_TRUE(supply(diag_dev, what));
             run_clock(1000);
         }
     }
@@ -145,6 +146,23 @@ TEST_F(DiagReplyTest, ACpThatOnlyLogsFailsThirtySecondsAfterItsLastAnswer) {
     EXPECT_EQ(hear(*client, "ERROR 3\n"), "ERROR 3\n");
     EXPECT_EQ(result_file(kind), "part");
     EXPECT_EQ(log.count(kind.timeout), 1u);
+}
+
+TEST_F(DiagReplyTest, AnAnswerThatNeverEndsIsNone) {
+    const Kind& kind = KINDS[0];
+    const struct {
+        const char* payload;
+        int seconds;
+    } cases[] = {{"", 30}, {"x", 600}};
+    for (const auto& c : cases) {
+        ASSERT_NO_FATAL_FAILURE(begin(false));
+        ASSERT_TRUE(request(kind));
+        send_for(c.seconds - 1, frame(kind.type, 'd', c.payload));
+        EXPECT_EQ(modem()->state(), CWS_SAVE_RINGBUF);
+        run_clock(1000);
+        EXPECT_EQ(hear(*client, "ERROR 3\n"), "ERROR 3\n") << c.seconds;
+        end_service();
+    }
 }
 
 }  // namespace

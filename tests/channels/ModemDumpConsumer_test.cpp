@@ -65,6 +65,22 @@ TEST_F(ModemDumpTest, AFileThatWentUnderTheDumpDoesNotCount) {
     EXPECT_EQ(ctrl->stor_mgr().get_media_stor()->size(), size);
 }
 
+// A modem that does not know the request goes on to log on the device.
+TEST_F(ModemDumpTest, AStreamThatNeverEndsIsNoDump) {
+    boot_modem(true);
+    ASSERT_TRUE(both_log("<start>"));
+    ASSERT_TRUE(begin_dump());
+    for (int seconds = 2; seconds < 1800; seconds += 2) {
+        run_clock(2000);
+        ASSERT_TRUE(supply(diag_dev, frame(0x98, 'd', "log")));
+    }
+    EXPECT_EQ(modem()->state(), CWS_DUMP);
+    run_clock(2000);
+    EXPECT_EQ(modem()->state(), CWS_NOT_WORKING);
+    EXPECT_TRUE(log.has("dump_does_not_end(void*): no end of the dump ["));
+    EXPECT_TRUE(files() == (Files{{"data:" + DUMP_NAME + ".mem", MEMORY}}));
+}
+
 // The medium refuses the dump or the file goes away under it.
 TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
     const Files on_card{{"sd:" + DUMP_NAME + ".dmp", std::string(64000, 'x')}};
