@@ -48,6 +48,8 @@ void LogPipeHandler::process_assert(bool save_md) {
         m_state = CWS_NOT_WORKING;
         return;
     }
+    // With all logs off nothing else would: a CP that crashes again and again filled the medium.
+    m_storage->check_quota(MT_NONE);
     LogController::save_dipx_dump(m_storage, t);
     if (save_md) {
         m_log_ctrl->save_mini_dump(m_storage, t, m_type);

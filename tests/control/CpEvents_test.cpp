@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
 #include "sim/SimSupervisor.h"
+#include "storage/MediaStorage.h"
 #include "support/ServiceFixture.h"
 
 namespace {
@@ -31,6 +32,20 @@ TEST_F(CpEventsTest, EventsForNobody) {
     EXPECT_TRUE(log.has("CpEvent): kestcp: unknown MODEM type 1 asserts ["));
     ctrl->process_cp_evt(CT_WANMODEM, static_cast<CpStateHandler::CpEvent>(4));
     EXPECT_TRUE(log.has("CpEvent): unknown event 4 ["));
+}
+
+// With its log off a modem that crashed again and again filled the medium.
+TEST_F(CpEventsTest, CrashesKeepTheQuota) {
+    root.write_file("d/dipx/smsg", std::string(100000, 's'));
+    ASSERT_NO_FATAL_FAILURE(boot_supervised());
+    const CpType type = CT_WCDMA;
+    ASSERT_EQ(ctrl->disable_log(&type, 1) + ctrl->set_data_part_size(1), 0);
+    for (int i = 0; i < 15; ++i) {
+        modem()->process_assert(false);
+        modem()->process_alive();
+    }
+    EXPECT_LE(ctrl->stor_mgr().get_media_stor()->size(), (1u << 20) + 100002);
+    EXPECT_GT(files().size(), 2u);
 }
 
 TEST_F(CpEventsTest, NoControlServer) {
