@@ -5,6 +5,7 @@
 #include <errno.h>
 
 #include "core/SavedErrno.h"
+#include "core/log.h"
 #include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/MediaStorage.h"
@@ -18,14 +19,27 @@ CpStorage::~CpStorage() {
 
 void CpStorage::stop() {
     if (m_cur_file) {
+        write_out();
         m_cur_file->close();
         m_cur_file = nullptr;
     }
 }
 
+// False when blocks that were taken are lost.
+bool CpStorage::write_out() {
+    if (m_cur_file->write_out() == 0) {
+        return true;
+    }
+    err_log("what %s had staged is lost", m_channel->name().string());
+    return false;
+}
+
 void CpStorage::flush() {
-    if (m_cur_file) {
-        m_cur_file->flush();
+    if (m_cur_file && !write_out()) {
+        // The medium hears of it as of a write: a failing card to which each block is only
+        // staged, and lost as it is flushed, would else stay in use for ever.
+        MediaStorage* media = m_cur_file->media();
+        errno == ENOSPC ? make_room(media) : m_manager->write_failed(media, errno);
     }
 }
 
@@ -52,8 +66,11 @@ int CpStorage::write(const void* data, size_t len) {
 
 void CpStorage::close_full_file(const MediaStorage* media) {
     if (m_cur_file->size() >= media->file_size()) {
-        m_cur_file->dir()->close_log_file();
-        stop();
+        flush();
+        if (m_cur_file) {
+            m_cur_file->dir()->close_log_file();
+            stop();
+        }
     }
 }
 
@@ -104,6 +121,7 @@ bool CpStorage::prepare_write(size_t len) {
 // False while the medium is above its quota after an earlier write.
 bool CpStorage::pass_quota(MediaStorage* media) {
     if (m_quota_pending && media->check_quota() != 0 && !media->make_room_with_new_set()) {
+        errno = EDQUOT;  // for who reports the block that is lost
         return false;
     }
     m_quota_pending = false;

@@ -63,6 +63,7 @@ public:
     LogFile* current_file() const { return m_cur_file.get(); }
 
 private:
+    bool write_out();
     bool prepare_write(size_t len);
     void close_full_file(const MediaStorage* media);
     void keep_quota(MediaStorage* media);

@@ -73,7 +73,8 @@ public:
     // nothing below it is made, scanned or deleted: on a card it could lead anywhere.
     bool leads_away() const;
 
-    // True when a file can be made in the log root and written now: makes one and deletes it.
+    // True when a file can be made in the log root and written now: makes one and deletes it. Also
+    // when the medium is full: whoever makes a set or a file there makes room.
     bool can_make_files() const;
 
     void add_size(uint64_t num) { m_size += num; }

@@ -89,6 +89,7 @@ TEST_F(CpStorageTest, SparedFilesDoNotEndTheLogging) {
     for (int i = 0; i < 30; ++i) {
         write_later(block);
     }
+    EXPECT_EQ(errno, EDQUOT);
     EXPECT_FALSE(log.has(forced));
 }
 

@@ -37,6 +37,68 @@ TEST_F(FailingMediumTest, WantOfDescriptorsKeepsTheCard) {
     EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
 }
 
+bool on_card(int fd) {
+    char path[500] = "";
+    const ssize_t len = readlink(("/proc/self/fd/" + std::to_string(fd)).c_str(), path, 499);
+    return len > 0 && strstr(path, "/sd/") != nullptr;
+}
+
+// Each block was staged and then lost by a flush, which nobody asked how it went: nothing was
+// logged any more, and nothing told it.
+TEST_F(FailingMediumTest, ACardToWhichBlocksAreOnlyStagedIsLeft) {
+    for (const bool asked : {false, true}) {
+        plug_card();
+        m_mgr.set_sd_size(asked ? 1000000 : 50000);
+        EXPECT_EQ(lost_of(1, std::string(20000, 'x')), 0);
+        EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+        faults::instead.write = [](int fd, const void* data, size_t len) {
+            return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
+        };
+        LogCapture log;
+        for (int i = 0; i < 5; ++i) {
+            EXPECT_EQ(lost_of(1, std::string(20000, 'x')), 0);
+            if (asked) {
+                m_store->flush();
+            }
+        }
+        EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL) << asked;
+        EXPECT_EQ(log.count("what cp_gnss had staged is lost ["), 1u) << log.text();
+        EXPECT_GE(internal().size(), 40000u);
+        faults::instead = {};
+        pull_card();
+        lost_of(1, "x");
+    }
+}
+
+// A card that failed once, and on which then a directory has the name of the file that is to
+// show that it works again, or which is full.
+TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
+    plug_card();
+    m_root.make_dir("sd/modem_log/.write_test");
+    const std::string block(70000, 'x');
+    faults::fail(faults::WRITE, 1, EIO);
+    EXPECT_EQ(lost_of(2, block), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+    pull_card();
+    m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp_gnss/old", block);
+    m_mgr.set_file_size(70000);
+    EXPECT_EQ(lost_of(1, block), 0);
+    plug_card();
+    faults::fail(faults::WRITE, 1, EIO);
+    EXPECT_EQ(lost_of(1, block), 1);
+    bool full = true;
+    faults::instead.write = [&](int fd, const void* data, size_t len) {
+        return full && on_card(fd) ? (errno = ENOSPC, ssize_t{-1}) : real::write(fd, data, len);
+    };
+    faults::instead.unlink = [&](const char* path) {
+        full = full && !strstr(path, "/old");
+        return real::unlink(path);
+    };
+    EXPECT_EQ(lost_of(2, block), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+    faults::instead = {};
+}
+
 // A broken medium may say of every name that it is taken.
 TEST_F(FailingMediumTest, NamesAreNotTriedForEver) {
     faults::fail(faults::OPEN, 1, EEXIST, faults::FOREVER);
