@@ -15,7 +15,12 @@ int refuse(int fd, int error) {
     return -1;
 }
 
-int open_checked(const char* path, int flags, Links links, bool block_device_too) {
+// Raw flash, unlike any other character device.
+bool has_size(int fd) {
+    return lseek(fd, 0, SEEK_END) > 0 && lseek(fd, 0, SEEK_SET) == 0;
+}
+
+int open_checked(const char* path, int flags, Links links, bool partitions_too) {
     const int no_follow = links == Links::REFUSE ? O_NOFOLLOW : 0;
     // Nothing is cut before it is known what was opened.
     const int fd =
@@ -27,7 +32,8 @@ int open_checked(const char* path, int flags, Links links, bool block_device_too
     if (fstat(fd, &st) < 0) {
         return refuse(fd, errno);
     }
-    if (!S_ISREG(st.st_mode) && !(block_device_too && S_ISBLK(st.st_mode))) {
+    const bool partition = S_ISBLK(st.st_mode) || (S_ISCHR(st.st_mode) && has_size(fd));
+    if (!S_ISREG(st.st_mode) && !(partitions_too && partition)) {
         return refuse(fd, S_ISDIR(st.st_mode) ? EISDIR : EINVAL);
     }
     const bool writes = (flags & O_ACCMODE) != O_RDONLY;

@@ -11,9 +11,9 @@
 // /data/local/tmp: it may be another file's.
 enum class Links { FOLLOW, REFUSE };
 
-// Opens a regular file or a block device for reading, with the blocking mode of an ordinary
-// open. The descriptor, which the caller owns, or -1 with errno: EISDIR for a directory,
-// EINVAL for a file of another kind, ELOOP for a link refused.
+// Opens a regular file or a partition (a block device or raw flash) for reading, with the blocking
+// mode of an ordinary open. The descriptor, which the caller owns, or -1 with errno: EISDIR for a
+// directory, EINVAL for a file of another kind, ELOOP for a link refused.
 int open_to_read(const char* path, Links links);
 
 // Opens a regular file for writing; flags are those of open() (O_RDWR or O_WRONLY, with

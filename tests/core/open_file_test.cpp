@@ -11,6 +11,7 @@
 #include <string>
 
 #include "support/TestRoot.h"
+#include "support/faults.h"
 
 namespace {
 
@@ -52,6 +53,17 @@ TEST(OpenFile, TakesOnlyWhatCanBeReadToAnEnd) {
             close(out);
         }
     }
+    // Raw flash is a character device that has a size.
+    faults::instead.fstat = [](int fd, struct stat* st) {
+        const int result = real::fstat(fd, st);
+        st->st_mode = (st->st_mode & ~S_IFMT) | S_IFCHR;
+        return result;
+    };
+    const int flash = open_to_read(root.path("file").c_str(), Links::REFUSE);
+    EXPECT_EQ(lseek(flash, 0, SEEK_CUR), 0);
+    EXPECT_EQ(open_to_write(root.path("file").c_str(), O_WRONLY, Links::REFUSE), -1);
+    faults::instead = {};
+    close(flash);
     EXPECT_EQ(open_to_write(root.path("hard").c_str(), O_WRONLY | O_TRUNC, Links::REFUSE), -1);
     EXPECT_EQ(root.read_file("twice"), "content") << "not cut before it was refused";
     const mode_t mask = umask(0);
