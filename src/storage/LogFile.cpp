@@ -196,7 +196,11 @@ int LogFile::copy(const char* source) {
         return -1;
     }
     uint64_t copied;
-    const int result = copy_bytes(src, m_fd, m_buffer.get(), m_capacity, UINT64_MAX, copied);
+    int result = copy_bytes(src, m_fd, m_buffer.get(), m_capacity, MAX_COPY, copied);
+    if (copied == MAX_COPY) {
+        errno = EFBIG;
+        result = -1;
+    }
     const SavedErrno keep;
     grow(copied);
     ::close(src);

@@ -77,8 +77,9 @@ public:
     void found(uint64_t bytes);
 
     // Fills this freshly opened file with the source file's content. 0 or -1; what was
-    // copied before a failure stays and counts.
+    // copied before a failure stays and counts. EFBIG when it has no end within MAX_COPY.
     int copy(const char* source);
+    static constexpr uint64_t MAX_COPY = 0xFFFFFFFF;
 
     // Adds 1 to the number at the head of the name, on the medium and here. 0 or -1.
     int rotate(const android::String8& dir_path);

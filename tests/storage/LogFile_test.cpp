@@ -77,6 +77,18 @@ TEST_F(LogFileTest, OpenAndClosed) {
     EXPECT_EQ(open_descriptors(), before);
 }
 
+// A file of the kernel may say the same for ever.
+TEST_F(LogFileTest, ACopyHasAnEnd) {
+    LogFile* file = make();
+    m_root.write_file("mem", "x");
+    faults::instead.read = [](int, void*, size_t len) { return static_cast<ssize_t>(len); };
+    faults::instead.write = [](int, const void*, size_t len) { return static_cast<ssize_t>(len); };
+    EXPECT_EQ(file->copy(m_root.path("mem").c_str()), -1);
+    faults::instead = {};
+    EXPECT_EQ(errno, EFBIG);
+    EXPECT_EQ(file->counted(), 0xFFFFFFFFu);
+}
+
 TEST_F(LogFileTest, RotateRenumberRemove) {
     const struct {
         std::string number, next;
