@@ -27,6 +27,9 @@ void complete_dump(int fd) {
 // How long the driver may take for the next part of a dump, and a step of that time.
 constexpr int DUMP_PATIENCE_MS = 3000;
 constexpr int DUMP_STEP_MS = 10;
+// More no dump has, in all, nor does it wait so long: the loop serves nothing else meanwhile.
+constexpr uint64_t MAX_DUMP = 512u << 20;
+constexpr int MAX_WAITED_MS = 60000;
 // In a row; a device whose every read is interrupted has failed.
 constexpr int MAX_INTERRUPTIONS = 300;
 
@@ -154,6 +157,8 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
         return;
     }
     bool stored = false;
+    uint64_t total = 0;
+    int all_waited_ms = 0;
     int waited_ms = 0;      // since the last data
     int interruptions = 0;  // likewise
     for (;;) {
@@ -168,9 +173,10 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
                 notifier->note_read(false);
                 return;
             }
-            if (waited_ms < DUMP_PATIENCE_MS) {
+            if (waited_ms < DUMP_PATIENCE_MS && all_waited_ms < MAX_WAITED_MS) {
                 await_dump(notifier->fd(), waited_ms == 0);
                 waited_ms += DUMP_STEP_MS;
+                all_waited_ms += DUMP_STEP_MS;
                 continue;
             }
         }
@@ -187,6 +193,11 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
             break;
         }
         stored = true;
+        total += len;
+        if (total >= MAX_DUMP) {
+            err_log("no end of the AG-DSP dump");
+            break;
+        }
         waited_ms = 0;
         interruptions = 0;
     }

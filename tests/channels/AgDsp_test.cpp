@@ -73,6 +73,31 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
     EXPECT_TRUE(log.has("save_dump(FileNotifier*): read AG-DSP dump device error [11("));
 }
 
+// It held the service for ever, and pushed all logs out of their quota.
+TEST_F(AgDspTest, ADumpWithoutAnEndIsEnded) {
+    const auto device_read = faults::instead.read;
+    faults::instead.read = [&](int fd, void* data, size_t len) {
+        const ssize_t n = device_read(fd, data, len);
+        return len == 32748 && n > 0 ? static_cast<ssize_t>(len) : n;
+    };
+    mem.script_reads(FakeDevice::Steps(17000, {"x", 0}));
+    ASSERT_TRUE(pump([&] { return mem.count(COMPLETE) == 1; }));
+    EXPECT_EQ(mem.reads_left(), 17000 - (512u << 20) / 32748 - 1);
+    EXPECT_TRUE(log.has("save_dump(FileNotifier*): no end of the AG-DSP dump ["));
+    // Nor may it take a minute for a little.
+    FakeDevice::Steps slow;
+    for (int i = 0; i < 30; ++i) {
+        slow.push_back({"y", 0});
+        slow.insert(slow.end(), 299, {"", EAGAIN});
+    }
+    faults::instead.read = device_read;
+    faults::instead.usleep = [](useconds_t) { return 0; };
+    mem.script_reads(slow);
+    ASSERT_TRUE(pump([&] { return mem.count(COMPLETE) == 2; }));
+    EXPECT_GE(mem.reads_left(), 2900u);
+    faults::instead.usleep = nullptr;
+}
+
 TEST_F(AgDspTest, AFailingStorageEndsADumpWithItsCompletion) {
     const std::string big = pattern_bytes(32748, 3);
     // Of a write that is short: the rest of the dump is not read.
