@@ -4,6 +4,7 @@
 
 #include <errno.h>
 
+#include "core/SavedErrno.h"
 #include "core/log.h"
 #include "storage/CpStorage.h"
 
@@ -59,7 +60,17 @@ bool CpDumpConsumer::dump_file_there() {
 }
 
 int CpDumpConsumer::write_out_dump_file() {
-    return dump_file_there() ? m_dump_file->write_out() : -1;
+    return checked(dump_file_there() ? m_dump_file->write_out() : -1);
+}
+
+// What is saved instead of a dump that could not be written goes to the other medium when this
+// one fails.
+int CpDumpConsumer::checked(ssize_t result) {
+    if (result == -1 && m_dump_file && errno != ENOSPC) {
+        const SavedErrno keep;
+        m_storage->write_failed(m_dump_file->media(), errno);
+    }
+    return static_cast<int>(result);
 }
 
 bool CpDumpConsumer::dump_on_sd() const {
@@ -73,5 +84,5 @@ void CpDumpConsumer::discard_dump_file() {
 }
 
 ssize_t CpDumpConsumer::write_dump(const void* data, size_t len) {
-    return dump_file_there() ? m_dump_file->write(data, len) : -1;
+    return checked(dump_file_there() ? m_dump_file->write(data, len) : -1);
 }

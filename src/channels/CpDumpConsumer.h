@@ -39,6 +39,7 @@ private:
     // The file may have gone with its set or its medium, been trimmed or deleted: false with
     // a message then, errno ENOENT and nothing of it left in lists and totals.
     bool dump_file_there();
+    int checked(ssize_t result);
     android::String8 file_name(const char* extension) const;
 
     struct tm m_dump_time;

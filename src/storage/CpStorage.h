@@ -51,6 +51,9 @@ public:
     // Trims the medium to its quota. 0 when it is within it now or there is no such
     // medium, else -1.
     int check_quota(MediaType media);
+    // Another file than the log could not be written, for the reason error: as after a failed
+    // write of the log, an SD card is left for now.
+    void write_failed(MediaStorage* media, int error);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
     void unsubscribe_media_change_evt(void* client);

@@ -108,6 +108,9 @@ TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
          ": dump file of cp_wcdma is gone\n", copy},
         {"unmounted", true, [&] { set_card(false); }, "",
          ": SD card is gone, the dump of cp_wcdma ends\n", on_card},
+        {"the card fails", true,
+         [] { faults::fail(faults::WRITEV, 1, EIO), faults::fail(faults::WRITE, 1, EIO); }, more,
+         "returns -1 [5(", copy},
         {"full, unmounted", true, [&] { set_card(false), full(); }, more, "returns -2 [28(", copy},
     };
     for (const auto& c : cases) {
