@@ -56,6 +56,19 @@ int LogPipeHandler::open_dev() {
     return m_fd < 0 ? -1 : 0;
 }
 
+// The driver of a CP that was reset may have hung up the descriptor for good: one that gave
+// nothing when it was last read is replaced. The new one is opened first, so that what waits in
+// the device survives.
+void LogPipeHandler::renew_dev() {
+    if (m_fd >= 0 && idle_wakeups() > 0) {
+        const int old = m_fd;
+        del_events(POLLIN);
+        m_fd = -1;
+        open_dev();
+        ::close(old);
+    }
+}
+
 void LogPipeHandler::close_dev() {
     if (m_fd >= 0) {
         del_events(POLLIN);

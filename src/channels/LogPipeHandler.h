@@ -118,6 +118,7 @@ protected:
     // Opens the log device; 0 or -1. Nothing happens when it is open.
     int open_dev();
     void close_dev();
+    void renew_dev();
     // A wake-up in which the log device gave nothing. On a failed read, with its errno, the
     // device is closed and opened again, now or in a while.
     void dev_gave_nothing();

@@ -88,6 +88,7 @@ void LogPipeHandler::process_alive() {
     if (!m_enabled) {
         return;
     }
+    renew_dev();
     note_alive();  // what the device came to before does not count
     if (open_dev() < 0) {
         err_log("kestcp: open %s error", m_name.string());

@@ -62,6 +62,36 @@ TEST_F(LogPipeHandlerTest, ReopensADeviceThatFailedOrWasMissing) {
     EXPECT_EQ(open_descriptors(), before + 1) << "the FIFO of this test";
 }
 
+// A CP that the handset resets keeps its device open; a driver that had hung it up gave nothing
+// any more until the log was switched off and on.
+TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnewWhenTheCpIsAlive) {
+    const std::string name = root.path("gnss");
+    const auto connect = [&] {
+        auto device = std::make_unique<Pty>();
+        unlink(name.c_str());
+        EXPECT_EQ(symlink(device->path().c_str(), name.c_str()), 0);
+        return device;
+    };
+    const auto feed = [&](const Pty& device, const char* data) {
+        return device.put(data) && pump([&] { return device.pending() == 0; });
+    };
+    auto device = connect();
+    ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
+    gnss = ctrl->get_cp(CT_GNSS);
+    ASSERT_TRUE(feed(*device, "one"));
+    const size_t descriptors = open_descriptors();
+    gnss->process_alive();
+    EXPECT_TRUE(feed(*device, "two")) << "kept: it works";
+    device.reset();
+    ASSERT_TRUE(pump([&] { return log.has("read returns 0"); }));
+    device = connect();
+    gnss->process_alive();
+    EXPECT_TRUE(feed(*device, "three"));
+    EXPECT_EQ(open_descriptors(), descriptors);
+    ctrl.reset();
+    EXPECT_EQ(content("cp_gnss"), "onetwothree");
+}
+
 // No timer can be made then: the device stayed closed for good.
 TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
     boot_clock::fail();
