@@ -144,6 +144,7 @@ struct State {
     bool faulted;  // fault_seen, at any time in the run
     Setting settings[SETTING_COUNT];
     bool save_failed;       // the settings file may be older than the settings
+    bool save_cut;          // a write to it failed or took a part only, in this pass
     uint32_t time_answers;  // TimeAnswers
     bool supervisor_gone[2];
     bool cp_reset[2];

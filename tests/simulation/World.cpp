@@ -67,7 +67,7 @@ void World::pump() {
 }
 
 void World::pass_ends(bool idle) {
-    g_state->fault_in_step = false;
+    g_state->fault_in_step = g_state->save_cut = false;
     g_state->pass_calls = g_state->counters.calls;
     m_idle_passes = idle ? m_idle_passes + 1 : 0;
 }
@@ -163,6 +163,11 @@ void World::service_dies() {
     if (g_state->save_failed || !m_clients.quiet()) {
         no_setting_is_certain();
     }
+    if (g_state->save_cut) {
+        // Lines of two files may stand in it: a write of which the system takes a part, and a
+        // kill before the rest. Its owner has to throw it away.
+        unlink((m_root + SETTINGS_PATH).c_str());
+    }
 }
 
 void World::rule_fired(Call call, Place place) {
@@ -172,6 +177,7 @@ void World::rule_fired(Call call, Place place) {
     }
     g_state->scan_failed =
         g_state->scan_failed || call == CALL_OPENDIR || call == CALL_READDIR || call == CALL_STAT;
+    g_state->save_cut = g_state->save_cut || (call == CALL_WRITE && place == PLACE_SETTINGS);
     if (call == CALL_WRITE && place == PLACE_SOCKET) {
         g_state->reply_lost = true;
     }

@@ -25,6 +25,8 @@ class LogController;
 constexpr int64_t NS_PER_MS = 1000000;
 constexpr int64_t START_NS = int64_t{100} * 1000000000;
 
+constexpr char SETTINGS_PATH[] = "/data/local/tmp/kestmodem/kest_modem.conf";
+
 class World {
 public:
     // Makes the handset's files at the root, for the first life.

@@ -64,7 +64,7 @@ void World::check_settings() const {
     if (g_state->faulted || g_state->save_failed || !m_clients.quiet()) {
         return;
     }
-    std::ifstream in(m_root + "/data/local/tmp/kestmodem/kest_modem.conf");
+    std::ifstream in(m_root + SETTINGS_PATH);
     for (std::string line; std::getline(in, line);) {
         for (unsigned i = SET_FILE_MB; i <= SET_CARD_MB; ++i) {
             const Setting& setting = g_state->settings[i];
