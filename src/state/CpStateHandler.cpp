@@ -71,6 +71,9 @@ void CpStateHandler::connection_lasts(void* handler) {
 }
 
 int CpStateHandler::process_data() {
+    if (!m_young_timer.pending()) {
+        note_alive();
+    }
     char text[4 * BUFFER_SIZE + 1];
     make_line(m_buffer.get(), m_data_len, text);
     info_log("%u bytes: %s", static_cast<unsigned int>(m_data_len), text);

@@ -103,6 +103,26 @@ TEST_F(CpStateHandlerTest, SupervisorThatClosesAtOnce) {
     EXPECT_EQ(log.count("gave nothing"), 1u);
 }
 
+// Ten readings in weeks that came to nothing made it rest with each further one: messages that
+// arrive meanwhile are one.
+TEST_F(CpStateHandlerTest, IdleReadingsCountInARowOnly) {
+    boot_clock::freeze();
+    connect(*modem);
+    boot_clock::advance(6000);
+    pump_once(loop);
+    bool nothing = false;
+    faults::instead.read = [&](int fd, void* data, size_t len) {
+        nothing = fd == modem->fd() && !nothing;
+        return nothing ? (errno = EAGAIN, ssize_t{-1}) : real::read(fd, data, len);
+    };
+    for (int i = 0; i < 12; ++i) {
+        EXPECT_EQ(say("Modem Alive", "11 bytes: Modem Alive"), CWS_WORKING);
+    }
+    EXPECT_FALSE(modem->resting());
+    EXPECT_EQ(modem->idle_wakeups(), 0u);
+    faults::instead = {};
+}
+
 TEST_F(CpStateHandlerTest, ReconnectsAtOnceAndLeaksNothing) {
     connect(*modem);
     const size_t descriptors = open_descriptors();
