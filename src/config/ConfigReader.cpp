@@ -2,10 +2,19 @@
 
 #include "config/ConfigReader.h"
 
+#include <errno.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "core/SavedErrno.h"
 #include "core/open_file.h"
+
+namespace {
+
+// A thousand times what anybody needs. All of it is read while the loop waits.
+constexpr off_t MAX_CONFIG_SIZE = 1 << 20;
+
+}  // namespace
 
 ConfigReader::~ConfigReader() {
     if (m_file) {
@@ -18,9 +27,13 @@ int ConfigReader::open(const char* path) {
     if (fd < 0) {
         return -1;
     }
-    m_file = fdopen(fd, "r");
+    struct stat st;
+    if (fstat(fd, &st) == 0) {
+        errno = st.st_size > MAX_CONFIG_SIZE ? EFBIG : 0;
+        m_file = errno == 0 ? fdopen(fd, "r") : nullptr;
+    }
     if (!m_file) {
-        const SavedErrno fdopen_errno;
+        const SavedErrno open_errno;
         close(fd);
         return -1;
     }

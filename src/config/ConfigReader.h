@@ -18,7 +18,7 @@ public:
     ConfigReader(const ConfigReader&) = delete;
     ConfigReader& operator=(const ConfigReader&) = delete;
 
-    // Opens the file at path, used as given. 0, or -1 with errno.
+    // Opens the file at path, used as given. 0, or -1 with errno: EFBIG above 1 MiB.
     int open(const char* path);
 
     // The next line, valid until the next call. Null at the end and after a read error,

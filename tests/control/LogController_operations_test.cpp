@@ -138,6 +138,9 @@ TEST_F(ControlOperationsTest, AReloadThatChangesNothingOrCannotBeSavedOrRead) {
     root.write_file(path, "enable\nstream cp_wcdma off 5 3\n");
     EXPECT_EQ(ctrl->reload_kest_conf(), 0);
     EXPECT_TRUE(log.has(begin + "save config failed [21("));
+    ASSERT_EQ(truncate(root.path(path).c_str(), (1 << 20) + 1), 0);
+    EXPECT_EQ(ctrl->reload_kest_conf(), -1);
+    EXPECT_TRUE(log.has(begin + "load kest.conf failed [27(")) << "all of it would be read at once";
     remove_tree(path);
     root.write_file("elsewhere", "enable\nstream cp_gnss off 5 3\n");
     ASSERT_EQ(symlink(root.path("elsewhere").c_str(), root.path(path).c_str()), 0);
