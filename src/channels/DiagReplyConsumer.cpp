@@ -2,6 +2,7 @@
 
 #include "channels/DiagReplyConsumer.h"
 
+#include <errno.h>
 #include <string.h>
 #include <unistd.h>
 
@@ -91,6 +92,13 @@ void DiagReplyConsumer::discard_file() {
     }
 }
 
+// The medium did not take the result: the next one may find room, or the other medium.
+void DiagReplyConsumer::fail_file(int error) {
+    MediaStorage* const media = m_file->media();
+    discard_file();
+    m_storage->write_failed(media, error);
+}
+
 bool DiagReplyConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     m_read_timer.start(READ_TIMEOUT_MS);
     bool answered = false;
@@ -147,7 +155,7 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
     if (header.sub_type == REPLY_END) {
         if (m_file->write_out() < 0) {
             err_log("result file of %s is not complete", m_cp_name);
-            discard_file();
+            fail_file(errno);
             end(LPR_FAILURE);
             return ENDED;
         }
@@ -156,8 +164,9 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
         return ENDED;
     }
     const size_t payload = len - sizeof(header);
-    if (m_file->write(frame + sizeof(header), payload) != static_cast<ssize_t>(payload)) {
-        discard_file();
+    const ssize_t written = m_file->write(frame + sizeof(header), payload);
+    if (written != static_cast<ssize_t>(payload)) {
+        fail_file(written == -1 ? errno : ENOSPC);
         end(LPR_FAILURE);
         return ENDED;
     }

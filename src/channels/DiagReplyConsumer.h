@@ -55,6 +55,7 @@ private:
     static void on_no_reply(void* consumer);
 
     Outcome process_frame(const uint8_t* frame, size_t len);
+    void fail_file(int error);
     void end(LogProcResult result);
     bool send_request();
     void stop_timers();

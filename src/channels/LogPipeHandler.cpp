@@ -132,6 +132,7 @@ int LogPipeHandler::stop_logging() {
         err_log("stop saving WCDMA I/Q error");
     }
     if (m_storage) {
+        m_storage->flush();  // unlike stop, tells the medium when that fails
         m_storage->stop();
     }
     m_enabled = false;

@@ -2,6 +2,7 @@
 
 #include "channels/ModemDumpConsumer.h"
 
+#include <errno.h>
 #include <poll.h>
 #include <string.h>
 #include <unistd.h>
@@ -122,12 +123,23 @@ void ModemDumpConsumer::stop_timers() {
 
 bool ModemDumpConsumer::save_dump_file() {
     m_handler->del_events(POLLIN);
-    LogFile* file = open_dump_mem_file();
-    if (!file) {
-        err_log("create dump mem file failed");
-        return false;
+    LogFile* file = nullptr;
+    int result = LogFile::NOT_TAKEN;
+    for (bool first = true;; first = false) {
+        file = open_dump_mem_file();
+        if (!file) {
+            err_log("create dump mem file failed");
+            return false;
+        }
+        result = file->copy(m_mem_path);
+        // Not on a full medium: room is made by deleting files, this one among them.
+        if (!first || result != LogFile::NOT_TAKEN || errno == ENOSPC ||
+            !m_storage->write_failed(file->media(), errno)) {
+            break;
+        }
+        file->discard();
     }
-    const bool copied = file->copy(m_mem_path) == 0;
+    const bool copied = result == 0;
     if (copied) {
         info_log("dump proc memory: %s successfully.", m_mem_path);
     } else {

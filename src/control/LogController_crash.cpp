@@ -9,12 +9,30 @@
 
 namespace {
 
-// The result of the copy, with its errno.
-int copy_and_close(LogFile* file, const char* source) {
-    const int result = file->copy(system_path(source).string());
-    const SavedErrno copy_errno;
-    file->close();
-    return result;
+enum SaveResult { SAVED, NO_FILE, NO_COPY };
+
+// Copies the source into a new file. Crash material has no next write: when the medium does not
+// take it, it is tried once more, with room made or on the other medium. errno is the reason.
+SaveResult save_copy(CpStorage* storage, const android::String8& name, LogType type,
+                     MediaType media_type, const char* source) {
+    for (bool first = true;; first = false) {
+        LogFile* file = storage->create_file(name, type, media_type);
+        if (!file) {
+            return NO_FILE;
+        }
+        MediaStorage* const media = file->media();
+        const int result = file->copy(system_path(source).string());
+        if (result == 0) {
+            file->close();
+            return SAVED;
+        }
+        const SavedErrno copy_errno;
+        const int error = errno;
+        file->discard();
+        if (!first || result != LogFile::NOT_TAKEN || !storage->write_failed(media, error)) {
+            return NO_COPY;
+        }
+    }
 }
 
 }  // namespace
@@ -27,17 +45,16 @@ int LogController::save_mini_dump(CpStorage* storage, const tm& time, CpType typ
         err_log("no space for mini dump");
         return -1;
     }
-    LogFile* file = storage->create_file(name, LT_MINI_DUMP, media);
-    if (!file) {
-        err_log("create mini dump file %s failed", name.string());
-        return -1;
+    switch (save_copy(storage, name, LT_MINI_DUMP, media, cp_mini_dump_path(type))) {
+        case NO_FILE:
+            err_log("create mini dump file %s failed", name.string());
+            return -1;
+        case NO_COPY:
+            err_log("save mini dump error");
+            return -1;
+        default:
+            return 0;
     }
-    const int result = copy_and_close(file, cp_mini_dump_path(type));
-    if (result < 0) {
-        err_log("save mini dump error");
-        file->discard();
-    }
-    return result;
 }
 
 int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
@@ -51,13 +68,8 @@ int LogController::save_dipx_dump(CpStorage* storage, const tm& time) {
     for (const auto& source : sources) {
         const android::String8 name =
             android::String8::format("%s_%s.log", source.record, stamp.string());
-        LogFile* file = storage->create_file(name, LT_IPC_INFO);
-        if (!file) {
-            continue;
-        }
-        if (copy_and_close(file, source.path) != 0) {
+        if (save_copy(storage, name, LT_IPC_INFO, MT_NONE, source.path) == NO_COPY) {
             err_log("kestcp: save DIPX %s info failed", source.record);
-            file->discard();
             result = -1;
         }
     }

@@ -22,7 +22,7 @@ int copy_bytes(int src, int dst, uint8_t* buffer, size_t buffer_size, uint64_t l
         }
         if (written != n) {
             errno = written < 0 ? errno : ENOSPC;
-            return -1;
+            return COPY_NOT_TAKEN;
         }
     }
     return 0;

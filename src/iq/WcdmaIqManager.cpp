@@ -187,6 +187,8 @@ void WcdmaIqManager::process(int /*events*/) {
         note_saved(false);
         return;
     }
+    // With all logs off nothing else would.
+    m_storage->check_quota(MT_NONE);
     m_cur_file = create_iq_file();
     if (!m_cur_file) {
         release_buffer();
@@ -196,6 +198,7 @@ void WcdmaIqManager::process(int /*events*/) {
     }
     m_save_file = m_cur_file.get();
     m_saved_bytes = 0;
+    m_save_error = 0;
     if (m_resp_handler->send_cmd(IQST_SAVE) < 0) {
         m_save_file = nullptr;
         m_cur_file->discard();
@@ -222,9 +225,13 @@ int WcdmaIqManager::gen_iq_file_name(android::String8& name) {
 LogFile* WcdmaIqManager::create_iq_file() {
     prune_files();
     while (m_files.size() >= MAX_FILES) {
-        LogFile* oldest = m_files.begin()->get();
-        oldest->discard();
-        m_files.erase(m_files.begin());
+        // A device that hung up or fails leaves empty files: these go before what was captured.
+        android::List<FileRef>::iterator goes = --m_files.end();
+        if (idle_wakeups() == 0 || (*goes)->counted() > 0) {
+            goes = m_files.begin();
+        }
+        (*goes)->discard();
+        m_files.erase(goes);
     }
     android::String8 name;
     if (gen_iq_file_name(name) < 0) {
@@ -272,7 +279,11 @@ void WcdmaIqManager::settle_file() {
 void WcdmaIqManager::process_stor_response(int response) {
     if (response == IQST_SAVED && m_state == IQS_SAVING) {
         info_log("WCDMA I/Q saved");
+        MediaStorage* const media = m_cur_file ? m_cur_file->media() : nullptr;
         settle_file();
+        if (media && m_save_error != 0) {
+            m_storage->write_failed(media, m_save_error);
+        }
         await_buffer();
         note_saved(m_saved_bytes != 0);
     } else if (response == IQST_SAVED) {

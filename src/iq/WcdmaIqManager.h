@@ -8,9 +8,9 @@
 // thread only, except save_thread and process_save.
 //
 // The saving thread touches the device descriptor, the mapping, m_save_file (write_raw and fd
-// only), m_saved_bytes and its end of the socket pair, and these only between a command
-// and its response; the bytes on the socket pair are the only synchronisation. A file
-// that is about to be destroyed while it is being saved ends the save first.
+// only), m_saved_bytes, m_save_error and its end of the socket pair, and these only between a
+// command and its response; the bytes on the socket pair are the only synchronisation. A file that
+// is about to be destroyed while it is being saved ends the save first.
 #ifndef IQ_WCDMAIQMANAGER_H_
 #define IQ_WCDMAIQMANAGER_H_
 
@@ -110,6 +110,7 @@ private:
     int m_thread_sock = -1;
     LogFile* m_save_file = nullptr;  // m_cur_file as the saving thread sees it
     uint32_t m_saved_bytes = 0;
+    int m_save_error = 0;  // errno of a write that the medium did not take
 };
 
 #endif  // IQ_WCDMAIQMANAGER_H_

@@ -75,7 +75,7 @@ void* WcdmaIqManager::save_thread(void* param) {
 
 // False when the thread is to end.
 bool WcdmaIqManager::process_save() {
-    IqBufInfo info;
+    IqBufInfo info{};
     if (ioctl(m_fd, CMD_GET_IQ_BUF_INFO, &info) < 0) {
         err_log("ioctl CMD_GET_IQ_BUF_INFO error");
         m_saved_bytes = 0;
@@ -102,6 +102,7 @@ bool WcdmaIqManager::process_save() {
         if (n != static_cast<ssize_t>(chunk)) {
             {
                 const SavedErrno write_errno;
+                m_save_error = n >= 0 ? ENOSPC : errno == EFAULT ? 0 : errno;  // 0: the driver's
                 // A part of the chunk may have reached the file before the failure.
                 const off_t reached = lseek(m_save_file->fd(), 0, SEEK_CUR);
                 if (reached >= 0 && reached <= static_cast<off_t>(info.len)) {

@@ -198,8 +198,10 @@ int CpStorage::check_quota(MediaType media_type) {
     return media ? media->check_quota() : 0;
 }
 
-void CpStorage::write_failed(MediaStorage* media, int error) {
-    m_manager->write_failed(media, error);
+bool CpStorage::write_failed(MediaStorage* media, int error) {
+    const bool again = m_manager->creation_failed(media, error);
+    errno = error;
+    return again;
 }
 
 void CpStorage::subscribe_media_change_evt(StorageManager::media_change_callback callback,

@@ -52,8 +52,9 @@ public:
     // medium, else -1.
     int check_quota(MediaType media);
     // Another file than the log could not be written, for the reason error: as after a failed
-    // write of the log, an SD card is left for now.
-    void write_failed(MediaStorage* media, int error);
+    // write of the log an SD card is left for now, or room is made on a full medium. True when
+    // another try may come to something. errno becomes error.
+    bool write_failed(MediaStorage* media, int error);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
     void unsubscribe_media_change_evt(void* client);

@@ -201,6 +201,7 @@ int LogFile::copy(const char* source) {
         errno = EFBIG;
         result = -1;
     }
+    result = result == COPY_NOT_TAKEN ? NOT_TAKEN : result;
     const SavedErrno keep;
     grow(copied);
     ::close(src);

@@ -27,6 +27,8 @@ class LogFile : public RefTarget {
 public:
     // What the writes of log files and CP storages return for a full medium.
     static constexpr int FULL = -2;
+    // What copy() returns when it was not the source that failed.
+    static constexpr int NOT_TAKEN = -3;
 
     static constexpr size_t BUFFER_SIZE = 65536;
 
@@ -76,8 +78,9 @@ public:
     // Sets size() and counted() to what a scan found on the medium. The totals stay.
     void found(uint64_t bytes);
 
-    // Fills this freshly opened file with the source file's content. 0 or -1; what was
-    // copied before a failure stays and counts. EFBIG when it has no end within MAX_COPY.
+    // Fills this freshly opened file with the source file's content. 0, or with errno -1 for a
+    // source that cannot be read, EFBIG when it has no end within MAX_COPY, or NOT_TAKEN when the
+    // medium does not take it. What was copied before a failure stays and counts.
     int copy(const char* source);
     static constexpr uint64_t MAX_COPY = 0xFFFFFFFF;
 

@@ -36,5 +36,5 @@ int copy_file(const char* src, const char* dst) {
     const SavedErrno keep;
     close(dst_fd);
     close(src_fd);
-    return result;
+    return result < 0 ? -1 : 0;
 }

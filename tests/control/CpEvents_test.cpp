@@ -48,6 +48,34 @@ TEST_F(CpEventsTest, CrashesKeepTheQuota) {
     EXPECT_GT(files().size(), 2u);
 }
 
+// A medium that does not take the material: the other one does, or room is made.
+TEST_F(CpEventsTest, CrashMaterialOutlivesItsMedium) {
+    const std::string old = "sd/modem_log/2016-02-01-00-00-00/cp_gnss/old";
+    for (const int error : {EIO, ENOSPC}) {
+        root.write_file(old, std::string(3 << 20, 'x'));
+        set_card(true);
+        ASSERT_NO_FATAL_FAILURE(boot_supervised());
+        ASSERT_TRUE(both_log("<start>"));
+        bool failing = true;
+        faults::instead.write = [&](int fd, const void* data, size_t len) {
+            char path[500] = "";
+            const std::string link = "/proc/self/fd/" + std::to_string(fd);
+            failing = failing && (error == EIO || root.exists(old));
+            errno = error;
+            return failing && readlink(link.c_str(), path, 499) > 0 && strstr(path, "/sd/")
+                       ? -1
+                       : real::write(fd, data, len);
+        };
+        modem()->process_assert(true);
+        faults::instead = {};
+        const std::string medium = error == EIO ? "data:" : "sd:";
+        Files saved = files("cp_wcdma");
+        EXPECT_EQ(saved[medium + "smsg" + STAMP + ".log"], "S") << error;
+        EXPECT_EQ(saved[medium + "mini_dump" + STAMP + ".bin"], "MINI W") << error;
+        end_service();
+    }
+}
+
 TEST_F(CpEventsTest, NoControlServer) {
     const int taken =
         socket_local_server("kestmodem", ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);

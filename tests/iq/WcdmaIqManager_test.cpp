@@ -8,6 +8,7 @@
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
 #include "storage/CpStorage.h"
+#include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
 #include "support/ServiceFixture.h"
 #include "support/fake_devices.h"
@@ -23,8 +24,10 @@ const pthread_t s_main = pthread_self();
 struct Script {
     std::vector<size_t> writes;  // what the saving thread wrote to files, call by call
     size_t half_at = 0;          // that call (from 1) transfers 1000 bytes only
-    size_t fail_at = 0;          // that call and all later ones fail with ENOSPC
-    int refused_cmd = -1;        // this command to the thread is not taken
+    size_t fail_at = 0;          // that call and all later ones fail with fail_error
+    int fail_error = ENOSPC;
+    bool dead_card = false;
+    int refused_cmd = -1;  // this command to the thread is not taken
     bool no_threads = false;
     bool impatient = false;     // no poll of the loop's thread waits for longer than 1 ms
     int pair[2] = {-1, -1};     // the connection to the thread: the loop's end, the thread's
@@ -49,7 +52,7 @@ ssize_t thread_write(Script& script, int fd, const char* data, size_t len) {
     script.writes.push_back(len);
     const size_t call = script.writes.size();
     if (script.fail_at != 0 && call >= script.fail_at) {
-        errno = ENOSPC;
+        errno = script.fail_error;
         return -1;
     }
     ssize_t n = real::write(fd, data, std::min<size_t>(len, 1000));
@@ -71,6 +74,10 @@ ssize_t scripted_write(Script& script, int fd, const void* data, size_t len) {
     const bool in_main = pthread_equal(pthread_self(), s_main) != 0;
     if (S_ISREG(st.st_mode) && !in_main) {
         return thread_write(script, fd, static_cast<const char*>(data), len);
+    }
+    if (S_ISREG(st.st_mode) && script.dead_card) {  // the file that shows whether it works
+        errno = EIO;
+        return -1;
     }
     const int message = S_ISSOCK(st.st_mode) ? *static_cast<const uint8_t*>(data) : -1;
     if (in_main && message >= 0 && message == script.refused_cmd) {
@@ -311,6 +318,53 @@ TEST_F(WcdmaIqManagerTest, KeepsSixtyFilesAcrossStopAndStart) {
     log_data(CT_WCN);
     EXPECT_EQ(iq->num_files(), 2u);
     EXPECT_TRUE(waits());
+}
+
+TEST_F(WcdmaIqManagerTest, AMediumThatTakesNothingIsLeftOrMadeRoomOn) {
+    const std::string sets = "data/modem_log/2016-02-0", file = "-00-00-00/cp_gnss/old";
+    root.write_file(sets + "1" + file, std::string(MB, 'x'));
+    root.write_file(sets + "2" + file, std::string(MB, 'x'));
+    MediaStorage* const internal = ctrl->stor_mgr().get_media(MT_INTERNAL);
+    internal->clear();
+    ASSERT_EQ(internal->stat(), 0);
+    ASSERT_EQ(ctrl->set_log_file_size(1), 0);
+    ASSERT_EQ(start(), 0);
+    script.fail_at = 1;  // full
+    ASSERT_TRUE(save("lost"));
+    EXPECT_FALSE(root.exists(sets + "1" + file));
+    EXPECT_TRUE(root.exists(sets + "2" + file));
+    script.fail_at = 0;
+    // With the logs off nothing else kept the quota.
+    ASSERT_EQ(ctrl->set_data_part_size(1), 0);
+    ASSERT_TRUE(save("first") && save("second"));
+    EXPECT_FALSE(root.exists(sets + "2" + file));
+    set_card(true);
+    ASSERT_TRUE(save("on the card"));
+    EXPECT_EQ(iq_files().back().compare(0, 2, "sd"), 0) << iq_files().back();
+    script.fail_at = 1;
+    script.fail_error = EIO;
+    script.dead_card = true;
+    ASSERT_TRUE(save("lost"));
+    script.fail_at = 0;
+    ASSERT_TRUE(save("inside"));
+    EXPECT_EQ(ctrl->stor_mgr().media_type(), MT_INTERNAL);
+    EXPECT_EQ(root.find("_wiq_").size(), 6u);
+    EXPECT_EQ(root.read_file(root.find("data/modem_log/2016-03-01").back()), "inside");
+}
+
+// A device that hung up left an empty file every time, which pushed the captures out.
+TEST_F(WcdmaIqManagerTest, EmptyFilesPushNoCaptureOut) {
+    ASSERT_EQ(start(), 0);
+    for (size_t i = 0; i < 59; ++i) {
+        ASSERT_TRUE(save("x"));
+    }
+    device.fail_ioctl(CMD_GET_IQ_BUF_INFO, EIO);
+    for (size_t i = 0; i < 8; ++i) {
+        fill("lost");
+        ASSERT_TRUE(pump([&] { return released() == 60 + i; }));
+    }
+    ASSERT_EQ(iq_files().size(), 60u);
+    EXPECT_EQ(root.read_file(iq_files()[58]), "x");
 }
 
 TEST_F(WcdmaIqManagerTest, AThreadThatDoesNotAnswerIsReported) {
