@@ -56,7 +56,7 @@ TEST(OpenFile, TakesOnlyWhatCanBeReadToAnEnd) {
     // Raw flash is a character device that has a size.
     faults::instead.fstat = [](int fd, struct stat* st) {
         const int result = real::fstat(fd, st);
-        st->st_mode = (st->st_mode & ~S_IFMT) | S_IFCHR;
+        st->st_mode = (st->st_mode & 07777) | S_IFCHR;
         return result;
     };
     const int flash = open_to_read(root.path("file").c_str(), Links::REFUSE);
