@@ -38,14 +38,22 @@ void CpStorage::flush() {
     if (m_cur_file && !write_out()) {
         // The medium hears of it as of a write: a failing card to which each block is only
         // staged, and lost as it is flushed, would else stay in use for ever.
-        MediaStorage* media = m_cur_file->media();
-        errno == ENOSPC ? make_room(media) : m_manager->write_failed(media, errno);
+        // On a full one the next write makes room: a crash flushes what was logged before, and
+        // its own files would be the first to go.
+        m_room_wanted = errno == ENOSPC;
+        if (!m_room_wanted) {
+            m_manager->write_failed(m_cur_file->media(), errno);
+        }
     }
 }
 
 int CpStorage::write(const void* data, size_t len) {
     if (m_manager->check_media_change()) {
         stop();
+    }
+    if (m_room_wanted && m_manager->get_media_stor()) {
+        m_room_wanted = false;
+        make_room(m_manager->get_media_stor());
     }
     if (!prepare_write(len)) {
         return -1;

@@ -82,6 +82,7 @@ private:
     new_dir_callback m_new_dir_cb = nullptr;
     ObjectRef<LogFile> m_cur_file;
     bool m_quota_pending = false;  // the next write has to pass the quota check first
+    bool m_room_wanted = false;    // what was staged found the medium full
 };
 
 #endif  // STORAGE_CPSTORAGE_H_
