@@ -40,9 +40,11 @@ void CpStorage::flush() {
         // staged, and lost as it is flushed, would else stay in use for ever.
         // On a full one the next write makes room: a crash flushes what was logged before, and
         // its own files would be the first to go.
-        m_room_wanted = errno == ENOSPC;
-        if (!m_room_wanted) {
-            m_manager->write_failed(m_cur_file->media(), errno);
+        MediaStorage* const media = m_cur_file->media();
+        if (errno == ENOSPC) {
+            m_full_media = media;
+        } else {
+            m_manager->write_failed(media, errno);
         }
     }
 }
@@ -51,9 +53,12 @@ int CpStorage::write(const void* data, size_t len) {
     if (m_manager->check_media_change()) {
         stop();
     }
-    if (m_room_wanted && m_manager->get_media_stor()) {
-        m_room_wanted = false;
-        make_room(m_manager->get_media_stor());
+    if (m_full_media) {
+        MediaStorage* const full = m_full_media;
+        m_full_media = nullptr;
+        if (full == m_manager->get_media_stor()) {  // not another one that has come into use
+            make_room(full);
+        }
     }
     if (!prepare_write(len)) {
         return -1;

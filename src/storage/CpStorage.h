@@ -81,8 +81,8 @@ private:
     new_log_callback m_new_log_cb = nullptr;
     new_dir_callback m_new_dir_cb = nullptr;
     ObjectRef<LogFile> m_cur_file;
-    bool m_quota_pending = false;  // the next write has to pass the quota check first
-    bool m_room_wanted = false;    // what was staged found the medium full
+    bool m_quota_pending = false;          // the next write has to pass the quota check first
+    MediaStorage* m_full_media = nullptr;  // what was staged found it full; lives as the manager
 };
 
 #endif  // STORAGE_CPSTORAGE_H_

@@ -70,6 +70,30 @@ TEST_F(FailingMediumTest, ACardToWhichBlocksAreOnlyStagedIsLeft) {
     }
 }
 
+// What a flush lost on a full card makes room there, with the next write, and nowhere else.
+TEST_F(FailingMediumTest, RoomIsMadeOnTheMediumThatWasFull) {
+    const std::string old = "modem_log/2016-02-01-00-00-00/cp_gnss/old";
+    m_root.write_file("data/" + old, "12345678");
+    m_root.write_file("sd/" + old, "12345678");
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    m_mgr.set_file_size(16);
+    for (const bool pulled : {false, true}) {
+        plug_card();
+        EXPECT_EQ(lost_of(1, "x"), 0);
+        EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+        faults::fail(faults::WRITE, 1, ENOSPC);
+        m_store->flush();
+        EXPECT_EQ(m_root.exists("sd/" + old), !pulled) << "not by the flush";
+        if (pulled) {
+            pull_card();
+        }
+        EXPECT_EQ(lost_of(1, "x"), 0);
+        EXPECT_FALSE(m_root.exists("sd/" + old));
+        EXPECT_TRUE(m_root.exists("data/" + old));
+    }
+}
+
 // A card that failed once, and on which then a directory has the name of the file that is to
 // show that it works again, or which is full.
 TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
