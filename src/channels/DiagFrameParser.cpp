@@ -8,12 +8,10 @@
 
 namespace {
 
-constexpr uint8_t FLAG = 0x7E;
-constexpr uint8_t ESCAPE = 0x7D;
 constexpr uint8_t ESCAPE_XOR = 0x20;
 
 bool is_special(uint8_t byte) {
-    return byte == FLAG || byte == ESCAPE;
+    return byte == DiagFrameParser::FLAG || byte == DiagFrameParser::ESCAPE;
 }
 
 }  // namespace

@@ -20,6 +20,8 @@ static_assert(sizeof(DiagHeader) == 8, "DiagHeader is 8 bytes on the wire");
 class DiagFrameParser {
 public:
     static constexpr size_t MAX_FRAME = 65536;
+    static constexpr uint8_t FLAG = 0x7E;
+    static constexpr uint8_t ESCAPE = 0x7D;
 
     DiagFrameParser() { init(); }
 

@@ -4,9 +4,11 @@
 // that is cut is told.
 #include <string.h>
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
+#include "channels/DiagFrameParser.h"
 #include "channels/DspChunkHeader.h"
 #include "fuzz/fuzz.h"
 #include "kestlog/FileScan.h"
@@ -31,6 +33,7 @@ const std::string RECORD_MAGIC("\x78\x56\x34\x12");
 struct ScannedPiece {
     uint64_t offset;
     uint32_t seq_num;
+    int type;  // and sub-type
     bool intact;
     size_t len;
     std::string kind;  // of a chunk
@@ -54,8 +57,8 @@ Scanned fuzz_scan(const std::string& name, const std::string& content,
         in, FileName(name),
         [&](const Piece& piece) {
             result.pieces.push_back(
-                {piece.offset, piece.seq_num, piece.intact, piece.data_len,
-                 piece.kind ? piece.kind : "",
+                {piece.offset, piece.seq_num, piece.type << 8 | piece.sub_type, piece.intact,
+                 piece.data_len, piece.kind ? piece.kind : "",
                  piece.data ? fuzz_text(piece.data, piece.data_len) : std::string()});
             return true;
         },
@@ -132,7 +135,7 @@ void check_measured(const std::string& name, const std::string& content, const S
     for (size_t i = 0; i < scan.pieces.size(); ++i) {
         const ScannedPiece &c = scan.pieces[i], &d = decoded.pieces[i];
         FUZZ_CHECK(c.offset == d.offset && c.seq_num == d.seq_num && c.len == d.len);
-        FUZZ_CHECK(c.intact == d.intact && c.kind == d.kind);
+        FUZZ_CHECK(c.type == d.type && c.intact == d.intact && c.kind == d.kind);
     }
 }
 
@@ -156,16 +159,43 @@ void check_own_chunk(const uint8_t* data, size_t size) {
     FUZZ_CHECK(cut.pieces.empty() && cut.report.other == len && cut.report.damaged == (len > 0));
 }
 
+// Two bytes tell of each frame how long it is, what stands in it and where. The length in its
+// header is what a careless count finds: all bytes between the flags but those that escape.
+void check_own_frames(const uint8_t* data, size_t size) {
+    static const char* const ODD[] = {"", "}^", "}", "}}", "~", "~~", "}~", "}]}]}]}]"};
+    std::string content;
+    for (uint32_t i = 0; size > 1 && content.size() < 40000; ++i) {
+        const uint8_t kind = data[2 * i % size];
+        std::string payload(kind % 2 ? kind % 32 : kind, 'x');
+        payload.insert(payload.size() * (data[(2 * i + 1) % size] % 4) / 3, ODD[kind >> 5]);
+        DiagHeader header{i, 0, static_cast<uint8_t>(i + 3), 0};
+        header.len = static_cast<uint16_t>(sizeof(header) + payload.size() -
+                                           std::count(payload.begin(), payload.end(), '}'));
+        uint8_t escaped[2 * sizeof(header)];
+        const size_t len = DiagFrameParser::escape(reinterpret_cast<const uint8_t*>(&header),
+                                                   sizeof(header), escaped);
+        content += "~" + fuzz_text(escaped, len) + payload + "~";
+    }
+    const std::string name = "0-cp_gnss-2016-03-01_09-15-00.log";
+    const Scanned scan = fuzz_scan(name, content);
+    check_measured(name, content, scan);
+    check_frames(scan, content);
+}
+
 }  // namespace
 
-// The first byte tells the name, or is 'c' for a chunk that the service writes; from 0x80 on,
-// the content is repeated past the reader's window.
+// The first byte tells the name, or is 'c' for a chunk that the service writes, 'f' for many
+// frames; from 0x80 on, the content is repeated past the reader's window.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     if (size < 1) {
         return 0;
     }
     if (data[0] == 'c') {
         check_own_chunk(data + 1, size - 1);
+        return 0;
+    }
+    if (data[0] == 'f') {
+        check_own_frames(data + 1, size - 1);
         return 0;
     }
     const std::string name = NAMES[(data[0] & 0x7f) % NAME_NUM];

@@ -13,6 +13,7 @@
 #include "channels/ModemImage.h"
 #include "channels/modem_dump_end.h"
 #include "core/text.h"
+#include "kestlog/FrameIndex.h"
 
 const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
 
@@ -200,7 +201,8 @@ private:
         size_t used = 0;
         DiagHeader header;
         for (size_t body_len; !m_stop;) {
-            const size_t size = DiagFrameParser::measure(data + used, len - used, header, body_len);
+            const size_t size =
+                m_index.measure(data + used, len - used, m_in.offset() + used, header, body_len);
             const bool end = m_name.framed_dump && is_end_len(body_len);
             if (size == 0 || header.len != body_len || end) {
                 break;  // to be decoded
@@ -344,6 +346,7 @@ private:
     FileReport& m_report;
     bool m_stop = false;
     DiagFrameParser m_parser;
+    FrameIndex m_index;
 };
 
 }  // namespace

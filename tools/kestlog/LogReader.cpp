@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <thread>
 
 #include "kestlog/Progress.h"
 
@@ -54,7 +55,7 @@ bool LogReader::open(const std::string& path, bool follow) {
     m_size = static_cast<uint64_t>(std::max<off_t>(st.st_size - start, 0));
     m_left = m_piped ? UINT64_MAX : m_size;
     m_modified = modified_time(st);
-    if (!m_piped && m_size >= LARGE) {
+    if (!m_piped && m_size >= LARGE && std::thread::hardware_concurrency() > 1) {
         m_ahead = std::make_unique<ReadAhead>();
         if (m_ahead->start(m_fd, m_size)) {
             return true;
