@@ -3,7 +3,6 @@
 #include "channels/LogPipeHandler.h"
 
 #include "support/ServiceFixture.h"
-#include "support/faults.h"
 
 namespace {
 

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The modem's log parsing database, taken from the firmware image to the log root.
 #include <sys/resource.h>
-#include <sys/stat.h>
 #include <sys/wait.h>
 
 #include "channels/ModemImage.h"

@@ -6,7 +6,6 @@
 #include "sim/SimSupervisor.h"
 #include "sim/local_socket.h"
 #include "support/ServiceFixture.h"
-#include "support/faults.h"
 
 namespace {
 

@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 // Every request in every form is in tests/recordings/requests.in.
-#include <map>
 #include <regex>
 
 #include "support/ControlFixture.h"

@@ -7,7 +7,6 @@
 #include "client/uid_list.h"
 #include "config/property_names.h"
 #include "support/ControlFixture.h"
-#include "support/faults.h"
 
 namespace {
 

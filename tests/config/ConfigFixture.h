@@ -4,11 +4,7 @@
 #ifndef TESTS_CONFIG_CONFIGFIXTURE_H_
 #define TESTS_CONFIG_CONFIGFIXTURE_H_
 
-#include <gtest/gtest.h>
 #include <stdlib.h>
-
-#include <string>
-#include <vector>
 
 #include "config/LogConfig.h"
 #include "support/TestRoot.h"

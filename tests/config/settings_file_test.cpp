@@ -2,7 +2,6 @@
 // The settings file through kills, faults and whatever stands in its place.
 #include <errno.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <algorithm>
 

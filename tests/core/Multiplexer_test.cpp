@@ -3,14 +3,9 @@
 #include "core/Multiplexer.h"
 
 #include <errno.h>
-#include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
-#include <functional>
 #include <memory>
-#include <vector>
 
 #include "core/FdHandler.h"
 #include "support/TestRoot.h"

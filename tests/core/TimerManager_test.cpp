@@ -2,11 +2,6 @@
 
 #include "core/TimerManager.h"
 
-#include <gtest/gtest.h>
-
-#include <functional>
-#include <string>
-
 #include "support/TestRoot.h"
 #include "support/faults.h"
 

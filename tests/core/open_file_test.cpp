@@ -4,11 +4,7 @@
 
 #include <errno.h>
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <unistd.h>
-
-#include <string>
 
 #include "support/TestRoot.h"
 #include "support/faults.h"

@@ -9,7 +9,6 @@
 
 #include <chrono>
 #include <filesystem>
-#include <vector>
 
 #include "faults/FaultPlayer.h"
 #include "sim/SharedFile.h"

@@ -6,13 +6,11 @@
 #include <pthread.h>
 
 #include "iq/IqStorRespHandler.h"
-#include "iq/iq_mem.h"
 #include "storage/CpStorage.h"
 #include "storage/MediaStorage.h"
 #include "storage/StorageManager.h"
 #include "support/ServiceFixture.h"
 #include "support/fake_devices.h"
-#include "support/faults.h"
 
 namespace {
 

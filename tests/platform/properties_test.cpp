@@ -2,15 +2,12 @@
 
 #include <cutils/properties.h>
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <time.h>
-#include <unistd.h>
 
 #include <atomic>
-#include <string>
 #include <thread>
 
 #include "support/TestRoot.h"

@@ -3,14 +3,10 @@
 #include <cutils/sockets.h>
 #include <errno.h>
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <stddef.h>
 #include <stdlib.h>
 #include <sys/socket.h>
 #include <sys/un.h>
-#include <unistd.h>
-
-#include <string>
 
 #include "support/TestRoot.h"
 

@@ -3,10 +3,8 @@
 #include "state/CpStateHandler.h"
 
 #include "sim/SimSupervisor.h"
-#include "state/ExtWcnStateHandler.h"
 #include "state/ModemStateHandler.h"
 #include "support/ControlFixture.h"
-#include "support/faults.h"
 
 namespace {
 

@@ -5,17 +5,11 @@
 #define TESTS_STORAGE_STORAGEFIXTURE_H_
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <time.h>
-#include <unistd.h>
 
-#include <string>
-#include <vector>
-
-#include "core/ObjectRef.h"
 #include "storage/CpChannel.h"
 #include "storage/CpDirectory.h"
 #include "storage/CpSetDirectory.h"

@@ -2,8 +2,6 @@
 
 #include "storage/StorageManager.h"
 
-#include <functional>
-
 #include "storage/StorageFixture.h"
 #include "storage/SubscriberList.h"
 #include "storage/paths.h"

@@ -2,11 +2,7 @@
 
 #include "storage/paths.h"
 
-#include <gtest/gtest.h>
 #include <limits.h>
-#include <string.h>
-
-#include <string>
 
 #include "storage/StorageFixture.h"
 

@@ -12,11 +12,7 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <functional>
 #include <map>
-#include <memory>
-#include <string>
-#include <vector>
 
 #include "channels/LogPipeHandler.h"
 #include "config/LogConfig.h"

@@ -9,7 +9,6 @@
 #include <string.h>
 #include <sys/mman.h>
 #include <time.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <filesystem>

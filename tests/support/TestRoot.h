@@ -4,8 +4,8 @@
 #ifndef TESTS_SUPPORT_TESTROOT_H_
 #define TESTS_SUPPORT_TESTROOT_H_
 
+#include <gtest/gtest.h>
 #include <stdint.h>
-#include <sys/types.h>
 #include <unistd.h>
 
 #include <functional>

@@ -6,16 +6,11 @@
 
 #include <cutils/sockets.h>
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <stdlib.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <unistd.h>
-
-#include <string>
-#include <vector>
 
 #include "sim/SimDiagDevice.h"
 #include "sim/TimeService.h"

@@ -8,7 +8,6 @@
 #include <functional>
 #include <limits>
 #include <string>
-#include <vector>
 
 #include "sim/calls.h"
 

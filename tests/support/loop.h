@@ -3,9 +3,7 @@
 #ifndef TESTS_SUPPORT_LOOP_H_
 #define TESTS_SUPPORT_LOOP_H_
 
-#include <functional>
 #include <memory>
-#include <vector>
 
 #include "core/FdHandler.h"
 #include "core/Multiplexer.h"

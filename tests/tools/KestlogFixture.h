@@ -5,11 +5,8 @@
 #define TESTS_TOOLS_KESTLOGFIXTURE_H_
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
-
-#include <string>
 
 #include "support/TestRoot.h"
 #include "support/wire.h"

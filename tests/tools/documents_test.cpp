@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The documents against the programs: requests and commands are listed once in code, and
 // whoever adds one has to describe it.
-#include <gtest/gtest.h>
 
 #include <fstream>
 #include <map>

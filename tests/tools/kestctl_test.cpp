@@ -1,16 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Runs the real kestctl against a scripted service in the test.
-#include <cutils/sockets.h>
-#include <gtest/gtest.h>
 #include <linux/sockios.h>
-#include <poll.h>
 #include <signal.h>
 #include <string.h>
-#include <sys/ioctl.h>
-#include <sys/socket.h>
-#include <sys/stat.h>
 #include <sys/wait.h>
-#include <unistd.h>
 
 #include <set>
 #include <sstream>

@@ -2,14 +2,11 @@
 // Runs the real kestlog follow, at a pipe and in a terminal, beside the real service and beside
 // changes of the test's own.
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <pty.h>
 #include <signal.h>
 #include <sys/ioctl.h>
-#include <sys/stat.h>
 #include <sys/wait.h>
 #include <termios.h>
-#include <unistd.h>
 
 #include <filesystem>
 #include <fstream>

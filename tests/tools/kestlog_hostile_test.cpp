@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 // A card that somebody made to harm its reader, through every command of the real kestlog.
-#include <algorithm>
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <sstream>
