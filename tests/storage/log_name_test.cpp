@@ -72,6 +72,8 @@ TEST(LogName, NumbersAndTimeOrder) {
     EXPECT_EQ(parse_log_number("007-x", number, digits), 0);
     EXPECT_EQ(number, 7u);
     EXPECT_EQ(digits, 3u);
+    EXPECT_EQ(parse_log_number("4294967296-", number, digits), 0);
+    EXPECT_EQ(number, 0u) << "larger values wrap until there is another digit";
     for (const char* name : {"12", "-12-", "1x-", "42949672959-"}) {
         EXPECT_EQ(parse_log_number(name, number, digits), -1) << name;
     }
