@@ -76,32 +76,19 @@ TEST_F(ControlOperationsTest, ActOnTheRunningObjectsAndTheFile) {
         std::function<int()> operation;
         Change file, state;
     } cases[] = {
-        {[&] { return c->set_log_file_size(4097); },  // kept in 32 bits
-         {"file_size 4", "file_size 4097"},
-         {"file 4 (4 4)", "file 4097 (1 1)"}},
-        {[&] { return c->set_data_part_size(8000); },
-         {"data_log_size 30", "data_log_size 8000"},
-         {"data 30 (30)", "data 8000 (8000)"}},
-        {[&] { return c->set_sd_size(0); },
-         {"sd_log_size 300", "sd_log_size 0"},
-         {"sd 300 (300)", "sd 0 (0)"}},
-        {[&] { return c->set_log_overwrite(true); },
-         {"overwrite disable", "overwrite enable"},
-         {"overwrite 0 (0 0)", "overwrite 1 (1 1)"}},
+        // clang-format off
+        // The first is kept in 32 bits.
+        {[&] { return c->set_log_file_size(4097); }, {"file_size 4", "file_size 4097"}, {"file 4 (4 4)", "file 4097 (1 1)"}},
+        {[&] { return c->set_data_part_size(8000); }, {"data_log_size 30", "data_log_size 8000"}, {"data 30 (30)", "data 8000 (8000)"}},
+        {[&] { return c->set_sd_size(0); }, {"sd_log_size 300", "sd_log_size 0"}, {"sd 300 (300)", "sd 0 (0)"}},
+        {[&] { return c->set_log_overwrite(true); }, {"overwrite disable", "overwrite enable"}, {"overwrite 0 (0 0)", "overwrite 1 (1 1)"}},
         {[&] { return c->enable_md(); }, {"minidump disable", "minidump enable"}, {"", ""}},
         {[&] { return c->enable_md() + c->disable_md(); }, {"", ""}, {"", ""}},
-        {[&] { return c->set_md_int_stor(true); },
-         {"external", "internal"},
-         {"mini dumps 0", "mini dumps 1"}},
-        {[&] { return turn(true, CT_WCN, CT_TD); },
-         {"off", "on"},
-         {"2 devices: wcdma gnss", "3 devices: wcdma wcn gnss"}},
-        {[&] { return turn(false, CT_TD, CT_GNSS, CT_GNSS); },
-         {"ss\ton", "ss\toff"},
-         {"2 devices: wcdma gnss", "1 devices: wcdma"}},
-        {[&] { return c->enable_wcdma_iq(CT_GNSS); },
-         {"\n\n\n", "\n\niq cp_gnss WCDMA\n\n"},
-         {"", ""}},
+        {[&] { return c->set_md_int_stor(true); }, {"external", "internal"}, {"mini dumps 0", "mini dumps 1"}},
+        {[&] { return turn(true, CT_WCN, CT_TD); }, {"off", "on"}, {"2 devices: wcdma gnss", "3 devices: wcdma wcn gnss"}},
+        {[&] { return turn(false, CT_TD, CT_GNSS, CT_GNSS); }, {"ss\ton", "ss\toff"}, {"2 devices: wcdma gnss", "1 devices: wcdma"}},
+        {[&] { return c->enable_wcdma_iq(CT_GNSS); }, {"\n\n\n", "\n\niq cp_gnss WCDMA\n\n"}, {"", ""}},
+        // clang-format on
     };
     const Fifo wcn(root.path("wcn"));
     for (const auto& test : cases) {

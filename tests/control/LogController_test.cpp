@@ -46,17 +46,6 @@ TEST_F(LogControllerTest, ChannelWithoutDevicesWaitsToBeStarted) {
     EXPECT_EQ(polled(), 1u);
 }
 
-TEST_F(LogControllerTest, KestLayout) {
-    const Fifo fifo(root.path("gnss"));
-    ASSERT_EQ(boot("stream cp_gnss on 5 3\n", {"-s"}), 0);
-    EXPECT_TRUE(
-        log.has("int LogController::init(LogConfig*): modem log will be placed in kest dir!\n"));
-    ASSERT_TRUE(feed(fifo, "data"));
-    ctrl.reset();
-    EXPECT_EQ(log_content(root, log_files(root, "data/kest/modem_log", "cp_gnss")), "data");
-    EXPECT_FALSE(root.exists("data/modem_log"));
-}
-
 TEST_F(LogControllerTest, NoSpaceForAMiniDump) {
     const Fifo fifo(root.path("gnss"));
     root.write_file("proc/cptl/mini_dump", "mini");

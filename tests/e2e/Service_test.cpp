@@ -2,7 +2,6 @@
 // The real program as a child process: its exit statuses, its log lines, the files that
 // it leaves and the system calls that a block of log data costs.
 
-#include <map>
 #include <sstream>
 
 #include "sim/ChildProcess.h"
@@ -94,6 +93,7 @@ TEST_F(ServiceTest, WhatItMakesHasItsModeInSpiteOfTheParentsMask) {
                         entry.status().permissions() == std::filesystem::perms(0644))
                 << entry.path();
         }
+        EXPECT_TRUE(logged("init(LogConfig*): modem log will be placed in kest dir!\n"));
         EXPECT_FALSE(logged("save log"));
         EXPECT_FALSE(logged("kestcp: open "));
         process.stop();
