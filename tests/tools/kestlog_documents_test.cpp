@@ -185,7 +185,7 @@ TEST_F(KestlogDocuments, TheManualPageHasEveryCommandAndOption) {
         }
         all += line + "\n";
     }
-    run("--help");
+    EXPECT_EQ(run("--help"), 0);
     std::istringstream help(m_out.substr(0, m_out.find("\n\nROOT is")));
     bool commands = false;
     for (std::string line; std::getline(help, line);) {

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // What kestlog takes out of log trees: streams, memory images, sound and I/Q captures.
 #include <signal.h>
-#include <unistd.h>
 
 #include <filesystem>
 #include <nlohmann/json.hpp>
@@ -59,8 +58,6 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     EXPECT_EQ(m_out, "all: cp_wcdma, 14 files, 700000 bytes\n");
     EXPECT_EQ(m_root.read_file("all"), fed);
     EXPECT_EQ(run("join . -o data --force"), 4);
-    EXPECT_EQ(run("join . >/dev/full; echo $?"), 0);
-    EXPECT_EQ(m_out, "4\n");
     EXPECT_EQ(run("join . -o /dev/full"), 4);
     EXPECT_TRUE(m_root.find(".kestlog-").empty());
 
@@ -340,7 +337,7 @@ TEST_F(KestlogStreamsTest, AFullOutputIsToldOnce) {
     write_good_tree();
     write("iq", "iqiq");
     for (const char* args : {"ls .", "ls --tree .", "--json ls .", "verify .", "report --json .",
-                             "report . -o -", "join . --cp cp_wcn", "export .",
+                             "report . -o -", "join . --cp cp_wcn", "export .", "frames */*/*/*",
                              "wav modem_log/*/agdsp/0-* --rate 8000 --channels 1 --format u8 -o -",
                              "sigmf iq --datatype ci8 --rate 1 --frequency 1 -o -"}) {
         EXPECT_EQ(run(std::string(args) + " >/dev/full 2>err; exit $?; true"), 4) << args;

@@ -1,12 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Runs the real kestlog over good trees and over a table of damages.
-#include <fcntl.h>
-#include <gtest/gtest.h>
 #include <signal.h>
 #include <string.h>
-#include <sys/stat.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <algorithm>
 
@@ -237,8 +232,6 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_EQ(std::count(m_out.begin(), m_out.end(), '\n'), 3);
     EXPECT_EQ(run("--json frames " + DSP_LOG), 0);
     EXPECT_TRUE(said("\"len\":8,\"payload\":0,\"intact\":true,\"kind\":\"pcm\"}\n")) << m_out;
-    EXPECT_EQ(run("frames " + WCN_LOG + " >/dev/full 2>/dev/null; echo $?"), 0);
-    EXPECT_EQ(m_out, "4\n");
     // Who reads the output may stop: no word, and the end that the signal means.
     EXPECT_EQ(system(("cd " + m_root.root() + "; (trap '' PIPE; '" KESTLOG "' frames --hex " +
                       WCN_LOG + " 2>err; echo $? >status) | head -1 >out")
@@ -355,16 +348,11 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     EXPECT_LT(m_out.find("\"kind\":\"log\",\"number\":2,"), m_out.find("\"number\":0,")) << m_out;
 }
 
-TEST_F(KestlogTest, WrongUsageAndHelp) {
+TEST_F(KestlogTest, WrongUsageAndCompletion) {
     for (const char* args : {"", "fly", "ls", "frames --type x a", "frames --limit -1 a", "ls ''",
                              "--fly ls x", "ls --force x", "info --output d x"}) {
         EXPECT_EQ(run(args), 1) << args;
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
-    }
-    EXPECT_EQ(run("--help"), 0);
-    for (const char* line :
-         {"\n  ls ROOT... ", "\n  info FILE... ", "\n  split FILE... ", ": replace files"}) {
-        EXPECT_TRUE(said(line)) << line;
     }
     EXPECT_EQ(run("vrify ."), 1);
     EXPECT_NE(m_err.find("(did you mean 'verify'?)"), std::string::npos) << m_err;
