@@ -60,25 +60,25 @@ TEST_F(DiagReplyTest, AResultThatCannotBeStored) {
         const std::string dir = "data/modem_log/" + root.list("data/modem_log")[0] + "/cp_wcdma/";
         remove_tree(dir + root.list(dir).back());
     };
+    const auto pull_card = [&] {
+        set_card(false);
+        remove_tree("sd");
+        EXPECT_TRUE(feed(gnss_dev, "notices it"));
+    };
     const struct {
         const char* what;
         std::function<void()> arrange;
         std::string then;  // comes from the CP, if empty until the time-out
         const char* message;
     } cases[] = {
+        // clang-format off
         {"cut", [] { faults::shorten(faults::WRITEV, 64001); }, block, ""},
-        {"full at the end", [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end,
-         ": result file of cp_wcdma is not complete [28("},
+        {"full at the end", [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end, ": result file of cp_wcdma is not complete [28("},
         {"deleted", delete_it, block, "is gone ["},
         {"deleted, silent", delete_it, "", ""},
         {"deleted, alive", [&] { delete_it(), modem()->process_alive(); }, "", ""},
-        {"card pulled",
-         [&] {
-             set_card(false);
-             remove_tree("sd");
-             EXPECT_TRUE(feed(gnss_dev, "notices it"));
-         },
-         block, "is gone ["},
+        {"card pulled", pull_card, block, "is gone ["},
+        // clang-format on
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);

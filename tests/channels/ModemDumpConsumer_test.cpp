@@ -2,8 +2,6 @@
 
 #include "channels/ModemDumpConsumer.h"
 
-#include <malloc.h>
-
 #include "storage/MediaStorage.h"
 #include "support/ServiceFixture.h"
 
@@ -96,25 +94,18 @@ TEST_F(ModemDumpTest, OutlivesFaultsOfItsFile) {
         std::string message;
         Files files;
     } cases[] = {
+        // clang-format off
         {"full", false, full, more, ": need to write 4000, write returns -2 [28(", copy},
         {"cut", false, [] { faults::shorten(faults::WRITEV, 64010); }, more, "returns 10 [", copy},
-        {"full at the end", false, [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end_marker(),
-         "returns -1 [28(", copy},
-        {"no memory file", false, [&] { full(), faults::fail(faults::OPEN, 1, ENOSPC); }, more,
-         "create dump mem file failed [28(", Files{}},
-        {"copy fails", false, [&] { full(), faults::fail(faults::WRITE, 2, ENOSPC); }, more,
-         "/proc/cpw/mem failed. [28(", half},
-        {"the card fails under the copy", true,
-         [&] { full(), faults::fail(faults::WRITE, 1, EIO, 2); }, more,
-         "/proc/cpw/mem successfully.", copy},
-        {"set deleted", false, [&] { remove_tree(dir_of(dir_of(dump_path()))); }, more,
-         ": dump file of cp_wcdma is gone\n", copy},
-        {"unmounted", true, [&] { set_card(false); }, "",
-         ": SD card is gone, the dump of cp_wcdma ends\n", on_card},
-        {"the card fails", true,
-         [] { faults::fail(faults::WRITEV, 1, EIO), faults::fail(faults::WRITE, 1, EIO); }, more,
-         "returns -1 [5(", copy},
+        {"full at the end", false, [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end_marker(), "returns -1 [28(", copy},
+        {"no memory file", false, [&] { full(), faults::fail(faults::OPEN, 1, ENOSPC); }, more, "create dump mem file failed [28(", Files{}},
+        {"copy fails", false, [&] { full(), faults::fail(faults::WRITE, 2, ENOSPC); }, more, "/proc/cpw/mem failed. [28(", half},
+        {"the card fails under the copy", true, [&] { full(), faults::fail(faults::WRITE, 1, EIO, 2); }, more, "/proc/cpw/mem successfully.", copy},
+        {"set deleted", false, [&] { remove_tree(dir_of(dir_of(dump_path()))); }, more, ": dump file of cp_wcdma is gone\n", copy},
+        {"unmounted", true, [&] { set_card(false); }, "", ": SD card is gone, the dump of cp_wcdma ends\n", on_card},
+        {"the card fails", true, [] { faults::fail(faults::WRITEV, 1, EIO), faults::fail(faults::WRITE, 1, EIO); }, more, "returns -1 [5(", copy},
         {"full, unmounted", true, [&] { set_card(false), full(); }, more, "returns -2 [28(", copy},
+        // clang-format on
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
