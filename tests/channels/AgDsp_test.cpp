@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // The audio DSP's three devices when one fails; tests/recordings/audio_dsp.in has its log.
 #include "channels/AgDspLogHandler.h"
-#include "channels/DspChunkHeader.h"
 #include "support/ServiceFixture.h"
 #include "support/fake_devices.h"
 
@@ -40,16 +39,14 @@ TEST_F(AgDspTest, TheCompletionIsAlwaysSent) {
         std::string stored;
         const char* message;
     } cases[] = {
+        // clang-format off
         {{{"", 0}}, "", ""},
-        {{{"", EINTR}, {"a", 0}, {"", EINTR}, {"b", 0}, {"", 0}},
-         chunk(0, DUMP, "a") + chunk(1, DUMP, "b"),
-         ""},
+        {{{"", EINTR}, {"a", 0}, {"", EINTR}, {"b", 0}, {"", 0}}, chunk(0, DUMP, "a") + chunk(1, DUMP, "b"), ""},
         {{{"", EIO}}, "", "save_dump(FileNotifier*): read AG-DSP dump device error [5("},
         {FakeDevice::Steps(301, {"", EINTR}), "", "read AG-DSP dump device error [4("},
         // The driver needs a moment.
-        {{{"c", 0}, {"", EAGAIN}, {"", EAGAIN}, {"d", 0}, {"", 0}},
-         chunk(2, DUMP, "c") + chunk(3, DUMP, "d"),
-         ""},
+        {{{"c", 0}, {"", EAGAIN}, {"", EAGAIN}, {"d", 0}, {"", 0}}, chunk(2, DUMP, "c") + chunk(3, DUMP, "d"), ""},
+        // clang-format on
     };
     size_t completions = 0;
     std::string expected;
@@ -124,6 +121,8 @@ TEST_F(AgDspTest, AFailingStorageEndsADumpWithItsCompletion) {
 TEST_F(AgDspTest, FailingDevices) {
     const size_t running = open_descriptors();
     const size_t slots = Filler::free_slots(mux());
+    EXPECT_EQ(dsp->start(), 0);
+    EXPECT_EQ(open_descriptors(), running) << "they are open";
     ASSERT_TRUE(yields(pcm, {{"", EAGAIN}, {"", EINTR}, {"", ENODEV}}));
     EXPECT_TRUE(log.has("read PCM device error [19("));
     EXPECT_EQ(open_descriptors(), running - 1) << "off until the next start";
@@ -137,6 +136,9 @@ TEST_F(AgDspTest, FailingDevices) {
     EXPECT_EQ(dsp->start(), 0);
     EXPECT_TRUE(log.has("AgDspLogHandler::start(): start dump notifier error [2("));
     ASSERT_TRUE(pump([&] { return pcm.reads_left() == 0; }));
+    // One that nobody writes to is not waited for.
+    ASSERT_EQ(mkfifo(root.path("dev/audio_dsp_mem").c_str(), 0600), 0);
+    EXPECT_EQ(dsp->start(), 0);
     // There is no dump over the diag device.
     dsp->process_assert(false);
     EXPECT_EQ(dsp->state(), CWS_NOT_WORKING);

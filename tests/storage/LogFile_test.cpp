@@ -23,6 +23,7 @@ protected:
 };
 
 TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
+    const size_t descriptors = open_descriptors();
     LogFile* file = make();
     const std::string data = pattern_bytes(1000, 5);
     faults::shorten(faults::WRITE, 300);
@@ -44,9 +45,15 @@ TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
     EXPECT_EQ(file->size(), 1u);
     check_sums(internal());
     file->write("kept", 4);
+    faults::fail(faults::WRITEV, 1, ENOSPC);
+    EXPECT_EQ(file->write(std::string(70000, 'x').data(), 70000), LogFile::FULL);
     file->flush();
     EXPECT_EQ(content(), data + data + "lkept");
     EXPECT_EQ(file->size(), 5u);
+    file->write("lost", 4);
+    faults::fail(faults::WRITE, 1, ENOSPC);
+    file->close();
+    EXPECT_EQ(open_descriptors(), descriptors);
 }
 
 TEST_F(LogFileTest, OpenAndClosed) {
