@@ -157,6 +157,7 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
         return;
     }
     bool stored = false;
+    bool endless = false;
     uint64_t total = 0;
     int all_waited_ms = 0;
     int waited_ms = 0;      // since the last data
@@ -193,9 +194,10 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
             break;
         }
         stored = true;
-        total += len;
+        total += len + DSP_CHUNK_HEADER_LEN;
         if (total >= MAX_DUMP) {
             err_log("no end of the AG-DSP dump");
+            endless = true;
             break;
         }
         waited_ms = 0;
@@ -204,4 +206,7 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
     notifier->note_read(stored);
     complete_dump(notifier->fd());
     flush();
+    if (endless) {
+        notifier->close();  // or it would go on with the next pass of the loop
+    }
 }
