@@ -59,7 +59,9 @@ int LogFile::close() {
     if (m_fd < 0) {
         return 0;
     }
-    flush();
+    if (write_out() < 0) {
+        err_log("what was staged of %s is lost", m_name.string());
+    }
     ::close(m_fd);
     m_fd = -1;
     m_buffer.reset();

@@ -23,6 +23,7 @@ protected:
 };
 
 TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
+    LogCapture log;
     const size_t descriptors = open_descriptors();
     LogFile* file = make();
     const std::string data = pattern_bytes(1000, 5);
@@ -53,6 +54,7 @@ TEST_F(LogFileTest, UnbufferedWritesAndFlush) {
     file->write("lost", 4);
     faults::fail(faults::WRITE, 1, ENOSPC);
     file->close();
+    EXPECT_TRUE(log.has("close(): what was staged of f is lost [28(")) << log.text();
     EXPECT_EQ(open_descriptors(), descriptors);
 }
 
