@@ -125,16 +125,14 @@ bool ModemDumpConsumer::save_dump_file() {
     m_handler->del_events(POLLIN);
     LogFile* file = nullptr;
     int result = LogFile::NOT_TAKEN;
-    for (bool first = true;; first = false) {
+    for (int tries = 1;; ++tries) {
         file = open_dump_mem_file();
         if (!file) {
             err_log("create dump mem file failed");
             return false;
         }
         result = file->copy(m_mem_path);
-        // Not on a full medium: room is made by deleting files, this one among them.
-        if (!first || result != LogFile::NOT_TAKEN || errno == ENOSPC ||
-            !m_storage->write_failed(file->media(), errno)) {
+        if (!m_storage->copy_again(file, result, tries)) {
             break;
         }
         file->discard();

@@ -12,24 +12,23 @@ namespace {
 enum SaveResult { SAVED, NO_FILE, NO_COPY };
 
 // Copies the source into a new file. Crash material has no next write: when the medium does not
-// take it, it is tried once more, with room made or on the other medium. errno is the reason.
+// take it, it is tried again, with room made or on the other medium. errno is the reason.
 SaveResult save_copy(CpStorage* storage, const android::String8& name, LogType type,
                      MediaType media_type, const char* source) {
-    for (bool first = true;; first = false) {
+    for (int tries = 1;; ++tries) {
         LogFile* file = storage->create_file(name, type, media_type);
         if (!file) {
-            return NO_FILE;
+            return tries == 1 ? NO_FILE : NO_COPY;
         }
-        MediaStorage* const media = file->media();
         const int result = file->copy(system_path(source).string());
         if (result == 0) {
             file->close();
             return SAVED;
         }
         const SavedErrno copy_errno;
-        const int error = errno;
+        const bool again = storage->copy_again(file, result, tries);
         file->discard();
-        if (!first || result != LogFile::NOT_TAKEN || !storage->write_failed(media, error)) {
+        if (!again) {
             return NO_COPY;
         }
     }

@@ -187,8 +187,8 @@ void WcdmaIqManager::process(int /*events*/) {
         note_saved(false);
         return;
     }
-    // With all logs off nothing else would.
-    m_storage->check_quota(MT_NONE);
+    // While the CP logs nothing nobody else would: without this the captures of each start pile up.
+    m_storage->trim_old_sets();
     m_cur_file = create_iq_file();
     if (!m_cur_file) {
         release_buffer();

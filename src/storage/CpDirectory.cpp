@@ -208,7 +208,7 @@ void CpDirectory::dec_size(uint64_t num) {
 
 uint64_t CpDirectory::trim(uint64_t wanted) {
     const LogFile* stuck = nullptr;
-    const uint64_t removed = delete_oldest(wanted, false, stuck);
+    const uint64_t removed = delete_oldest(wanted, Spare::NOTHING, stuck);
     if (stuck) {
         err_log("delete %s error", stuck->name().string());
     }
@@ -216,10 +216,10 @@ uint64_t CpDirectory::trim(uint64_t wanted) {
     return removed;
 }
 
-// Deletes files from the front, without those that are protected if spare says so, until the
-// bytes wanted are gone: at least one, if there is one. Ends at the first that can not be
-// deleted, stuck, with its errno. Returns the bytes removed; the sizes stay.
-uint64_t CpDirectory::delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck) {
+// Deletes files from the front, without those that spare says, until the bytes wanted are gone: at
+// least one, if there is one. Ends at the first that can not be deleted, stuck, with its errno.
+// Returns the bytes removed; the sizes stay.
+uint64_t CpDirectory::delete_oldest(uint64_t wanted, Spare spare, const LogFile*& stuck) {
     uint64_t removed = 0;
     if (is_link(m_path)) {
         return removed;
@@ -227,7 +227,7 @@ uint64_t CpDirectory::delete_oldest(uint64_t wanted, bool spare, const LogFile*&
     FileIter it = m_files.begin();
     while (it != m_files.end()) {
         LogFile* file = *it;
-        if (spare && is_protected(file)) {
+        if (is_spared(file, spare)) {
             ++it;
             continue;
         }
@@ -246,14 +246,17 @@ uint64_t CpDirectory::delete_oldest(uint64_t wanted, bool spare, const LogFile*&
     return removed;
 }
 
-bool CpDirectory::is_protected(const LogFile* file) const {
-    return file == m_first_log.get() || file == m_cur_log.get() || file->type() == LT_VERSION ||
-           file->type() == LT_WCDMA_IQ;
+bool CpDirectory::is_spared(const LogFile* file, Spare spare) const {
+    const bool kept_type = spare == Spare::PROTECTED
+                               ? file->type() == LT_VERSION || file->type() == LT_WCDMA_IQ
+                               : file->type() != LT_LOG;
+    return spare != Spare::NOTHING &&
+           (kept_type || file == m_first_log.get() || file == m_cur_log.get());
 }
 
-uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
+uint64_t CpDirectory::trim_working_dir(uint64_t wanted, Spare spare) {
     const LogFile* stuck = nullptr;
-    const uint64_t removed = delete_oldest(wanted, true, stuck);
+    const uint64_t removed = delete_oldest(wanted, spare, stuck);
     if (stuck) {
         err_log("delete %s error", stuck->name().string());
     }

@@ -77,9 +77,9 @@ public:
     // Deletes files from the front until at least the bytes wanted are gone (at least
     // one file is deleted, if there is one). Returns the bytes removed.
     uint64_t trim(uint64_t wanted);
-    // As trim, but spares the first and the current log file, version records and I/Q
-    // captures; renumbers the first log file to follow the oldest one left.
-    uint64_t trim_working_dir(uint64_t wanted);
+    // As trim, but leaves what spare says; renumbers the first log file to follow the oldest one
+    // left.
+    uint64_t trim_working_dir(uint64_t wanted, Spare spare = Spare::PROTECTED);
 
 private:
     typedef android::List<LogFile*>::iterator FileIter;
@@ -91,8 +91,8 @@ private:
     bool taken_by_stranger(const android::String8& name,
                            const std::set<std::string_view>& listed) const;
     FileIter drop(FileIter it);
-    uint64_t delete_oldest(uint64_t wanted, bool spare, const LogFile*& stuck);
-    bool is_protected(const LogFile* file) const;
+    uint64_t delete_oldest(uint64_t wanted, Spare spare, const LogFile*& stuck);
+    bool is_spared(const LogFile* file, Spare spare) const;
     bool leads_away() const;
     void renumber_first_log();
     void insert_scanned(LogFile** files, size_t num);

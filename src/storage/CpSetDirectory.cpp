@@ -114,7 +114,7 @@ size_t CpSetDirectory::recount() {
     return looked_at;
 }
 
-uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted) {
+uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
     uint64_t removed = 0;
     if (is_link(m_path)) {
         return removed;
@@ -122,7 +122,8 @@ uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), 
     android::List<CpDirectory*>::iterator it = m_dirs.begin();
     while (it != m_dirs.end()) {
         CpDirectory* dir = *it;
-        const uint64_t n = (dir->*trim_dir)(wanted);
+        const uint64_t n =
+            spare == Spare::NOTHING ? dir->trim(wanted) : dir->trim_working_dir(wanted, spare);
         removed += n;
         if (dir->empty()) {
             it = m_dirs.erase(it);
@@ -141,9 +142,9 @@ uint64_t CpSetDirectory::trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), 
 }
 
 uint64_t CpSetDirectory::trim(uint64_t wanted) {
-    return trim_with(&CpDirectory::trim, wanted);
+    return trim_with(Spare::NOTHING, wanted);
 }
 
-uint64_t CpSetDirectory::trim_working_dir(uint64_t wanted) {
-    return trim_with(&CpDirectory::trim_working_dir, wanted);
+uint64_t CpSetDirectory::trim_working_dir(uint64_t wanted, Spare spare) {
+    return trim_with(spare, wanted);
 }

@@ -60,11 +60,11 @@ public:
     // removing those that become empty. Returns the bytes removed; the caller subtracts
     // them from the medium's total.
     uint64_t trim(uint64_t wanted);
-    // The same for the set being written: spares the protected files.
-    uint64_t trim_working_dir(uint64_t wanted);
+    // The same for the set being written, without the files that spare says.
+    uint64_t trim_working_dir(uint64_t wanted, Spare spare = Spare::PROTECTED);
 
 private:
-    uint64_t trim_with(uint64_t (CpDirectory::*trim_dir)(uint64_t), uint64_t wanted);
+    uint64_t trim_with(Spare spare, uint64_t wanted);
 
     MediaStorage* m_media;
     android::String8 m_path;

@@ -38,13 +38,12 @@ void CpStorage::flush() {
     if (m_cur_file && !write_out()) {
         // The medium hears of it as of a write: a failing card to which each block is only
         // staged, and lost as it is flushed, would else stay in use for ever.
-        // On a full one the next write makes room: a crash flushes what was logged before, and
-        // its own files would be the first to go.
-        MediaStorage* const media = m_cur_file->media();
+        // On a full one the next write makes room, if that is still so: a crash flushes what was
+        // logged before, and its own files would be the first to go.
         if (errno == ENOSPC) {
-            m_full_media = media;
+            m_was_full = true;
         } else {
-            m_manager->write_failed(media, errno);
+            m_manager->write_failed(m_cur_file->media(), errno);
         }
     }
 }
@@ -53,19 +52,17 @@ int CpStorage::write(const void* data, size_t len) {
     if (m_manager->check_media_change()) {
         stop();
     }
-    if (m_full_media) {
-        MediaStorage* const full = m_full_media;
-        m_full_media = nullptr;
-        if (full == m_manager->get_media_stor()) {  // not another one that has come into use
-            make_room(full);
-        }
-    }
     if (!prepare_write(len)) {
         return -1;
     }
     MediaStorage* media = m_manager->get_media_stor();
     const int n = static_cast<int>(m_cur_file->write(data, len));
+    const bool was_full = m_was_full;
+    m_was_full = false;
     if (n > 0) {
+        if (was_full) {
+            make_room_if_full(media);
+        }
         close_full_file(media);
         keep_quota(media);
     } else if (n == LogFile::FULL) {
@@ -78,7 +75,7 @@ int CpStorage::write(const void* data, size_t len) {
 }
 
 void CpStorage::close_full_file(const MediaStorage* media) {
-    if (m_cur_file->size() >= media->file_size()) {
+    if (m_cur_file && m_cur_file->size() >= media->file_size()) {
         flush();
         if (m_cur_file) {
             m_cur_file->dir()->close_log_file();
@@ -91,6 +88,16 @@ void CpStorage::keep_quota(MediaStorage* media) {
     if (media->check_quota() != 0) {
         m_quota_pending = true;
         flush();
+    }
+}
+
+// Since a flush found a medium full it may have got room, in whatever way, or be another one: what
+// it takes now tells.
+void CpStorage::make_room_if_full(MediaStorage* media) {
+    flush();
+    if (m_was_full) {
+        m_was_full = false;
+        make_room(media);
     }
 }
 
@@ -198,7 +205,7 @@ LogFile* CpStorage::create_file(const android::String8& name, LogType type, Medi
         }
         bool new_dir = false;
         LogFile* file = media->create_file(m_channel->name(), type, new_dir, name);
-        if (file || !m_manager->creation_failed(media, errno)) {
+        if (file || !write_failed(media, errno)) {
             return file;
         }
     }
@@ -211,10 +218,22 @@ int CpStorage::check_quota(MediaType media_type) {
     return media ? media->check_quota() : 0;
 }
 
+void CpStorage::trim_old_sets() {
+    if (MediaStorage* const media = m_manager->get_media_stor()) {
+        media->trim_old_sets();
+    }
+}
+
 bool CpStorage::write_failed(MediaStorage* media, int error) {
-    const bool again = m_manager->creation_failed(media, error);
+    const bool again =
+        error == ENOSPC ? media->free_logs() == 0 : m_manager->creation_failed(media, error);
     errno = error;
     return again;
+}
+
+bool CpStorage::copy_again(const LogFile* file, int result, int tries) {
+    return result == LogFile::NOT_TAKEN && write_failed(file->media(), errno) &&
+           tries < (errno == ENOSPC ? 2 : 3);
 }
 
 void CpStorage::subscribe_media_change_evt(StorageManager::media_change_callback callback,

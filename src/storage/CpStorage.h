@@ -51,10 +51,17 @@ public:
     // Trims the medium to its quota. 0 when it is within it now or there is no such
     // medium, else -1.
     int check_quota(MediaType media);
+    // Trims the medium in use to its quota, but for the set in use, of which no capture is deleted:
+    // all else in it would go in vain.
+    void trim_old_sets();
     // Another file than the log could not be written, for the reason error: as after a failed
-    // write of the log an SD card is left for now, or room is made on a full medium. True when
-    // another try may come to something. errno becomes error.
+    // write of the log an SD card is left for now, or room is made on a full medium, by deleting
+    // older sets and logs only. True when another try may come to something. errno becomes error.
     bool write_failed(MediaStorage* media, int error);
+    // After a copy into a file that is not a log, with its result, errno, and the number of tries
+    // so far: true when the medium is to blame and another file may be tried. A card seems to
+    // work again after its first failure, so that it takes two to find the other medium.
+    bool copy_again(const LogFile* file, int result, int tries);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
     void unsubscribe_media_change_evt(void* client);
@@ -71,6 +78,7 @@ private:
     bool prepare_write(size_t len);
     void close_full_file(const MediaStorage* media);
     void keep_quota(MediaStorage* media);
+    void make_room_if_full(MediaStorage* media);
     void make_room(MediaStorage* media);
     bool prepare_file();
     bool open_log_file(MediaStorage* media);
@@ -81,8 +89,8 @@ private:
     new_log_callback m_new_log_cb = nullptr;
     new_dir_callback m_new_dir_cb = nullptr;
     ObjectRef<LogFile> m_cur_file;
-    bool m_quota_pending = false;          // the next write has to pass the quota check first
-    MediaStorage* m_full_media = nullptr;  // what was staged found it full; lives as the manager
+    bool m_quota_pending = false;  // the next write has to pass the quota check first
+    bool m_was_full = false;       // what was staged found the medium full
 };
 
 #endif  // STORAGE_CPSTORAGE_H_

@@ -15,4 +15,11 @@ enum LogType : int {
     LT_WCDMA_IQ = 8    // WCDMA I/Q capture; becomes LT_UNKNOWN when scanned
 };
 
+// What trimming leaves alone.
+enum class Spare {
+    NOTHING,
+    PROTECTED,    // of a directory in use: first and current log, version records, I/Q captures
+    ALL_BUT_LOGS  // first and current log, and all that is no log
+};
+
 #endif  // STORAGE_LOGTYPE_H_

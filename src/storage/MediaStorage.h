@@ -90,6 +90,8 @@ public:
     // Trims to the quota. 0 when the total is within it now, else -1. Files deleted by
     // somebody else are found missing before it gives up.
     int check_quota();
+    // The same without the working set.
+    void trim_old_sets();
     // For a medium that is above its quota even after check_quota, because trimming spares
     // files in the working set: starts a new set, so that the old one can be trimmed like any
     // other. At most once per file size of data that arrived. True when the total is within
@@ -98,6 +100,9 @@ public:
     // Frees one file size after the medium ran full. 0 when at least half of it could
     // be freed, else -1.
     int free_space();
+    // The same for a file that is not a log. What was saved in the working set stays: it may be
+    // of the same crash.
+    int free_logs();
 
     // Forgets all sets, so that the next use scans again; nothing on the medium changes.
     void clear();
@@ -105,6 +110,8 @@ public:
     void clear_all();
 
 private:
+    uint64_t trim_sets_before(uint64_t wanted);
+    uint64_t trim_working_set(uint64_t wanted, Spare spare);
     int prepare_top_dir() const;
     int remake_log_root();
     int scan_sets();
@@ -113,6 +120,7 @@ private:
     void drop_working_set();
     bool above_quota() const;
     bool recount_helps();
+    void recount_if_uncertain();
     void recount();
 
     StorageManager* m_manager;

@@ -21,6 +21,11 @@ constexpr size_t FILES_PER_CHECK = 32;
 }  // namespace
 
 uint64_t MediaStorage::trim(uint64_t wanted) {
+    const uint64_t removed = trim_sets_before(wanted);
+    return removed + trim_working_set(wanted - std::min(wanted, removed), Spare::PROTECTED);
+}
+
+uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
     uint64_t removed = 0;
     if (leads_away()) {
         return removed;
@@ -42,17 +47,20 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
             ++it;
         }
         if (n >= wanted) {
-            wanted = 0;
             break;
         }
         wanted -= n;
     }
     m_size -= removed;
-    if (wanted > 0 && m_working_set) {
-        const uint64_t n = m_working_set->trim_working_dir(wanted);
-        m_size -= n;
-        removed += n;
+    return removed;
+}
+
+uint64_t MediaStorage::trim_working_set(uint64_t wanted, Spare spare) {
+    if (wanted == 0 || !m_working_set || leads_away()) {
+        return 0;
     }
+    const uint64_t removed = m_working_set->trim_working_dir(wanted, spare);
+    m_size -= removed;
     return removed;
 }
 
@@ -60,10 +68,21 @@ bool MediaStorage::above_quota() const {
     return m_quota != 0 && m_size > m_quota;
 }
 
-int MediaStorage::check_quota() {
+void MediaStorage::trim_old_sets() {
+    recount_if_uncertain();
+    if (above_quota() && m_overwrite) {
+        trim_sets_before(m_size - m_quota);
+    }
+}
+
+void MediaStorage::recount_if_uncertain() {
     if (above_quota() && m_uncertain) {
         recount();
     }
+}
+
+int MediaStorage::check_quota() {
+    recount_if_uncertain();
     if (above_quota() && m_overwrite) {
         info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
                  static_cast<unsigned int>(m_quota >> 20));
@@ -131,4 +150,13 @@ int MediaStorage::free_space() {
         return -1;
     }
     return trim(m_file_size) >= m_file_size / 2 ? 0 : -1;
+}
+
+int MediaStorage::free_logs() {
+    if (!m_overwrite) {
+        return -1;
+    }
+    const uint64_t removed = trim_sets_before(m_file_size);
+    const uint64_t left = m_file_size - std::min<uint64_t>(m_file_size, removed);
+    return removed + trim_working_set(left, Spare::ALL_BUT_LOGS) >= m_file_size / 2 ? 0 : -1;
 }

@@ -48,31 +48,51 @@ TEST_F(CpEventsTest, CrashesKeepTheQuota) {
     EXPECT_GT(files().size(), 2u);
 }
 
-// A medium that does not take the material: the other one does, or room is made.
+// A medium that does not take the material: the other one does, or room is made; not by deleting
+// what was just saved. A dying card may take a single byte.
 TEST_F(CpEventsTest, CrashMaterialOutlivesItsMedium) {
     const std::string old = "sd/modem_log/2016-02-01-00-00-00/cp_gnss/old";
-    for (const int error : {EIO, ENOSPC}) {
-        root.write_file(old, std::string(3 << 20, 'x'));
+    const std::string stamp(STAMP), smsg = "smsg" + stamp + ".log";
+    const struct {
+        const char* what;
+        int error;
+        const char* failing;  // in the path
+        std::string medium;
+        bool room;  // can be made
+        const char* lost;
+    } cases[] = {
+        {"the card fails", EIO, "/sd/", "data:", false, ""},
+        {"both fail", EIO, "/sd/", "data:", false, "save DIPX smsg info failed [20("},
+        {"full", ENOSPC, "/sd/", "sd:", true, ""},
+        {"full for the dump", ENOSPC, "mini_dump", "sd:", false, "save mini dump error [28("},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
+        root.write_file(old, std::string(c.room ? 3 << 20 : 0, 'x'));
         set_card(true);
         ASSERT_NO_FATAL_FAILURE(boot_supervised());
         ASSERT_TRUE(both_log("<start>"));
+        const bool inside = strcmp(c.what, "both fail") != 0;
+        if (!inside) {
+            remove_tree("data/modem_log");
+            root.write_file("data/modem_log", "in the way");
+        }
         bool failing = true;
         faults::instead.write = [&](int fd, const void* data, size_t len) {
-            char path[500] = "";
-            const std::string link = "/proc/self/fd/" + std::to_string(fd);
-            failing = failing && (error == EIO || root.exists(old));
-            errno = error;
-            return failing && readlink(link.c_str(), path, 499) > 0 && strstr(path, "/sd/")
-                       ? -1
-                       : real::write(fd, data, len);
+            const std::string path = faults::path_of(fd);
+            failing = failing && (!c.room || root.exists(old));
+            const bool fails = failing && path.find(c.failing) != std::string::npos &&
+                               path.find(".write_test") == std::string::npos;
+            return fails ? (errno = c.error, ssize_t{-1}) : real::write(fd, data, len);
         };
         modem()->process_assert(true);
         faults::instead = {};
-        const std::string medium = error == EIO ? "data:" : "sd:";
+        EXPECT_TRUE(log.has(c.lost)) << log.text();
         Files saved = files("cp_wcdma");
-        EXPECT_EQ(saved[medium + "smsg" + STAMP + ".log"], "S") << error;
-        EXPECT_EQ(saved[medium + "mini_dump" + STAMP + ".bin"], "MINI W") << error;
+        EXPECT_EQ(saved[c.medium + smsg], inside ? "S" : "");
+        EXPECT_EQ(saved[c.medium + "mini_dump" + stamp + ".bin"], *c.lost ? "" : "MINI W");
         end_service();
+        remove_tree("data/modem_log");
     }
 }
 

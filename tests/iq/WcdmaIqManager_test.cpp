@@ -332,10 +332,14 @@ TEST_F(WcdmaIqManagerTest, AMediumThatTakesNothingIsLeftOrMadeRoomOn) {
     EXPECT_FALSE(root.exists(sets + "1" + file));
     EXPECT_TRUE(root.exists(sets + "2" + file));
     script.fail_at = 0;
-    // With the logs off nothing else kept the quota.
+    // With the logs off nothing else kept the quota. What is saved with the captures stays.
     ASSERT_EQ(ctrl->set_data_part_size(1), 0);
-    ASSERT_TRUE(save("first") && save("second"));
+    bool new_dir;
+    internal->create_file(android::String8("cp_gnss"), LT_DUMP, new_dir, android::String8("dump"))
+        ->close();
+    ASSERT_TRUE(save(std::string(MB + 1, 'x')) && save("second"));
     EXPECT_FALSE(root.exists(sets + "2" + file));
+    EXPECT_EQ(root.find("dump").size(), 1u);
     set_card(true);
     ASSERT_TRUE(save("on the card"));
     EXPECT_EQ(iq_files().back().compare(0, 2, "sd"), 0) << iq_files().back();

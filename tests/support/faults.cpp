@@ -135,6 +135,12 @@ bool hit(Call call) {
     return s_faults[call].hit;
 }
 
+std::string path_of(int fd) {
+    char path[500] = "";
+    const ssize_t len = readlink(("/proc/self/fd/" + std::to_string(fd)).c_str(), path, 499);
+    return len > 0 ? path : "";
+}
+
 void set_time(time_t now) {
     s_time = now;
 }

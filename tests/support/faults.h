@@ -39,6 +39,9 @@ bool hit(Call call);
 // What time() returns from now on; 0: the real time; -1: it fails.
 void set_time(time_t now);
 
+// The path of an open file, for a function that runs instead.
+std::string path_of(int fd);
+
 // Functions of the test's that run instead, as long as they are set.
 struct Instead {
 #define MEMBER(NAME, name, kind, result, params, args) std::function<result params> name;
