@@ -60,17 +60,3 @@ int parse_leading_number(const uint8_t* text, size_t len, uint32_t& value, size_
     digits = n;
     return 0;
 }
-
-int parse_number(const uint8_t* text, size_t len, uint32_t& value) {
-    if (len == 0) {
-        value = 0;
-        return 0;
-    }
-    size_t digits;
-    uint32_t number;
-    if (parse_leading_number(text, len, number, digits) < 0 || digits != len) {
-        return -1;
-    }
-    value = number;
-    return 0;
-}

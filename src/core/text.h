@@ -21,13 +21,9 @@ bool token_equals(const uint8_t* token, size_t len, const char* word);
 // First position where the pattern occurs, or null. An empty pattern is never found.
 const uint8_t* find_bytes(const uint8_t* text, size_t len, const void* pattern, size_t pattern_len);
 
-// Whole-field decimal number: every byte must be a digit; an empty field gives 0.
-// The value is kept in 32 bits and wraps; the parse fails (-1) on a byte that is no
-// digit and when the value already is 4294967295 before another digit. 0 on success.
-int parse_number(const uint8_t* text, size_t len, uint32_t& value);
-
-// Leading decimal number: the first byte must be a digit (else -1); digits are read
-// while present, with the overflow rule of parse_number. Stores how many were read.
+// Leading decimal number: the first byte must be a digit (else -1); digits are read while
+// present. The value is kept in 32 bits and wraps; -1 also when it already is 4294967295 before
+// another digit. Stores how many digits were read.
 int parse_leading_number(const uint8_t* text, size_t len, uint32_t& value, size_t& digits);
 
 #endif  // CORE_TEXT_H_

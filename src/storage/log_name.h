@@ -38,7 +38,7 @@ LogType parse_log_name(const char* name, size_t len, LogTime& time);
 
 // The rotation number at the head of a log file's name: a digit run followed by "-".
 // digits gets the length of the run. -1 when the name has none, or one that
-// parse_number refuses.
+// parse_leading_number refuses.
 int parse_log_number(const android::String8& name, uint32_t& number, size_t& digits);
 
 // The name with another number in place of the old_digits digits at its head.
