@@ -224,7 +224,11 @@ Bytes chunk_payload(const Bytes& bytes, uint8_t kind) {
         const bool wanted = bytes.data[at + 19] == kind;
         const size_t from = at + CHUNK_HEADER_LEN;
         const size_t end = std::min(from + len, bytes.size);
-        at = from;
+        // What follows tells that the chunk is whole, though it may end like the next one begins.
+        const bool whole =
+            from + len <= bytes.size &&
+            memcmp(bytes.data + end, "~~~~", std::min<size_t>(bytes.size - end, 4)) == 0;
+        at = whole ? end : from;
         while (at < end && !chunk_begins(bytes, at)) {
             const void* const flag = memchr(bytes.data + at + 1, '~', end - at - 1);
             at = flag ? static_cast<size_t>(static_cast<const uint8_t*>(flag) - bytes.data) : end;
