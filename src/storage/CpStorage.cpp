@@ -232,8 +232,10 @@ bool CpStorage::write_failed(MediaStorage* media, int error) {
 }
 
 bool CpStorage::copy_again(const LogFile* file, int result, int tries) {
-    return result == LogFile::NOT_TAKEN && write_failed(file->media(), errno) &&
-           tries < (errno == ENOSPC ? 2 : 3);
+    if (result != LogFile::NOT_TAKEN || (errno == ENOSPC && tries > 1)) {
+        return false;
+    }
+    return write_failed(file->media(), errno) && tries < 3;
 }
 
 void CpStorage::subscribe_media_change_evt(StorageManager::media_change_callback callback,
