@@ -126,6 +126,36 @@ TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
     faults::instead = {};
 }
 
+TEST_F(FailingMediumTest, WhatCannotBeMadeOnAMedium) {
+    const std::string old = "data/modem_log/2016-02-01-00-00-00/cp_gnss/old";
+    m_root.write_file(old, "12345678");
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    m_mgr.set_file_size(16);
+    faults::fail(faults::MKDIR, 1, ENOSPC);  // a set
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_FALSE(m_root.exists(old)) << "no room was made";
+    NamedChannel channel("cp_wcn");
+    CpStorage* const other = m_mgr.create_storage(&channel);
+    EXPECT_EQ(other->write("x", 1), 1);
+    plug_card();
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_EQ(other->write("x", 1), 1);
+    EXPECT_TRUE(other->on_sd(other->current_file())) << "all logs go to the card";
+    m_store->stop();
+    faults::only_on("sd/modem_log/2016");
+    faults::fail(faults::OPEN, 1, EIO, faults::FOREVER);  // a log file
+    EXPECT_EQ(lost_of(3, "x"), 2);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    int told = 0;
+    m_mgr.subscribe_ext_stor_umount_evt(&told, [](void* n) { ++*static_cast<int*>(n); });
+    pull_card();
+    EXPECT_EQ(lost_of(1, "x"), 0);
+    EXPECT_EQ(told, 1) << "a dump may lie on it";
+    m_mgr.unsubscribe_ext_stor_umount_evt(&told);
+    m_mgr.delete_storage(other);
+}
+
 // A broken medium may say of every name that it is taken.
 TEST_F(FailingMediumTest, NamesAreNotTriedForEver) {
     faults::fail(faults::OPEN, 1, EEXIST, faults::FOREVER);

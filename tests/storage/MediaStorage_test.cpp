@@ -58,6 +58,26 @@ TEST_F(MediaStorageTest, WhatVanishedLeavesTheTotals) {
     }
 }
 
+TEST_F(MediaStorageTest, TheTotalsFollowTheMedium) {
+    init();
+    internal().set_quota(10);
+    LogFile* const gone = make("cp");
+    gone->write("12345678", 8);
+    make("cp", LT_DUMP, "dump")->write("12345678", 8);
+    ASSERT_EQ(unlink(m_root.path(ROOT + TODAY + "/cp/" + gone->name().string()).c_str()), 0);
+    gone->dir()->file_removed(gone);
+    EXPECT_EQ(internal().check_quota(), 0) << "nothing is trimmed for it";
+    EXPECT_EQ(m_root.find("dump").size(), 1u);
+    internal().set_quota(1);
+    faults::fail(faults::UNLINK, 1, EIO);
+    EXPECT_EQ(internal().check_quota(), -1);
+    EXPECT_EQ(internal().size(), 8u) << "it is still there";
+    remove_tree(m_root.path(ROOT + TODAY).c_str());
+    make("cp")->write("1", 1);
+    EXPECT_EQ(internal().size(), 1u);
+    check_sums(internal());
+}
+
 // Counting looks at every file, and a check is made for every block that is refused.
 TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
     init();
