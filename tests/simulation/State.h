@@ -8,6 +8,8 @@
 #include <stddef.h>
 #include <stdint.h>
 
+#include "config/CpType.h"
+
 // The log streams, one a channel, and what else goes into the log of the audio DSP.
 enum StreamId : unsigned {
     ST_WCDMA,
@@ -22,6 +24,8 @@ enum StreamId : unsigned {
 // Those of the channels are also their directories'.
 constexpr const char* STREAM_NAMES[STREAM_COUNT] = {"cp_wcdma", "cp_wcn",  "cp_gnss",
                                                     "agdsp",    "DSP PCM", "DSP dump"};
+constexpr CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN,   CT_GNSS,
+                                               CT_AGDSP, CT_AGDSP, CT_AGDSP};
 enum MediumId : unsigned { MED_DATA, MED_CARD, MEDIUM_COUNT };
 
 // The settings that clients can ask for, as they were set last.

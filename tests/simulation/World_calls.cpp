@@ -15,7 +15,6 @@ namespace {
 
 // So long after everything was put in order the service has found out.
 constexpr int64_t CALM_AFTER_NS = int64_t{65} * 1000000000;
-const CpType STREAM_TYPES[STREAM_COUNT] = {CT_WCDMA, CT_WCN, CT_GNSS, CT_AGDSP, CT_AGDSP, CT_AGDSP};
 
 }  // namespace
 

@@ -2,6 +2,7 @@
 // The part of World that compares what the service holds and has written with what it should.
 #include <fstream>
 
+#include "channels/LogPipeHandler.h"
 #include "control/LogController.h"
 #include "simulation/Ledger.h"
 #include "simulation/World.h"
@@ -154,6 +155,10 @@ void World::check_descriptors() const {
         ++count[info.cls];
         if (info.cls == FD_LOG_DEVICE || info.cls == FD_DIAG_DEVICE) {
             ++devices[info.stream];
+        }
+        if (info.cls == FD_LOG_FILE &&
+            !m_controller->get_cp(STREAM_TYPES[info.stream])->enabled()) {
+            fail_run("leak", "a log file of stream %u is open, and its log is off", info.stream);
         }
     }
     const unsigned most[FD_CLASS_COUNT] = {
