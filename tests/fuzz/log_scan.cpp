@@ -169,8 +169,8 @@ void check_own_frames(const uint8_t* data, size_t size) {
         std::string payload(kind % 2 ? kind % 32 : kind, 'x');
         payload.insert(payload.size() * (data[(2 * i + 1) % size] % 4) / 3, ODD[kind >> 5]);
         DiagHeader header{i, 0, static_cast<uint8_t>(i + 3), 0};
-        header.len = static_cast<uint16_t>(sizeof(header) + payload.size() -
-                                           std::count(payload.begin(), payload.end(), '}'));
+        const auto escapes = static_cast<size_t>(std::count(payload.begin(), payload.end(), '}'));
+        header.len = static_cast<uint16_t>(sizeof(header) + payload.size() - escapes);
         uint8_t escaped[2 * sizeof(header)];
         const size_t len = DiagFrameParser::escape(reinterpret_cast<const uint8_t*>(&header),
                                                    sizeof(header), escaped);
