@@ -125,7 +125,7 @@ bool ModemDumpConsumer::save_dump_file() {
     m_handler->del_events(POLLIN);
     LogFile* file = nullptr;
     int result = LogFile::NOT_TAKEN;
-    for (int tries = 1;; ++tries) {
+    for (CpStorage::CopyTries tries;;) {
         file = open_dump_mem_file();
         if (!file) {
             err_log("create dump mem file failed");

@@ -15,10 +15,10 @@ enum SaveResult { SAVED, NO_FILE, NO_COPY };
 // take it, it is tried again, with room made or on the other medium. errno is the reason.
 SaveResult save_copy(CpStorage* storage, const android::String8& name, LogType type,
                      MediaType media_type, const char* source) {
-    for (int tries = 1;; ++tries) {
+    for (CpStorage::CopyTries tries;;) {
         LogFile* file = storage->create_file(name, type, media_type);
         if (!file) {
-            return tries == 1 ? NO_FILE : NO_COPY;
+            return tries.failed == 0 ? NO_FILE : NO_COPY;
         }
         const int result = file->copy(system_path(source).string());
         if (result == 0) {

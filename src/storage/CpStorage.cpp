@@ -60,8 +60,9 @@ int CpStorage::write(const void* data, size_t len) {
     const bool was_full = m_was_full;
     m_was_full = false;
     if (n > 0) {
-        if (was_full) {
-            make_room_if_full(media);
+        if (was_full && !has_room(media)) {
+            errno = ENOSPC;
+            return LogFile::FULL;
         }
         close_full_file(media);
         keep_quota(media);
@@ -92,13 +93,15 @@ void CpStorage::keep_quota(MediaStorage* media) {
 }
 
 // Since a flush found a medium full it may have got room, in whatever way, or be another one: what
-// it takes now tells.
-void CpStorage::make_room_if_full(MediaStorage* media) {
+// it takes now tells. False when it is still full; then room was made.
+bool CpStorage::has_room(MediaStorage* media) {
     flush();
-    if (m_was_full) {
-        m_was_full = false;
-        make_room(media);
+    if (!m_was_full) {
+        return true;
     }
+    m_was_full = false;
+    make_room(media);
+    return false;
 }
 
 // After a write that the full medium did not take.
@@ -205,7 +208,8 @@ LogFile* CpStorage::create_file(const android::String8& name, LogType type, Medi
         }
         bool new_dir = false;
         LogFile* file = media->create_file(m_channel->name(), type, new_dir, name);
-        if (file || !write_failed(media, errno)) {
+        const bool still_full = tries > 0 && errno == ENOSPC;
+        if (file || still_full || !write_failed(media, errno)) {
             return file;
         }
     }
@@ -231,11 +235,14 @@ bool CpStorage::write_failed(MediaStorage* media, int error) {
     return again;
 }
 
-bool CpStorage::copy_again(const LogFile* file, int result, int tries) {
-    if (result != LogFile::NOT_TAKEN || (errno == ENOSPC && tries > 1)) {
+bool CpStorage::copy_again(const LogFile* file, int result, CopyTries& tries) {
+    ++tries.failed;
+    const bool full = errno == ENOSPC;
+    if (result != LogFile::NOT_TAKEN || (full && tries.made_room)) {
         return false;
     }
-    return write_failed(file->media(), errno) && tries < 3;
+    tries.made_room = tries.made_room || full;
+    return write_failed(file->media(), errno) && tries.failed < (tries.made_room ? 4 : 3);
 }
 
 void CpStorage::subscribe_media_change_evt(StorageManager::media_change_callback callback,

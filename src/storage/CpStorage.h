@@ -51,17 +51,21 @@ public:
     // Trims the medium to its quota. 0 when it is within it now or there is no such
     // medium, else -1.
     int check_quota(MediaType media);
-    // Trims the medium in use to its quota, but for the set in use, of which no capture is deleted:
-    // all else in it would go in vain.
+    // Trims the medium in use to its quota by deleting older sets only: captures in the set in use
+    // are spared, so that deleting the rest of it would not help.
     void trim_old_sets();
     // Another file than the log could not be written, for the reason error: as after a failed
     // write of the log an SD card is left for now, or room is made on a full medium, by deleting
     // older sets and logs only. True when another try may come to something. errno becomes error.
     bool write_failed(MediaStorage* media, int error);
-    // After a copy into a file that is not a log, with its result, errno, and the number of tries
-    // so far: true when the medium is to blame and another file may be tried. A card seems to
-    // work again after its first failure, so that it takes two to find the other medium.
-    bool copy_again(const LogFile* file, int result, int tries);
+    struct CopyTries {
+        int failed = 0;
+        bool made_room = false;
+    };
+    // After a copy into a file that is not a log, with its result and errno: true when the medium
+    // is to blame and another file may be tried. A card seems to work again after its first
+    // failure, so that it takes two to find the other medium. Room is made once.
+    bool copy_again(const LogFile* file, int result, CopyTries& tries);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
     void unsubscribe_media_change_evt(void* client);
@@ -78,7 +82,7 @@ private:
     bool prepare_write(size_t len);
     void close_full_file(const MediaStorage* media);
     void keep_quota(MediaStorage* media);
-    void make_room_if_full(MediaStorage* media);
+    bool has_room(MediaStorage* media);
     void make_room(MediaStorage* media);
     bool prepare_file();
     bool open_log_file(MediaStorage* media);

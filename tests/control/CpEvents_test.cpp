@@ -51,24 +51,27 @@ TEST_F(CpEventsTest, CrashesKeepTheQuota) {
 // A medium that does not take the material: the other one does, or room is made; not by deleting
 // what was just saved. A dying card may take a single byte.
 TEST_F(CpEventsTest, CrashMaterialOutlivesItsMedium) {
-    const std::string old = "sd/modem_log/2016-02-01-00-00-00/cp_gnss/old";
     const std::string stamp(STAMP), smsg = "smsg" + stamp + ".log";
     const struct {
         const char* what;
         int error;
         const char* failing;  // in the path
         std::string medium;
-        bool room;  // can be made
+        std::string full;  // as long as an older set is there
         const char* lost;
     } cases[] = {
-        {"the card fails", EIO, "/sd/", "data:", false, ""},
-        {"both fail", EIO, "/sd/", "data:", false, "save DIPX smsg info failed [20("},
-        {"full", ENOSPC, "/sd/", "sd:", true, ""},
-        {"full for the dump", ENOSPC, "mini_dump", "sd:", false, "save mini dump error [28("},
+        {"the card fails", EIO, "/sd/", "data:", "", ""},
+        {"the card fails, full inside", EIO, "/sd/", "data:", "data", ""},
+        {"both fail", EIO, "/sd/", "data:", "", "save DIPX smsg info failed [20("},
+        {"full", 0, "?", "sd:", "sd", ""},
+        {"full for the dump", ENOSPC, "mini_dump", "sd:", "", "save mini dump error [28("},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
-        root.write_file(old, std::string(c.room ? 3 << 20 : 0, 'x'));
+        const std::string old = c.full + "/modem_log/2016-02-01-00-00-00/cp_gnss/old";
+        if (!c.full.empty()) {
+            root.write_file(old, std::string(3 << 20, 'x'));
+        }
         set_card(true);
         ASSERT_NO_FATAL_FAILURE(boot_supervised());
         ASSERT_TRUE(both_log("<start>"));
@@ -77,13 +80,14 @@ TEST_F(CpEventsTest, CrashMaterialOutlivesItsMedium) {
             remove_tree("data/modem_log");
             root.write_file("data/modem_log", "in the way");
         }
-        bool failing = true;
         faults::instead.write = [&](int fd, const void* data, size_t len) {
             const std::string path = faults::path_of(fd);
-            failing = failing && (!c.room || root.exists(old));
-            const bool fails = failing && path.find(c.failing) != std::string::npos &&
+            const bool full = !c.full.empty() && root.exists(old) &&
+                              path.find("/" + c.full + "/") != std::string::npos;
+            const bool fails = path.find(c.failing) != std::string::npos &&
                                path.find(".write_test") == std::string::npos;
-            return fails ? (errno = c.error, ssize_t{-1}) : real::write(fd, data, len);
+            errno = full ? ENOSPC : c.error;
+            return full || fails ? ssize_t{-1} : real::write(fd, data, len);
         };
         modem()->process_assert(true);
         faults::instead = {};
@@ -92,7 +96,9 @@ TEST_F(CpEventsTest, CrashMaterialOutlivesItsMedium) {
         EXPECT_EQ(saved[c.medium + smsg], inside ? "S" : "");
         EXPECT_EQ(saved[c.medium + "mini_dump" + stamp + ".bin"], *c.lost ? "" : "MINI W");
         end_service();
-        remove_tree("data/modem_log");
+        if (!inside) {
+            remove_tree("data/modem_log");
+        }
     }
 }
 

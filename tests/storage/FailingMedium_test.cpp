@@ -90,7 +90,7 @@ TEST_F(FailingMediumTest, RoomIsMadeOnAMediumThatIsStillFull) {
         if (now == "pulled") {
             pull_card();
         }
-        EXPECT_EQ(lost_of(1, "x"), 0);
+        EXPECT_EQ(lost_of(1, "x"), now == "full" ? 1 : 0);
         EXPECT_EQ(m_root.exists("sd/" + old), now != "full") << now;
         EXPECT_TRUE(m_root.exists("data/" + old)) << now;
         faults::instead = {};
@@ -127,14 +127,21 @@ TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
 }
 
 TEST_F(FailingMediumTest, WhatCannotBeMadeOnAMedium) {
-    const std::string old = "data/modem_log/2016-02-01-00-00-00/cp_gnss/old";
-    m_root.write_file(old, "12345678");
+    const std::string old = "data/modem_log/2016-02-0", file = "-00-00-00/cp_gnss/old";
+    for (const char* number : {"1", "2", "3"}) {
+        m_root.write_file(old + number + file, "0123456789abcdef");
+    }
     internal().clear();
     ASSERT_EQ(internal().stat(), 0);
     m_mgr.set_file_size(16);
     faults::fail(faults::MKDIR, 1, ENOSPC);  // a set
     EXPECT_EQ(lost_of(1, "x"), 0);
-    EXPECT_FALSE(m_root.exists(old)) << "no room was made";
+    EXPECT_FALSE(m_root.exists(old + "1" + file)) << "no room was made";
+    faults::only_on("dump");
+    faults::fail(faults::OPEN, 1, ENOSPC, 2);  // a file that is not a log
+    EXPECT_EQ(m_store->create_file("dump", LT_DUMP), nullptr);
+    EXPECT_FALSE(m_root.exists(old + "2" + file)) << "no room was made";
+    EXPECT_TRUE(m_root.exists(old + "3" + file)) << "room is made once";
     NamedChannel channel("cp_wcn");
     CpStorage* const other = m_mgr.create_storage(&channel);
     EXPECT_EQ(other->write("x", 1), 1);

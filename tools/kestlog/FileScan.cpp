@@ -200,7 +200,7 @@ private:
     size_t measure_frames(const uint8_t* data, size_t len) {
         size_t used = 0;
         DiagHeader header;
-        for (size_t body_len; !m_stop;) {
+        for (size_t body_len = 0; !m_stop;) {
             const size_t size =
                 m_index.measure(data + used, len - used, m_in.offset() + used, header, body_len);
             const bool end = m_name.framed_dump && is_end_len(body_len);
