@@ -125,14 +125,14 @@ bool ModemDumpConsumer::save_dump_file() {
     m_handler->del_events(POLLIN);
     LogFile* file = nullptr;
     int result = LogFile::NOT_TAKEN;
-    for (CpStorage::CopyTries tries;;) {
+    for (CpStorage::Tries tries;;) {
         file = open_dump_mem_file();
         if (!file) {
             err_log("create dump mem file failed");
             return false;
         }
         result = file->copy(m_mem_path);
-        if (!m_storage->copy_again(file, result, tries)) {
+        if (result != LogFile::NOT_TAKEN || !m_storage->try_again(file->media(), tries)) {
             break;
         }
         file->discard();

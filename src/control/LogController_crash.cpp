@@ -15,7 +15,7 @@ enum SaveResult { SAVED, NO_FILE, NO_COPY };
 // take it, it is tried again, with room made or on the other medium. errno is the reason.
 SaveResult save_copy(CpStorage* storage, const android::String8& name, LogType type,
                      MediaType media_type, const char* source) {
-    for (CpStorage::CopyTries tries;;) {
+    for (CpStorage::Tries tries;;) {
         LogFile* file = storage->create_file(name, type, media_type);
         if (!file) {
             return tries.failed == 0 ? NO_FILE : NO_COPY;
@@ -26,7 +26,7 @@ SaveResult save_copy(CpStorage* storage, const android::String8& name, LogType t
             return SAVED;
         }
         const SavedErrno copy_errno;
-        const bool again = storage->copy_again(file, result, tries);
+        const bool again = result == LogFile::NOT_TAKEN && storage->try_again(file->media(), tries);
         file->discard();
         if (!again) {
             return NO_COPY;

@@ -187,7 +187,7 @@ void WcdmaIqManager::process(int /*events*/) {
         note_saved(false);
         return;
     }
-    // While the CP logs nothing nobody else would: without this the captures of each start pile up.
+    // While the CP logs nothing, nobody else trims, and the captures of each start would pile up.
     m_storage->trim_old_sets();
     m_cur_file = create_iq_file();
     if (!m_cur_file) {

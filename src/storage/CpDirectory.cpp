@@ -216,7 +216,7 @@ uint64_t CpDirectory::trim(uint64_t wanted) {
     return removed;
 }
 
-// Deletes files from the front, without those that spare says, until the bytes wanted are gone: at
+// Deletes files from the front, but for those that spare names, until the bytes wanted are gone: at
 // least one, if there is one. Ends at the first that can not be deleted, stuck, with its errno.
 // Returns the bytes removed; the sizes stay.
 uint64_t CpDirectory::delete_oldest(uint64_t wanted, Spare spare, const LogFile*& stuck) {

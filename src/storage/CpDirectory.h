@@ -77,9 +77,9 @@ public:
     // Deletes files from the front until at least the bytes wanted are gone (at least
     // one file is deleted, if there is one). Returns the bytes removed.
     uint64_t trim(uint64_t wanted);
-    // As trim, but leaves what spare says; renumbers the first log file to follow the oldest one
-    // left.
-    uint64_t trim_working_dir(uint64_t wanted, Spare spare = Spare::PROTECTED);
+    // As trim, but leaves the files that spare names; renumbers the first log file to follow the
+    // oldest one left.
+    uint64_t trim_working_dir(uint64_t wanted, Spare spare);
 
 private:
     typedef android::List<LogFile*>::iterator FileIter;

@@ -60,8 +60,8 @@ public:
     // removing those that become empty. Returns the bytes removed; the caller subtracts
     // them from the medium's total.
     uint64_t trim(uint64_t wanted);
-    // The same for the set being written, without the files that spare says.
-    uint64_t trim_working_dir(uint64_t wanted, Spare spare = Spare::PROTECTED);
+    // The same for the set being written, but leaves the files that spare names.
+    uint64_t trim_working_dir(uint64_t wanted, Spare spare);
 
 private:
     uint64_t trim_with(Spare spare, uint64_t wanted);

@@ -195,9 +195,9 @@ bool CpStorage::open_log_file(MediaStorage* media) {
 }
 
 LogFile* CpStorage::create_file(const android::String8& name, LogType type, MediaType media_type) {
-    // Crash material has no next write: a medium that was full or has failed is tried a
-    // second time, or the other one instead of it.
-    for (int tries = 0; tries < 2; ++tries) {
+    // Crash material has no next write: a medium that was full or has failed is tried again, or
+    // the other one instead of it.
+    for (Tries tries;;) {
         if (media_type == MT_NONE) {
             m_manager->check_media_change();
         }
@@ -208,12 +208,10 @@ LogFile* CpStorage::create_file(const android::String8& name, LogType type, Medi
         }
         bool new_dir = false;
         LogFile* file = media->create_file(m_channel->name(), type, new_dir, name);
-        const bool still_full = tries > 0 && errno == ENOSPC;
-        if (file || still_full || !write_failed(media, errno)) {
+        if (file || !try_again(media, tries)) {
             return file;
         }
     }
-    return nullptr;
 }
 
 int CpStorage::check_quota(MediaType media_type) {
@@ -235,14 +233,14 @@ bool CpStorage::write_failed(MediaStorage* media, int error) {
     return again;
 }
 
-bool CpStorage::copy_again(const LogFile* file, int result, CopyTries& tries) {
+bool CpStorage::try_again(MediaStorage* media, Tries& tries) {
     ++tries.failed;
     const bool full = errno == ENOSPC;
-    if (result != LogFile::NOT_TAKEN || (full && tries.made_room)) {
+    if (full && tries.made_room) {
         return false;
     }
     tries.made_room = tries.made_room || full;
-    return write_failed(file->media(), errno) && tries.failed < (tries.made_room ? 4 : 3);
+    return write_failed(media, errno) && tries.failed < (tries.made_room ? 4 : 3);
 }
 
 void CpStorage::subscribe_media_change_evt(StorageManager::media_change_callback callback,

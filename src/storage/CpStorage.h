@@ -58,14 +58,13 @@ public:
     // write of the log an SD card is left for now, or room is made on a full medium, by deleting
     // older sets and logs only. True when another try may come to something. errno becomes error.
     bool write_failed(MediaStorage* media, int error);
-    struct CopyTries {
+    struct Tries {
         int failed = 0;
         bool made_room = false;
     };
-    // After a copy into a file that is not a log, with its result and errno: true when the medium
-    // is to blame and another file may be tried. A card seems to work again after its first
-    // failure, so that it takes two to find the other medium. Room is made once.
-    bool copy_again(const LogFile* file, int result, CopyTries& tries);
+    // The same for who tries until this is false. A card seems to work again after its first
+    // failure, so that it takes two to find the other medium; room is made once.
+    bool try_again(MediaStorage* media, Tries& tries);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);
     void unsubscribe_media_change_evt(void* client);

@@ -159,6 +159,9 @@ TEST_F(FailingMediumTest, WhatCannotBeMadeOnAMedium) {
     pull_card();
     EXPECT_EQ(lost_of(1, "x"), 0);
     EXPECT_EQ(told, 1) << "a dump may lie on it";
+    plug_card();
+    const LogFile* const saved = m_store->create_file("dump", LT_DUMP);
+    EXPECT_TRUE(saved && !m_store->on_sd(saved)) << "the third try is inside";
     m_mgr.unsubscribe_ext_stor_umount_evt(&told);
     m_mgr.delete_storage(other);
 }

@@ -88,8 +88,8 @@ WITH_AVX2 void FrameIndex::build(const uint8_t* data, size_t len) {
         const uint32_t odd = (alone | (specials & (specials << 1 | escape_before))) ? ODD : 0;
         flag_before = flags >> 63;
         escape_before = specials >> 63;
-        // Mostly there is one end or none: the first is written without a branch, which no
-        // processor could foresee.
+        // Mostly there is one end or none: the first is written without a branch, which would be
+        // mispredicted half of the time.
         uint64_t ends = flags & next;
         do {
             const uint64_t before = (ends & -ends) - 1;

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Where the frames of a log end, found 64 bytes at a time: to look for each flag and each escape
-// on its own takes longer than to read the bytes. For who goes through a file from its start to
-// its end and only counts; owned by the scan of that file.
+// on its own takes longer than to read the bytes. For whoever goes through a file from its start to
+// its end and only counts. Owned by the scan of that file.
 #ifndef KESTLOG_FRAMEINDEX_H_
 #define KESTLOG_FRAMEINDEX_H_
 
