@@ -9,16 +9,8 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <thread>
 
 #include "kestlog/Progress.h"
-
-namespace {
-
-// From this size on a thread costs less than it saves.
-constexpr uint64_t LARGE = 8 * 1024 * 1024;
-
-}  // namespace
 
 time_t modified_time(const struct stat& st) {
     constexpr int64_t LAST = 253402214400;  // a day before the year 10000: zones differ
@@ -26,7 +18,6 @@ time_t modified_time(const struct stat& st) {
 }
 
 LogReader::~LogReader() {
-    m_ahead.reset();  // before its descriptor is closed
     if (m_fd >= 0) {
         close(m_fd);
     }
@@ -55,15 +46,7 @@ bool LogReader::open(const std::string& path, bool follow) {
     m_size = static_cast<uint64_t>(std::max<off_t>(st.st_size - start, 0));
     m_left = m_piped ? UINT64_MAX : m_size;
     m_modified = modified_time(st);
-    if (!m_piped && m_size >= LARGE && std::thread::hardware_concurrency() > 1) {
-        m_ahead = std::make_unique<ReadAhead>();
-        if (m_ahead->start(m_fd, m_size)) {
-            return true;
-        }
-        m_ahead.reset();
-    }
     m_window.resize(WINDOW);
-    m_bytes = m_window.data();
     return true;
 }
 
@@ -75,19 +58,19 @@ void LogReader::drain() {
 
 const uint8_t* LogReader::peek(size_t want, size_t& got) {
     if (m_end - m_start < want && m_left > 0) {
-        m_ahead ? fill_ahead(want) : fill(want);
+        fill(want);
     }
     got = m_end - m_start;
-    return m_bytes + m_start;
+    return m_window.data() + m_start;
 }
 
 void LogReader::fill(size_t want) {
-    memmove(m_bytes, m_bytes + m_start, m_end - m_start);
+    memmove(m_window.data(), m_window.data() + m_start, m_end - m_start);
     m_end -= m_start;
     m_start = 0;
     while (m_end < want && m_left > 0) {
         const size_t room = static_cast<size_t>(std::min<uint64_t>(WINDOW - m_end, m_left));
-        const ssize_t n = read(m_fd, m_bytes + m_end, room);
+        const ssize_t n = read(m_fd, m_window.data() + m_end, room);
         if (n < 0 && errno == EINTR) {
             continue;
         }
@@ -99,23 +82,6 @@ void LogReader::fill(size_t want) {
         m_end += static_cast<size_t>(n);
         m_left -= static_cast<uint64_t>(n);
         Progress::advance(static_cast<uint64_t>(n));
-    }
-}
-
-void LogReader::fill_ahead(size_t want) {
-    while (m_end - m_start < want && m_left > 0) {
-        ReadAhead::Block* const block = m_ahead->next();
-        const size_t rest = m_end - m_start;
-        uint8_t* const bytes = block->bytes.data();
-        if (rest > 0) {
-            memcpy(bytes + WINDOW - rest, m_bytes + m_start, rest);
-        }
-        m_bytes = bytes;
-        m_start = WINDOW - rest;
-        m_end = WINDOW + block->len;
-        m_left = block->len < WINDOW ? 0 : m_left - block->len;
-        m_error = block->error;
-        Progress::advance(block->len);
     }
 }
 

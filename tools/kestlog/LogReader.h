@@ -8,11 +8,8 @@
 #include <stdint.h>
 #include <time.h>
 
-#include <memory>
 #include <string>
 #include <vector>
-
-#include "kestlog/ReadAhead.h"
 
 struct stat;
 
@@ -23,7 +20,7 @@ time_t modified_time(const struct stat& st);
 class LogReader {
 public:
     // Larger than any frame or chunk.
-    static constexpr size_t WINDOW = ReadAhead::SIZE;
+    static constexpr size_t WINDOW = 256 * 1024;
 
     LogReader() = default;
     ~LogReader();
@@ -50,7 +47,6 @@ public:
 
 private:
     void fill(size_t want);
-    void fill_ahead(size_t want);
 
     int m_fd = -1;
     int m_error = 0;
@@ -60,8 +56,6 @@ private:
     uint64_t m_offset = 0;
     time_t m_modified = 0;
     std::vector<uint8_t> m_window;
-    std::unique_ptr<ReadAhead> m_ahead;  // of a large file, instead of the window
-    uint8_t* m_bytes = nullptr;          // where the window is
     size_t m_start = 0;
     size_t m_end = 0;
 };
