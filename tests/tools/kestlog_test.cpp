@@ -210,8 +210,7 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_TRUE(said("\"dump_bytes\":1000,\"sequence_gaps\":0,\"payload\":1007,")) << m_out;
 
     // Frames are found between anything, across every window, and after a lost flag.
-    std::string text =
-        "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(9000000, 2);
+    std::string text = "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(900000, 2);
     const std::string big(65527, '~');  // the largest
     text += "~" + frame(big, 3, 4) + frame("lost").substr(1) + frame("last");
     write(WCN_LOG, text);
@@ -220,7 +219,7 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_EQ(
         run("--version >/dev/null; cat " + WCN_LOG + " | '" KESTLOG "' frames - | grep -v wrong"),
         0);
-    EXPECT_EQ(m_out, large) << "a file that is read ahead and a pipe differ";
+    EXPECT_EQ(m_out, large) << "a file and a pipe differ";
     const size_t at = text.find(frame(big, 3, 4).substr(0, 20));
     const std::string seq = "  seq 0          type ";
     for (const std::string& line :
@@ -239,6 +238,22 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
               0);
     EXPECT_EQ(m_root.read_file("status"), std::to_string(128 + SIGPIPE) + "\n");
     EXPECT_EQ(m_root.read_file("err"), "");
+}
+
+TEST_F(KestlogTest, FramesStandInColumnsWhateverTheirNumbers) {
+    std::string text, want;
+    for (const uint32_t seq : {0u, 9u, 10u, 9999u, 10000u, 10200u, 999u, 123456789u, 4294967295u}) {
+        const DiagFrame frame{seq, 0x9d, 1, std::vector<uint8_t>(seq % 20000)};
+        char line[100];
+        snprintf(line, sizeof(line), "%10zu  seq %-10u type 0x9d 0x01  %5zu bytes\n", text.size(),
+                 seq, frame.payload.size());
+        want += line;
+        const std::vector<uint8_t> bytes = frame.encode();
+        text.append(bytes.begin(), bytes.end());
+    }
+    write(WCN_LOG, text);
+    EXPECT_EQ(run("frames " + WCN_LOG), 0) << m_err;
+    EXPECT_EQ(m_out, want);
 }
 
 TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {

@@ -8,6 +8,7 @@
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/LineBuffer.h"
+#include "kestlog/NumberColumn.h"
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 #include "kestlog/TreeInput.h"
@@ -48,16 +49,7 @@ public:
 
 private:
     void print_text(const Piece& piece) {
-        m_out.add(piece.offset, 10);
-        m_out.add("  seq ");
-        m_out.add(piece.seq_num, -10);
-        m_out.add(" type 0x");
-        m_out.add_hex(piece.type);
-        m_out.add(" 0x");
-        m_out.add_hex(piece.sub_type);
-        m_out.add("  ");
-        m_out.add(piece.data_len, 5);
-        m_out.add(" bytes");
+        print_facts(piece);
         if (piece.kind) {
             m_out.add("  ");
             m_out.add(std::string_view(piece.kind));
@@ -69,6 +61,21 @@ private:
             m_out.end_line();
             print_row(piece, row);
         }
+    }
+
+    // What each line begins with.
+    void print_facts(const Piece& piece) {
+        LineBuffer::Short line(m_out);
+        line.add(m_offset, piece.offset);
+        line.add("  seq ");
+        line.add(m_seq, piece.seq_num);
+        line.add(" type 0x");
+        line.add_hex(piece.type);
+        line.add(" 0x");
+        line.add_hex(piece.sub_type);
+        line.add("  ");
+        line.add(m_data_len, piece.data_len);
+        line.add(" bytes");
     }
 
     void print_row(const Piece& piece, size_t row) {
@@ -130,6 +137,9 @@ private:
     const Wanted& m_wanted;
     std::string m_file;
     LineBuffer m_out;
+    NumberColumn m_offset{NumberColumn::RIGHT, 10};
+    NumberColumn m_seq{NumberColumn::LEFT, 10};
+    NumberColumn m_data_len{NumberColumn::RIGHT, 5};
 };
 
 int frames(const std::string& path, Wanted* wanted) {
