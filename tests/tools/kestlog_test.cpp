@@ -214,12 +214,7 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     const std::string big(65527, '~');  // the largest
     text += "~" + frame(big, 3, 4) + frame("lost").substr(1) + frame("last");
     write(WCN_LOG, text);
-    EXPECT_EQ(run("frames - <" + WCN_LOG + " | grep -v wrong"), 0);
-    const std::string large = m_out;
-    EXPECT_EQ(
-        run("--version >/dev/null; cat " + WCN_LOG + " | '" KESTLOG "' frames - | grep -v wrong"),
-        0);
-    EXPECT_EQ(m_out, large) << "a file and a pipe differ";
+    EXPECT_EQ(run("frames " + WCN_LOG + " | grep -v wrong"), 0);
     const size_t at = text.find(frame(big, 3, 4).substr(0, 20));
     const std::string seq = "  seq 0          type ";
     for (const std::string& line :
