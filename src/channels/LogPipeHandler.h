@@ -156,7 +156,7 @@ private:
     void arm_reopen();
     // Opens a log device that is missing without being tried again.
     void open_missing_dev();
-    // For the crash path, which may come before the first log data: makes the storage
+    // For the crash path, which may come before the log was first started: makes the storage
     // with the hook for new log files only. False when there is none.
     bool need_storage();
     bool will_be_reset() const;
