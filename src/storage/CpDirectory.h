@@ -36,11 +36,12 @@ public:
     const android::String8& path() const { return m_path; }
     uint64_t size() const { return m_size; }
     CpSetDirectory* set() const { return m_set; }
-    bool empty() const { return m_files.empty(); }
     const android::List<LogFile*>& files() const { return m_files; }
 
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
+    // Whether it holds no files for certain: a scan that could not see all is made again.
+    bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
     // Scans the directory on the medium. 0, or -1 when it cannot be opened.
@@ -101,6 +102,7 @@ private:
     android::String8 m_name;
     android::String8 m_path;
     uint64_t m_size = 0;
+    bool m_left_out = false;  // something by the scan, which could not look at it
     ObjectRef<LogFile> m_first_log;
     android::List<LogFile*> m_files;
     ObjectRef<LogFile> m_cur_log;

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "storage/CpDirectory.h"
+#include "storage/CpSetDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/dir_entries.h"
 #include "storage/log_name.h"
@@ -26,7 +27,16 @@ int CpDirectory::stat() {
         m_size += file->counted();
     });
     insert_scanned(found.data(), found.size());
-    return result;
+    m_left_out = result != 0;
+    return result < 0 ? -1 : 0;
+}
+
+bool CpDirectory::found_empty() {
+    if (m_files.empty() && m_left_out && !is_link(m_path)) {
+        stat();
+        m_set->add_size(m_size);
+    }
+    return m_files.empty() && !m_left_out;
 }
 
 size_t CpDirectory::recount() {

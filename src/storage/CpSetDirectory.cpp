@@ -31,7 +31,8 @@ int CpSetDirectory::remove() {
 }
 
 int CpSetDirectory::stat() {
-    return for_each_entry(m_path, [this](const char* name, const struct stat& st) {
+    bool all = true;
+    const int result = for_each_entry(m_path, [&](const char* name, const struct stat& st) {
         if (!S_ISDIR(st.st_mode)) {
             return;
         }
@@ -39,8 +40,20 @@ int CpSetDirectory::stat() {
         if (dir->stat() == 0) {
             m_size += dir->size();
             m_dirs.push_back(dir.release());
+        } else {
+            all = false;
         }
     });
+    m_left_out = !all || result != 0;
+    return result < 0 ? -1 : 0;
+}
+
+bool CpSetDirectory::found_empty() {
+    if (m_dirs.empty() && m_left_out && !is_link(m_path)) {
+        stat();
+        m_media->add_size(m_size);
+    }
+    return m_dirs.empty() && !m_left_out;
 }
 
 CpDirectory* CpSetDirectory::get_cp_dir(const android::String8& cp_name) const {
@@ -125,7 +138,7 @@ uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
         const uint64_t n =
             spare == Spare::NOTHING ? dir->trim(wanted) : dir->trim_working_dir(wanted, spare);
         removed += n;
-        if (dir->empty()) {
+        if (dir->found_empty()) {
             it = m_dirs.erase(it);
             dir->remove();
             delete dir;

@@ -27,11 +27,12 @@ public:
     const android::String8& path() const { return m_path; }
     uint64_t size() const { return m_size; }
     MediaStorage* media() const { return m_media; }
-    bool empty() const { return m_dirs.empty(); }
     const android::List<CpDirectory*>& dirs() const { return m_dirs; }
 
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
+    // Whether it holds no CP directories for certain: a scan that could not see all is made again.
+    bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
     // Scans the set on the medium. 0, or -1 when it cannot be opened.
@@ -70,6 +71,7 @@ private:
     android::String8 m_path;
     android::List<CpDirectory*> m_dirs;
     uint64_t m_size = 0;
+    bool m_left_out = false;  // something by the scan, which could not look at it
 };
 
 #endif  // STORAGE_CPSETDIRECTORY_H_

@@ -93,7 +93,7 @@ int MediaStorage::scan_sets() {
     for (std::unique_ptr<CpSetDirectory>& set : found) {
         insert_scanned(std::move(set));
     }
-    return result;
+    return result < 0 ? -1 : 0;
 }
 
 // Puts a scanned set in front of the first one whose path compares greater.

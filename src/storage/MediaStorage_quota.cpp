@@ -39,7 +39,7 @@ uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
         }
         const uint64_t n = set->trim(wanted);
         removed += n;
-        if (set->empty()) {
+        if (set->found_empty()) {
             it = m_sets.erase(it);
             set->remove();
             delete set;

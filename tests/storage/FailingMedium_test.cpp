@@ -199,6 +199,39 @@ TEST_F(FailingMediumTest, FullMediumOfSparedFiles) {
     EXPECT_EQ(lost_of(3, block), 0);
 }
 
+// What a scan could not read was not known, and went with the directory that seemed empty.
+TEST_F(FailingMediumTest, WhatAScanLeftOutIsNotDeleted) {
+    const struct {
+        faults::Call call;
+        int nth, times;
+        uint64_t left;  // in two files of 16 bytes, of which one was to go
+    } CASES[] = {
+        {faults::FSTATAT, 2, 1, 32},  // the directory
+        {faults::FSTATAT, 3, 1, 16},  // a file
+        {faults::FSTATAT, 3, faults::FOREVER, 32},
+        {faults::OPENDIR, 3, 1, 32},
+        {faults::OPENDIR, 3, faults::FOREVER, 32},
+    };
+    const std::string dir = "data/modem_log/2016-02-01-00-00-00/cp_gnss";
+    for (const auto& c : CASES) {
+        SCOPED_TRACE(std::to_string(c.call) + " " + std::to_string(c.nth));
+        m_root.write_file(dir + "/a", "0123456789abcdef");
+        m_root.write_file(dir + "/b", "0123456789abcdef");
+        internal().clear();
+        faults::reset();
+        faults::only_on("");
+        faults::fail(c.call, c.nth, EIO, c.times);
+        ASSERT_EQ(internal().stat(), 0);
+        internal().trim(16);
+        check_sums(internal());
+        faults::reset();
+        EXPECT_EQ(m_root.list(dir).size() * 16, c.left);
+        internal().trim(32);  // knows them now
+        internal().trim(32);
+        EXPECT_FALSE(m_root.exists(dir));
+    }
+}
+
 // A number beyond 32 bits cannot be raised; an errno from before made that look like a file
 // that is gone, and it was deleted.
 TEST_F(FailingMediumTest, NumberTooLargeIsNoReasonToDelete) {
