@@ -66,11 +66,13 @@ int CpStorage::write(const void* data, size_t len) {
         }
         close_full_file(media);
         keep_quota(media);
-    } else if (n == LogFile::FULL) {
-        const SavedErrno keep;  // the caller reports why the block is lost
-        make_room(media);
     } else if (n < 0) {
-        m_manager->write_failed(media, errno);
+        const SavedErrno keep;  // the caller reports why the block is lost
+        if (n == LogFile::FULL) {
+            make_room(media);
+        } else {
+            m_manager->write_failed(media, errno);
+        }
     }
     return n;
 }
@@ -104,7 +106,7 @@ bool CpStorage::has_room(MediaStorage* media) {
     return false;
 }
 
-// After a write that the full medium did not take.
+// After a file or a block that the full medium did not take.
 void CpStorage::make_room(MediaStorage* media) {
     if (media->free_space() == 0) {
         return;
@@ -182,8 +184,13 @@ bool CpStorage::open_log_file(MediaStorage* media) {
     bool new_dir = false;
     m_cur_file = media->create_file(m_channel->name(), LT_LOG, new_dir, android::String8());
     if (!m_cur_file) {
-        m_manager->creation_failed(media, errno);  // the next write tries again
-        return false;
+        const SavedErrno keep;  // the caller reports why the block is lost
+        if (errno == ENOSPC) {
+            make_room(media);
+        } else {
+            m_manager->write_failed(media, errno);
+        }
+        return false;  // the next write tries again
     }
     if (new_dir && m_new_dir_cb) {
         m_new_dir_cb(m_channel);
@@ -228,7 +235,7 @@ void CpStorage::trim_old_sets() {
 
 bool CpStorage::write_failed(MediaStorage* media, int error) {
     const bool again =
-        error == ENOSPC ? media->free_logs() == 0 : m_manager->creation_failed(media, error);
+        error == ENOSPC ? media->free_logs() > 0 : m_manager->write_failed(media, error);
     errno = error;
     return again;
 }

@@ -139,7 +139,7 @@ CpSetDirectory* MediaStorage::create_cp_set() {
 
 // Somebody deleted the whole log root, or the card is another one: starts over.
 int MediaStorage::remake_log_root() {
-    m_manager->media_vanished(this);
+    m_manager->stop_storages_on(this);
     forget_sets();
     m_rescan = true;  // it may have been there all the time
     return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root, m_root_links);
@@ -151,7 +151,7 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
         return nullptr;
     }
     if (!dir_usable(m_log_root, m_root_links)) {
-        m_manager->media_vanished(this);
+        m_manager->stop_storages_on(this);
         forget_sets();
         m_rescan = true;
         if (make_log_dir(m_log_root, m_root_links) < 0) {
@@ -160,10 +160,10 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
         }
     }
     if (m_working_set && !dir_usable(m_working_set->path())) {
-        m_manager->media_vanished(this);
+        m_manager->stop_storages_on(this);
         drop_working_set();
     }
-    CpSetDirectory* set = m_working_set ? m_working_set : create_cp_set();
+    CpSetDirectory* set = m_working_set ? m_working_set : start_set();
     if (set && m_rescan) {
         // The log root may have been there all the time: what it holds counts.
         m_rescan = scan_sets() < 0;

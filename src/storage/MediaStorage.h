@@ -58,6 +58,9 @@ public:
     // Starts a new working set, named by the local time; makes the log root too when that
     // is missing. Null on failure, with errno.
     CpSetDirectory* create_cp_set();
+    // The same; on a full medium after making room for it, also of what is spared in the set that
+    // was written to so far.
+    CpSetDirectory* start_set();
     // A usable working set: the present one, or a new one when there is none, when it
     // vanished or when the whole log root vanished. Null on failure, with errno.
     CpSetDirectory* prepare_cur_set();
@@ -92,17 +95,17 @@ public:
     int check_quota();
     // The same without the working set.
     void trim_old_sets();
-    // For a medium that is above its quota even after check_quota, because trimming spares
-    // files in the working set: starts a new set, so that the old one can be trimmed like any
-    // other. At most once per file size of data that arrived. True when the total is within
-    // the quota now; the CP storages have closed their files then.
+    // For a medium that is full, or above its quota even after check_quota, because trimming
+    // spares files in the working set: starts a new set, so that the old one can be trimmed like
+    // any other. At most once per file size of data that arrived. True when the total is within
+    // the quota now. The CP storages may have closed their files.
     bool make_room_with_new_set();
     // Frees one file size after the medium ran full. 0 when at least half of it could
     // be freed, else -1.
     int free_space();
-    // The same for a file that is not a log. What was saved in the working set stays: it may be
-    // of the same crash.
-    int free_logs();
+    // The same for a file that is not a log; the bytes freed, as the file may be small. What was
+    // saved in the working set stays: it may be of the same crash.
+    uint64_t free_logs();
 
     // Forgets all sets, so that the next use scans again; nothing on the medium changes.
     void clear();

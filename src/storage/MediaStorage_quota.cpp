@@ -128,35 +128,45 @@ bool MediaStorage::make_room_with_new_set() {
         return false;
     }
     const android::String8 old = m_working_set->path();  // the set itself may go
-    const CpSetDirectory* set = create_cp_set();
-    if (!set && errno == ENOSPC) {
-        // No room for a directory either: the old set is trimmed before there is a new one.
-        m_manager->stop_all_storages();
-        m_working_set = nullptr;
-        trim(m_file_size);
-        set = create_cp_set();
+    const CpSetDirectory* set = start_set();
+    if (!set && errno != ENOSPC) {
+        m_manager->write_failed(this, errno);  // nothing else is written that could tell
     }
     if (!set || set->path() == old) {
         return false;  // set names have one-second resolution: try later
     }
     m_arrived = 0;
-    m_manager->stop_all_storages();
+    m_manager->stop_storages_on(this);
     info_log("nothing else is left to trim, new set %s", set->path().string());
     return check_quota() == 0;
 }
 
-int MediaStorage::free_space() {
-    if (!m_overwrite) {
-        return -1;
+CpSetDirectory* MediaStorage::start_set() {
+    CpSetDirectory* set = create_cp_set();
+    if (!set && errno == ENOSPC && m_overwrite) {
+        m_rescan = m_rescan && scan_sets() < 0;
+        if (free_space() < 0) {
+            // Only what is spared is left, in a set that will not be written to any more.
+            m_manager->stop_storages_on(this);
+            m_working_set = nullptr;
+            free_space();
+        }
+        set = create_cp_set();
     }
-    return trim(m_file_size) >= m_file_size / 2 ? 0 : -1;
+    return set;
 }
 
-int MediaStorage::free_logs() {
+int MediaStorage::free_space() {
+    // With a file size of 0 there is nothing to keep in proportion to: anything will do.
+    const uint64_t wanted = std::max<uint64_t>(m_file_size, 1);
+    return m_overwrite && trim(wanted) >= (wanted + 1) / 2 ? 0 : -1;
+}
+
+uint64_t MediaStorage::free_logs() {
     if (!m_overwrite) {
-        return -1;
+        return 0;
     }
-    const uint64_t removed = trim_sets_before(m_file_size);
-    const uint64_t left = m_file_size - std::min<uint64_t>(m_file_size, removed);
-    return removed + trim_working_set(left, Spare::ALL_BUT_LOGS) >= m_file_size / 2 ? 0 : -1;
+    const uint64_t wanted = std::max<uint64_t>(m_file_size, 1);
+    const uint64_t removed = trim_sets_before(wanted);
+    return removed + trim_working_set(wanted - std::min(wanted, removed), Spare::ALL_BUT_LOGS);
 }

@@ -54,7 +54,6 @@ int StorageManager::init(const android::String8& sd_root, LogController* /*ctrl*
 }
 
 void StorageManager::set_overwrite(bool overwrite) {
-    m_overwrite = overwrite;
     m_internal.set_overwrite(overwrite);
     m_external.set_overwrite(overwrite);
 }
@@ -115,7 +114,7 @@ bool StorageManager::check_media_change() {
     if (m_media_type == MT_INTERNAL) {
         return false;
     }
-    start_set(m_internal);
+    m_internal.start_set();
     change_media(MT_INTERNAL);
     return true;
 }
@@ -130,29 +129,9 @@ void StorageManager::card_removed() {
     m_card_rest_timer.stop();
 }
 
-// Starts a new set. When the medium is full, frees space for the next try.
-CpSetDirectory* StorageManager::start_set(MediaStorage& media) {
-    CpSetDirectory* set = media.create_cp_set();
-    if (!set && errno == ENOSPC) {
-        media.free_space();
-    }
-    return set;
-}
-
-bool StorageManager::creation_failed(MediaStorage* media, int error) {
-    if (error == ENOSPC) {
-        return media->free_space() == 0;
-    }
-    return card_failed(media, error);
-}
-
-void StorageManager::write_failed(MediaStorage* media, int error) {
-    card_failed(media, error);
-}
-
 // A dying card's file system becomes read-only, its driver gives up, or it is gone while it
 // still counts as mounted. When the service itself lacks something, the card is not to blame.
-bool StorageManager::card_failed(MediaStorage* media, int error) {
+bool StorageManager::write_failed(MediaStorage* media, int error) {
     const bool own_want =
         error == 0 || error == EMFILE || error == ENFILE || error == ENOMEM || error == EINTR;
     if (media != &m_external || m_media_type != MT_EXTERNAL || own_want) {
@@ -174,7 +153,7 @@ bool StorageManager::card_failed(MediaStorage* media, int error) {
 // Takes the SD card into use with a new set. False when no set can be started there.
 bool StorageManager::use_external() {
     // Sometimes a directory can be made, or exists, where no file can be made.
-    if ((m_card_suspect && !m_external.can_make_files()) || !start_set(m_external)) {
+    if ((m_card_suspect && !m_external.can_make_files()) || !m_external.start_set()) {
         return false;
     }
     if (m_media_type == MT_INTERNAL) {
@@ -187,7 +166,7 @@ bool StorageManager::use_external() {
 // Falls back to the internal medium while the SD card cannot be used. False when it is
 // in use already or no set can be started there.
 bool StorageManager::use_internal() {
-    if (m_media_type == MT_INTERNAL || !start_set(m_internal)) {
+    if (m_media_type == MT_INTERNAL || !m_internal.start_set()) {
         return false;
     }
     change_media(MT_INTERNAL);
@@ -214,7 +193,7 @@ void StorageManager::stop_all_storages() {
     }
 }
 
-void StorageManager::media_vanished(MediaStorage* media) {
+void StorageManager::stop_storages_on(const MediaStorage* media) {
     if (media == get_media_stor()) {
         stop_all_storages();
     }

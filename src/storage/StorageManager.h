@@ -66,15 +66,13 @@ public:
     void delete_storage(CpStorage* storage);
     // Every CP storage closes and forgets its current file.
     void stop_all_storages();
-    // Called by a medium whose log root or working set vanished.
-    void media_vanished(MediaStorage* media);
-    // A file or directory could not be made on the medium, for the reason error gives. A
-    // full medium frees space, once. An SD card in use that cannot be written any more is
-    // not in use from now on: the next check for a change falls back to the internal medium
-    // and tries the card again. True when another try may succeed.
-    bool creation_failed(MediaStorage* media, int error);
-    // The same for a write that failed for another reason than a full medium.
-    void write_failed(MediaStorage* media, int error);
+    // The same if that medium is in use: its files vanished or are about to go.
+    void stop_storages_on(const MediaStorage* media);
+    // The medium did not take a file, a directory or data, for the reason error gives, which is
+    // not that it is full. An SD card in use that cannot be written any more is not in use from
+    // now on: the next check for a change falls back to the internal medium and tries the card
+    // again. True when another try may succeed.
+    bool write_failed(MediaStorage* media, int error);
     // Deletes every set on both media; the next write chooses the medium afresh.
     void clear_all();
 
@@ -91,17 +89,14 @@ private:
     static constexpr unsigned int CARD_REST_MS = 3000;
     static constexpr unsigned int MAX_CARD_REST_MS = 600000;
 
-    bool card_failed(MediaStorage* media, int error);
     void card_removed();
     bool use_external();
     bool use_internal();
-    CpSetDirectory* start_set(MediaStorage& media);
     void change_media(MediaType type);
 
     MediaType m_media_type = MT_NONE;
     MediaStorage m_internal;
     MediaStorage m_external;
-    bool m_overwrite = true;
     android::List<CpStorage*> m_storages;
     SubscriberList<media_change_callback> m_media_change_clients;
     SubscriberList<ext_umount_callback> m_ext_umount_clients;

@@ -199,6 +199,80 @@ TEST_F(FailingMediumTest, FullMediumOfSparedFiles) {
     EXPECT_EQ(lost_of(3, block), 0);
 }
 
+// A medium so full that it takes no file, or no directory: what made no room before.
+TEST_F(FailingMediumTest, RoomIsMadeForFilesAndSets) {
+    const std::string block(70000, 'x');
+    const char* refused = "-cp_gnss-";
+    bool full = false;
+    const auto refuses = [&](const char* path) {
+        const bool yes = full && strstr(path, refused);
+        errno = yes ? ENOSPC : errno;
+        return yes;
+    };
+    faults::instead.open = [&](const char* path, int flags, mode_t mode) {
+        return (flags & O_CREAT) && refuses(path) ? -1 : real::open(path, flags, mode);
+    };
+    faults::instead.mkdir = [&](const char* path, mode_t mode) {
+        return refuses(path) ? -1 : real::mkdir(path, mode);
+    };
+    faults::instead.unlink = [&](const char* path) {
+        full = full && strstr(path, ".write_test");
+        const int result = real::unlink(path);
+        errno = EPERM;
+        return result;
+    };
+    m_mgr.set_file_size(100000);
+    EXPECT_EQ(lost_of(1, block), 0);
+    m_store->stop();
+    full = true;  // no log file, and only a spared one is there
+    EXPECT_EQ(lost_of(1, block), 1);
+    EXPECT_EQ(errno, ENOSPC);
+    EXPECT_EQ(lost_of(5, block), 0);
+    m_mgr.set_file_size(1000000);
+    refused = "dump";  // with a little room to make
+    full = true;
+    EXPECT_NE(m_store->create_file("dump", LT_DUMP), nullptr);
+    m_mgr.set_file_size(0);
+    EXPECT_EQ(internal().free_space(), -1) << "nothing is left to delete";
+
+    m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp_gnss/old", block);
+    plug_card();
+    EXPECT_EQ(lost_of(1, block), 0);
+    const std::string log_root = m_root.path("sd/modem_log"), away = m_root.path("away");
+    ASSERT_EQ(rename(log_root.c_str(), away.c_str()), 0);
+    refused = "sd/modem_log/2";  // the card is away for a moment and then full of old logs
+    faults::fail(faults::MKDIR, 1, EIO);
+    EXPECT_EQ(lost_of(1, block), 1);
+    ASSERT_EQ(rename(away.c_str(), log_root.c_str()), 0);
+    full = true;
+    EXPECT_EQ(lost_of(1, block), 0);
+    EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+    EXPECT_FALSE(m_root.exists("sd/modem_log/2016-02-01-00-00-00"));
+    refused = "data/modem_log/2";  // the card fails, and spared files fill the internal medium
+    full = true;
+    faults::instead.write = [](int fd, const void* data, size_t len) {
+        return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
+    };
+    EXPECT_EQ(lost_of(3, block), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    faults::instead = {};
+    check_sums(internal());
+}
+
+// Nothing is written to a card above its quota that could tell that it fails.
+TEST_F(FailingMediumTest, ACardThatTakesNoSetIsLeft) {
+    plug_card();
+    m_mgr.set_sd_size(30000);
+    EXPECT_EQ(lost_of(2, std::string(20000, 'x')), 0);
+    faults::fail(faults::MKDIR, 1, EIO);
+    faults::instead.write = [](int fd, const void* data, size_t len) {
+        return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
+    };
+    EXPECT_EQ(lost_of(3, "x"), 1);
+    EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
+    faults::instead = {};
+}
+
 // What a scan could not read was not known, and went with the directory that seemed empty.
 TEST_F(FailingMediumTest, WhatAScanLeftOutIsNotDeleted) {
     const struct {
