@@ -198,7 +198,9 @@ bool MediaStorage::can_make_files() const {
         return false;
     }
     const JoinedPath probe(m_log_root, android::String8(".write_test"));
-    remove(probe.string());
+    if (remove(probe.string()) < 0 && errno == ENOTEMPTY) {
+        remove_tree(android::String8(probe.string()));
+    }
     const int fd = open(probe.string(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644);
     if (fd < 0) {
         return errno == ENOSPC;

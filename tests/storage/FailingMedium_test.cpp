@@ -101,7 +101,7 @@ TEST_F(FailingMediumTest, RoomIsMadeOnAMediumThatIsStillFull) {
 // show that it works again, or which is full.
 TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
     plug_card();
-    m_root.make_dir("sd/modem_log/.write_test");
+    m_root.write_file("sd/modem_log/.write_test/x", "");
     const std::string block(70000, 'x');
     faults::fail(faults::WRITE, 1, EIO);
     EXPECT_EQ(lost_of(2, block), 1);
