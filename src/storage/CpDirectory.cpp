@@ -41,6 +41,7 @@ CpDirectory::~CpDirectory() {
 }
 
 int CpDirectory::create() {
+    m_left_out = true;  // it may have been there all the time
     return make_log_dir(m_path);
 }
 
@@ -254,9 +255,20 @@ bool CpDirectory::is_spared(const LogFile* file, Spare spare) const {
            (kept_type || file == m_first_log.get() || file == m_cur_log.get());
 }
 
-uint64_t CpDirectory::trim_working_dir(uint64_t wanted, Spare spare) {
+uint64_t CpDirectory::trim_working_dir(uint64_t wanted) {
     const LogFile* stuck = nullptr;
-    const uint64_t removed = delete_oldest(wanted, spare, stuck);
+    const uint64_t removed = delete_oldest(wanted, Spare::PROTECTED, stuck);
+    if (stuck) {
+        err_log("delete %s error", stuck->name().string());
+    }
+    m_size -= removed;
+    renumber_first_log();
+    return removed;
+}
+
+uint64_t CpDirectory::trim_logs(uint64_t wanted) {
+    const LogFile* stuck = nullptr;
+    const uint64_t removed = delete_oldest(wanted, Spare::ALL_BUT_LOGS, stuck);
     if (stuck) {
         err_log("delete %s error", stuck->name().string());
     }

@@ -40,7 +40,9 @@ public:
 
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
-    // Whether it holds no files for certain: a scan that could not see all is made again.
+    bool empty() const { return m_files.empty(); }
+    // Whether it holds no files for certain: a scan that could not see all is made again, once in
+    // a while.
     bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
@@ -78,9 +80,11 @@ public:
     // Deletes files from the front until at least the bytes wanted are gone (at least
     // one file is deleted, if there is one). Returns the bytes removed.
     uint64_t trim(uint64_t wanted);
-    // As trim, but leaves the files that spare names; renumbers the first log file to follow the
-    // oldest one left.
-    uint64_t trim_working_dir(uint64_t wanted, Spare spare);
+    // As trim, but leaves the protected files; renumbers the first log file to follow the oldest
+    // one left.
+    uint64_t trim_working_dir(uint64_t wanted);
+    // The same, but deletes nothing but logs.
+    uint64_t trim_logs(uint64_t wanted);
 
 private:
     typedef android::List<LogFile*>::iterator FileIter;
@@ -102,7 +106,8 @@ private:
     android::String8 m_name;
     android::String8 m_path;
     uint64_t m_size = 0;
-    bool m_left_out = false;  // something by the scan, which could not look at it
+    bool m_left_out = false;   // something by the scan, which could not look at it
+    unsigned int m_asked = 0;  // whether it is empty for certain, in that case
     ObjectRef<LogFile> m_first_log;
     android::List<LogFile*> m_files;
     ObjectRef<LogFile> m_cur_log;

@@ -32,7 +32,7 @@ int CpDirectory::stat() {
 }
 
 bool CpDirectory::found_empty() {
-    if (m_files.empty() && m_left_out && !is_link(m_path)) {
+    if (m_files.empty() && m_left_out && m_asked++ % ASKED_PER_SCAN == 0 && !is_link(m_path)) {
         stat();
         m_set->add_size(m_size);
     }

@@ -49,7 +49,7 @@ int CpSetDirectory::stat() {
 }
 
 bool CpSetDirectory::found_empty() {
-    if (m_dirs.empty() && m_left_out && !is_link(m_path)) {
+    if (m_dirs.empty() && m_left_out && m_asked++ % ASKED_PER_SCAN == 0 && !is_link(m_path)) {
         stat();
         m_media->add_size(m_size);
     }
@@ -135,8 +135,10 @@ uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
     android::List<CpDirectory*>::iterator it = m_dirs.begin();
     while (it != m_dirs.end()) {
         CpDirectory* dir = *it;
-        const uint64_t n =
-            spare == Spare::NOTHING ? dir->trim(wanted) : dir->trim_working_dir(wanted, spare);
+        dir->found_empty();  // what it finds is trimmed
+        const uint64_t n = spare == Spare::NOTHING     ? dir->trim(wanted)
+                           : spare == Spare::PROTECTED ? dir->trim_working_dir(wanted)
+                                                       : dir->trim_logs(wanted);
         removed += n;
         if (dir->found_empty()) {
             it = m_dirs.erase(it);

@@ -31,7 +31,9 @@ public:
 
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
-    // Whether it holds no CP directories for certain: a scan that could not see all is made again.
+    bool empty() const { return m_dirs.empty(); }
+    // Whether it holds no CP directories for certain: a scan that could not see all is made
+    // again, once in a while.
     bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
@@ -71,7 +73,8 @@ private:
     android::String8 m_path;
     android::List<CpDirectory*> m_dirs;
     uint64_t m_size = 0;
-    bool m_left_out = false;  // something by the scan, which could not look at it
+    bool m_left_out = false;   // something by the scan, which could not look at it
+    unsigned int m_asked = 0;  // whether it is empty for certain, in that case
 };
 
 #endif  // STORAGE_CPSETDIRECTORY_H_

@@ -139,7 +139,7 @@ CpSetDirectory* MediaStorage::create_cp_set() {
 
 // Somebody deleted the whole log root, or the card is another one: starts over.
 int MediaStorage::remake_log_root() {
-    m_manager->stop_storages_on(this);
+    m_manager->media_vanished(this);
     forget_sets();
     m_rescan = true;  // it may have been there all the time
     return prepare_top_dir() < 0 ? -1 : make_log_dir(m_log_root, m_root_links);
@@ -151,7 +151,7 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
         return nullptr;
     }
     if (!dir_usable(m_log_root, m_root_links)) {
-        m_manager->stop_storages_on(this);
+        m_manager->media_vanished(this);
         forget_sets();
         m_rescan = true;
         if (make_log_dir(m_log_root, m_root_links) < 0) {
@@ -160,7 +160,7 @@ CpSetDirectory* MediaStorage::prepare_cur_set() {
         }
     }
     if (m_working_set && !dir_usable(m_working_set->path())) {
-        m_manager->stop_storages_on(this);
+        m_manager->media_vanished(this);
         drop_working_set();
     }
     CpSetDirectory* set = m_working_set ? m_working_set : start_set();
@@ -193,12 +193,13 @@ CpDirectory* MediaStorage::get_cp_dir(const android::String8& cp_name) const {
     return m_working_set ? m_working_set->get_cp_dir(cp_name) : nullptr;
 }
 
-bool MediaStorage::can_make_files() const {
+bool MediaStorage::can_make_files() {
     if (prepare_top_dir() < 0 || make_log_dir(m_log_root, m_root_links) < 0) {
         return false;
     }
     const JoinedPath probe(m_log_root, android::String8(".write_test"));
-    if (remove(probe.string()) < 0 && errno == ENOTEMPTY) {
+    if (remove(probe.string()) < 0 && errno == ENOTEMPTY && !m_probe_cleared) {
+        m_probe_cleared = true;  // a shell with every block would cost too much
         remove_tree(android::String8(probe.string()));
     }
     const int fd = open(probe.string(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644);
@@ -214,6 +215,7 @@ void MediaStorage::clear() {
     forget_sets();
     m_scanned = false;
     m_rescan = false;
+    m_probe_cleared = false;
 }
 
 void MediaStorage::clear_all() {

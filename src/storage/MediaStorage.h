@@ -78,7 +78,7 @@ public:
 
     // True when a file can be made in the log root and written now: makes one and deletes it. Also
     // when the medium is full: whoever makes a set or a file there makes room.
-    bool can_make_files() const;
+    bool can_make_files();
 
     void add_size(uint64_t num) { m_size += num; }
     void dec_size(uint64_t num) { m_size -= num; }
@@ -128,7 +128,8 @@ private:
 
     StorageManager* m_manager;
     bool m_scanned = false;
-    bool m_rescan = false;  // the log root vanished: scan it when it is there again
+    bool m_rescan = false;         // the log root vanished: scan it when it is there again
+    bool m_probe_cleared = false;  // what had the name of can_make_files()'s file
     uint64_t m_quota = 0;
     uint32_t m_file_size = 512u << 20;
     bool m_overwrite = true;

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 
+#include "core/list_find.h"
 #include "core/log.h"
 #include "storage/CpSetDirectory.h"
 #include "storage/MediaStorage.h"
@@ -37,6 +38,7 @@ uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
             ++it;
             continue;
         }
+        set->found_empty();  // what it finds is trimmed
         const uint64_t n = set->trim(wanted);
         removed += n;
         if (set->found_empty()) {
@@ -136,7 +138,7 @@ bool MediaStorage::make_room_with_new_set() {
         return false;  // set names have one-second resolution: try later
     }
     m_arrived = 0;
-    m_manager->stop_storages_on(this);
+    m_manager->media_vanished(this);
     info_log("nothing else is left to trim, new set %s", set->path().string());
     return check_quota() == 0;
 }
@@ -145,13 +147,18 @@ CpSetDirectory* MediaStorage::start_set() {
     CpSetDirectory* set = create_cp_set();
     if (!set && errno == ENOSPC && m_overwrite) {
         m_rescan = m_rescan && scan_sets() < 0;
-        if (free_space() < 0) {
-            // Only what is spared is left, in a set that will not be written to any more.
-            m_manager->stop_storages_on(this);
-            m_working_set = nullptr;
-            free_space();
+        if (free_space() == 0 || !m_working_set) {
+            return create_cp_set();
         }
+        // Only what is spared is left, in a set that will not be written to any more.
+        const android::String8 old = m_working_set->path();
+        m_manager->media_vanished(this);
+        m_working_set = nullptr;
+        free_space();
         set = create_cp_set();
+        if (!set) {
+            m_working_set = find_named(m_sets, &CpSetDirectory::path, old);
+        }
     }
     return set;
 }
@@ -159,7 +166,7 @@ CpSetDirectory* MediaStorage::start_set() {
 int MediaStorage::free_space() {
     // With a file size of 0 there is nothing to keep in proportion to: anything will do.
     const uint64_t wanted = std::max<uint64_t>(m_file_size, 1);
-    return m_overwrite && trim(wanted) >= (wanted + 1) / 2 ? 0 : -1;
+    return m_overwrite && trim(wanted) >= std::max<uint64_t>(wanted / 2, 1) ? 0 : -1;
 }
 
 uint64_t MediaStorage::free_logs() {

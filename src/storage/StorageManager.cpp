@@ -142,18 +142,28 @@ bool StorageManager::write_failed(MediaStorage* media, int error) {
     stop_all_storages();
     m_media_type = MT_NONE;
     if (m_card_suspect) {
-        // It was tried again, seemed to work and failed: do not try it with every block.
-        m_card_rest_timer.start(m_card_rest_ms);
-        m_card_rest_ms = std::min(2 * m_card_rest_ms, MAX_CARD_REST_MS);
+        rest_card();  // it was tried again, seemed to work and failed
     }
     m_card_suspect = true;
     return true;
 }
 
+// Sees to it that the card is not tried with every block.
+void StorageManager::rest_card() {
+    m_card_rest_timer.start(m_card_rest_ms);
+    m_card_rest_ms = std::min(2 * m_card_rest_ms, MAX_CARD_REST_MS);
+}
+
 // Takes the SD card into use with a new set. False when no set can be started there.
 bool StorageManager::use_external() {
     // Sometimes a directory can be made, or exists, where no file can be made.
-    if ((m_card_suspect && !m_external.can_make_files()) || !m_external.start_set()) {
+    if (m_card_suspect && !m_external.can_make_files()) {
+        return false;
+    }
+    if (!m_external.start_set()) {
+        if (errno == ENOSPC && m_external.overwrite()) {
+            rest_card();  // with every try more would be deleted on it, in vain
+        }
         return false;
     }
     if (m_media_type == MT_INTERNAL) {
@@ -193,7 +203,7 @@ void StorageManager::stop_all_storages() {
     }
 }
 
-void StorageManager::stop_storages_on(const MediaStorage* media) {
+void StorageManager::media_vanished(const MediaStorage* media) {
     if (media == get_media_stor()) {
         stop_all_storages();
     }

@@ -66,8 +66,8 @@ public:
     void delete_storage(CpStorage* storage);
     // Every CP storage closes and forgets its current file.
     void stop_all_storages();
-    // The same if that medium is in use: its files vanished or are about to go.
-    void stop_storages_on(const MediaStorage* media);
+    // Called by a medium whose log root or working set vanished, or is about to go.
+    void media_vanished(const MediaStorage* media);
     // The medium did not take a file, a directory or data, for the reason error gives, which is
     // not that it is full. An SD card in use that cannot be written any more is not in use from
     // now on: the next check for a change falls back to the internal medium and tries the card
@@ -89,6 +89,7 @@ private:
     static constexpr unsigned int CARD_REST_MS = 3000;
     static constexpr unsigned int MAX_CARD_REST_MS = 600000;
 
+    void rest_card();
     void card_removed();
     bool use_external();
     bool use_internal();

@@ -13,6 +13,10 @@
 // What for_each_entry returns when there are entries that could not be read or looked at.
 constexpr int SOME_LEFT_OUT = 1;
 
+// Who asks for every block whether a directory is empty for certain, of which something was left
+// out, has it scanned once in so many times: a dying medium may take long to fail.
+constexpr unsigned int ASKED_PER_SCAN = 16;
+
 // Calls visit(name, st) for each entry other than "." and "..", in the file system's order.
 // st (struct stat) is the entry's own: links are not followed, so that one on a card does not
 // lead out of the tree. 0, SOME_LEFT_OUT, or -1 when the directory cannot be opened.

@@ -69,6 +69,7 @@ protected:
         m_root.make_dir("sd");
     }
     ~StorageTest() override {
+        faults::instead = {};
         faults::reset();
         umask(m_umask);
     }
