@@ -44,6 +44,11 @@ const char* ConfigReader::next_line() {
     if (!fgets(m_line, sizeof(m_line), m_file)) {
         return nullptr;
     }
+    if (ftello(m_file) > MAX_CONFIG_SIZE) {  // it grows while it is read
+        m_too_large = true;
+        errno = EFBIG;
+        return nullptr;
+    }
     ++m_number;
     return m_line;
 }

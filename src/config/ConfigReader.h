@@ -21,16 +21,17 @@ public:
     // Opens the file at path, used as given. 0, or -1 with errno: EFBIG above 1 MiB.
     int open(const char* path);
 
-    // The next line, valid until the next call. Null at the end and after a read error,
+    // The next line, valid until the next call. Null at the end and after a read error or 1 MiB,
     // which then is in errno.
     const char* next_line();
 
     int line_number() const { return m_number; }  // of the last line, from 1
-    bool failed() const { return ferror(m_file) != 0; }
+    bool failed() const { return m_too_large || ferror(m_file) != 0; }
 
 private:
     FILE* m_file = nullptr;
     int m_number = 0;
+    bool m_too_large = false;
     char m_line[CONFIG_LINE_SIZE];
 };
 
