@@ -14,11 +14,16 @@
 
 namespace {
 
-// Writes the bytes up to the first NUL as text of one line: control bytes other than a tab
-// become \xNN, all others stay as they are. text has room for four bytes a byte and a NUL.
+// Writes the bytes up to the first NUL as text of one line: without line feeds at its end, and
+// control bytes other than a tab become \xNN; all others stay as they are. text has room for four
+// bytes a byte and a NUL.
 void make_line(const uint8_t* bytes, size_t len, char* text) {
     static const char digits[] = "0123456789abcdef";
-    for (size_t i = 0; i < len && bytes[i]; ++i) {
+    len = strnlen(reinterpret_cast<const char*>(bytes), len);
+    while (len > 0 && bytes[len - 1] == '\n') {
+        --len;
+    }
+    for (size_t i = 0; i < len; ++i) {
         const uint8_t c = bytes[i];
         if ((c >= ' ' && c != 0x7f) || c == '\t') {
             *text++ = static_cast<char>(c);

@@ -63,6 +63,7 @@ TEST_F(CpStateHandlerTest, ConnectsAfterTheSupervisorAppears) {
     loop.run_once();
     ASSERT_TRUE(supervisor.connected());
     EXPECT_EQ(log.text(), "");
+    EXPECT_EQ(say("Modem\nAssert\n", "13 bytes: Modem\\x0aAssert"), CWS_WORKING);
     EXPECT_EQ(say("Modem Assert", "12 bytes: Modem Assert"), CWS_NOT_WORKING);
     modem->init();  // connected: nothing to do
     EXPECT_TRUE(supervisor.connected() && supervisor.accepted() == 1);
