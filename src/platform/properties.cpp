@@ -28,6 +28,9 @@ const off_t MAX_FILE_SIZE = 1 << 20;
 // file changed twice in one tick has the same stamp after both. A stamp proves the
 // content only when it was this old at the time the content was read.
 const int64_t SETTLE_NS = 50 * 1000 * 1000;
+// The same where stamps are whole seconds, or every other one.
+const int64_t SECOND_NS = 1000 * 1000 * 1000;
+const int64_t COARSE_SETTLE_NS = 2 * SECOND_NS + SETTLE_NS;
 
 int64_t nanoseconds(const struct timespec& t) {
     return static_cast<int64_t>(t.tv_sec) * 1000000000 + t.tv_nsec;
@@ -42,9 +45,9 @@ std::optional<int64_t> now(clockid_t clock) {
     return nanoseconds(t);
 }
 
-// Whether then lies back far enough. Not when a time is unknown.
-bool is_settled(std::optional<int64_t> now, std::optional<int64_t> then) {
-    return now && then && *now - *then >= SETTLE_NS;
+// Whether then lies back so far. Not when a time is unknown.
+bool is_settled(std::optional<int64_t> now, std::optional<int64_t> then, int64_t settle_ns) {
+    return now && then && *now - *then >= settle_ns;
 }
 
 // What tells one state of a file from another.
@@ -104,10 +107,15 @@ bool PropertyFile::find(const char* root, const char* key, std::string_view& val
 }
 
 // Makes the table that of the file as it is now; false when there is no usable file. One that
-// is there and cannot be read, for want of a descriptor, say, leaves the table as it was.
+// is there and cannot be looked at or read, for want of a descriptor, say, leaves the table as it
+// was.
 bool PropertyFile::refresh() {
     struct stat st;
-    if (stat(m_path.c_str(), &st) < 0 || !acceptable(st)) {
+    const bool there = stat(m_path.c_str(), &st) == 0;
+    if (!there && errno != ENOENT && errno != ENOTDIR) {
+        return m_known;
+    }
+    if (!there || !acceptable(st)) {
         m_known = false;
         return false;
     }
@@ -142,7 +150,10 @@ bool PropertyFile::load() {
     }
     // Either the change lies back far enough by the wall clock or, when that was set
     // back, the stamp has been known for long enough.
-    m_settled = is_settled(realtime, stamp.ctime) || is_settled(monotonic, m_first_seen);
+    const bool coarse = stamp.mtime % SECOND_NS == 0 && stamp.ctime % SECOND_NS == 0;
+    const int64_t settle_ns = coarse ? COARSE_SETTLE_NS : SETTLE_NS;
+    m_settled = is_settled(realtime, stamp.ctime, settle_ns) ||
+                is_settled(monotonic, m_first_seen, settle_ns);
     return true;
 }
 

@@ -125,6 +125,33 @@ TEST_F(Properties, SteadyStateCostsOneStat) {
     overwrite(m_root, 2, "VALUE");
     EXPECT_EQ(get("k"), "VALUE that is longer than a short string");
     EXPECT_TRUE(wait_until([] { return opens_of_one_read() == 0; }));
+    faults::fail(faults::STAT, 1, ENOMEM);  // which tells nothing
+    EXPECT_EQ(get("k"), "VALUE that is longer than a short string");
+}
+
+TEST_F(Properties, StampsOfWholeSeconds) {
+    struct timespec now = {1000, 500000000};
+    const auto stamped = [](int result, struct stat* st) {
+        st->st_mtim = st->st_ctim = {1000, 0};
+        return result;
+    };
+    faults::instead.clock_gettime = [&](clockid_t, struct timespec* t) {
+        *t = now;
+        return 0;
+    };
+    faults::instead.stat = [&](const char* path, struct stat* st) {
+        return stamped(real::stat(path, st), st);
+    };
+    faults::instead.fstat = [&](int fd, struct stat* st) {
+        return stamped(real::fstat(fd, st), st);
+    };
+    m_root.write_file("default.prop", "k=a\n");
+    EXPECT_EQ(get("k"), "a");
+    overwrite(m_root, 2, "b");
+    EXPECT_EQ(get("k"), "b");
+    now.tv_sec += 3;
+    EXPECT_EQ(get("k"), "b");
+    EXPECT_EQ(opens_of_one_read(), 0);
 }
 
 // A file older than the clock's tick is settled at once; a clock set back does not keep
