@@ -56,9 +56,9 @@ int LogPipeHandler::open_dev() {
     return m_fd < 0 ? -1 : 0;
 }
 
-// The driver of a CP that was reset may have hung up the descriptor for good: one that gave
-// nothing when it was last read is replaced. The new one is opened first, so that what waits in
-// the device survives.
+// A driver may have hung up the descriptor for good, when it was reset with its CP, say: one that
+// gave nothing when it was last read is replaced. The new one is opened first, so that what waits
+// in the device survives.
 void LogPipeHandler::renew_dev() {
     if (m_fd >= 0 && idle_wakeups() > 0) {
         const int old = m_fd;
@@ -174,6 +174,14 @@ bool LogPipeHandler::need_storage() {
 
 void LogPipeHandler::dev_gave_nothing() {
     note_idle(dev_label().string());
+    if (resting() && m_fd >= 0) {  // once a rest
+        renew_dev();
+        if (m_fd >= 0) {
+            poll_dev();
+        } else {
+            arm_reopen();
+        }
+    }
 }
 
 void LogPipeHandler::dev_read_failed() {

@@ -63,7 +63,7 @@ TEST_F(LogPipeHandlerTest, ReopensADeviceThatFailedOrWasMissing) {
 
 // A CP that the handset resets keeps its device open; a driver that had hung it up gave nothing
 // any more until the log was switched off and on.
-TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnewWhenTheCpIsAlive) {
+TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnew) {
     const std::string name = root.path("gnss");
     const auto connect = [&] {
         auto device = std::make_unique<Pty>();
@@ -86,9 +86,16 @@ TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnewWhenTheCpIsAlive) {
     device = connect();
     gnss->process_alive();
     EXPECT_TRUE(feed(*device, "three"));
+    // Nobody tells that some CPs are alive.
+    boot_clock::freeze();
+    device.reset();
+    ASSERT_TRUE(pump([&] { return log.has("gave nothing 10 times in a row"); }));
+    device = connect();
+    boot_clock::advance(3000);
+    EXPECT_TRUE(feed(*device, "four"));
     EXPECT_EQ(open_descriptors(), descriptors);
     ctrl.reset();
-    EXPECT_EQ(content("cp_gnss"), "onetwothree");
+    EXPECT_EQ(content("cp_gnss"), "onetwothreefour");
 }
 
 // No timer can be made then: the device stayed closed for good.
