@@ -166,6 +166,10 @@ DiagReplyConsumer::Outcome DiagReplyConsumer::process_frame(const uint8_t* frame
     const size_t payload = len - sizeof(header);
     const ssize_t written = m_file->write(frame + sizeof(header), payload);
     if (written != static_cast<ssize_t>(payload)) {
+        if (written >= 0) {
+            errno = ENOSPC;
+            err_log("result file of %s is not complete", m_cp_name);
+        }
         fail_file(written == -1 ? errno : ENOSPC);
         end(LPR_FAILURE);
         return ENDED;

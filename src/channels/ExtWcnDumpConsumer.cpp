@@ -2,6 +2,7 @@
 
 #include "channels/ExtWcnDumpConsumer.h"
 
+#include <errno.h>
 #include <poll.h>
 
 #include "core/log.h"
@@ -54,6 +55,10 @@ bool ExtWcnDumpConsumer::process(DeviceFileHandler::DataBuffer& buf) {
     const ssize_t written = write_dump(buf.data(), len);
     buf.consume_all();
     if (written < static_cast<ssize_t>(len)) {
+        if (written >= 0) {
+            errno = ENOSPC;
+            err_log("dump of %s is not complete", m_cp_name);
+        }
         m_handler->del_events(POLLIN);
         discard_dump_file();
         notify_result(LPR_FAILURE);

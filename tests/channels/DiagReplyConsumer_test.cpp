@@ -72,7 +72,7 @@ TEST_F(DiagReplyTest, AResultThatCannotBeStored) {
         const char* message;
     } cases[] = {
         // clang-format off
-        {"cut", [] { faults::shorten(faults::WRITEV, 64001); }, block, ""},
+        {"cut", [] { faults::shorten(faults::WRITEV, 64001); }, block, "is not complete [28("},
         {"full at the end", [] { faults::fail(faults::WRITE, 1, ENOSPC); }, end, ": result file of cp_wcdma is not complete [28("},
         {"deleted", delete_it, block, "is gone ["},
         {"deleted, silent", delete_it, "", ""},
