@@ -50,7 +50,8 @@ public:
     void init_state_handler(ModemStateHandler*& handler, const char* name);
     void init_wcn_state_handler(ExtWcnStateHandler*& handler, const char* name);
 
-    // ---- Control operations. They never wait. A change of a setting is applied to the
+    // ---- Control operations. They wait for nothing but the deletion of files and the thread that
+    // saves I/Q samples. A change of a setting is applied to the
     // running objects first, then the configuration file is rewritten; a file that cannot
     // be written is logged and written with the next change. Sizes are in MB.
 

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Helpers on byte ranges: a pointer and a length, never NUL-terminated text. Every
-// parser of requests, messages, file names and configuration lines is built on them;
-// none reads a byte outside its range.
+// Helpers on byte ranges: a pointer and a length, never NUL-terminated text, for the parsers of
+// requests, messages, file names and configuration lines. None reads a byte outside its range.
 #ifndef CORE_TEXT_H_
 #define CORE_TEXT_H_
 
