@@ -273,6 +273,29 @@ TEST_F(FailingMediumTest, ACardThatTakesNoSetIsLeft) {
     faults::instead = {};
 }
 
+// A full medium on which no directory can be made, whatever room is made there.
+TEST_F(FailingMediumTest, ASetThatCannotBeMadeCostsLittle) {
+    const std::string block(70000, 'x');
+    const char* refused = "data/modem_log/2";
+    m_mgr.set_file_size(100000);
+    EXPECT_EQ(lost_of(3, block), 0);  // two files, both spared
+    plug_card();
+    EXPECT_EQ(lost_of(1, block), 0);
+    faults::instead.mkdir = [&](const char* path, mode_t mode) {
+        return strstr(path, refused) ? (errno = ENOSPC, -1) : real::mkdir(path, mode);
+    };
+    pull_card();
+    EXPECT_EQ(lost_of(2, block), 0) << "the old set is there";
+    refused = "sd/modem_log/2";
+    for (const char* day : {"1", "2", "3", "4", "5"}) {
+        m_root.write_file("sd/modem_log/2016-02-0" + std::string(day) + "-00-00-00/cp_wcn/old",
+                          block);
+    }
+    plug_card();
+    EXPECT_EQ(lost_of(4, block), 0);
+    EXPECT_EQ(m_root.list("sd/modem_log").size(), 4u) << "of six: room was made once";
+}
+
 // What a scan could not read was not known, and went with the directory that seemed empty.
 TEST_F(FailingMediumTest, WhatAScanLeftOutIsNotDeleted) {
     const struct {
