@@ -21,8 +21,8 @@ public:
     // Opens the file at path, used as given. 0, or -1 with errno: EFBIG above 1 MiB.
     int open(const char* path);
 
-    // The next line, valid until the next call. Null at the end and after a read error or 1 MiB,
-    // which then is in errno.
+    // The next line, valid until the next call. Null at the end and, with errno, after a read error
+    // or beyond 1 MiB.
     const char* next_line();
 
     int line_number() const { return m_number; }  // of the last line, from 1

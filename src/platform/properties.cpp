@@ -28,7 +28,7 @@ const off_t MAX_FILE_SIZE = 1 << 20;
 // file changed twice in one tick has the same stamp after both. A stamp proves the
 // content only when it was this old at the time the content was read.
 const int64_t SETTLE_NS = 50 * 1000 * 1000;
-// The same where stamps are whole seconds, or every other one.
+// Where stamps are whole seconds, or only even ones.
 const int64_t SECOND_NS = 1000 * 1000 * 1000;
 const int64_t COARSE_SETTLE_NS = 2 * SECOND_NS + SETTLE_NS;
 

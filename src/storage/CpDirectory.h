@@ -41,8 +41,8 @@ public:
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
     bool empty() const { return m_files.empty(); }
-    // Whether it holds no files for certain: a scan that could not see all is made again, once in
-    // a while.
+    // Whether it is known to hold no files. A scan that could not see everything is repeated now
+    // and then.
     bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
@@ -106,8 +106,8 @@ private:
     android::String8 m_name;
     android::String8 m_path;
     uint64_t m_size = 0;
-    bool m_left_out = false;   // something by the scan, which could not look at it
-    unsigned int m_asked = 0;  // whether it is empty for certain, in that case
+    bool m_left_out = false;   // the scan could not look at everything
+    unsigned int m_asked = 0;  // how often found_empty() was called then
     ObjectRef<LogFile> m_first_log;
     android::List<LogFile*> m_files;
     ObjectRef<LogFile> m_cur_log;

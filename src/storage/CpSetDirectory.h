@@ -32,8 +32,8 @@ public:
     // Makes the directory on the medium; 0 also when it exists. -1 on failure.
     int create();
     bool empty() const { return m_dirs.empty(); }
-    // Whether it holds no CP directories for certain: a scan that could not see all is made
-    // again, once in a while.
+    // Whether it is known to hold no CP directories. A scan that could not see everything is
+    // repeated now and then.
     bool found_empty();
     // Deletes the directory on the medium with everything in it.
     int remove();
@@ -73,8 +73,8 @@ private:
     android::String8 m_path;
     android::List<CpDirectory*> m_dirs;
     uint64_t m_size = 0;
-    bool m_left_out = false;   // something by the scan, which could not look at it
-    unsigned int m_asked = 0;  // whether it is empty for certain, in that case
+    bool m_left_out = false;   // the scan could not look at everything
+    unsigned int m_asked = 0;  // how often found_empty() was called then
 };
 
 #endif  // STORAGE_CPSETDIRECTORY_H_

@@ -62,8 +62,9 @@ public:
         int failed = 0;
         bool made_room = false;
     };
-    // The same for who tries until this is false. A card seems to work again after its first
-    // failure, so that it takes two to find the other medium; room is made once.
+    // The same with a limit, for a caller that tries again until this is false. A card seems to
+    // work again after its first failure, so it takes two to reach the other medium; room is made
+    // once.
     bool try_again(MediaStorage* media, Tries& tries);
 
     void subscribe_media_change_evt(StorageManager::media_change_callback callback, void* client);

@@ -13,8 +13,8 @@
 // What for_each_entry returns when there are entries that could not be read or looked at.
 constexpr int SOME_LEFT_OUT = 1;
 
-// Who asks for every block whether a directory is empty for certain, of which something was left
-// out, has it scanned once in so many times: a dying medium may take long to fail.
+// A directory whose scan left something out is scanned again once in this many times that somebody
+// asks whether it is empty: on a dying medium each scan may take long to fail.
 constexpr unsigned int ASKED_PER_SCAN = 16;
 
 // Calls visit(name, st) for each entry other than "." and "..", in the file system's order.
