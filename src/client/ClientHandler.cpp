@@ -15,9 +15,9 @@
 namespace {
 
 // What a client is polled for while its transaction runs and nothing is read from it. poll
-// reports a hang-up unasked; this only keeps the client in the loop's table. It means that
-// both directions are gone. A client that shut down its writing end alone, as a pipe into
-// a network tool does after its last request, still waits for its reply.
+// reports a hang-up unasked; this only keeps the client in the loop's table, as long as it is
+// there: a hang-up means that both directions are gone. A client that shut down its writing end
+// alone, as a pipe into a network tool does after its last request, still waits for its reply.
 constexpr int GONE_EVENTS = POLLHUP;
 
 // One write: what a client that does not read has no room for is lost, and a late
@@ -33,6 +33,16 @@ ClientHandler::ClientHandler(int fd, LogController* ctrl, Multiplexer* mux, Clie
 
 ClientHandler::~ClientHandler() {
     cancel_trans();
+}
+
+void ClientHandler::process(int events) {
+    if (m_trans_state == CTS_EXECUTING) {
+        // It hung up: others may have its place. What it has sent waits for the end of the
+        // transaction all the same, which a request might end.
+        del_events(GONE_EVENTS);
+        return;
+    }
+    BufferedFdHandler::process(events);
 }
 
 int ClientHandler::process_data() {

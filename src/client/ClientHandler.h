@@ -34,6 +34,8 @@ public:
     ClientHandler(int fd, LogController* ctrl, Multiplexer* mux, ClientManager* manager);
     ~ClientHandler() override;
 
+    void process(int events) override;
+
     int process_data() override;
     void process_conn_closed() override;
     void process_conn_error(int err) override;

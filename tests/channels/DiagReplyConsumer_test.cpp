@@ -133,6 +133,21 @@ TEST_F(DiagReplyTest, ACpThatIsSilentFailsAndLeavesWhatItSent) {
     EXPECT_EQ(modem()->state(), CWS_WORKING);
 }
 
+// What it had sent before was read at once, and ended the exchange.
+TEST_F(DiagReplyTest, AClientThatHangsUpEndsNothing) {
+    const Kind& kind = KINDS[0];
+    ASSERT_NO_FATAL_FAILURE(begin(false));
+    ASSERT_TRUE(request(kind));
+    const size_t slots = Filler::free_slots(mux());
+    ASSERT_TRUE(client->say("DISABLE_LOG WCDMA\n"));
+    client->hang_up();
+    EXPECT_TRUE(pump([&] { return Filler::free_slots(mux()) == slots + 1; }));
+    ASSERT_TRUE(supply(diag_dev, frame(kind.type, 'd', "all") + frame(kind.type, 1)));
+    EXPECT_TRUE(pump([&] { return log.has("client disconnected, remaining 0 clients"); }));
+    EXPECT_FALSE(modem()->enabled());
+    EXPECT_EQ(result_file(kind), "all");
+}
+
 TEST_F(DiagReplyTest, ACpThatOnlyLogsFailsThirtySecondsAfterItsLastAnswer) {
     const Kind& kind = KINDS[1];
     ASSERT_NO_FATAL_FAILURE(begin(true));
