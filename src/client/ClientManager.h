@@ -28,7 +28,8 @@ public:
     int init(const char* name);
 
     // Accepts one connection. A refusal, for want of descriptors say, leaves the client
-    // waiting. A client who may not be served is disconnected without a reply.
+    // waiting. A client who may not be served, or for whom the loop has no place, is disconnected
+    // without a reply.
     void process(int events) override;
 
     // Destroys the handler of a connection that has ended; its code must return at once.

@@ -50,10 +50,11 @@ public:
     void init_state_handler(ModemStateHandler*& handler, const char* name);
     void init_wcn_state_handler(ExtWcnStateHandler*& handler, const char* name);
 
-    // ---- Control operations. They wait for nothing but the deletion of files and the thread that
-    // saves I/Q samples. A change of a setting is applied to the
-    // running objects first, then the configuration file is rewritten; a file that cannot
-    // be written is logged and written with the next change. Sizes are in MB.
+    // ---- Control operations. They wait for nothing but the media (what is staged is written,
+    // files are deleted, a modem that is switched on has the parsing library of its image copied)
+    // and the thread that saves I/Q samples. A change of a setting is applied to the running
+    // objects first, then the configuration file is rewritten; a file that cannot be written is
+    // logged and written with the next change. Sizes are in MB.
 
     // Switch the logging of CPs on and off; CPs without a channel are skipped. Always 0.
     int enable_log(const CpType* types, size_t num);

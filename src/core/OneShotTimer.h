@@ -22,7 +22,8 @@ public:
     // Due ms milliseconds from now, pending already or not. 0, or -1 when the clock cannot be
     // read or nothing is bound: a pending timer keeps its time then.
     int start(unsigned int ms);
-    // The same for a timer that nobody watches: the failure is logged, by TimerManager.
+    // The same for a timer that nobody watches: the failure is logged, by TimerManager, and a timer
+    // that was pending is not any more.
     int start_or_log(unsigned int ms);
     void stop();
     bool pending() const { return m_timer || m_added; }

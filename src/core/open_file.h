@@ -17,8 +17,8 @@ enum class Links { FOLLOW, REFUSE };
 int open_to_read(const char* path, Links links);
 
 // Opens a regular file for writing; flags are those of open() (O_RDWR or O_WRONLY, with
-// O_CREAT, O_TRUNC and so on), a file made has mode 0644. Result as above; ENXIO for a FIFO,
-// EMLINK for a second name refused.
+// O_CREAT, O_TRUNC and so on), a file made has mode 0644. Result as above; ENXIO or EINVAL
+// for a FIFO, EMLINK for a second name refused.
 int open_to_write(const char* path, int flags, Links links);
 
 #endif  // CORE_OPEN_FILE_H_

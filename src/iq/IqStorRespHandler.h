@@ -27,7 +27,7 @@ public:
     // 0 when the command was handed over, else -1.
     int send_cmd(int cmd);
     // Blocks until the thread responds; the response. While it waits it says so every few
-    // seconds. -1 when the thread can not respond any more.
+    // seconds. -1 when the thread can not respond any more, or this end can not hear it.
     int wait_response();
     // Makes the thread end, which the caller waits for by joining it. No failure of the
     // connection keeps the thread running.
