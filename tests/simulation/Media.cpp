@@ -344,8 +344,7 @@ void Media::check_bytes() const {
     }
 }
 
-void Media::check_libraries(bool in_use) const {
-    bool found = false;
+void Media::check_libraries(std::optional<MediumId> in_use) const {
     const SimModemImage image(IMAGE_SIZE, g_state->image);
     for (const std::string& tree : trees()) {
         const std::string library = read_text_file(tree + "/modem_db.gz");
@@ -355,10 +354,9 @@ void Media::check_libraries(bool in_use) const {
         if (!library.empty() && digest.size() == own.size() && digest != own) {
             fail_run("library", "the digest in %s is not the library's", tree.c_str());
         }
-        found = found || image.saved_in(tree);
     }
-    if (in_use && g_state->image && !found) {
-        fail_run("library", "no medium has that of the image");
+    if (in_use && g_state->image && !image.saved_in(log_root(*in_use))) {
+        fail_run("library", "medium %d has not that of the image", *in_use);
     }
 }
 

@@ -7,6 +7,7 @@
 #include <stdint.h>
 #include <sys/stat.h>
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -59,8 +60,8 @@ public:
     // Compares the bytes that were written with those that are there, on every card, and the
     // names with their rules.
     void check_bytes() const;
-    // A digest beside a parsing library is its own. in_use: one medium has that of the image.
-    void check_libraries(bool in_use) const;
+    // A digest beside a parsing library is its own. in_use: this medium has that of the image.
+    void check_libraries(std::optional<MediumId> in_use) const;
     void check_names() const;
     // The stream whose directory this is part of, or CHANNEL_COUNT.
     static unsigned stream_of(const std::string& path);

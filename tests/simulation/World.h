@@ -88,6 +88,8 @@ private:
     void check_settings() const;
     void check_quota() const;
     void check_room_made();
+    void check_card_left(bool due);
+    MediumId medium_in_use() const;
     Media::Seen look_at_medium_in_use() const;
     void spins(const struct pollfd* fds, nfds_t count) const;
     void write_props() const;
@@ -106,8 +108,10 @@ private:
     Media m_media;
     unsigned m_idle_passes = 0;
     unsigned m_refused_since_deletion = UINT32_MAX / 2;
-    unsigned m_refused = 0;       // blocks in a row, by a full medium
-    uint64_t m_refused_from = 0;  // bytes read until the first of them
+    unsigned m_refused = 0;           // blocks in a row, by a full medium
+    uint64_t m_refused_from = 0;      // bytes read until the first of them
+    unsigned m_lost_beside_card = 0;  // blocks in a row, while the internal medium takes all
+    uint64_t m_stored = 0;            // in all, when the last of them was lost
     unsigned m_last_stream = STREAM_COUNT;
 };
 

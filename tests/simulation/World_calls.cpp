@@ -161,11 +161,13 @@ void World::message(const std::string& text) {
     if (m_last_stream == STREAM_COUNT) {
         fail_run("lost", "a block lost of no stream: %s", text.c_str());
     }
-    if (!g_state->fault_in_step && !refusal_is_due()) {
+    const bool due = refusal_is_due();
+    if (!g_state->fault_in_step && !due) {
         fail_run("refused", "nothing was in the way: %s", text.c_str());
     }
     ledger::excuse(m_last_stream);
     check_room_made();
+    check_card_left(due);
 }
 
 // Whether the medium in use is above its quota and may not delete anything.
@@ -174,13 +176,12 @@ bool World::refusal_is_due() {
     if (!media) {
         return false;
     }
-    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
-    const Setting& quota = g_state->settings[card ? SET_CARD_MB : SET_DATA_MB];
+    const MediumId medium = medium_in_use();
+    const Setting& quota = g_state->settings[medium == MED_CARD ? SET_CARD_MB : SET_DATA_MB];
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
     // A request that was sent may not have been read.
     const bool known = !quota.uncertain && !overwrite.uncertain && !m_clients.waiting();
-    if (m_media.must_refuse(card ? MED_CARD : MED_DATA,
-                            known ? uint64_t{quota.value} << 20 : media->quota(),
+    if (m_media.must_refuse(medium, known ? uint64_t{quota.value} << 20 : media->quota(),
                             known ? overwrite.value != 0 : media->overwrite())) {
         return true;
     }

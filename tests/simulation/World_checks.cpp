@@ -31,7 +31,9 @@ void World::check(bool last) {
     if (g_state->dump_unconfirmed) {
         fail_run("dump", "what was read of the DSP's memory is not confirmed");
     }
-    m_media.check_libraries(last && g_state->streams[ST_WCDMA].logged.value);
+    const bool modem_logs = g_state->streams[ST_WCDMA].logged.value;
+    m_media.check_libraries(last && modem_logs ? std::make_optional(medium_in_use())
+                                               : std::nullopt);
     check_descriptors();
     check_totals();
     check_settings();
@@ -40,8 +42,7 @@ void World::check(bool last) {
     if (last) {
         check_quota();
         constexpr int64_t REST_NS = int64_t{610} * 1000000000;
-        if (m_controller->stor_mgr().media_type() != MT_EXTERNAL &&
-            g_state->boot_ns - g_state->card_failed_ns > REST_NS) {
+        if (medium_in_use() != MED_CARD && g_state->boot_ns - g_state->card_failed_ns > REST_NS) {
             fail_run("medium", "the card is in, and not used");
         }
         for (const std::string& capture : m_media.captures()) {
@@ -79,11 +80,14 @@ void World::check_settings() const {
     }
 }
 
+MediumId World::medium_in_use() const {
+    return m_controller->stor_mgr().media_type() == MT_EXTERNAL ? MED_CARD : MED_DATA;
+}
+
 Media::Seen World::look_at_medium_in_use() const {
     const MediaStorage* const media = m_controller->stor_mgr().get_media_stor();
     const CpSetDirectory* const set = media ? media->working_set() : nullptr;
-    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
-    return m_media.look(card ? MED_CARD : MED_DATA, set ? set->path().string() : "");
+    return m_media.look(medium_in_use(), set ? set->path().string() : "");
 }
 
 // On the medium in use this happens when only spared files are left.
@@ -105,7 +109,7 @@ void World::set_begins(const std::string& path) const {
 // In the calm nothing keeps a card above its quota.
 void World::check_quota() const {
     const Setting& quota = g_state->settings[SET_CARD_MB];
-    if (m_controller->stor_mgr().media_type() != MT_EXTERNAL) {
+    if (medium_in_use() != MED_CARD) {
         return;
     }
     const Media::Seen seen = look_at_medium_in_use();
@@ -122,9 +126,8 @@ void World::check_room_made() {
     constexpr unsigned MAX_REFUSED = 12;
     constexpr uint64_t MUCH = 3 << 20;
     constexpr uint64_t ENOUGH = 3 << 20;  // of new data: one and a half times the largest file
-    const bool card = m_controller->stor_mgr().media_type() == MT_EXTERNAL;
     const Setting& overwrite = g_state->settings[SET_OVERWRITE];
-    const bool has_to = g_state->room[card ? MED_CARD : MED_DATA] == 0 && overwrite.value &&
+    const bool has_to = g_state->room[medium_in_use()] == 0 && overwrite.value &&
                         !overwrite.uncertain && m_clients.quiet() && !g_state->fault_seen &&
                         !g_state->card_read_only;
     m_refused = has_to ? m_refused + 1 : 0;
@@ -143,9 +146,25 @@ void World::check_room_made() {
     }
 }
 
+// A card that takes nothing is left for the internal medium.
+void World::check_card_left(bool due) {
+    constexpr unsigned MAX_LOST = 12;
+    const bool has_to = !due && !g_state->fault_seen && g_state->room[MED_DATA] == UINT64_MAX &&
+                        (!g_state->card_in || g_state->card_read_only);
+    uint64_t stored = 0;
+    for (const StreamState& stream : g_state->streams) {
+        stored += stream.stored;
+    }
+    m_lost_beside_card = has_to && stored == m_stored ? m_lost_beside_card + 1 : 0;
+    m_stored = stored;
+    if (m_lost_beside_card > MAX_LOST) {
+        fail_run("medium", "%u blocks lost, and the internal medium takes all", m_lost_beside_card);
+    }
+}
+
 void World::check_between_lives() const {
     m_media.check_bytes();
-    m_media.check_libraries(false);
+    m_media.check_libraries(std::nullopt);
 }
 
 void World::check_descriptors() const {
@@ -159,6 +178,10 @@ void World::check_descriptors() const {
         if (info.cls == FD_LOG_FILE &&
             !m_controller->get_cp(STREAM_TYPES[info.stream])->enabled()) {
             fail_run("leak", "a log file of stream %u is open, and its log is off", info.stream);
+        }
+        if (info.cls == FD_LOG_FILE &&
+            (info.place == PLACE_CARD) != (medium_in_use() == MED_CARD)) {
+            fail_run("medium", "a log file of stream %u is open on the other one", info.stream);
         }
     }
     const unsigned most[FD_CLASS_COUNT] = {
