@@ -12,6 +12,7 @@ urgency=medium\n\n  * Built from the sources; CHANGELOG.md there has the changes
 -- ${CPACK_PACKAGE_CONTACT}  ${date}\n")
     file(GLOB_RECURSE texts ${share}/man/*.[1-8] ${share}/doc/${package}/changelog)
     foreach(text IN LISTS texts)
+        file(CHMOD ${text} PERMISSIONS OWNER_READ OWNER_WRITE GROUP_READ WORLD_READ)
         execute_process(COMMAND gzip -9nf ${text} COMMAND_ERROR_IS_FATAL ANY)
     endforeach()
     # The documents of the reader, which a plain install puts beside those of the service.

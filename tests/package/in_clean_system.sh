@@ -73,6 +73,7 @@ value ExecStartPre | sh -e
 $(value ExecStart) 2>"$here/service.log" &
 pid=$!
 await kestctl status
+! setpriv --reuid 65534 --clear-groups kestctl status 2>/dev/null || fail "every user is served"
 $(value ExecStop | sed 's/^-//')
 [ "$(kestctl get-log-file-size)" = 5 ] || fail "the packaged settings do not count"
 kill "$pid"
