@@ -234,6 +234,7 @@ exit $status
 TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
     write_good_tree();
     write("version", "1");
+    write(MODEM + "cp_wcdma_wiq_2016-03-01_09-16-00.bin", "iqiqiqiq");
     const std::string before =
         "mkdir -p card handset/data media tmp usr/share && cp -a modem_log card && cp -a modem_log "
         "handset/data && cp -a modem_log data && cp -a card media && tar czf card.tar.gz card && "

@@ -62,7 +62,7 @@ int open_input(LogReader& in, const std::string& path) {
 }
 
 int for_each_file(const CommandLine& line,
-                  int (*run)(const CommandLine& line, const std::string& path)) {
+                  const std::function<int(const CommandLine& line, const std::string& path)>& run) {
     int status = ES_OK;
     const Progress progress(total_size(line.params()));
     for (const std::string& path : line.params()) {

@@ -4,6 +4,7 @@
 #ifndef KESTLOG_REPORT_H_
 #define KESTLOG_REPORT_H_
 
+#include <functional>
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
@@ -34,7 +35,7 @@ int open_input(LogReader& in, const std::string& path);
 
 // Runs a command for each of the FILEs of the line; the largest of the statuses.
 int for_each_file(const CommandLine& line,
-                  int (*run)(const CommandLine& line, const std::string& path));
+                  const std::function<int(const CommandLine& line, const std::string& path)>& run);
 
 // The size of all the files, or 0 when one is no file.
 uint64_t total_size(const Args& paths);

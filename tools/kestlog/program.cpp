@@ -43,7 +43,7 @@ constexpr Command COMMANDS[] = {
 #ifdef KEST_WAV
     {"wav",    "FILE|ROOT...", 1, ANY, run_wav, "write the PCM data of an audio DSP log to a WAV file"},
 #endif
-    {"sigmf",  "FILE",    1, 1,   run_sigmf,  "write a SigMF meta file beside an I/Q capture"},
+    {"sigmf",  "FILE...", 1, ANY, run_sigmf,  "write a SigMF meta file beside each I/Q capture"},
 };
 
 // The commands that take a ROOT.

@@ -147,20 +147,9 @@ void print_result(const Problems& problems, const Capture& capture, const Settin
     }
 }
 
-}  // namespace
-
-int run_sigmf(const CommandLine& line) {
-    Settings settings;
-    int status;
-    if (!read_settings(line, &settings, &status)) {
-        return status;
-    }
-    const std::string& path = line.params()[0];
-    if (path == "-") {
-        return line.usage_error("the meta file names the capture; give its path");
-    }
+int describe(const CommandLine& line, const Settings& settings, const std::string& path) {
     LogReader in;
-    if ((status = open_input(in, path)) != ES_OK) {
+    if (const int status = open_input(in, path)) {
         return status;
     }
     const Capture capture = {path, FileName(file_part(path)), in.size()};
@@ -191,4 +180,24 @@ int run_sigmf(const CommandLine& line) {
     }
     print_result(problems, capture, settings, out);
     return problems.status();
+}
+
+}  // namespace
+
+int run_sigmf(const CommandLine& line) {
+    Settings settings;
+    int status;
+    if (!read_settings(line, &settings, &status)) {
+        return status;
+    }
+    const Args& paths = line.params();
+    if (std::find(paths.begin(), paths.end(), "-") != paths.end()) {
+        return line.usage_error("the meta file names the capture; give its path");
+    }
+    if (line.has("output") && paths.size() > 1) {
+        return line.usage_error("--output is for one FILE");
+    }
+    return for_each_file(line, [&settings](const CommandLine& each, const std::string& path) {
+        return describe(each, settings, path);
+    });
 }
