@@ -101,7 +101,8 @@ const struct {
     {"info", {WCN_LOG + " " + DSP_LOG, MODEM_LOG, MODEM_DUMP, MODEM + "cp_wcdma.version"}},
     {"verify", {"."}},
     {"frames", {MODEM_LOG, "--hex " + OLD_DSP_LOG + " " + WCN_LOG}},
-    {"report", {". nowhere", "--iq-rate 1e6 --iq-format ci8 --pcm-rate 8000 --pcm-format s8 ."}},
+    {"report",
+     {". many nowhere", "--iq-rate 1e6 --iq-format ci8 --pcm-rate 8000 --pcm-format s8 ."}},
     {"bundle", {"--crash 2016-03-01 -o crash.tar ."}},
     {"split", {"-o . " + OLD_DSP_LOG}},
     {"export", {"-o capture ."}},
@@ -118,9 +119,15 @@ TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
     write_good_tree();
     write(DSP_LOG, "no chunks");
     write("iq", "12345");
-    for (uint32_t lost = 1; lost < 30; ++lost) {
+    std::string types;
+    for (uint32_t lost = 1; lost < 202; ++lost) {
         m_root.write_file(DSP_LOG, m_root.read_file(DSP_LOG) + chunk(2 * lost, PCM, "x"));
+        m_root.write_file(
+            "many/cp_gnss/cp_gnss_sleeplog_" + std::to_string(2000 + lost) + "-03-01_09-15-00.log",
+            "");
+        types += frame("", 1, static_cast<int>(lost));
     }
+    write("many/cp_gnss/0-cp_gnss-" + STAMP + ".log", types);
     std::map<std::string, std::vector<Table>> tables = read_tables();
     for (const auto& command : RUNS) {
         std::vector<Table>& kinds = tables[command.command];
