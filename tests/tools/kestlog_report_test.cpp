@@ -159,9 +159,9 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
     std::string iq, pcm;
     for (int k = 0; k < 4096; ++k) {
         for (const double value : {cos(k * M_PI / 4), sin(k * M_PI / 4)}) {
-            const int number = static_cast<int>(lround(value * 16384));
+            const int number = 32768 + static_cast<int>(lround(value * 16384));
+            iq += static_cast<char>(number >> 8);
             iq += static_cast<char>(number & 0xff);
-            iq += static_cast<char>(number >> 8 & 0xff);
         }
     }
     for (int k = 0; k < 3000; ++k) {
@@ -173,7 +173,7 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
     write(OLD_DSP_LOG, chunk(1, PCM, pcm.substr(0, 1001)) + chunk(2, LOG, "no sample"));
     write(DSP_LOG, chunk(3, PCM, pcm.substr(1001)));
     const std::string pictures =
-        " --iq-rate 3.84e6 --iq-format ci16_le --pcm-rate 8000 --pcm-format s8 --pcm-channels 2";
+        " --iq-rate 3.84e6 --iq-format cu16_be --pcm-rate 8000 --pcm-format s8 --pcm-channels 2";
     const Json json = report("." + pictures);
     const Json spectrum =
         only(json["spectra"], {{"samples", 4096}, {"columns", 16}, {"bins", 256}});
@@ -193,6 +193,14 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
     EXPECT_EQ(waveform["channels"][0][1], 500);
     EXPECT_EQ(waveform["channels"][1][1000], -1000);
     EXPECT_EQ(waveform["channels"][1].size(), 1500u);
+    write("all/" + DSP_LOG, chunk(1, PCM, "\x3f\x20\xa0\xbe"));
+    std::string firsts;
+    for (const std::string format :
+         {"u8", "s8", "s16le", "s16be", "s24le", "s24be", "s32le", "s32be", "f32le", "f32be"}) {
+        const Json all = report("all --pcm-rate 1 --pcm-format " + format);
+        firsts += all["waveforms"][0]["channels"][0][0].dump() + " ";
+    }
+    EXPECT_EQ(firsts, "-508 492 252 493 -749 493 -511 493 -313 627 ");
     EXPECT_TRUE(report(".")["spectra"].empty());
     EXPECT_EQ(m_err, "");
     report(". --until 2000-01-01" + pictures);

@@ -124,7 +124,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
          "--kind log", 0, "oneone", "note: chunk 5 where 8 was expected (at byte 0)\n"},
         {"agdsp", {in(0, "09-00-00", chunk(5, DUMP, "a") + "~~~~\x1b" + three)},
          "--kind dump", 3, "a3", "damage: wrong chunk header: mark (at byte 21)\n"},
-        {"agdsp", {in(0, "09-00-00", three)}, "--kind sms", 1, "", "not log, pcm or dump"},
+        {"agdsp", {in(0, "09-00-00", three)}, "--kind sms", 1, "", "give one of log, pcm, dump"},
         // clang-format on
     };
     for (const auto& c : CASES) {

@@ -7,10 +7,11 @@
 #include <stdint.h>
 
 #include <string>
+#include <vector>
 
 struct SampleFormat {
-    const char* iq;                    // the name of the complex format
-    const char* pcm;                   // the name of the real format
+    const char* iq;                    // the name of the complex format, as SigMF has it, or null
+    const char* pcm;                   // the name of the real format or null
     size_t bytes;                      // of one number
     float (*read)(const uint8_t* at);  // full scale is 1
 };
@@ -19,8 +20,7 @@ struct SampleFormat {
 const SampleFormat* iq_format(const std::string& name);
 const SampleFormat* pcm_format(const std::string& name);
 
-// "ci8, ci16_le".
-std::string iq_format_names();
-std::string pcm_format_names();
+std::vector<std::string> iq_format_names();
+std::vector<std::string> pcm_format_names();
 
 #endif  // KESTLOG_SAMPLEFORMAT_H_

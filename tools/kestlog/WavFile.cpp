@@ -36,10 +36,10 @@ const WavFormat* find_wav_format(const std::string& name) {
     return nullptr;
 }
 
-std::string wav_format_names() {
-    std::string names;
+std::vector<std::string> wav_format_names() {
+    std::vector<std::string> names;
     for (const WavFormat& format : FORMATS) {
-        names += (names.empty() ? "" : ", ") + std::string(format.name);
+        names.push_back(format.name);
     }
     return names;
 }

@@ -20,7 +20,7 @@ struct WavFormat {
 
 // Null when there is none of that name.
 const WavFormat* find_wav_format(const std::string& name);
-std::string wav_format_names();
+std::vector<std::string> wav_format_names();
 
 class WavFile {
 public:

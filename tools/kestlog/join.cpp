@@ -20,6 +20,7 @@
 #include "kestlog/Report.h"
 #include "kestlog/StreamPlan.h"
 #include "kestlog/TreeInput.h"
+#include "kestlog/option_numbers.h"
 
 namespace {
 
@@ -156,12 +157,10 @@ private:
 
 // False, with the exit status in *status, when --kind cannot be meant.
 bool check_kind(const CommandLine& line, const LogStream& stream, int* status) {
-    const std::string kind = line.value("kind", "");
     if (!line.has("kind")) {
         return true;
     }
-    if (std::find(std::begin(CHUNK_KINDS), std::end(CHUNK_KINDS), kind) == std::end(CHUNK_KINDS)) {
-        *status = line.usage_error("--kind: '" + kind + "' is not log, pcm or dump");
+    if (!check_word(line, "kind", {std::begin(CHUNK_KINDS), std::end(CHUNK_KINDS)}, status)) {
         return false;
     }
     if (stream.files[0].file->name.cp_type != CT_AGDSP) {

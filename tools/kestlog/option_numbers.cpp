@@ -4,6 +4,7 @@
 
 #include <stdlib.h>
 
+#include <algorithm>
 #include <charconv>
 
 namespace {
@@ -67,4 +68,16 @@ bool read_hertz(const CommandLine& line, const char* option, bool positive, doub
     }
     *value = number;
     return true;
+}
+
+bool check_word(const CommandLine& line, const char* option, const Args& words, int* status) {
+    if (std::find(words.begin(), words.end(), line.value(option, "")) != words.end()) {
+        return true;
+    }
+    std::string list;
+    for (const std::string& word : words) {
+        list += (list.empty() ? "" : ", ") + word;
+    }
+    *status = line.usage_error("--" + std::string(option) + ": give one of " + list);
+    return false;
 }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-// The numbers that options of kestlog take. Each function leaves the value as it is when the option
-// is not given and otherwise needs one within the limits; it is false, with the exit status in
-// *status, after printing what is wrong.
+// The numbers and words that options of kestlog take. Each function leaves the value as it is when
+// the option is not given and otherwise needs one within the limits; it is false, with the exit
+// status in *status, after printing what is wrong.
 #ifndef KESTLOG_OPTION_NUMBERS_H_
 #define KESTLOG_OPTION_NUMBERS_H_
 
@@ -19,5 +19,8 @@ bool read_type(const CommandLine& line, const char* option, int* value, int* sta
 // A frequency or, with positive, a rate: it may have a fraction and an exponent.
 bool read_hertz(const CommandLine& line, const char* option, bool positive, double* value,
                 int* status);
+
+// One of the words; false also when the option is not given.
+bool check_word(const CommandLine& line, const char* option, const Args& words, int* status);
 
 #endif  // KESTLOG_OPTION_NUMBERS_H_

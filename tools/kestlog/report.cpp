@@ -15,15 +15,6 @@
 
 namespace {
 
-bool read_format(const CommandLine& line, const char* option, const SampleFormat* format,
-                 const std::string& names, int* status) {
-    if (!format) {
-        *status = line.usage_error("--" + std::string(option) + ": '" + line.value(option, "") +
-                                   "' is none of " + names);
-    }
-    return format != nullptr;
-}
-
 bool read_options(const CommandLine& line, ReportOptions* options, int* status) {
     options->whole = !line.has("since");
     if (line.has("iq-rate") != line.has("iq-format")) {
@@ -37,7 +28,7 @@ bool read_options(const CommandLine& line, ReportOptions* options, int* status) 
     }
     if (line.has("iq-rate")) {
         options->iq = iq_format(line.value("iq-format", ""));
-        if (!read_format(line, "iq-format", options->iq, iq_format_names(), status) ||
+        if (!check_word(line, "iq-format", iq_format_names(), status) ||
             !read_hertz(line, "iq-rate", true, &options->iq_rate, status)) {
             return false;
         }
@@ -45,7 +36,7 @@ bool read_options(const CommandLine& line, ReportOptions* options, int* status) 
     uint64_t channels = 1;
     if (line.has("pcm-rate")) {
         options->pcm = pcm_format(line.value("pcm-format", ""));
-        if (!read_format(line, "pcm-format", options->pcm, pcm_format_names(), status) ||
+        if (!check_word(line, "pcm-format", pcm_format_names(), status) ||
             !read_hertz(line, "pcm-rate", true, &options->pcm_rate, status) ||
             !read_whole(line, "pcm-channels", 1, Waveform::MAX_CHANNELS, &channels, status)) {
             return false;

@@ -13,6 +13,7 @@
 #include "kestlog/ExitStatus.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
+#include "kestlog/SampleFormat.h"
 #include "kestlog/option_numbers.h"
 #include "kestlog/small_files.h"
 
@@ -33,26 +34,12 @@ struct Capture {
     uint64_t size;
 };
 
-// The bytes of a sample, 0 when it is no datatype: complex or real, a number type, the byte order
-// of numbers that have one.
-uint64_t sample_bytes(const std::string& datatype) {
-    static const struct {
-        const char* name;
-        uint64_t bytes;
-    } NUMBERS[] = {{"f32", 4}, {"f64", 8}, {"i32", 4}, {"i16", 2},
-                   {"u32", 4}, {"u16", 2}, {"i8", 1},  {"u8", 1}};
-    for (const auto& number : NUMBERS) {
-        for (const char* order : {"", "_le", "_be"}) {
-            if ((number.bytes == 1) == (*order == '\0') &&
-                datatype.substr(std::min<size_t>(1, datatype.size())) ==
-                    std::string(number.name) + order) {
-                return datatype[0] == 'c'   ? 2 * number.bytes
-                       : datatype[0] == 'r' ? number.bytes
-                                            : 0;
-            }
-        }
-    }
-    return 0;
+// The bytes of a sample, 0 when it is no datatype: a complex one, or a real one for an "r".
+uint64_t sample_bytes(std::string datatype) {
+    const bool real = datatype[0] == 'r';
+    datatype[0] = real ? 'c' : datatype[0];
+    const SampleFormat* const format = iq_format(datatype);
+    return format ? (real ? 1 : 2) * format->bytes : 0;
 }
 
 bool read_settings(const CommandLine& line, Settings* settings, int* status) {

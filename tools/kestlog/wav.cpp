@@ -49,8 +49,7 @@ bool read_number(const CommandLine& line, const char* option, int most, int* num
 bool read_sound(const CommandLine& line, Sound* sound, int* status) {
     sound->format = find_wav_format(line.value("format", ""));
     sound->fill_gaps = line.has("fill-gaps");
-    if (!sound->format) {
-        *status = line.usage_error("--format: give one of " + wav_format_names());
+    if (!check_word(line, "format", wav_format_names(), status)) {
         return false;
     }
     if (!line.has("output")) {
