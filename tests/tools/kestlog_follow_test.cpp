@@ -290,6 +290,11 @@ TEST_F(KestlogFollowTreeTest, WhatCannotBeFollowedEndsAtOnce) {
     m_root.make_dir("modem_log");
     EXPECT_EQ(Following({KESTLOG, "follow", m_root.path("nowhere")}, false).finish(), 2);
     EXPECT_EQ(Following({KESTLOG, "follow", m_root.path("file")}, false).finish(), 2);
+    for (const std::string args : {"join ", "export ", "bundle -o - --crash 2016-03-01 "}) {
+        Following binary({"sh", "-c", "'" KESTLOG "' " + args + m_root.path("modem_log")}, true);
+        EXPECT_TRUE(binary.says("a terminal cannot show this")) << args;
+        EXPECT_EQ(binary.finish(), 1);
+    }
     EXPECT_EQ(Following({"sh", "-c", "exec \"$@\" >/dev/full", "sh", KESTLOG, "follow",
                          m_root.path("modem_log")},
                         false)

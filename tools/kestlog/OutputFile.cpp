@@ -14,6 +14,7 @@
 #include <atomic>
 #include <vector>
 
+#include "common/CommandLine.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
@@ -53,6 +54,14 @@ uint64_t copy_in_kernel(int from, int to, uint64_t limit) {
 
 std::string output_name(const std::string& stem, const std::string& suffix) {
     return stem.substr(0, NAME_MAX - std::min<size_t>(NAME_MAX, suffix.size())) + suffix;
+}
+
+bool takes_binary(const CommandLine& line, int* status) {
+    if (line.value("output", "-") != "-" || !isatty(STDOUT_FILENO)) {
+        return true;
+    }
+    *status = line.usage_error("a terminal cannot show this; give --output or a pipe");
+    return false;
 }
 
 OutputFile* OutputFile::s_first = nullptr;

@@ -12,8 +12,14 @@
 
 #include <string>
 
+class CommandLine;
+
 // The stem with the suffix, as the name of a file: a long stem is cut to what a file system takes.
 std::string output_name(const std::string& stem, const std::string& suffix);
+
+// Whether the command may write what is no text to its --output, which a terminal is not made for.
+// False after printing that, with the exit status in *status.
+bool takes_binary(const CommandLine& line, int* status);
 
 class OutputFile {
 public:

@@ -133,7 +133,7 @@ int run_bundle(const CommandLine& line) {
         }
     }
     LogTree tree;
-    if (!open_tree(line, &tree, &status)) {
+    if (!takes_binary(line, &status) || !open_tree(line, &tree, &status)) {
         return status;
     }
     LogTime time;

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestlog export.
 #include <stdio.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <nlohmann/json.hpp>
@@ -48,14 +47,11 @@ int run_export(const CommandLine& line) {
     FrameExporter::Wanted wanted;
     wanted.broken = line.has("broken");
     int status = ES_OK;
-    if (!read_type(line, "type", &wanted.type, &status)) {
+    if (!read_type(line, "type", &wanted.type, &status) || !takes_binary(line, &status)) {
         return status;
     }
     const std::string path = line.value("output", "-");
     const bool piped = path == "-";
-    if (piped && isatty(STDOUT_FILENO)) {
-        return line.usage_error("the terminal cannot show a capture; give --output or a pipe");
-    }
     LogTree tree;
     if (!open_tree(line, &tree, &status, LogTree::FILES_TOO)) {
         return status;

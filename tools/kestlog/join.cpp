@@ -175,7 +175,7 @@ bool check_kind(const CommandLine& line, const LogStream& stream, int* status) {
 int run_join(const CommandLine& line) {
     LogTree tree;
     int status;
-    if (!open_tree(line, &tree, &status)) {
+    if (!takes_binary(line, &status) || !open_tree(line, &tree, &status)) {
         return status;
     }
     const std::vector<LogStream> streams = log_streams(tree);

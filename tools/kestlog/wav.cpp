@@ -245,7 +245,7 @@ int run_wav(const CommandLine& line) {
     Sound sound;
     LogTree tree;
     int status;
-    if (!read_sound(line, &sound, &status) ||
+    if (!read_sound(line, &sound, &status) || !takes_binary(line, &status) ||
         !open_tree(line, &tree, &status, LogTree::FILES_TOO)) {
         return status;
     }
