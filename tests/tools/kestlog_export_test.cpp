@@ -188,6 +188,7 @@ TEST_F(KestlogExportTest, TheOutputIsRefusedOrGivenUpWithAReason) {
         {"export . --cp cp_gnss -o new", 2, "no file with frames"},
         {"export . --type 256 -o new", 1, "a number from 0 to 255"},
         {"export nowhere -o new", 2, "nowhere: "},
+        {"export taken -o new", 2, "kestlog: taken: no frames or chunks in it\n"},
     };
     for (const auto& c : CASES) {
         EXPECT_EQ(run(c.args), c.status) << c.args;

@@ -59,7 +59,12 @@ int FrameExporter::add(const ExportSource& source) {
         end(in);
     }
     tell_damage(shown, report);
-    return scan_status(in, shown, report);
+    const int status = scan_status(in, shown, report);
+    if (status == ES_OK && source.given() && !source.file->name.exact && !report.chunked &&
+        report.frames == 0 && !(m_wanted.broken && report.broken > 0)) {
+        return failure(ES_UNREADABLE, shown + ": no frames or chunks in it");
+    }
+    return status;
 }
 
 // Before the first piece, which begins at that offset; or at the end of a file without one.

@@ -79,6 +79,9 @@ int run_export(const CommandLine& line) {
             break;
         }
     }
+    if (status == ES_UNREADABLE && exporter.totals().packets == 0) {
+        return std::max(status, tell_failures(tree));  // a capture of nothing is not kept
+    }
     if (!writer.finish() || !out.close()) {
         return out.failed();
     }
