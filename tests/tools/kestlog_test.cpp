@@ -368,6 +368,13 @@ TEST_F(KestlogTest, WrongUsageAndCompletion) {
     EXPECT_NE(m_err.find("(did you mean 'verify'?)"), std::string::npos) << m_err;
     EXPECT_EQ(run("--complete --json info --"), 0);
     EXPECT_EQ(m_out, "--help\n--json\n--version\n");
+    std::string words;
+    for (const std::string line :
+         {"join --kind P", "report --iq-format = cf3", "--pcm-format s24", "--datatype ri8"}) {
+        EXPECT_EQ(run("--complete " + line), 0);
+        words += m_out;
+    }
+    EXPECT_EQ(words, "pcm\ncf32_le\ncf32_be\ns24le\ns24be\nri8\n");
 }
 
 }  // namespace

@@ -260,12 +260,20 @@ void CommandLine::print_completions(const Args& words) const {
     const std::vector<Option> options = all_options(m_syntax);
     Args args;  // the command and its parameters, without options
     for (size_t i = 0; i + 1 < words.size(); ++i) {
-        const bool takes_param = std::any_of(options.begin(), options.end(), [&](const Option& o) {
+        const auto found = std::find_if(options.begin(), options.end(), [&](const Option& o) {
             return o.param && (words[i] == std::string("--") + o.name ||
                                (o.letter && words[i] == std::string("-") + o.letter));
         });
-        if (takes_param && ++i + 1 == words.size()) {
-            return;  // the option's parameter is being typed
+        const bool takes_param = found != options.end();
+        if (takes_param) {
+            i += words[i + 1] == "=" && i + 2 < words.size() ? 2 : 1;  // bash cuts at it
+        }
+        if (i + 1 == words.size()) {  // the option's parameter is being typed
+            for (const std::string& word :
+                 m_syntax.option_words ? m_syntax.option_words(found->name) : Args()) {
+                offer(word);
+            }
+            return;
         }
         if (!takes_param && (words[i] == "-" || words[i].compare(0, 1, "-") != 0)) {
             args.push_back(words[i]);

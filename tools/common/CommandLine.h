@@ -36,6 +36,8 @@ struct Syntax {
     // The words that may follow the command and these parameters. Null, or no words: the shell
     // completes file names.
     std::function<Args(const std::string& command, const Args& params)> next_words;
+    // The words that the option takes; the same of null or none.
+    std::function<Args(const std::string& option)> option_words = nullptr;
 };
 
 class CommandLine {

@@ -10,6 +10,11 @@
 #include "common/CommandLine.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/FileScan.h"
+#include "kestlog/SampleFormat.h"
+#ifdef KEST_WAV
+#include "kestlog/WavFile.h"
+#endif
 
 namespace {
 
@@ -104,6 +109,27 @@ constexpr char NOTES[] =
     "  3  damage found\n"
     "  4  the output could not be written, or already exists\n";
 
+Args option_words(const std::string& option) {
+    if (option == "kind") {
+        return {std::begin(CHUNK_KINDS), std::end(CHUNK_KINDS)};
+    }
+#ifdef KEST_WAV
+    if (option == "format") {
+        return wav_format_names();
+    }
+#endif
+    if (option == "pcm-format") {
+        return pcm_format_names();
+    }
+    Args words = option == "iq-format" || option == "datatype" ? iq_format_names() : Args();
+    if (option == "datatype") {
+        for (const std::string& complex : iq_format_names()) {
+            words.push_back("r" + complex.substr(1));
+        }
+    }
+    return words;
+}
+
 Syntax make_syntax() {
     Syntax syntax = {
         "kestlog",
@@ -113,6 +139,7 @@ Syntax make_syntax() {
         {},
         NOTES,
         nullptr,
+        option_words,
     };
     for (const Command& command : COMMANDS) {
         const std::string usage = std::string(command.name) + " " + command.params;
