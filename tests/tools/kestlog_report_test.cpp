@@ -343,8 +343,10 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
               only(inside["timeline"], {{"kind", "log"}, {"cp", "cp_wcdma"}, {"size", 3000}}));
 
     EXPECT_EQ(run("bundle handset --crash 09:05 -o crash.tar"), 4);
-    EXPECT_EQ(run("bundle handset --crash 2016-03-03 -o none.tar"), 2);
-    EXPECT_NE(m_err.find("no crash within a day of 2016-03-03 00:00:00; there are:\n"
+    EXPECT_EQ(run("bundle handset --crash 09:05 --cp CP_WCN --minutes 0 -o wcn.tar"), 0);
+    EXPECT_EQ(m_out.find("wcn.tar: 2016-03-01 09:06:30 cp_wcn on internal: memory dump; "), 0u);
+    EXPECT_EQ(run("bundle handset --crash 2016-03-03 --cp cp_wcn -o none.tar"), 2);
+    EXPECT_NE(m_err.find("no crash of cp_wcn within a day of 2016-03-03 00:00:00; there are:\n"
                          "kestlog: 2016-03-01 09:06:00 cp_wcdma on internal: mini dump, "),
               std::string::npos)
         << m_err;

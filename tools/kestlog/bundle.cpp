@@ -2,6 +2,7 @@
 // kestlog bundle.
 #include <stdio.h>
 #include <stdlib.h>
+#include <strings.h>
 
 #include <algorithm>
 #include <set>
@@ -26,10 +27,13 @@ std::string crash_line(const Crash& crash) {
            crash_text(crash);
 }
 
-// The crash nearest to the time; null, after printing which there are, when none is near.
-const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time) {
-    const auto distance = [&time](const Crash& crash) {
-        return std::abs(seconds_of(crash.time) - seconds_of(time));
+// The crash nearest to the time, of any CP without a name; null, after printing which there are,
+// when none is near.
+const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time,
+                        const std::string& cp) {
+    const auto distance = [&](const Crash& crash) {
+        const bool wanted = cp.empty() || strcasecmp(crash.cp->name.c_str(), cp.c_str()) == 0;
+        return wanted ? std::abs(seconds_of(crash.time) - seconds_of(time)) : INT64_MAX;
     };
     const auto nearest =
         std::min_element(crashes.begin(), crashes.end(),
@@ -37,7 +41,8 @@ const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time) 
     if (nearest != crashes.end() && distance(*nearest) <= DAY_SECONDS) {
         return &*nearest;
     }
-    failure(ES_UNREADABLE, "no crash within a day of " + time_text(time) +
+    failure(ES_UNREADABLE, "no crash " + (cp.empty() ? "" : "of " + cp + " ") + "within a day of " +
+                               time_text(time) +
                                (crashes.empty() ? "; there is none at all" : "; there are:"));
     for (size_t i = 0; i < std::min(crashes.size(), MAX_CRASHES); ++i) {
         failure(ES_UNREADABLE, crash_line(crashes[i]));
@@ -141,7 +146,7 @@ int run_bundle(const CommandLine& line) {
         return line.usage_error("--crash: '" + line.value("crash", "") + "' is not a time");
     }
     const std::vector<Crash> crashes = find_crashes(tree);
-    const Crash* const crash = find_crash(crashes, time);
+    const Crash* const crash = find_crash(crashes, time, line.value("cp", ""));
     if (!crash) {
         tell_failures(tree);
         return ES_UNREADABLE;
@@ -151,6 +156,7 @@ int run_bundle(const CommandLine& line) {
         return out.failed();
     }
     const std::string about = crash_line(*crash);
+    const std::string cp = crash->cp->name;
     reduce(*crash, static_cast<int64_t>(minutes) * 60, &tree);
     const Progress progress(2 * tree.size());  // for the report, and into the tar
     ReportOptions options;
@@ -167,6 +173,7 @@ int run_bundle(const CommandLine& line) {
     } else if (line.has("json")) {
         print_json({{"path", json_text(out.path())},
                     {"crash", json_text(about)},
+                    {"cp", json_text(cp)},
                     {"files", bundle.files()},
                     {"size", bundle.bytes()},
                     {"unreadable", bundle.unreadable()}});

@@ -80,6 +80,7 @@ constexpr Option OPTIONS[] = {
     {"pcm-format",   "F",     "report", "and this format: u8, s8, s16le, s16be, s24le ... s32be, f32le, f32be"},
     {"crash",        "T",     "bundle", "the crash nearest to T"},
     {"minutes",      "N",     "bundle", "with the logs of so many minutes around it (default: 5)"},
+    {"cp",           "NAME",  "bundle", "the crash of this CP nearest to T"},
     {"cp",           "NAME",  "join",  "the CP, when there are several"},
     {"records",      nullptr, "join",  "keep the time records"},
     {"kind",         "KIND",  "join",  "of an audio DSP's log only the data of chunks: log, pcm, dump"},
