@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // Runs the real kestlog over good trees and over a table of damages.
+#include <limits.h>
 #include <signal.h>
 #include <string.h>
 
 #include <algorithm>
 
+#include "sim/FaultPlan.h"
 #include "storage/CpDirectory.h"
 #include "storage/LogFile.h"
 #include "storage/MediaStorage.h"
@@ -24,6 +26,16 @@ TEST_F(KestlogTest, AGoodTreeIsFineFromEveryDirectoryOfIt) {
     EXPECT_EQ(rename(m_root.path(WCN).c_str(), m_root.path("copy").c_str()), 0);
     EXPECT_EQ(run("verify copy"), 0) << m_out;
     EXPECT_EQ(run("ls nowhere"), 2);
+    // What cannot be read of a directory is told.
+    for (const faults::Call call : {faults::FSTATAT, faults::READDIR}) {
+        const int plan[8] = {0, call, EIO, 2, INT_MAX};
+        write("plan", std::string(reinterpret_cast<const char*>(plan), sizeof(FaultPlan)));
+        EXPECT_EQ(
+            run("--version; export ASAN_OPTIONS=verify_asan_link_order=0; " FAULT_PLAN_VARIABLE
+                "=plan LD_PRELOAD='" KESTSIM_FAULTS "' '" KESTLOG "' ls copy"),
+            2);
+        EXPECT_EQ(occurrences(m_err, ": Input/output error\n"), 1u) << m_err;
+    }
 }
 
 // A handset's root with both media, logs of the internal one from 09:00 to 09:20.

@@ -81,7 +81,10 @@ bool LogTree::visit_dir(const std::string& path, const std::function<void(const 
         failures.push_back(shown(path) + ": " + strerror(errno));
         return false;
     }
-    while (const struct dirent* entry = readdir(dir)) {
+    uint64_t lost = 0;
+    int lost_error = 0;
+    // The end and a failure look the same but for errno.
+    while (const struct dirent* entry = (errno = 0, readdir(dir))) {
         struct stat st;
         if (strcmp(entry->d_name, ".") == 0 || strcmp(entry->d_name, "..") == 0) {
             continue;
@@ -91,7 +94,17 @@ bool LogTree::visit_dir(const std::string& path, const std::function<void(const 
         } else if (fstatat(dirfd(dir), entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0) {
             visit({entry->d_name, S_ISDIR(st.st_mode), S_ISREG(st.st_mode),
                    static_cast<uint64_t>(st.st_size), modified_time(st)});
+        } else if (errno != ENOENT) {  // else it has just been deleted
+            ++lost;
+            lost_error = errno;
         }
+    }
+    if (errno != 0) {
+        failures.push_back(shown(path) + ": only in part: " + strerror(errno));
+    }
+    if (lost > 0) {
+        failures.push_back(shown(path) + ": " + std::to_string(lost) +
+                           " entries cannot be read: " + strerror(lost_error));
     }
     closedir(dir);
     return true;
@@ -233,6 +246,7 @@ bool LogTree::add_directory(const std::string& path) {
     bool any_cp = false;
     bool any_file = false;
     const size_t foreign_before = foreign.size();
+    const size_t failures_before = failures.size();
     const bool readable = visit_dir(path, [&](const Entry& entry) {
         any_set |= entry.dir && parse_set_name(entry.name, &time);
         any_cp |= entry.dir && cp_type_of(entry.name) != CT_UNKNOWN;
@@ -241,16 +255,22 @@ bool LogTree::add_directory(const std::string& path) {
     if (!readable) {
         return true;
     }
-    foreign.resize(foreign_before);  // the directory is read again below
-    if (name == &DIR_MODEM_LOG[1] || any_set) {
+    const bool is_root = name == &DIR_MODEM_LOG[1] || any_set;
+    const bool is_set = parse_set_name(name, &time) || any_cp;
+    const bool is_cp = cp_type_of(name) != CT_UNKNOWN || any_file;
+    // The directory is read again below.
+    foreign.resize(foreign_before);
+    if (!is_root && !is_set && !is_cp) {
+        return false;
+    }
+    failures.resize(failures_before);
+    if (is_root) {
         read_root(path);
-    } else if (parse_set_name(name, &time) || any_cp) {
+    } else if (is_set) {
         read_set(path, name);
-    } else if (cp_type_of(name) != CT_UNKNOWN || any_file) {
+    } else {
         sets.push_back({"", shown(path), m_medium, {}, {}});
         read_cp(path, name, &sets.back());
-    } else {
-        return false;
     }
     return true;
 }
