@@ -77,10 +77,11 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
 TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     write_good_tree();
     m_root.make_dir("temp");
-    const std::string packers[] = {"tar cf a.tar modem_log", "tar cjf a.tbz2 modem_log",
-                                   "tar czf a.tgz --transform 's,^,some/card/,' modem_log",
-                                   "python3 -m zipfile -c a.zip modem_log",
-                                   "tar cf a.cp.tar -C " + WCN + " ."};
+    const std::string packers[] = {
+        "tar cf a.tar modem_log", "tar cjf a.tbz2 modem_log",
+        "tar czf a.tgz --transform 's,^,some/card/,' modem_log",
+        "python3 -m zipfile -c a.zip modem_log",
+        "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " ."};
     for (const std::string& packer : packers) {
         ASSERT_EQ(system(("cd " + m_root.root() + " && " + packer).c_str()), 0) << packer;
     }
@@ -90,7 +91,8 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         EXPECT_TRUE(said("18 files checked, 0 damages, 0 notes\n")) << args;
     }
     EXPECT_EQ(run("ls --json a.cp.tar"), 0) << m_err;
-    EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,")) << m_out;
+    EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,\"size\":501000,"))
+        << m_out;
 
     // An entry that is there twice is left out the second time, and what is cut off is told.
     ASSERT_EQ(system(("cd " + m_root.root() + " && tar rf a.tar " + WCN_LOG +

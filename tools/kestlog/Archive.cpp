@@ -154,7 +154,7 @@ private:
             return fail(name, errno == EEXIST ? "left out: another entry has this name"
                                               : std::string("left out: ") + strerror(errno));
         }
-        const uint64_t size = copy_data(fd, name);
+        const uint64_t size = copy_data(fd, entry, name);
         m_used += size;
         const struct timespec times[2] = {{0, UTIME_OMIT}, {archive_entry_mtime(entry), 0}};
         futimens(fd, times);
@@ -162,7 +162,7 @@ private:
     }
 
     // The size that the file got.
-    uint64_t copy_data(int fd, const std::string& name) {
+    uint64_t copy_data(int fd, struct archive_entry* entry, const std::string& name) {
         uint64_t size = 0;
         const void* data;
         size_t len;
@@ -172,13 +172,8 @@ private:
                 fail(name, std::string("cut off: ") + archive_error_string(m_in));
                 return size;
             }
-            // A hole counts, too: what reads the file reads it.
             const uint64_t end = static_cast<uint64_t>(offset) + len;
-            if (offset < 0 || end > m_limit || m_used + end > m_limit) {
-                m_full = true;
-                fail("", "unpacked it is larger than the " + std::to_string(m_limit / MIB) +
-                             " MiB that it may take in " + m_dir.substr(0, m_dir.rfind('/')) +
-                             "; choose another directory by TMPDIR or see --unpack-limit");
+            if (offset < 0 || !has_room(end)) {
                 return size;
             }
             if (!write_at(fd, static_cast<const char*>(data), len, offset)) {
@@ -191,7 +186,27 @@ private:
             Progress::advance(static_cast<uint64_t>(packed - m_packed));
             m_packed = packed;
         }
+        // A hole at the end is no data.
+        const la_int64_t whole = archive_entry_size(entry);
+        if (archive_entry_size_is_set(entry) && whole > 0 && static_cast<uint64_t>(whole) > size &&
+            has_room(static_cast<uint64_t>(whole))) {
+            if (ftruncate(fd, whole) == 0) {
+                return static_cast<uint64_t>(whole);
+            }
+            fail(name, std::string("cut off: ") + strerror(errno));
+        }
         return size;
+    }
+
+    // Whether a file may become so large. A hole counts, too: what reads the file reads it.
+    bool has_room(uint64_t size) {
+        if (size > m_limit || m_used + size > m_limit) {
+            m_full = true;
+            fail("", "unpacked it is larger than the " + std::to_string(m_limit / MIB) +
+                         " MiB that it may take in " + m_dir.substr(0, m_dir.rfind('/')) +
+                         "; choose another directory by TMPDIR or see --unpack-limit");
+        }
+        return !m_full;
     }
 
     static bool write_at(int fd, const char* data, size_t len, off_t offset) {
