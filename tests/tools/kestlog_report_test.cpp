@@ -337,6 +337,10 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
     const Json inside = data_of(m_root.read_file("unpacked/report.html"));
     EXPECT_EQ(inside["totals"]["files"], 9);
     EXPECT_EQ(inside["crashes"].size(), 1u);
+    for (const char* args : {"report nosuch", "bundle nosuch --crash 09:05"}) {
+        EXPECT_EQ(run(args + std::string(" --force -o crash.tar")), 2);
+        EXPECT_EQ(m_err, "kestlog: nosuch: No such file or directory\n");
+    }
     const Json again = report("crash.tar", 3);
     EXPECT_EQ(again["crashes"], inside["crashes"]);
     EXPECT_EQ(only(again["timeline"], {{"kind", "log"}, {"cp", "cp_wcdma"}, {"size", 3000}}),

@@ -253,7 +253,7 @@ bool LogTree::add_directory(const std::string& path) {
         any_file |= entry.file && (any_file || FileName(entry.name).type != LT_UNKNOWN);
     });
     if (!readable) {
-        return true;
+        return false;
     }
     const bool is_root = name == &DIR_MODEM_LOG[1] || any_set;
     const bool is_set = parse_set_name(name, &time) || any_cp;

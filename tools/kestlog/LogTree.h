@@ -81,7 +81,7 @@ public:
     // Adds what is at path: a handset's root, a medium's top directory, a log root, a set or a
     // CP directory, or an archive of one of them ("-": on standard input), which is unpacked;
     // with FILES_TOO also a single file of any name, or standard input. False when it is not one of
-    // them. What cannot be read goes to failures. Nothing is added twice.
+    // them or not there. What cannot be read goes to failures. Nothing is added twice.
     bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
     // Adds a single file of any name, as a set of its own; it need not be there.
     void add_file(const std::string& path);

@@ -136,9 +136,10 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
     }
     bool any = false;
     for (const std::string& root : roots) {
+        const size_t told = tree->failures.size();
         if (tree->add(root, files)) {
             any = true;
-        } else {
+        } else if (tree->failures.size() == told) {
             tree->failures.push_back(
                 root + (root == "-" ? ": no archive of a log tree" : ": not a log tree"));
         }

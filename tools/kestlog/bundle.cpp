@@ -41,9 +41,11 @@ const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time,
     if (nearest != crashes.end() && distance(*nearest) <= DAY_SECONDS) {
         return &*nearest;
     }
-    failure(ES_UNREADABLE, "no crash " + (cp.empty() ? "" : "of " + cp + " ") + "within a day of " +
-                               time_text(time) +
-                               (crashes.empty() ? "; there is none at all" : "; there are:"));
+    // Without a newest time in the tree there may be no day, either.
+    failure(ES_UNREADABLE, crashes.empty()
+                               ? "there is no crash at all"
+                               : "no crash " + (cp.empty() ? "" : "of " + cp + " ") +
+                                     "within a day of " + time_text(time) + "; there are:");
     for (size_t i = 0; i < std::min(crashes.size(), MAX_CRASHES); ++i) {
         failure(ES_UNREADABLE, crash_line(crashes[i]));
     }
@@ -146,9 +148,9 @@ int run_bundle(const CommandLine& line) {
         return line.usage_error("--crash: '" + line.value("crash", "") + "' is not a time");
     }
     const std::vector<Crash> crashes = find_crashes(tree);
+    tell_failures(tree);
     const Crash* const crash = find_crash(crashes, time, line.value("cp", ""));
     if (!crash) {
-        tell_failures(tree);
         return ES_UNREADABLE;
     }
     OutputFile out;
