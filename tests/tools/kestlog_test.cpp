@@ -51,7 +51,8 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
         std::string files;
     } CASES[] = {
         {"handset", {"card", "internal"}, "4 files"},
-        {"--card usb handset", {"card", "internal"}, "4 files"},
+        {"--card usb/kest/modem_log handset", {"card", "internal"}, "4 files"},
+        {"--card usb.tar handset", {"card", "internal"}, "4 files"},
         {"handset usb", {"card", "internal", "usb"}, "5 files"},
         {"handset/data handset handset/data/modem_log", {"handset card", "data"}, "4 files"},
         {"handset --since 09:15:01", {"card", "internal"}, "2 files"},
@@ -59,6 +60,7 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
         {"handset --until 2016-02-29", {"card", "internal"}, "1 files"},
         {"handset --since -10m --until -5m", {"card", "internal"}, "3 files"},
     };
+    ASSERT_EQ(run("--version; tar cf usb.tar usb"), 0);
     for (const auto& c : CASES) {
         EXPECT_EQ(run("ls --json " + c.args), 0) << m_err;
         size_t at = 0;

@@ -28,7 +28,7 @@ void Follower::reread() {
     m_watches.begin();
     LogTree tree;
     if (!m_card.empty()) {
-        tree.add_card(m_card);
+        tree.add_card(is_dir(m_card) ? m_card : "");  // as for a ROOT
         watch_root(m_card, {""});
     }
     for (const std::string& root : m_roots) {

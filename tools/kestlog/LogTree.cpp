@@ -136,8 +136,12 @@ bool LogTree::first_visit(const std::string& path) {
 }
 
 bool LogTree::add(const std::string& path, Files files) {
+    return add_as(base_name(path), path, files);
+}
+
+bool LogTree::add_as(const std::string& medium, const std::string& path, Files files) {
     struct stat st;
-    m_medium = base_name(path);
+    m_medium = medium;
     if (path == "-" || (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode))) {
         const bool both = path == "-" && files == FILES_TOO;
         const off_t start = both ? rewindable_input() : 0;
@@ -196,7 +200,6 @@ bool LogTree::add_archive(const std::string& path) {
             strays.push_back(path + stray);
         }
     }
-    m_medium = name;
     m_alias = {dir, path};
     // It may have been packed together with the directories above it.
     while (!add_media(dir) && !add_directory(dir)) {
@@ -211,8 +214,10 @@ bool LogTree::add_archive(const std::string& path) {
 
 bool LogTree::add_card(const std::string& path) {
     m_card_given = true;
-    m_alias = {};
-    return add_medium(path, MEDIUM_CARD);
+    const bool added =
+        access(path.c_str(), F_OK) == 0 && add_as(MEDIUM_CARD, path, DIRECTORIES_ONLY);
+    m_roots = 0;  // it is none of the handsets
+    return added;
 }
 
 // What a handset's root or a medium's top directory holds. False when path is neither.

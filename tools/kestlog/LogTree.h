@@ -85,8 +85,8 @@ public:
     bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
     // Adds a single file of any name, as a set of its own; it need not be there.
     void add_file(const std::string& path);
-    // Adds a medium's top directory under this name in place of its own. With it a handset's
-    // root does not take the card that it has itself.
+    // Adds what is a ROOT as the card, before any other. With it a handset's root does not take
+    // the card that it has itself. False also when it is not there.
     bool add_card(const std::string& path);
     // The most bytes that each archive may take; 0 for what is free.
     void limit_archives(uint64_t bytes) { m_unpack_limit = bytes; }
@@ -124,6 +124,7 @@ private:
     const TreeDir* tree_dir(const std::string& path);
     std::string shown(const std::string& path) const;
     bool first_visit(const std::string& path);
+    bool add_as(const std::string& medium, const std::string& path, Files files);
     bool add_archive(const std::string& path);
     bool add_media(const std::string& path);
     bool add_medium(const std::string& path, const std::string& name);
