@@ -64,7 +64,7 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     write_log(CARD_SET, "cp_gnss", 0, "10-00-00", "gnss");
     EXPECT_EQ(run("join ."), 1);
     EXPECT_TRUE(complained("choose one with --cp: cp_gnss, cp_wcdma\n")) << m_err;
-    EXPECT_EQ(run("join . --cp cp_gnss"), 0);
+    EXPECT_EQ(run("join . --cp CP_GNSS"), 0);
     EXPECT_EQ(m_out, "gnss");
     EXPECT_EQ(run("join . --cp cp_wcn"), 2);
     EXPECT_EQ(run("join . --cp cp_gnss --kind pcm"), 1);

@@ -3,6 +3,7 @@
 #include "kestlog/StreamPlan.h"
 
 #include <string.h>
+#include <strings.h>
 
 #include <algorithm>
 #include <map>
@@ -143,7 +144,8 @@ const LogStream* choose_stream(const CommandLine& line, const std::vector<LogStr
     const std::string wanted = line.value("cp", "");
     std::string names;
     for (const LogStream& stream : streams) {
-        if (stream.cp == wanted || (streams.size() == 1 && !line.has("cp"))) {
+        if (strcasecmp(stream.cp.c_str(), wanted.c_str()) == 0 ||
+            (streams.size() == 1 && !line.has("cp"))) {
             return &stream;
         }
         names += (names.empty() ? "" : ", ") + stream.cp;
