@@ -257,6 +257,7 @@ TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
         EXPECT_EQ(run("wav . " + std::string(args)), 1) << args;
     }
     EXPECT_FALSE(m_root.exists("none.wav"));
+    EXPECT_EQ(run("--version; TMPDIR=/nowhere '" KESTLOG "' wav . " + sound + "-"), 4);
     EXPECT_TRUE(m_root.find(".kestlog-").empty());
 
     if (run("--version >/dev/null && soxi gap.wav") == 127) {

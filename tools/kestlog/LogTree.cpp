@@ -34,12 +34,10 @@ std::string base_name(const std::string& path) {
 // without a name. Where it stands, or -1.
 off_t rewindable_input() {
     const off_t start = lseek(STDIN_FILENO, 0, SEEK_CUR);
-    std::string name = TempDir::parent() + "/kestlog-XXXXXX";
-    const int copy = start < 0 ? mkostemp(name.data(), O_CLOEXEC) : -1;
+    const int copy = start < 0 ? TempDir::open_file() : -1;
     if (copy < 0) {
         return start;
     }
-    unlink(name.c_str());
     bool good = true;
     std::vector<char> bytes(256 * 1024);
     for (ssize_t n; good && (n = read(STDIN_FILENO, bytes.data(), bytes.size())) != 0;) {

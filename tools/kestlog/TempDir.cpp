@@ -68,6 +68,15 @@ std::string TempDir::parent() {
     return dir && *dir ? dir : "/tmp";
 }
 
+int TempDir::open_file() {
+    std::string name = parent() + "/kestlog-XXXXXX";
+    const int fd = mkostemp(name.data(), O_CLOEXEC);
+    if (fd >= 0) {
+        unlink(name.c_str());
+    }
+    return fd;
+}
+
 // The child makes the directory, so that there is no moment at which a signal to this process
 // leaves it behind.
 bool TempDir::create() {

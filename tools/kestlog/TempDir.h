@@ -22,6 +22,8 @@ public:
     const std::string& path() const { return m_path; }
 
     static std::string parent();  // TMPDIR, or /tmp
+    // An empty file in parent() that has no name any more, to be written and read; or -1.
+    static int open_file();
 
 private:
     std::string m_path;

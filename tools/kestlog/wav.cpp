@@ -17,6 +17,7 @@
 #include "kestlog/Problems.h"
 #include "kestlog/Progress.h"
 #include "kestlog/StreamPlan.h"
+#include "kestlog/TempDir.h"
 #include "kestlog/TreeInput.h"
 #include "kestlog/WavFile.h"
 #include "kestlog/option_numbers.h"
@@ -101,10 +102,11 @@ public:
     // What has no position is written at once in the end.
     bool open() {
         const bool apart = m_out.is_standard() || lseek(fileno(m_out.stream()), 0, SEEK_CUR) < 0;
-        m_apart.reset(apart ? tmpfile() : nullptr);
+        const int nameless = apart ? TempDir::open_file() : -1;
+        m_apart.reset(nameless >= 0 ? fdopen(nameless, "w+") : nullptr);
         FILE* const file = apart ? m_apart.get() : m_out.stream();
         if (!file) {
-            failure(ES_OUTPUT, std::string("temporary file: ") + strerror(errno));
+            failure(ES_OUTPUT, TempDir::parent() + ": " + strerror(errno));
             return false;
         }
         return good(m_wav.open(fileno(file), *m_sound.format, m_sound.rate, m_sound.channels));
