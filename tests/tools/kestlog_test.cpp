@@ -81,7 +81,8 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     m_root.make_dir("temp");
     const std::string packers[] = {
         "tar cf a.tar modem_log", "tar cjf a.tbz2 modem_log",
-        "tar czf a.tgz --transform 's,^,some/card/,' modem_log",
+        "mkdir DCIM && truncate -s 2M DCIM/x && tar czf a.tgz --transform 's,^,some/card/,' DCIM "
+        "modem_log",
         "python3 -m zipfile -c a.zip modem_log",
         "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " ."};
     for (const std::string& packer : packers) {

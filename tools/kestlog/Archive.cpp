@@ -14,6 +14,8 @@
 #include <algorithm>
 #include <sstream>
 
+#include "core/system_paths.h"
+#include "kestlog/FileName.h"
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 
@@ -40,6 +42,19 @@ std::vector<std::string> safe_parts(const std::string& name) {
         }
     }
     return parts;
+}
+
+// Whether it may be part of a log tree: a card has photos, too. What lies at the top may be in the
+// directory of a CP.
+bool may_belong(const std::vector<std::string>& parts, bool is_dir) {
+    LogTime time;
+    for (const std::string& part : parts) {
+        if (part == &DIR_MODEM_LOG[1] || parse_set_name(part, &time) ||
+            cp_type_of(part) != CT_UNKNOWN) {
+            return true;
+        }
+    }
+    return !is_dir && (parts.size() == 1 || FileName(parts.back()).type != LT_UNKNOWN);
 }
 
 class Unpacker {
@@ -130,6 +145,9 @@ private:
             } else {
                 ++m_more;
             }
+            return;
+        }
+        if (!may_belong(parts, is_dir)) {
             return;
         }
         if (parts.size() > MAX_DEPTH) {
