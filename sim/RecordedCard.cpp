@@ -126,7 +126,10 @@ bool RecordedCard::read(const std::string& root, bool clean) {
     for (RecordedCp& cp : m_cps) {
         std::sort(cp.files.begin(), cp.files.end(), older);
     }
-    return !m_cps.empty() || fail(root, "no log files of the service are in there");
+    const fs::file_status status = fs::status(root, ec);
+    return !m_cps.empty() || fail(root, fs::exists(status) && !fs::is_directory(status)
+                                            ? "not a directory"
+                                            : "no log files of the service are in there");
 }
 
 void RecordedCard::find_sets(const std::string& log_root, std::vector<Set>* sets) {

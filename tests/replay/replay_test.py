@@ -117,6 +117,7 @@ def test_bad_card(temp):
     expected["cp_gnss"] = b" has crashed"
     assert streams(log_root) == expected
     replay(cut + "/agdsp", temp + "/none", 1)
+    assert log % 1 + ": not a directory" in replay(log % 1, temp + "/none", 1)[1]
 
 
 def test_recorded_speed(temp):
