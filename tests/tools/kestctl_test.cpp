@@ -30,7 +30,7 @@ protected:
     ~KestctlTest() override { close(m_listen); }
 
     void start(Strings args, const std::string& out_path = "") {
-        args.insert(args.begin(), KESTCTL);
+        args.insert(args.begin(), {"/bin/sh", "-c", m_before + "exec \"$@\"", "sh", KESTCTL});
         const std::string out = out_path.empty() ? m_root.path("out") : out_path;
         EXPECT_TRUE(m_process.start({std::move(args), out, m_root.path("err"), false, {}, -1}));
     }
@@ -82,6 +82,7 @@ protected:
     }
 
     TestRoot m_root;
+    std::string m_before;  // what a shell does before it becomes kestctl
     int m_listen =
         socket_local_server(SOCKET_CONTROL, ANDROID_SOCKET_NAMESPACE_ABSTRACT, SOCK_STREAM);
     std::unique_ptr<Client> m_peer;
@@ -277,6 +278,8 @@ TEST_F(KestctlTest, StatusAndValuesForPeopleAndAsJson) {
     EXPECT_EQ(exchange("--json raw X", {"OK \"\\\n"}), 0);
     EXPECT_EQ(out(), "{\"ok\":true,\"value\":\"\\\"\\\\\"}\n");
     EXPECT_EQ(exchange("get-log-file-size", {"OK 10\n"}, "/dev/full"), 5);
+    m_before = "exec >&-;";  // the number that a socket would then get
+    EXPECT_EQ(exchange("get-log-file-size", {"OK 10\n"}), 5);
 }
 
 TEST_F(KestctlTest, WrongUsageSendsNothing) {

@@ -140,6 +140,10 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
                 ("cd " + m_root.root() + " && rm -r data/* storage copy 2>/dev/null; :").c_str()),
             0);
     }
+    // What is said of it never gets into the stream.
+    write_log(INTERNAL, "agdsp", 0, "09-00-00", "abc");
+    EXPECT_EQ(run("join . --cp agdsp -o one 2>&-; true"), 0);
+    EXPECT_EQ(m_root.read_file("one"), "abc");
     // A link is not followed, an unreadable file costs only itself.
     write_log(INTERNAL, "cp_wcn", 0, "09-00-00", "a");
     ASSERT_EQ(symlink("/etc/passwd", m_root
@@ -147,7 +151,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
                                                           ".log")
                                          .c_str()),
               0);
-    EXPECT_EQ(run("join . nowhere"), 2);
+    EXPECT_EQ(run("join . nowhere --cp cp_wcn"), 2);
     EXPECT_EQ(m_out, "a");
 }
 

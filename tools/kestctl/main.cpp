@@ -5,6 +5,7 @@
 #include <string.h>
 
 #include "common/CommandLine.h"
+#include "common/standard_streams.h"
 #include "kestctl/Commands.h"
 #include "kestctl/ExitStatus.h"
 #include "kestctl/Session.h"
@@ -88,6 +89,7 @@ int run(const CommandLine& line) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    hold_standard_streams();
     const Syntax syntax = make_syntax();
     CommandLine line(syntax);
     const int status = line.parse(argc, argv) ? run(line) : line.status();
