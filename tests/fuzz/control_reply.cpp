@@ -70,7 +70,10 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const std::string text = fuzz_text(data, size);
     ControlConnection connection;
     Lines notifications;
-    connection.set_listener([&](const Notification& n) { notifications.push_back(text_of(n)); });
+    connection.set_listener([&](const Notification& n) {
+        notifications.push_back(text_of(n));
+        return true;
+    });
     FUZZ_CHECK(connection.open(0) == ES_OK);
     const int peer = accept(service.server, nullptr, nullptr);
     // All of it and the end, before the first request is sent.

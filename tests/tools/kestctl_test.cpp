@@ -278,6 +278,8 @@ TEST_F(KestctlTest, StatusAndValuesForPeopleAndAsJson) {
     EXPECT_EQ(exchange("--json raw X", {"OK \"\\\n"}), 0);
     EXPECT_EQ(out(), "{\"ok\":true,\"value\":\"\\\"\\\\\"}\n");
     EXPECT_EQ(exchange("get-log-file-size", {"OK 10\n"}, "/dev/full"), 5);
+    EXPECT_EQ(exchange("watch wcn", {"OK\nCP_DUMP_START WCN\n"}, "/dev/full"), 5);
+    EXPECT_EQ(err(), "kestctl: standard output: No space left on device\n");
     m_before = "exec >&-;";  // the number that a socket would then get
     EXPECT_EQ(exchange("get-log-file-size", {"OK 10\n"}), 5);
 }

@@ -95,8 +95,8 @@ int ControlConnection::read_reply(std::string* line) {
         if (status != ES_OK || !parse_notification(*line, &notification)) {
             return status;
         }
-        if (m_listener) {
-            m_listener(notification);
+        if (m_listener && !m_listener(notification)) {
+            return fail(ES_OUTPUT, std::string("standard output: ") + strerror(errno));
         }
     }
 }

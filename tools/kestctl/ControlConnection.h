@@ -18,7 +18,8 @@ public:
     // The longest line accepted from the service; it sends much shorter ones.
     static constexpr size_t MAX_LINE = 256;
 
-    typedef std::function<void(const Notification&)> NotificationFn;
+    // False with errno set when its output could not be written; the operation then fails.
+    typedef std::function<bool(const Notification&)> NotificationFn;
 
     ControlConnection() = default;
     ~ControlConnection();
@@ -37,7 +38,7 @@ public:
     // Sends the request and stores the reply line without its line feed.
     int request(const std::string& line, std::string* reply);
 
-    // Waits for notifications; returns only when the connection ends.
+    // Waits for notifications; returns only when the connection ends or the listener fails.
     int listen();
 
     const std::string& failure() const { return m_failure; }

@@ -12,9 +12,9 @@
 
 namespace {
 
-void print(const std::string& line) {
+bool print(const std::string& line) {
     printf("%s\n", line.c_str());
-    fflush(stdout);
+    return fflush(stdout) == 0 && !ferror(stdout);
 }
 
 std::string json_value(const std::string& value) {
@@ -57,16 +57,16 @@ void Output::value(const std::string& value) const {
     print(m_json ? "{\"ok\":true,\"value\":" + json_value(value) + "}" : escape_text(value));
 }
 
-void Output::notification(const Notification& notification) const {
+bool Output::notification(const Notification& notification) const {
     const std::string time = m_timed ? time_now() : "";
     if (!m_json) {
-        print((m_timed ? time + " " : "") + notification.event() + " " +
-              escape_text(notification.cp));
-        return;
+        return print((m_timed ? time + " " : "") + notification.event() + " " +
+                     escape_text(notification.cp));
     }
     const char* const event = notification.start ? "DUMP_START" : "DUMP_END";
-    print(std::string("{\"event\":\"") + event + "\",\"cp\":" + json_string(notification.cp) +
-          (m_timed ? ",\"time\":" + json_string(time) : "") + "}");
+    return print(std::string("{\"event\":\"") + event +
+                 "\",\"cp\":" + json_string(notification.cp) +
+                 (m_timed ? ",\"time\":" + json_string(time) : "") + "}");
 }
 
 void Output::status(const Table& settings, const Table& logs, const Table& iqs) const {

@@ -20,7 +20,8 @@ public:
     void ok() const;
     // A result; in JSON a number when is_number() says so.
     void value(const std::string& value) const;
-    void notification(const Notification& notification) const;
+    // False with errno set when it could not be written. main looks whether the others were.
+    bool notification(const Notification& notification) const;
     // The settings by name, and the log state and the I/Q types of each CP.
     typedef std::vector<std::pair<std::string, std::string>> Table;
     void status(const Table& settings, const Table& logs, const Table& iqs) const;

@@ -156,10 +156,11 @@ int run_watch(const Command& command, const Args& args, Session& session) {
     sigaction(SIGINT, &action, nullptr);
 
     session.connection.set_listener([&session](const Notification& n) {
-        session.output.notification(n);
-        if (!session.action.empty()) {
+        const bool printed = session.output.notification(n);
+        if (printed && !session.action.empty()) {
             run_action(n, session);
         }
+        return printed;
     });
     Args cps = args;
     for (size_t i = 0; args.empty() && param_word(PK_CP, i); ++i) {
