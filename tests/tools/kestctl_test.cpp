@@ -30,7 +30,7 @@ protected:
     ~KestctlTest() override { close(m_listen); }
 
     void start(Strings args, const std::string& out_path = "") {
-        args.insert(args.begin(), {"/bin/sh", "-c", m_before + "exec \"$@\"", "sh", KESTCTL});
+        args.insert(args.begin(), {"bash", "-c", m_before + "exec \"$@\"", "bash", KESTCTL});
         const std::string out = out_path.empty() ? m_root.path("out") : out_path;
         EXPECT_TRUE(m_process.start({std::move(args), out, m_root.path("err"), false, {}, -1}));
     }
@@ -214,8 +214,10 @@ TEST_F(KestctlTest, WatchPrintsAtOnceUntilInterrupted) {
 TEST_F(KestctlTest, WatchRunsACommandForEachEventInTheirOrder) {
     // The text of the service reaches the command as its parameters, not as a command.
     const std::string action = m_root.path("action"), said = m_root.path("said");
-    m_root.write_file("action", "#!/bin/sh\necho \"$#/$1/$2\" >>" + said + "\n[ \"$2\" = WCN ]\n");
+    m_root.write_file("action",
+                      "#!/bin/sh\necho \"$#/$1/$2$(cat)\" >>" + said + "\n[ \"$2\" = WCN ]\n");
     ASSERT_EQ(chmod(action.c_str(), 0700), 0);
+    m_before = "trap '' CHLD; exec <" + action + ";";  // the parent's, and no input of the action
     const Strings replies = {"OK\nCP_DUMP_START $(id); `id`\nCP_DUMP_END WCN\n"};
     EXPECT_EQ(exchange("watch wcn --time --exec " + action, replies), 4);
     EXPECT_EQ(m_root.read_file("said"), "2/CP_DUMP_START/$(id); `id`\n2/CP_DUMP_END/WCN\n");
@@ -309,7 +311,8 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
         {"ENABLE_LOG",
          "unknown command 'ENABLE_LOG'; see kestctl --help (did you mean 'enable-log'?)\n"},
         {"fly", "unknown command 'fly'; see kestctl --help\n"},
-        {"set-sd-max-size 10MB", "'10MB' is not a whole number of megabytes\n"},
+        {"set-sd-max-size 4294967296",
+         "'4294967296' is not a whole number of megabytes up to 4294967295\n"},
         {"get-log-state WC", "unknown co-processor 'WC'; expected one of: WCDMA, TD, TDD-LTE, "},
     };
     for (const auto& c : WORDS) {

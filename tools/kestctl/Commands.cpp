@@ -3,6 +3,7 @@
 #include "kestctl/Commands.h"
 
 #include <ctype.h>
+#include <stdint.h>
 #include <strings.h>
 
 #include <algorithm>
@@ -154,7 +155,8 @@ constexpr const char* KIND_NAMES[] = {"co-processor", "I/Q type", "medium"};
 // Checks one parameter and gives it the spelling of the service.
 bool check_arg(ParamKind kind, std::string* arg, std::string* reason) {
     if (kind == PK_MB) {
-        *reason = "'" + *arg + "' is not a whole number of megabytes";
+        *reason =
+            "'" + *arg + "' is not a whole number of megabytes up to " + std::to_string(UINT32_MAX);
         return is_number(*arg);
     }
     if (kind == PK_LINE) {

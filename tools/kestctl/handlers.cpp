@@ -3,6 +3,7 @@
 #include "kestctl/handlers.h"
 
 #include <errno.h>
+#include <fcntl.h>
 #include <signal.h>
 #include <string.h>
 #include <sys/wait.h>
@@ -59,16 +60,22 @@ extern "C" void end_watch(int) {
 void run_action(const Notification& notification, const Session& session) {
     const pid_t child = fork();
     if (child == 0) {
+        // What kestctl is given is not the command's.
+        const int nothing = open("/dev/null", O_RDONLY);
+        if (nothing >= 0) {
+            dup2(nothing, STDIN_FILENO);
+            close(nothing);
+        }
         execlp(session.action.c_str(), session.action.c_str(), notification.event(),
                notification.cp.c_str(), nullptr);
         session.output.remark(session.action + ": " + strerror(errno));
         _exit(127);
     }
     int status;
-    pid_t ended;
-    while ((ended = waitpid(child, &status, 0)) < 0 && errno == EINTR) {
+    pid_t ended = child;
+    while (child > 0 && (ended = waitpid(child, &status, 0)) < 0 && errno == EINTR) {
     }
-    if (child < 0 || ended != child) {
+    if (ended < 0) {
         session.output.remark(session.action + ": " + strerror(errno));
         return;
     }
@@ -154,6 +161,7 @@ int run_watch(const Command& command, const Args& args, Session& session) {
     struct sigaction action = {};
     action.sa_handler = end_watch;
     sigaction(SIGINT, &action, nullptr);
+    signal(SIGCHLD, SIG_DFL);  // ignored by the parent: statuses of actions would be lost
 
     session.connection.set_listener([&session](const Notification& n) {
         const bool printed = session.output.notification(n);
