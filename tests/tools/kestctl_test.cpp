@@ -326,7 +326,7 @@ TEST_F(KestctlTest, WrongUsageSendsNothing) {
 TEST_F(KestctlTest, CompletionKnowsTheTable) {
     EXPECT_EQ(run({"--complete", "get-l"}), 0);
     EXPECT_EQ(out(), "get-log-state\nget-log-file-size\nget-log-overwrite\n");
-    EXPECT_EQ(run({"--complete", "enable-log", "wcn", "--json", "W"}), 0);
+    EXPECT_EQ(run({"--complete", "--timeout", "=", "5", "enable-log", "wcn", "--json", "W"}), 0);
     EXPECT_EQ(out(), "WCDMA\n");
     EXPECT_EQ(run({"--complete", "get-log-state", "WCN", "W"}), 0);
     EXPECT_EQ(out(), "");
