@@ -53,8 +53,9 @@ const ScriptPlayer::CommandRow ScriptPlayer::COMMANDS[] = {
     {"client-notice", &ScriptPlayer::client_notice},
 };
 
-ScriptPlayer::ScriptPlayer(const std::string& program, bool keep_root)
-    : m_program(program), m_keep_root(keep_root) {}
+ScriptPlayer::ScriptPlayer(const std::string& program, bool keep_root,
+                           const volatile sig_atomic_t* interrupted)
+    : m_program(program), m_keep_root(keep_root), m_interrupted(interrupted) {}
 
 ScriptPlayer::~ScriptPlayer() {
     m_service.stop();
@@ -104,6 +105,9 @@ bool ScriptPlayer::play_lines(Round round, bool patient) {
 }
 
 bool ScriptPlayer::play_line(const std::string& line) {
+    if (interrupted()) {
+        return fail("interrupted");
+    }
     std::string args = line;
     const std::string word = take_script_word(&args);
     if (word.empty() || word[0] == '#') {
@@ -198,6 +202,9 @@ bool ScriptPlayer::fail(const std::string& reason) {
 
 bool ScriptPlayer::wait_until(const std::function<bool()>& condition, const std::string& what) {
     for (int waited_ms = 0; !condition(); waited_ms += STEP_MS) {
+        if (interrupted()) {
+            return fail("interrupted");
+        }
         if (!m_service.alive()) {
             return fail("the service does not run");
         }

@@ -8,6 +8,8 @@
 #ifndef SIM_SCRIPTPLAYER_H_
 #define SIM_SCRIPTPLAYER_H_
 
+#include <signal.h>
+
 #include <functional>
 #include <map>
 #include <string>
@@ -24,7 +26,9 @@ std::string take_script_word(std::string* text);
 class ScriptPlayer {
 public:
     // Runs this program as the service. The root of the handset is removed unless it is kept.
-    ScriptPlayer(const std::string& program, bool keep_root);
+    // Fails soon after *interrupted, if there is one, becomes other than 0.
+    ScriptPlayer(const std::string& program, bool keep_root,
+                 const volatile sig_atomic_t* interrupted = nullptr);
     ~ScriptPlayer();
 
     // Plays the whole script, once for each object. False with error() set: what failed in
@@ -91,6 +95,7 @@ protected:
     bool feed_cp(const std::string& args, bool until_read);
     bool wait_until(const std::function<bool()>& condition, const std::string& what);
     bool fail(const std::string& reason);
+    bool interrupted() const { return m_interrupted && *m_interrupted; }
     void tell(const std::string& line) { m_outcome += line + "\n"; }
 
     struct Line {
@@ -100,6 +105,7 @@ protected:
 
     const std::string m_program;
     const bool m_keep_root;
+    const volatile sig_atomic_t* const m_interrupted;
     int m_patience_ms = PATIENCE_MS;
     std::vector<Line> m_lines;
     std::map<std::string, std::string> m_fed;  // all that a CP has logged

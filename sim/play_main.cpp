@@ -11,6 +11,12 @@
 
 namespace {
 
+volatile sig_atomic_t s_interrupted = 0;
+
+void on_signal(int) {
+    s_interrupted = 1;
+}
+
 const char USAGE[] =
 #include "sim/play_usage.txt"
     ;
@@ -49,9 +55,16 @@ int main(int argc, char** argv) {
         fputs(USAGE, stderr);
         return 2;
     }
+    // The handset's root is removed first. A second one ends at once.
+    struct sigaction action = {};
+    action.sa_handler = on_signal;
+    action.sa_flags = static_cast<int>(SA_RESETHAND);
+    for (const int signo : {SIGINT, SIGTERM, SIGHUP}) {
+        sigaction(signo, &action, nullptr);
+    }
     signal(SIGPIPE, SIG_IGN);
     setenv("TZ", "UTC0", 1);  // time records tell the local time
-    ScriptPlayer player(program, keep);
+    ScriptPlayer player(program, keep, &s_interrupted);
     const bool played = player.play(argv[optind]);
     fputs(player.outcome().c_str(), stdout);
     if (!played) {

@@ -135,7 +135,16 @@ def test_recorded_speed(temp):
     assert streams(log_root) == streams(card)
 
 
-for test in test_all_comes_back, test_bad_card, test_recorded_speed:
+def test_interrupted_script(temp):
+    ran = subprocess.Popen([PLAY, f"{RECORDINGS}/iq_save.in"], env={**os.environ, "TMPDIR": temp})
+    while not os.listdir(temp):
+        time.sleep(0.001)
+    ran.terminate()
+    assert ran.wait() == 1
+    assert not os.listdir(temp)
+
+
+for test in test_interrupted_script, test_all_comes_back, test_bad_card, test_recorded_speed:
     with tempfile.TemporaryDirectory(prefix="kest-replay-") as directory:
         print("==", test.__name__)
         test(directory)
