@@ -8,6 +8,7 @@
 #include <string.h>
 
 #include <filesystem>
+#include <utility>
 
 #include "sim/Demo.h"
 #include "sim/Replay.h"
@@ -94,6 +95,10 @@ bool parse_rate(const std::string& text, DemoOptions& options) {
 
 // 0 to go on, otherwise the exit status plus 1.
 int parse_options(int argc, char** argv, DemoOptions& options) {
+    double seconds = 0;
+    unsigned rate = 0;
+    std::swap(options.seconds, seconds);  // 0: not given
+    std::swap(options.rate, rate);
     for (int opt; (opt = getopt_long(argc, argv, "", OPTIONS, nullptr)) != -1;) {
         bool good = true;
         double number = 0;
@@ -130,9 +135,9 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 options.serve = true;
                 break;
             case OPT_FAST:
-                options.seconds = 12;
                 options.fast = true;
-                options.rate = 2000;
+                seconds = 12;
+                rate = 2000;
                 break;
             case OPT_SD:
             case OPT_NO_SD:
@@ -152,6 +157,8 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
             return 3;
         }
     }
+    options.seconds = options.seconds > 0 ? options.seconds : seconds;
+    options.rate = options.rate > 0 ? options.rate : rate;
     if (optind < argc || (options.serve && !options.replay.empty())) {
         fputs(USAGE, stderr);
         return 3;

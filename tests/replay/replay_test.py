@@ -144,7 +144,13 @@ def test_interrupted_script(temp):
     assert not os.listdir(temp)
 
 
-for test in test_interrupted_script, test_all_comes_back, test_bad_card, test_recorded_speed:
+def test_fast_keeps_what_is_given(temp):
+    ran = subprocess.run([KESTSIM, "--kestmodem", "/bin/true", "--root", temp + "/root", "--seconds",
+                          "30", "--rate", "100", "--fast"], capture_output=True, text=True)
+    assert "; 100 KB/s from" in ran.stdout and " for 30 s;" in ran.stdout, ran.stdout
+
+
+for test in test_fast_keeps_what_is_given, test_interrupted_script, test_all_comes_back, test_bad_card, test_recorded_speed:
     with tempfile.TemporaryDirectory(prefix="kest-replay-") as directory:
         print("==", test.__name__)
         test(directory)
