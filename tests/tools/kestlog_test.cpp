@@ -367,7 +367,9 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     EXPECT_EQ(run("verify data"), 0) << m_err;
     EXPECT_EQ(m_out, "3 files checked, 0 damages, 0 notes\n");
     EXPECT_EQ(run("ls data"), 0);
-    EXPECT_TRUE(said("  cp_gnss                         300 bytes     3 files  2")) << m_out;
+    EXPECT_TRUE(said("  cp_gnss                         300 bytes     3 files  2") &&
+                said("  on data\n"))
+        << m_out;
     EXPECT_EQ(run("ls --tree data"), 0);
     EXPECT_EQ(m_out.find("data\n`-- 2"), 0u) << m_out;
     EXPECT_TRUE(said("\n    `-- cp_gnss\n        |-- 2-cp_gnss-2")) << m_out;

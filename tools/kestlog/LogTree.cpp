@@ -124,7 +124,7 @@ std::string LogTree::shown(const std::string& path) const {
 }
 
 const TreeDir* LogTree::tree_dir(const std::string& path) {
-    m_dirs.push_back({path + "/", shown(path) + "/"});
+    m_dirs.push_back({path + "/", shown(path) + "/", m_medium});
     return &m_dirs.back();
 }
 
@@ -162,7 +162,7 @@ void LogTree::add_file(const std::string& path) {
     const size_t slash = path.rfind('/') + 1;
     const std::string dir = path.substr(0, slash);
     const FileName name(path.substr(slash));
-    m_dirs.push_back({dir, dir});
+    m_dirs.push_back({dir, dir, m_medium});
     sets.push_back({"", path, m_medium, {}, {{name.cp(), path, {}}}});
     sets.back().cps[0].files.push_back(
         {name, &m_dirs.back(), static_cast<uint64_t>(st.st_size), modified_time(st)});

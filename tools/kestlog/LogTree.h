@@ -26,10 +26,11 @@ constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
 constexpr char MEDIUM_INTERNAL[] = "internal";
 constexpr char MEDIUM_CARD[] = "card";
 
-// A directory with files of the tree. Both end with "/".
+// A directory with files of the tree. Both paths end with "/".
 struct TreeDir {
-    std::string path;   // where to open the files
-    std::string shown;  // the same for humans: a path in an archive begins with its name
+    std::string path;    // where to open the files
+    std::string shown;   // the same for humans: a path in an archive begins with its name
+    std::string medium;  // as of a set
 };
 
 // There may be several hundred thousand.

@@ -47,20 +47,23 @@ void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* 
         return;
     }
     const std::string name = cp ? cp->name : set.name.empty() ? set.shown : set.name;
-    printf("%s%-*s %12llu bytes  %4llu files  %s to %s\n", indent, cp ? 22 : 24,
+    printf("%s%-*s %12llu bytes  %4llu files  %s to %s%s\n", indent, cp ? 22 : 24,
            escape_text(name).c_str(), static_cast<unsigned long long>(sum.size),
            static_cast<unsigned long long>(sum.files), time_text(sum.first).c_str(),
-           time_text(sum.last).c_str());
+           time_text(sum.last).c_str(), cp ? "" : ("  on " + escape_text(set.medium)).c_str());
 }
 
 void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile& file) {
     if (json) {
         Json object;
         if (set) {
-            object = {{"set", json_text(set->name)},
-                      {"medium", json_text(set->medium)},
-                      {"cp", json_text(cp->name)}};
+            object["set"] = json_text(set->name);
         }
+        object["medium"] = json_text(file.dir->medium);
+        if (cp) {
+            object["cp"] = json_text(cp->name);
+        }
+        object["path"] = json_text(file.shown());
         object["file"] = json_text(file.name.text());
         object["kind"] = file.name.kind();
         if (file.name.is_log()) {
