@@ -138,6 +138,22 @@ TEST_F(KestlogExportTest, WhatIsMissingStandsInTheLastComment) {
         "0-cp_wcn-2016-03-01_09-15-00.log: time of its name\n"
         "cp_wcdma_memory_2016-03-01_09-15-00.dmp: time of its name; "
         "the memory dump ends without its end marker\n");
+
+    // The halves of two frames around a file that cannot be read are no frame.
+    const std::string frame = numbered(3, 1, 1, "half");
+    write(WCN + "2-cp_wcn-2016-03-01_08-30-00.log", numbered(2, 1, 1, "") + frame.substr(0, 8));
+    write(WCN + "1-cp_wcn-2016-03-01_09-00-00.log", frame);
+    write(WCN_LOG, frame.substr(8) + numbered(4, 1, 1, ""));
+    EXPECT_EQ(chmod(m_root.path(WCN + "1-cp_wcn-2016-03-01_09-00-00.log").c_str(), 0), 0);
+    const char* const user =
+        geteuid() ? "" : "setpriv --bounding-set -dac_override,-dac_read_search ";
+    shell(std::string(user) + KESTLOG " export . --cp cp_wcn --since 08:30:01 -o halves");
+    EXPECT_EQ(fields("halves", "kestdiag.seq frame.comment"),
+              "2|2-cp_wcn-2016-03-01_08-30-00.log: time of its name\n"
+              "4|8 bytes at the end of 2-cp_wcn-2016-03-01_08-30-00.log are in no intact frame; "
+              "1-cp_wcn-2016-03-01_09-00-00.log could not be read: Permission denied; "
+              "6 bytes before this packet are in no intact frame; "
+              "0-cp_wcn-2016-03-01_09-15-00.log: time of its name\n");
 }
 
 TEST_F(KestlogExportTest, HostileNamesAndPacketsDoNoHarm) {

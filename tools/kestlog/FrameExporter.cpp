@@ -45,18 +45,23 @@ std::string read_at(const std::string& path, uint64_t offset, size_t len) {
 int FrameExporter::add(const ExportSource& source) {
     const std::string shown = source.file->shown();
     LogReader in;
-    if (!in.open(source.file->path(), source.given())) {
-        return failure(ES_UNREADABLE, shown + ": " + strerror(errno));
-    }
     FileReport report;
     m_source = &source;
     m_report = &report;
     m_begun = m_any = m_named = false;
+    if (!in.open(source.file->path(), source.given())) {
+        const int error = errno;
+        lose(error);
+        return failure(ES_UNREADABLE, shown + ": " + strerror(error));
+    }
     ++m_totals.files;
     const PieceVisitor visit = [this](const Piece& piece) { return take(piece); };
     scan_file(in, source.file->name, visit, FP_DATA, &report);
     if (m_writer.good()) {
         end(in);
+        if (in.error()) {
+            lose(in.error());
+        }
     }
     tell_damage(shown, report);
     const int status = scan_status(in, shown, report);
@@ -110,13 +115,29 @@ void FrameExporter::join(uint64_t first) {
                         escape_text("begins in " + before.tail_file + ", ends in " + file_name()));
                 }
                 m_end = m_tail = m_end + (used - tail);
+                before.tail_other = 0;
                 return;
             }
         }
     }
+    give_up_tail();
+}
+
+void FrameExporter::give_up_tail() {
+    Line& before = line();
+    before.tail.clear();
     if (before.tail_other > 0) {
         remark_next(outside(before.tail_other, "at the end of " + before.tail_file));
     }
+    before.tail_other = 0;
+}
+
+// The file, or its end, could not be read: what lies before it does not go on behind it.
+void FrameExporter::lose(int error) {
+    if (m_source->queue == 0) {
+        give_up_tail();
+    }
+    remark_next(file_name() + " could not be read: " + strerror(error));
 }
 
 bool FrameExporter::take(const Piece& piece) {

@@ -53,6 +53,8 @@ private:
     bool take(const Piece& piece);
     void end(const LogReader& in);
     void join(uint64_t first);
+    void give_up_tail();
+    void lose(int error);
     bool write(int64_t time, uint8_t type, const uint8_t* data, size_t len);
     void remark_next(const std::string& text);
     void remark_last(const std::string& text);
