@@ -149,8 +149,8 @@ TEST_F(KestlogExportTest, WhatIsMissingStandsInTheLastComment) {
         geteuid() ? "" : "setpriv --bounding-set -dac_override,-dac_read_search ";
     shell(std::string(user) + KESTLOG " export . --cp cp_wcn --since 08:30:01 -o halves");
     EXPECT_EQ(fields("halves", "kestdiag.seq frame.comment"),
-              "2|2-cp_wcn-2016-03-01_08-30-00.log: time of its name\n"
-              "4|8 bytes at the end of 2-cp_wcn-2016-03-01_08-30-00.log are in no intact frame; "
+              "2|2-cp_wcn-2016-03-01_08-30-00.log: time of its name; "
+              "8 bytes at the end of 2-cp_wcn-2016-03-01_08-30-00.log are in no intact frame\n4|"
               "1-cp_wcn-2016-03-01_09-00-00.log could not be read: Permission denied; "
               "6 bytes before this packet are in no intact frame; "
               "0-cp_wcn-2016-03-01_09-15-00.log: time of its name\n");

@@ -192,15 +192,18 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     }
 
     // From a tree: every image, ring buffer and sleep log, those in logs as well.
-    write(MODEM_LOG, TIME_RECORD + frame("ring", 0x3a, 0x64) + frame("end", 0x3a, 1) +
-                         frame("sleep", 0x3b, 0x64) + "tail");
+    // The last begins in the file before.
+    const std::string sleep = frame("sleep~", 0x3b, 0x64), older = "-cp_wcdma-2016-03-01_09-00-00";
+    write(MODEM + "1" + older + ".log", TIME_RECORD + "~junk~" + sleep.substr(0, 9));
+    write(MODEM_LOG, TIME_RECORD + sleep.substr(9) + frame("ring", 0x3a, 0x64) +
+                         frame("end", 0x3a, 1) + "tail");
     write(MODEM_DUMP, frame(LOG_DATA) + DUMP_END);
     write(DSP_LOG, THREE_CHUNKS);
     unlink(m_root.path(OLD_DSP_LOG).c_str());
     unlink(m_root.path("crash").c_str());
     const std::string name = "cp_wcdma-" + STAMP;
     const std::pair<std::string, std::string> FILES[] = {
-        {"0-" + name + ".ringbuf.bin", "ring"},        {"0-" + name + ".sleeplog.bin", "sleep"},
+        {"0-" + name + ".ringbuf.bin", "ring"},        {"1" + older + ".sleeplog.bin", "sleep~"},
         {"0-agdsp-" + STAMP + ".dump.bin", LOG_DATA},  {image, LOG_DATA},
         {"cp_wcdma_memory_" + STAMP + "-1.bin", "x"},  // of the kernel's copy
         {"cp_wcdma_ringbuf_" + STAMP + ".bin", "x"},   {"cp_wcdma_sleeplog_" + STAMP + ".bin", "x"},

@@ -107,8 +107,8 @@ void ExportPlan::find_interfaces() {
             continue;
         }
         ExportSource*& last = last_logs[source.interface];
-        if (last) {
-            last->continued = last->file->name.number == source.file->name.number + 1;
+        if (last && last->file->name.number == source.file->name.number + 1) {
+            last->next = source.file;
         }
         last = &source;
     }

@@ -15,10 +15,10 @@ struct ExportSource {
     const TreeSet* set;
     const TreeCp* cp;
     const TreeFile* file;
-    ShortTime order;         // the sources are sorted by it
-    uint32_t interface = 0;  // in ExportPlan::interfaces
-    uint32_t queue = 0;      // on it: 0 is the log, and each other file has its own
-    bool continued = false;  // the next log file on the interface goes on where this one ends
+    ShortTime order;                 // the sources are sorted by it
+    uint32_t interface = 0;          // in ExportPlan::interfaces
+    uint32_t queue = 0;              // on it: 0 is the log, and each other file has its own
+    const TreeFile* next = nullptr;  // the log file that goes on where this one ends
 
     // By its own path, not found in a directory.
     bool given() const { return set->shown == file->shown(); }

@@ -3,9 +3,7 @@
 #include "kestlog/FrameExporter.h"
 
 #include <errno.h>
-#include <fcntl.h>
 #include <string.h>
-#include <unistd.h>
 
 #include <algorithm>
 
@@ -18,27 +16,7 @@
 
 namespace {
 
-// The longest frame in a file.
-constexpr size_t MAX_TAIL = 2 * DiagFrameParser::MAX_FRAME + 2;
 constexpr size_t MAX_REMARKS = 2000;
-
-// Bytes of a file, again; fewer when it has become shorter.
-std::string read_at(const std::string& path, uint64_t offset, size_t len) {
-    std::string bytes(len, '\0');
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
-    size_t got = 0;
-    for (ssize_t n; fd >= 0 && got < len; got += static_cast<size_t>(n)) {
-        n = pread(fd, &bytes[got], len - got, static_cast<off_t>(offset + got));
-        if (n <= 0) {
-            break;
-        }
-    }
-    if (fd >= 0) {
-        close(fd);
-    }
-    bytes.resize(got);
-    return bytes;
-}
 
 }  // namespace
 
@@ -51,7 +29,7 @@ int FrameExporter::add(const ExportSource& source) {
     m_begun = m_any = m_named = false;
     if (!in.open(source.file->path(), source.given())) {
         const int error = errno;
-        lose(error);
+        lost(error);
         return failure(ES_UNREADABLE, shown + ": " + strerror(error));
     }
     ++m_totals.files;
@@ -60,7 +38,7 @@ int FrameExporter::add(const ExportSource& source) {
     if (m_writer.good()) {
         end(in);
         if (in.error()) {
-            lose(in.error());
+            lost(in.error());
         }
     }
     tell_damage(shown, report);
@@ -72,78 +50,36 @@ int FrameExporter::add(const ExportSource& source) {
     return status;
 }
 
-// Before the first piece, which begins at that offset; or at the end of a file without one.
-void FrameExporter::begin(uint64_t first) {
+// Before the first piece, or at the end of a file without one.
+void FrameExporter::begin() {
     const LogTime& named = m_source->file->name.time();
     m_begun = true;
     m_time = has_time(named) ? seconds_of(named) : 0;
-    m_end = m_tail = 0;
+    m_end = 0;
     if (m_report->has_record) {
         m_time = m_report->record.seconds;
-        m_end = m_tail = sizeof(TimeSyncRecord);
+        m_end = sizeof(TimeSyncRecord);
     }
-    if (m_source->queue == 0 && !line().tail.empty()) {
-        join(first);
-    }
-}
-
-// The frame that began in the log file before this one and ends in this one.
-void FrameExporter::join(uint64_t first) {
-    Line& before = line();
-    std::string bytes;
-    bytes.swap(before.tail);
-    const uint64_t rest = first - std::min(first, m_end);
-    if (rest > 0 && bytes.size() + rest <= MAX_TAIL) {
-        const size_t tail = bytes.size();
-        bytes += read_at(m_source->file->path(), m_end, static_cast<size_t>(rest));
-        uint8_t* body;
-        size_t len;
-        size_t used;
-        DiagHeader header;
-        m_parser.init();
-        if (m_parser.unescape(reinterpret_cast<const uint8_t*>(bytes.data()), bytes.size(), body,
-                              len, used) &&
-            len >= sizeof(header) && used > tail) {
-            memcpy(&header, body, sizeof(header));
-            const uint64_t skipped = used - std::min(used, m_parser.raw_size());
-            if (header.len == len) {
-                if (skipped > 0) {
-                    remark_next(outside(skipped, "before this packet"));
-                }
-                if (write(before.tail_time, header.type, body, len)) {
-                    m_writer.comment(
-                        escape_text("begins in " + before.tail_file + ", ends in " + file_name()));
-                }
-                m_end = m_tail = m_end + (used - tail);
-                before.tail_other = 0;
-                return;
-            }
-        }
-    }
-    give_up_tail();
-}
-
-void FrameExporter::give_up_tail() {
-    Line& before = line();
-    before.tail.clear();
-    if (before.tail_other > 0) {
-        remark_next(outside(before.tail_other, "at the end of " + before.tail_file));
-    }
-    before.tail_other = 0;
-}
-
-// The file, or its end, could not be read: what lies before it does not go on behind it.
-void FrameExporter::lose(int error) {
     if (m_source->queue == 0) {
-        give_up_tail();
+        m_end += line().head;
+        line().head = 0;
+    }
+    m_tail = m_end;
+}
+
+// The file, or its end, could not be read.
+void FrameExporter::lost(int error) {
+    if (m_source->queue == 0) {
+        line().head = 0;
     }
     remark_next(file_name() + " could not be read: " + strerror(error));
 }
 
 bool FrameExporter::take(const Piece& piece) {
     if (!m_begun) {
-        begin(piece.offset);
+        begin();
     }
+    m_tail = piece.offset + piece.size - (piece.intact ? 0 : 1);
     if (!piece.data || !(piece.intact || m_wanted.broken)) {
         return true;  // it counts with the bytes before the next one
     }
@@ -154,7 +90,6 @@ bool FrameExporter::take(const Piece& piece) {
         remark_next(outside(piece.offset - m_end, "before this packet"));
     }
     m_end = piece.offset + piece.size;
-    m_tail = piece.intact ? m_end : m_end - 1;
     if (!write(m_time, piece.type, body, len)) {
         return m_writer.good();
     }
@@ -181,16 +116,23 @@ bool FrameExporter::take(const Piece& piece) {
 void FrameExporter::end(const LogReader& in) {
     const TreeFile& file = *m_source->file;
     if (!m_begun) {
-        begin(in.size());
+        begin();
     }
-    const uint64_t left = in.size() - std::min(in.size(), m_end);
-    const uint64_t tail = in.size() - std::min(in.size(), m_tail);
-    if (m_source->continued && !m_report->chunked && tail > 0 && tail <= MAX_TAIL) {
-        line().tail = read_at(file.path(), m_tail, static_cast<size_t>(tail));
-        line().tail_other = left;
-        line().tail_time = m_time;
-        line().tail_file = file.name.text();
-    } else if (left > 0) {
+    uint64_t left = in.size() - std::min(in.size(), m_end);
+    if (left > 0 && m_source->next && !m_report->chunked &&
+        m_split.join(file, m_tail, in.size(), *m_source->next)) {
+        const uint64_t skipped = m_split.begin() - std::min(m_split.begin(), m_end);
+        if (skipped > 0) {
+            remark_next(outside(skipped, "before this packet"));
+        }
+        if (write(m_time, m_split.header().type, m_split.body(), m_split.len())) {
+            m_writer.comment(escape_text("begins in " + file.name.text() + ", ends in " +
+                                         m_source->next->name.text()));
+        }
+        line().head = m_split.head();
+        left = 0;
+    }
+    if (left > 0) {
         remark_last(outside(left, "at the end of " + file.name.text()));
     }
     if (file.name.framed_dump && !m_report->end_marker) {
@@ -214,14 +156,6 @@ bool FrameExporter::write(int64_t time, uint8_t type, const uint8_t* data, size_
     m_any = true;
     ++m_totals.packets;
     return m_writer.good();
-}
-
-FrameExporter::Totals FrameExporter::totals() const {
-    Totals totals = m_totals;
-    for (const Line& each : m_lines) {
-        totals.other += each.tail.empty() ? 0 : each.tail_other;  // nothing went on with it
-    }
-    return totals;
 }
 
 // Counts bytes that are in no packet; the words for them.

@@ -11,10 +11,10 @@
 #include <string>
 #include <vector>
 
-#include "channels/DiagFrameParser.h"
 #include "kestlog/ExportPlan.h"
 #include "kestlog/FileScan.h"
 #include "kestlog/PcapngWriter.h"
+#include "kestlog/SplitFrame.h"
 
 class FrameExporter {
 public:
@@ -35,26 +35,21 @@ public:
 
     // Called for the sources of the plan, in their order. Prints damage; returns the exit status.
     int add(const ExportSource& source);
-    Totals totals() const;
+    const Totals& totals() const { return m_totals; }
 
 private:
     // What one file of an interface leaves for the next.
     struct Line {
-        std::string remarks;      // for the comment on the next packet
-        std::string tail;         // the log's last bytes, when a frame may go on in the next file
-        uint64_t tail_other = 0;  // how many of them are in no packet
-        int64_t tail_time = 0;
-        std::string tail_file;
+        std::string remarks;  // for the comment on the next packet
+        size_t head = 0;      // bytes of the next log file that are in a packet already
     };
 
     Line& line() { return m_lines[m_source->interface]; }
     std::string file_name() const { return m_source->file->name.text(); }
-    void begin(uint64_t first);
+    void begin();
     bool take(const Piece& piece);
     void end(const LogReader& in);
-    void join(uint64_t first);
-    void give_up_tail();
-    void lose(int error);
+    void lost(int error);
     bool write(int64_t time, uint8_t type, const uint8_t* data, size_t len);
     void remark_next(const std::string& text);
     void remark_last(const std::string& text);
@@ -64,7 +59,7 @@ private:
     const Wanted m_wanted;
     std::vector<Line> m_lines;  // of the interfaces
     Totals m_totals;
-    DiagFrameParser m_parser;
+    SplitFrame m_split;
 
     // About the file in progress.
     const ExportSource* m_source = nullptr;

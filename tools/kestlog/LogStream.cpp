@@ -13,6 +13,16 @@ struct Place {
 };
 
 void add_directory(const TreeSet& set, const TreeCp& cp, std::vector<Place>* places) {
+    LogTime time;
+    for (const TreeFile* log : logs_in_order(cp)) {
+        time = std::max(time, log->name.time());
+        places->push_back({ShortTime(time), {&set, &cp, log}});
+    }
+}
+
+}  // namespace
+
+std::vector<const TreeFile*> logs_in_order(const TreeCp& cp) {
     std::vector<const TreeFile*> logs;
     for (const TreeFile& file : cp.files) {
         if (file.name.is_log()) {
@@ -22,14 +32,8 @@ void add_directory(const TreeSet& set, const TreeCp& cp, std::vector<Place>* pla
     std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
         return a->name.number > b->name.number;
     });
-    LogTime time;
-    for (const TreeFile* log : logs) {
-        time = std::max(time, log->name.time());
-        places->push_back({ShortTime(time), {&set, &cp, log}});
-    }
+    return logs;
 }
-
-}  // namespace
 
 std::vector<LogStream> log_streams(const LogTree& tree) {
     std::map<std::string, std::vector<Place>> cps;

@@ -21,6 +21,9 @@ struct LogStream {
     std::vector<StreamFile> files;
 };
 
+// The log files of a directory by number, oldest first, whatever the clock said.
+std::vector<const TreeFile*> logs_in_order(const TreeCp& cp);
+
 // The streams of all CPs that have log files, by name. The tree must stay as it is.
 std::vector<LogStream> log_streams(const LogTree& tree);
 

@@ -16,15 +16,18 @@
 #include "core/open_file.h"
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/LogStream.h"
 #include "kestlog/OutputFile.h"
 #include "kestlog/Problems.h"
 #include "kestlog/Progress.h"
+#include "kestlog/SplitFrame.h"
 #include "kestlog/TreeInput.h"
 #include "kestlog/option_numbers.h"
 
 namespace {
 
 constexpr int ANY = -1;
+constexpr uint64_t RECORD = sizeof(TimeSyncRecord);
 
 // What of a file goes to one file. The kind is that of chunks, or null for frames.
 struct Content {
@@ -89,6 +92,27 @@ public:
     }
 
     // False when the output failed; *status is set then.
+    bool extract(const TreeCp& cp, int* status) {
+        const std::vector<const TreeFile*> logs = logs_in_order(cp);
+        m_head = 0;
+        for (size_t i = 0; i < logs.size(); ++i) {
+            const bool goes_on =
+                i + 1 < logs.size() && logs[i]->name.number == logs[i + 1]->name.number + 1;
+            m_next = goes_on ? logs[i + 1] : nullptr;
+            if (!extract(*logs[i], logs[i]->shown() == cp.shown, status)) {
+                return false;
+            }
+        }
+        m_next = nullptr;
+        return std::all_of(cp.files.begin(), cp.files.end(), [&](const TreeFile& file) {
+            return file.name.is_log() || extract(file, file.shown() == cp.shown, status);
+        });
+    }
+
+    uint64_t outputs() const { return m_outputs.size(); }
+    int status() const { return m_problems.status(); }
+
+private:
     bool extract(const TreeFile& file, bool named, int* status) {
         const bool chosen = m_type != ANY || m_sub_type != ANY;
         if (is_plain(file.name) && !chosen) {
@@ -97,10 +121,6 @@ public:
         return !holds_frames(file.name) || scan(file, named, status);
     }
 
-    uint64_t outputs() const { return m_outputs.size(); }
-    int status() const { return m_problems.status(); }
-
-private:
     std::vector<Content> contents(const FileName& name, bool chunked) const {
         if (m_type != ANY || m_sub_type != ANY) {
             char suffix[40] = "";
@@ -160,6 +180,8 @@ private:
 
     bool scan(const TreeFile& file, bool named, int* status) {
         const std::string path = file.shown();
+        const size_t head = m_head;
+        m_head = 0;
         LogReader in;
         if (!in.open(file.path(), named)) {
             m_problems.unreadable(path, errno);
@@ -173,20 +195,30 @@ private:
         FileReport report;
         const Part* failed = nullptr;
         End end;
+        uint64_t tail = 0;  // where a frame may begin that ends in the next file
+        const auto take_all = [&](const Piece& piece) {
+            for (Part& part : parts) {
+                failed = !failed && !take(file, piece, &part) ? &part : failed;
+            }
+            return !failed;
+        };
         scan_file(
             in, file.name,
             [&](const Piece& piece) {
+                tail = piece.offset + piece.size - (piece.intact ? 0 : 1);
                 if (!file.name.is_log() && !piece.kind && is_end(piece)) {
                     end.seen = true;
                     end.counted += piece.intact ? 1 : 0;
                     return true;
                 }
-                for (Part& part : parts) {
-                    failed = !failed && !take(file, piece, &part) ? &part : failed;
-                }
-                return !failed;
+                return take_all(piece);
             },
             FP_DATA, &report);
+        report.other -= std::min<uint64_t>(report.other, head);
+        if (m_next && !report.chunked && !failed) {
+            take_split(file, std::max(tail, (report.has_record ? RECORD : 0) + head), in.size(),
+                       take_all, &report);
+        }
         for (Part& part : parts) {
             failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
         }
@@ -201,6 +233,22 @@ private:
         }
         tell(path, report, in.error());
         return true;
+    }
+
+    // The frame that begins in the file and ends in the next.
+    void take_split(const TreeFile& file, uint64_t tail, uint64_t size, const PieceVisitor& take,
+                    FileReport* report) {
+        if (!m_split.join(file, tail, size, *m_next)) {
+            return;
+        }
+        const DiagHeader& header = m_split.header();
+        const uint64_t raw = size - m_split.begin();
+        m_head = m_split.head();
+        ++report->frames;
+        report->other -= std::min(report->other, raw);
+        take({m_split.begin(), static_cast<size_t>(raw), header.seq_num, header.len, header.type,
+              header.sub_type, m_split.body() + sizeof(header), m_split.len() - sizeof(header),
+              true, nullptr});
     }
 
     void tell(const std::string& path, const FileReport& report, int error) {
@@ -290,6 +338,9 @@ private:
     int m_type = ANY;
     int m_sub_type = ANY;
     std::unordered_set<size_t> m_outputs;
+    SplitFrame m_split;
+    const TreeFile* m_next = nullptr;  // the log file that goes on where the one in hand ends
+    size_t m_head = 0;                 // bytes of it that have been taken with the one before
 };
 
 }  // namespace
@@ -305,10 +356,8 @@ int run_extract(const CommandLine& line) {
     const Progress progress(tree.size(), true);
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
-            for (const TreeFile& file : cp.files) {
-                if (!extractor.extract(file, file.shown() == cp.shown, &status)) {
-                    return status;
-                }
+            if (!extractor.extract(cp, &status)) {
+                return status;
             }
         }
     }

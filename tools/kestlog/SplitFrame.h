@@ -1,0 +1,37 @@
+// SPDX-License-Identifier: Apache-2.0
+// The frame of a log that begins at the end of one file and ends at the head of the next, as the
+// service begins a new file anywhere. Owned by whoever goes through the files of logs.
+#ifndef KESTLOG_SPLITFRAME_H_
+#define KESTLOG_SPLITFRAME_H_
+
+#include <stddef.h>
+#include <stdint.h>
+
+#include <string>
+
+#include "channels/DiagFrameParser.h"
+#include "kestlog/LogTree.h"
+
+class SplitFrame {
+public:
+    // Whether the bytes of the file from that offset to its size, and what the next file begins
+    // with, are an intact frame. Both are opened again for it.
+    bool join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next);
+
+    // Of the frame, until the next call: its header, and what was decoded, header included.
+    const DiagHeader& header() const { return m_header; }
+    const uint8_t* body() const { return m_body; }
+    size_t len() const { return m_len; }
+    uint64_t begin() const { return m_begin; }  // its offset in the first file
+    size_t head() const { return m_head; }  // its bytes in the next file, behind the time record
+
+private:
+    DiagFrameParser m_parser;
+    DiagHeader m_header{};
+    uint8_t* m_body = nullptr;
+    size_t m_len = 0;
+    uint64_t m_begin = 0;
+    size_t m_head = 0;
+};
+
+#endif  // KESTLOG_SPLITFRAME_H_
