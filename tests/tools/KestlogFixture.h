@@ -75,7 +75,7 @@ protected:
         write(WCN_LOG, LOG_DATA);
         write(WCN + "cp_wcn_memory_" + STAMP + ".dmp", LOG_DATA);
         write(DSP_LOG, THREE_CHUNKS);
-        write(OLD_DSP_LOG, TIME_RECORD + THREE_CHUNKS);
+        write(OLD_DSP_LOG, TIME_RECORD + chunk(6, LOG, LOG_DATA));
         write("modem_log/modem_db.gz", LOG_DATA);
         write("modem_log/sha1.txt", "0123456789ABCDEF0123456789ABCDEF01234567");
     }

@@ -25,6 +25,7 @@ public:
     int32_t take(const Piece& chunk, FileReport* report) {
         const int32_t missing = m_follows ? static_cast<int32_t>(chunk.seq_num - m_next) : 0;
         if (m_first && missing != 0) {
+            ++report->sequence_gaps;
             report->add(false, "sequence",
                         "chunk " + std::to_string(chunk.seq_num) + " where " +
                             std::to_string(m_next) + " was expected",

@@ -7,6 +7,8 @@
 
 #include <algorithm>
 
+#include "kestlog/ChunkSequence.h"
+#include "kestlog/LogStream.h"
 #include "kestlog/Report.h"
 
 namespace {
@@ -27,9 +29,7 @@ public:
         }
         for (const TreeSet& set : m_tree.sets) {
             for (const TreeCp& cp : set.cps) {
-                for (const TreeFile& file : cp.files) {
-                    look({&set, &cp, &file});
-                }
+                look_at_all(set, cp);
             }
         }
         for (const std::string& words : m_tree.failures) {
@@ -38,6 +38,21 @@ public:
     }
 
 private:
+    // By time; but the numbers of chunks go on from log file to log file, whatever the clock said.
+    void look_at_all(const TreeSet& set, const TreeCp& cp) {
+        const bool chunked = cp_type_of(cp.name) == CT_AGDSP;
+        if (chunked) {
+            for (const TreeFile* log : logs_in_order(cp)) {
+                look({&set, &cp, log});
+            }
+        }
+        for (const TreeFile& file : cp.files) {
+            if (!chunked || !file.name.is_log()) {
+                look({&set, &cp, &file});
+            }
+        }
+    }
+
     void look(const FilePlace& place) {
         const PieceVisitor visit = m_visitor.begin(place);
         if (place.cp) {
@@ -100,7 +115,16 @@ private:
             }
             return;
         }
-        scan_file(in, file.name, visit, FP_LENGTH, report);
+        if (file.name.is_log() && file.name.cp_type == CT_AGDSP) {
+            m_sequence.enter(*file.dir);
+            const auto take = [&](const Piece& piece) {
+                m_sequence.take(piece, report);
+                return !visit || visit(piece);
+            };
+            scan_file(in, file.name, take, FP_LENGTH, report);
+        } else {
+            scan_file(in, file.name, visit, FP_LENGTH, report);
+        }
         if (in.error()) {
             m_visitor.unreadable(file.shown() + ": " + strerror(in.error()));
         }
@@ -116,6 +140,7 @@ private:
 
     const LogTree& m_tree;
     TreeVisitor& m_visitor;
+    ChunkSequence m_sequence;
 };
 
 }  // namespace
