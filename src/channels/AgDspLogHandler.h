@@ -38,7 +38,8 @@ public:
 
 private:
     // What fits into the shared buffer behind the header.
-    static constexpr size_t MAX_CHUNK = IO_BUFFER_SIZE - DSP_CHUNK_HEADER_LEN;
+    static constexpr size_t MAX_CHUNK = DSP_CHUNK_MAX_DATA;
+    static_assert(MAX_CHUNK == IO_BUFFER_SIZE - DSP_CHUNK_HEADER_LEN, "one read fills the buffer");
 
     // Writes the chunk in the shared buffer, header and n data bytes; as CpStorage::write, and
     // reports a chunk that is taken in part only.

@@ -31,6 +31,10 @@ struct DspChunkHeader {
 constexpr size_t DSP_CHUNK_HEADER_LEN = 20;
 static_assert(sizeof(DspChunkHeader) == DSP_CHUNK_HEADER_LEN, "20 bytes on the medium");
 
+// The most data bytes of a chunk: what one read takes. A dump is read to its end, so its last chunk
+// has fewer and the others have as many.
+constexpr size_t DSP_CHUNK_MAX_DATA = 32768 - DSP_CHUNK_HEADER_LEN;
+
 constexpr uint16_t DSP_CHUNK_MARK = 0x5A5A;
 
 // The checksum field for a chunk of that many data bytes.

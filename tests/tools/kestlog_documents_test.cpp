@@ -121,7 +121,8 @@ TEST_F(KestlogDocuments, EveryLineOfJsonIsAsTheDocumentSays) {
     write("iq", "12345");
     std::string types;
     for (uint32_t lost = 1; lost < 202; ++lost) {
-        m_root.write_file(DSP_LOG, m_root.read_file(DSP_LOG) + chunk(2 * lost, PCM, "x"));
+        m_root.write_file(DSP_LOG,
+                          m_root.read_file(DSP_LOG) + chunk(2 * lost, lost % 2 ? PCM : DUMP, "x"));
         m_root.write_file(
             "many/cp_gnss/cp_gnss_sleeplog_" + std::to_string(2000 + lost) + "-03-01_09-15-00.log",
             "");

@@ -198,15 +198,23 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     write(MODEM_LOG, TIME_RECORD + sleep.substr(9) + frame("ring", 0x3a, 0x64) +
                          frame("end", 0x3a, 1) + "tail");
     write(MODEM_DUMP, frame(LOG_DATA) + DUMP_END);
-    write(DSP_LOG, THREE_CHUNKS);
-    unlink(m_root.path(OLD_DSP_LOG).c_str());
+    // A dump over two files, the whole one behind it, and one without its middle.
+    const std::string full = pattern_bytes(32748, 4), dsp = "agdsp_memory_2016-03-01_09-00-00";
+    write(OLD_DSP_LOG, chunk(7, LOG, "") + chunk(8, DUMP, full));
+    write(DSP_LOG, chunk(9, DUMP, full) + chunk(10, LOG, "") + chunk(11, DUMP, LOG_DATA) +
+                       chunk(12, DUMP, "2") + chunk(13, DUMP, full) + chunk(16, DUMP, "3"));
     unlink(m_root.path("crash").c_str());
     const std::string name = "cp_wcdma-" + STAMP;
     const std::pair<std::string, std::string> FILES[] = {
-        {"0-" + name + ".ringbuf.bin", "ring"},        {"1" + older + ".sleeplog.bin", "sleep~"},
-        {"0-agdsp-" + STAMP + ".dump.bin", LOG_DATA},  {image, LOG_DATA},
+        {"0-" + name + ".ringbuf.bin", "ring"},
+        {"1" + older + ".sleeplog.bin", "sleep~"},
+        {dsp + ".bin", full + full + LOG_DATA},
+        {"agdsp_memory_" + STAMP + ".bin", "2"},
+        {"agdsp_memory_" + STAMP + "-1.bin", full + "3"},
+        {image, LOG_DATA},
         {"cp_wcdma_memory_" + STAMP + "-1.bin", "x"},  // of the kernel's copy
-        {"cp_wcdma_ringbuf_" + STAMP + ".bin", "x"},   {"cp_wcdma_sleeplog_" + STAMP + ".bin", "x"},
+        {"cp_wcdma_ringbuf_" + STAMP + ".bin", "x"},
+        {"cp_wcdma_sleeplog_" + STAMP + ".bin", "x"},
         {"cp_wcn_memory_" + STAMP + ".bin", LOG_DATA},
     };
     EXPECT_EQ(run("extract . --json -o all"), 0) << m_err;
@@ -216,10 +224,13 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     }
     const Json first = Json::parse(m_out.substr(0, m_out.find('\n')));
     EXPECT_EQ(first,
-              Json::parse(R"({"file":"./)" + DSP_LOG + R"(","output":"all/0-agdsp-)" + STAMP +
-                          R"(.dump.bin","content":"memory image","framed":true,"bytes":1000,
-        "frames":1,"other_frames":2,"broken_frames":0,"other_bytes":0,"time_record":false,
-        "end_marker":false})"));
+              Json::parse(R"({"file":"./)" + OLD_DSP_LOG + R"(","output":"all/)" + dsp +
+                          R"(.bin","content":"memory image","framed":true,"bytes":66496,"frames":3,
+        "other_frames":1,"files":2,"missing_frames":0,"has_start":true,"has_end":true})"));
+    EXPECT_EQ(run("extract . --force -o all"), 0);
+    EXPECT_TRUE(m_out.find("part of a memory image, 32749 bytes of 2 chunks in 1 files; left out: "
+                           "nothing; missing: 2 chunks\n") != std::string::npos)
+        << m_out;
 }
 
 // Stereo samples of 16 bits in chunks that end within a sample; the log's chunks lie between.

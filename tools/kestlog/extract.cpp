@@ -15,6 +15,7 @@
 #include "common/text.h"
 #include "core/open_file.h"
 #include "kestlog/Commands.h"
+#include "kestlog/DspDumps.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/LogStream.h"
 #include "kestlog/OutputFile.h"
@@ -29,13 +30,12 @@ namespace {
 constexpr int ANY = -1;
 constexpr uint64_t RECORD = sizeof(TimeSyncRecord);
 
-// What of a file goes to one file. The kind is that of chunks, or null for frames.
+// What of a file goes to one file.
 struct Content {
     const char* words;
     std::string suffix;  // of the output's name
     int type;
     int sub_type;
-    const char* kind;
 };
 
 // The diag types and sub-type of data that the service asks for.
@@ -92,37 +92,42 @@ public:
     }
 
     // False when the output failed; *status is set then.
-    bool extract(const TreeCp& cp, int* status) {
+    bool extract(const TreeSet& set, const TreeCp& cp, int* status) {
         const std::vector<const TreeFile*> logs = logs_in_order(cp);
         m_head = 0;
         for (size_t i = 0; i < logs.size(); ++i) {
             const bool goes_on =
                 i + 1 < logs.size() && logs[i]->name.number == logs[i + 1]->name.number + 1;
             m_next = goes_on ? logs[i + 1] : nullptr;
-            if (!extract(*logs[i], logs[i]->shown() == cp.shown, status)) {
+            if (!extract({&set, &cp, logs[i]}, status)) {
                 return false;
             }
         }
         m_next = nullptr;
-        return std::all_of(cp.files.begin(), cp.files.end(), [&](const TreeFile& file) {
-            return file.name.is_log() || extract(file, file.shown() == cp.shown, status);
-        });
+        return finish_dump(status) &&
+               std::all_of(cp.files.begin(), cp.files.end(), [&](const TreeFile& file) {
+                   return file.name.is_log() ||
+                          (extract({&set, &cp, &file}, status) && finish_dump(status));
+               });
     }
 
     uint64_t outputs() const { return m_outputs.size(); }
     int status() const { return m_problems.status(); }
 
 private:
-    bool extract(const TreeFile& file, bool named, int* status) {
-        const bool chosen = m_type != ANY || m_sub_type != ANY;
-        if (is_plain(file.name) && !chosen) {
+    bool is_chosen() const { return m_type != ANY || m_sub_type != ANY; }
+
+    bool extract(const StreamFile& place, int* status) {
+        const TreeFile& file = *place.file;
+        const bool named = file.shown() == place.cp->shown;
+        if (is_plain(file.name) && !is_chosen()) {
             return copy(file, named ? Links::FOLLOW : Links::REFUSE, status);
         }
-        return !holds_frames(file.name) || scan(file, named, status);
+        return !holds_frames(file.name) || scan(place, named, status);
     }
 
     std::vector<Content> contents(const FileName& name, bool chunked) const {
-        if (m_type != ANY || m_sub_type != ANY) {
+        if (is_chosen()) {
             char suffix[40] = "";
             size_t len = 0;
             if (m_type != ANY) {
@@ -131,24 +136,27 @@ private:
             if (m_sub_type != ANY) {
                 snprintf(suffix + len, sizeof(suffix) - len, ".sub-type-%02x", m_sub_type);
             }
-            return {{"payload", suffix, m_type, m_sub_type, nullptr}};
+            return {{"payload", suffix, m_type, m_sub_type}};
         }
         if (chunked) {
-            return {{"memory image", ".dump", ANY, ANY, CHUNK_KINDS[CK_DUMP]}};
+            return {};  // see take_dump()
         }
         if (name.is_log()) {
-            return {{"ring buffer", ".ringbuf", RING_BUFFER, DATA, nullptr},
-                    {"sleep log", ".sleeplog", SLEEP_LOG, DATA, nullptr}};
+            return {{"ring buffer", ".ringbuf", RING_BUFFER, DATA},
+                    {"sleep log", ".sleeplog", SLEEP_LOG, DATA}};
         }
-        return {{"memory image", name.exact ? "" : ".image", ANY, ANY, nullptr}};
+        return {{"memory image", name.exact ? "" : ".image", ANY, ANY}};
+    }
+
+    static std::string stem_of(const FileName& file) {
+        const std::string name = file.text() == "-" ? "stdin" : file.text();
+        const size_t dot = name.rfind('.');
+        return dot == 0 ? name : name.substr(0, dot);
     }
 
     // Where it goes: no two outputs of one run have the same name. Of the names only hashes are
     // kept; where two have the same, the worst is a number that was not needed.
-    std::string output_path(const TreeFile& file, const std::string& suffix) {
-        const std::string name = file.name.text() == "-" ? "stdin" : file.name.text();
-        const size_t dot = name.rfind('.');
-        const std::string stem = dot == 0 ? name : name.substr(0, dot);
+    std::string output_path(const std::string& stem, const std::string& suffix) {
         std::string output = output_name(stem, suffix + ".bin");
         for (int i = 1; !m_outputs.insert(std::hash<std::string>()(output)).second; ++i) {
             output = output_name(stem, suffix + "-" + std::to_string(i) + ".bin");
@@ -156,21 +164,20 @@ private:
         return m_dir + "/" + output;
     }
 
-    bool open(const TreeFile& file, const std::string& suffix, OutputFile* out) {
+    bool open(const std::string& stem, const std::string& suffix, OutputFile* out) {
         if (m_outputs.empty()) {
             mkdir(m_dir.c_str(), 0777);  // if it cannot be made, the file in it cannot either
         }
-        return out->open(output_path(file, suffix), m_force);
+        return out->open(output_path(stem, suffix), m_force);
     }
 
     bool take(const TreeFile& file, const Piece& piece, Part* part) {
         const Content& content = part->content;
         if (!piece.intact || (content.type != ANY && content.type != piece.type) ||
-            (content.sub_type != ANY && content.sub_type != piece.sub_type) ||
-            (content.kind && content.kind != piece.kind)) {
+            (content.sub_type != ANY && content.sub_type != piece.sub_type)) {
             return true;
         }
-        if (part->frames == 0 && !open(file, content.suffix, &part->out)) {
+        if (part->frames == 0 && !open(stem_of(file.name), content.suffix, &part->out)) {
             return false;
         }
         ++part->frames;
@@ -178,7 +185,38 @@ private:
         return part->out.write(piece.data, piece.data_len);
     }
 
-    bool scan(const TreeFile& file, bool named, int* status) {
+    // A dump of an audio DSP goes over files. It is named as those of other CPs are.
+    bool take_dump(const TreeFile& file, const Piece& piece) {
+        if (!m_dumps.take(piece)) {
+            return !m_dump_failed;
+        }
+        const bool named = file.name.is_log();
+        const std::string stem =
+            named ? file.name.cp() + "_memory_" + file.name.time().file_stamp().string()
+                  : stem_of(file.name);
+        m_dump_failed =
+            m_dump_failed ||
+            (m_dumps.dump().chunks == 1 && !open(stem, named ? "" : ".dump", &m_dump)) ||
+            !m_dump.write(piece.data, piece.data_len);
+        return !m_dump_failed;
+    }
+
+    // It has ended, or nothing more of it is there.
+    void end_dump(const DspDump& dump) {
+        m_dump_failed = m_dump_failed || !m_dump.close();
+        if (!m_dump_failed) {
+            print(dump);
+        }
+    }
+
+    bool finish_dump(int* status) {
+        m_dumps.finish();
+        *status = m_dump_failed ? m_dump.failed() : *status;
+        return !m_dump_failed;
+    }
+
+    bool scan(const StreamFile& place, bool named, int* status) {
+        const TreeFile& file = *place.file;
         const std::string path = file.shown();
         const size_t head = m_head;
         m_head = 0;
@@ -192,6 +230,7 @@ private:
             parts.emplace_back();
             parts.back().content = content;
         }
+        m_dumps.enter(place);
         FileReport report;
         const Part* failed = nullptr;
         End end;
@@ -211,7 +250,7 @@ private:
                     end.counted += piece.intact ? 1 : 0;
                     return true;
                 }
-                return take_all(piece);
+                return piece.kind && !is_chosen() ? take_dump(file, piece) : take_all(piece);
             },
             FP_DATA, &report);
         report.other -= std::min<uint64_t>(report.other, head);
@@ -222,8 +261,8 @@ private:
         for (Part& part : parts) {
             failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
         }
-        if (failed) {
-            *status = failed->out.failed();
+        if (failed || m_dump_failed) {
+            *status = (failed ? failed->out : m_dump).failed();
             return false;
         }
         for (const Part& part : parts) {
@@ -273,8 +312,8 @@ private:
         OutputFile out;
         uint64_t copied = 0;
         int error = 0;
-        const bool good =
-            open(file, "", &out) && out.copy_from(fd, file.size, &copied, &error) && out.close();
+        const bool good = open(stem_of(file.name), "", &out) &&
+                          out.copy_from(fd, file.size, &copied, &error) && out.close();
         close(fd);
         if (!good) {
             *status = out.failed();
@@ -293,6 +332,31 @@ private:
         }
         tell(path, FileReport(), error);
         return true;
+    }
+
+    void print(const DspDump& dump) {
+        const char* const content = dump.is_whole() ? "memory image" : "part of a memory image";
+        if (m_problems.json()) {
+            m_problems.print({{"file", json_text(dump.files[0].file->shown())},
+                              {"output", json_text(m_dump.path())},
+                              {"content", content},
+                              {"framed", true},
+                              {"bytes", dump.bytes},
+                              {"frames", dump.chunks},
+                              {"other_frames", dump.others},
+                              {"files", dump.files.size()},
+                              {"missing_frames", dump.missing},
+                              {"has_start", dump.has_start},
+                              {"has_end", dump.has_end}});
+            return;
+        }
+        const std::string missing = dump.missing_words();
+        printf("%s: %s, %llu bytes of %llu chunks in %zu files; left out: %s%s%s\n",
+               escape_text(m_dump.path()).c_str(), content,
+               static_cast<unsigned long long>(dump.bytes),
+               static_cast<unsigned long long>(dump.chunks), dump.files.size(),
+               dump.others ? (std::to_string(dump.others) + " other chunks").c_str() : "nothing",
+               missing.empty() ? "" : "; missing: ", missing.c_str());
     }
 
     void print(const std::string& path, const Part& part, const FileReport& report,
@@ -338,6 +402,9 @@ private:
     int m_type = ANY;
     int m_sub_type = ANY;
     std::unordered_set<size_t> m_outputs;
+    OutputFile m_dump;
+    bool m_dump_failed = false;
+    DspDumps m_dumps{[this](const DspDump& dump) { end_dump(dump); }};
     SplitFrame m_split;
     const TreeFile* m_next = nullptr;  // the log file that goes on where the one in hand ends
     size_t m_head = 0;                 // bytes of it that have been taken with the one before
@@ -356,7 +423,7 @@ int run_extract(const CommandLine& line) {
     const Progress progress(tree.size(), true);
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
-            if (!extractor.extract(cp, &status)) {
+            if (!extractor.extract(set, cp, &status)) {
                 return status;
             }
         }
