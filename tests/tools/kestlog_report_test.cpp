@@ -355,6 +355,15 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
               std::string::npos)
         << m_err;
     EXPECT_FALSE(m_root.exists("none.tar"));
+    // An audio DSP's dump is in its logs, here in two.
+    const std::string dsp = HANDSET + "modem_log/2016-03-01-08-00-00/agdsp/";
+    write(dsp + "1-agdsp-2016-03-01_11-00-00.log", chunk(0, DUMP, std::string(32748, 'x')));
+    write(dsp + "0-agdsp-2016-03-01_11-01-00.log", chunk(1, DUMP, "end") + chunk(3, DUMP, "x"));
+    EXPECT_EQ(run("bundle handset --crash 11:00 -o dsp.tar"), 0) << m_err;
+    EXPECT_NE(m_out.find(" 11:00:00 agdsp on internal: memory dump; "), std::string::npos);
+    const Json dumps = report("dsp.tar");
+    only(dumps["timeline"], {{"kind", "crash"}, {"cp", "agdsp"}, {"size", 32751}});
+    only(dumps["crashes"], {{"what", "part of a memory dump, without its start"}, {"size", 1}});
     for (const char* wrong :
          {"-o x", "--crash noon -o x", "--crash 9:06", "--crash 9:06 -o x --minutes 9999"}) {
         EXPECT_EQ(run("bundle handset " + std::string(wrong)), 1) << wrong;

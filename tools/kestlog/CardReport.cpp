@@ -87,6 +87,9 @@ PieceVisitor CardReport::begin(const FilePlace& place) {
     }
     CpSum* const cp = &m_cps[place.cp->name];
     Waveform* waveform = nullptr;
+    if (place.file->name.cp_type == CT_AGDSP) {
+        m_dsp_dumps.enter({place.set, place.cp, place.file});
+    }
     if (m_options.pcm && place.file->name.cp_type == CT_AGDSP) {
         const auto found =
             std::find_if(m_waveforms.begin(), m_waveforms.end(), [&place](const auto& entry) {
@@ -106,6 +109,9 @@ PieceVisitor CardReport::begin(const FilePlace& place) {
         TypeSum& sum = cp->types[piece.type * 256 + piece.sub_type];
         ++sum.count;
         sum.bytes += piece.data_len;
+        if (piece.kind && m_place.file->name.cp_type == CT_AGDSP) {
+            m_dsp_dumps.take(piece);
+        }
         if (waveform && piece.kind) {
             if (piece.seq_num != m_next_seq) {
                 waveform->restart();
@@ -313,7 +319,8 @@ void CardReport::add_spectrum(const FilePlace& place) {
 }
 
 void CardReport::add_crashes() {
-    for (const Crash& crash : find_crashes(m_tree)) {
+    m_dsp_dumps.finish();
+    for (const Crash& crash : find_crashes(m_tree, std::move(m_dsp_crashes))) {
         TimelineItem item;
         Json files = Json::array();
         item.from = crash.time;
@@ -328,6 +335,7 @@ void CardReport::add_crashes() {
             item.damages += damaged == m_damaged.end() ? 0 : damaged->second;
             files.push_back(json_text(file->name.text()));
         }
+        item.size = crash.dump.empty() ? item.size : crash.dump_size;
         m_timeline.add(crash.cp->name, TK_CRASH, item);
         add_row("crashes", MAX_ROWS,
                 {{"cp", json_text(crash.cp->name)},

@@ -26,7 +26,7 @@ std::string kind_key(const FileName& name) {
 
 void find_in(const TreeSet& set, const TreeCp& cp, std::vector<Crash>* crashes) {
     std::set<std::string> kinds;
-    Crash crash = {&set, &cp, {}, {}};
+    Crash crash = {&set, &cp, {}, {}, "", 0};
     const auto finish = [&]() {
         if (!crash.files.empty()) {
             crashes->push_back(crash);
@@ -58,7 +58,43 @@ bool of_crash(const TreeFile& file) {
     return type == LT_DUMP || type == LT_MINI_DUMP || type == LT_IPC_INFO;
 }
 
+Crash crash_of(const DspDump& dump) {
+    const StreamFile& first = dump.files[0];
+    Crash crash = {first.set, first.cp, first.file->name.time(), {}, dump.words(), dump.bytes};
+    for (const StreamFile& each : dump.files) {
+        crash.files.push_back(each.file);
+    }
+    return crash;
+}
+
+std::vector<Crash> find_dsp_crashes(const LogTree& tree) {
+    std::vector<Crash> crashes;
+    DspDumps dumps([&](const DspDump& dump) { crashes.push_back(crash_of(dump)); });
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile* log : logs_in_order(cp)) {
+                LogReader in;
+                FileReport ignored;
+                if (log->name.cp_type != CT_AGDSP || !in.open(log->path(), false)) {
+                    continue;
+                }
+                dumps.enter({&set, &cp, log});
+                const auto take = [&dumps](const Piece& chunk) {
+                    dumps.take(chunk);
+                    return true;
+                };
+                scan_file(in, log->name, take, FP_LENGTH, &ignored);
+            }
+        }
+    }
+    dumps.finish();
+    return crashes;
+}
+
 std::string crash_text(const Crash& crash) {
+    if (!crash.dump.empty()) {
+        return crash.dump;
+    }
     std::vector<std::pair<std::string, int>> kinds;
     for (const TreeFile* file : crash.files) {
         const auto found = std::find_if(kinds.begin(), kinds.end(), [file](const auto& kind) {
@@ -78,8 +114,8 @@ std::string crash_text(const Crash& crash) {
     return text;
 }
 
-std::vector<Crash> find_crashes(const LogTree& tree) {
-    std::vector<Crash> crashes;
+std::vector<Crash> find_crashes(const LogTree& tree, std::vector<Crash> known) {
+    std::vector<Crash> crashes = std::move(known);
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
             find_in(set, cp, &crashes);

@@ -147,7 +147,7 @@ int run_bundle(const CommandLine& line) {
     if (!parse_time(line.value("crash", ""), tree.newest(), false, &time)) {
         return line.usage_error("--crash: '" + line.value("crash", "") + "' is not a time");
     }
-    const std::vector<Crash> crashes = find_crashes(tree);
+    const std::vector<Crash> crashes = find_crashes(tree, find_dsp_crashes(tree));
     tell_failures(tree);
     const Crash* const crash = find_crash(crashes, time, line.value("cp", ""));
     if (!crash) {
