@@ -92,7 +92,7 @@ private:
     std::map<const TreeSet*, SetSum> m_sets;
     std::vector<std::pair<FilePlace, Waveform>> m_waveforms;
     std::vector<Crash> m_dsp_crashes;
-    DspDumps m_dsp_dumps{[this](const DspDump& dump) { m_dsp_crashes.push_back(crash_of(dump)); }};
+    DspDumps m_dsp_dumps{[this](const DspDump& dump) { add_crash(dump, &m_dsp_crashes); }};
     uint32_t m_next_seq = 0;  // of PCM data in one file
     uint64_t m_files = 0, m_size = 0;
     uint64_t m_damages = 0, m_notes = 0, m_unreadable = 0;

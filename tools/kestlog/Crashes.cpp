@@ -14,6 +14,8 @@ namespace {
 constexpr int64_t MAX_PAUSE_SECONDS = 300;
 // More than the service ever writes.
 constexpr size_t MAX_FILES = 100;
+// A log of nothing but one-byte dumps would take all memory.
+constexpr size_t MAX_DSP_CRASHES = 10000;
 
 // The name without its time: what a crash has only once.
 std::string kind_key(const FileName& name) {
@@ -58,6 +60,8 @@ bool of_crash(const TreeFile& file) {
     return type == LT_DUMP || type == LT_MINI_DUMP || type == LT_IPC_INFO;
 }
 
+namespace {
+
 Crash crash_of(const DspDump& dump) {
     const StreamFile& first = dump.files[0];
     Crash crash = {first.set, first.cp, first.file->name.time(), {}, dump.words(), dump.bytes};
@@ -67,9 +71,17 @@ Crash crash_of(const DspDump& dump) {
     return crash;
 }
 
+}  // namespace
+
+void add_crash(const DspDump& dump, std::vector<Crash>* crashes) {
+    if (crashes->size() < MAX_DSP_CRASHES) {
+        crashes->push_back(crash_of(dump));
+    }
+}
+
 std::vector<Crash> find_dsp_crashes(const LogTree& tree) {
     std::vector<Crash> crashes;
-    DspDumps dumps([&](const DspDump& dump) { crashes.push_back(crash_of(dump)); });
+    DspDumps dumps([&](const DspDump& dump) { add_crash(dump, &crashes); });
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
             for (const TreeFile* log : logs_in_order(cp)) {

@@ -158,8 +158,12 @@ private:
     // kept; where two have the same, the worst is a number that was not needed.
     std::string output_path(const std::string& stem, const std::string& suffix) {
         std::string output = output_name(stem, suffix + ".bin");
-        for (int i = 1; !m_outputs.insert(std::hash<std::string>()(output)).second; ++i) {
-            output = output_name(stem, suffix + "-" + std::to_string(i) + ".bin");
+        if (output != m_last) {
+            m_last = output;
+            m_last_number = 0;
+        }
+        while (!m_outputs.insert(std::hash<std::string>()(output)).second) {
+            output = output_name(stem, suffix + "-" + std::to_string(++m_last_number) + ".bin");
         }
         return m_dir + "/" + output;
     }
@@ -402,6 +406,8 @@ private:
     int m_type = ANY;
     int m_sub_type = ANY;
     std::unordered_set<size_t> m_outputs;
+    std::string m_last;     // output without a number: one file may hold very many dumps
+    int m_last_number = 0;  // that it got last
     OutputFile m_dump;
     bool m_dump_failed = false;
     DspDumps m_dumps{[this](const DspDump& dump) { end_dump(dump); }};
