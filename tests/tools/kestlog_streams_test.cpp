@@ -107,6 +107,8 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
         {"cp_wcn", {in(0, "09-00-00", "a"), in(0, "09-00-00-1", "b")}, "", 0, "ba", ""},
         {"cp_wcn", {in(0, "09-00-00", "a"), in(0, "09-20-00", "b")},
          "", 3, "ab", "damage: two log files with this number\n"},
+        // A file that was set aside ends where the next one of its number begins.
+        {"cp_wcn", {in(1, "09-00-00-1", "a"), in(1, "09-05-00", "b"), in(0, "09-10-00", "c")}, "--since 09:05:30", 0, "bc", ""},
         // Copied while it grew, and before it was renumbered.
         {"cp_wcn", {in(1, "09-00-00", "abc"), in(0, "09-20-00", "d"), copied("ab")}, "", 3, "abcd",
          "copy/modem_log/2016-03-01-09-00-00/cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log: damage: the beginning of "

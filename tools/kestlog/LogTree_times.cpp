@@ -24,6 +24,8 @@ void find_missing(std::vector<TreeFile>* files) {
             logs.push_back(&file);
         }
     }
+    // From the newest to the oldest, also of those with one number.
+    std::reverse(logs.begin(), logs.end());
     std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
         return a->name.number < b->name.number;
     });
