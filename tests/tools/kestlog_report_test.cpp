@@ -122,9 +122,13 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
                                   R"({"type":157,"sub_type":1,"count":1,"bytes":3,"rate":0}])");
     only(json["findings"], {{"code", "name"}, {"path", CARD_TEXT}});
     // A copy that has its own times does not tell how long the newest file lasts.
+    const std::string wcn = DAY + "../cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log";
+    write(wcn, "");
+    written_last(wcn, 100000);
     written_last(DAY + log_at(3, "09-00-00"), 5000);
     only(report("handset", 3)["timeline"],
-         {{"kind", "log"}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
+         {{"size", 16}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
+    only(report("handset --since 09:31", 3)["timeline"], {{"kind", "log"}, {"medium", "card"}});
     // Of a part nobody can say what was there before.
     const Json part = report("handset --since 09:05", 3);
     EXPECT_FALSE(part["timeline"].empty());

@@ -20,14 +20,6 @@ int64_t seconds_between(const LogTime& from, const LogTime& to) {
     return has_time(from) && has_time(to) ? seconds_of(to) - seconds_of(from) : 0;
 }
 
-// Whether the times of the last writes are those of the handset. A copy may have its own.
-bool has_own_times(const TreeCp& cp) {
-    constexpr time_t TOLERANCE = 60;
-    return std::none_of(cp.files.begin(), cp.files.end(), [](const TreeFile& file) {
-        return file.name.is_log() && file.end.time() < local_time(file.modified - TOLERANCE);
-    });
-}
-
 std::string base64(const std::vector<uint8_t>& bytes) {
     static const char DIGITS[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
     std::string text;
@@ -128,17 +120,10 @@ PieceVisitor CardReport::begin(const FilePlace& place) {
 // When the file was written to last or, when nothing tells that, when the next one began.
 LogTime CardReport::last_byte(const FilePlace& place) {
     const TreeFile& log = *place.file;
-    if (m_timed_cp != place.cp) {
-        m_timed_cp = place.cp;
-        m_own_times = has_own_times(*place.cp);
-    }
     const LogTime& start = log.name.time();
-    const LogTime written = m_own_times ? local_time(log.modified) : log.end.time();
+    const LogTime written = place.cp->own_times ? local_time(log.modified) : log.end.time();
     const bool newest = log.name.number == 0;
-    LogTime last = written < start || log.end.time() < written ? log.end.time() : written;
-    if (newest && !m_own_times) {
-        last = start;
-    }
+    const LogTime last = written < start || log.end.time() < written ? log.end.time() : written;
     // A set ends where the next begins.
     const auto next =
         std::upper_bound(m_tree.sets.begin(), m_tree.sets.end(), start,

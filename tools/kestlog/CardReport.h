@@ -98,9 +98,7 @@ private:
     uint64_t m_damages = 0, m_notes = 0, m_unreadable = 0;
     uint64_t m_file_damages = 0;
     std::map<const TreeFile*, uint64_t> m_damaged;  // files of crashes, and their damages
-    const TreeCp* m_timed_cp = nullptr;             // of which is known:
-    bool m_own_times = false;
-    FilePlace m_place{};  // of the file that is being scanned
+    FilePlace m_place{};                            // of the file that is being scanned
 };
 
 #endif  // KESTLOG_CARDREPORT_H_

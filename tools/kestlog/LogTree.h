@@ -40,7 +40,7 @@ struct TreeFile {
     uint64_t size;
     time_t modified;
     // Of a log file: the time of the next newer one or, of the newest, when it was written to
-    // last. Of any other the time in its name.
+    // last if the CP has its own times. Of any other the time in its name.
     ShortTime end{};
     // Of a log file: the numbers between it and the next newer one (down to 0 from the newest)
     // that are missing.
@@ -59,6 +59,7 @@ struct TreeCp {
     std::string name;
     std::string shown;            // its path for humans
     std::vector<TreeFile> files;  // by time, oldest first
+    bool own_times = true;        // the last writes are the handset's, not those of a copy
 };
 
 struct TreeSet {
@@ -97,7 +98,7 @@ public:
     // Leaves out the files that ended before since or began after until. A time that is not set
     // does not count; nor does a file without a time. Sets and CPs stay.
     void cut(const LogTime& since, const LogTime& until);
-    // The newest time in the tree: of a name or of the last write to a log file.
+    // The newest time in the tree: of a name or of the end of a log file.
     LogTime newest() const;
     // The bytes of all files.
     uint64_t size() const;

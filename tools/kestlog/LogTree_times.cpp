@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The order, ends and missing numbers of the files in a tree, once it has been read.
 #include <algorithm>
+#include <map>
 
 #include "kestlog/LogTree.h"
 
@@ -43,10 +44,64 @@ void find_missing(std::vector<TreeFile>* files) {
         }
         log->disordered =
             newer && newer->name.number < number && newer->name.time() < log->name.time();
-        log->end = ShortTime(
-            std::max(log->name.time(), newer ? newer->name.time() : local_time(log->modified)));
+        log->end =
+            ShortTime(newer ? std::max(log->name.time(), newer->name.time()) : log->name.time());
         due = number + 1;
         newer = log;
+    }
+}
+
+// The log file of the CP that was begun last; null without one.
+TreeFile* newest_log(TreeCp* cp) {
+    TreeFile* newest = nullptr;
+    for (TreeFile& file : cp->files) {
+        if (file.name.is_log() && (!newest || file.name.number <= newest->name.number)) {
+            newest = &file;
+        }
+    }
+    return newest;
+}
+
+// Whether the last writes to the log files fit their names: -1 when one does not, as in a copy
+// or where this machine has another zone; 0 when nothing tells.
+int times_fit(const TreeCp& cp, const TreeFile* newest) {
+    constexpr time_t TOLERANCE = 60;
+    int fit = 0;
+    for (const TreeFile& file : cp.files) {
+        if (!file.name.is_log()) {
+            continue;
+        }
+        if (local_time(file.modified + TOLERANCE) < file.name.time() ||
+            (&file != newest && file.end.time() < local_time(file.modified - TOLERANCE))) {
+            return -1;
+        }
+        fit = &file == newest ? fit : 1;
+    }
+    return fit;
+}
+
+// Gives the newest log files the end that their last write tells, where it can be believed.
+void find_ends(std::vector<TreeSet>* sets) {
+    // Where a CP's files tell nothing, those of the other CPs on its medium do.
+    std::map<std::string, int> media;
+    std::vector<int> fits;
+    for (TreeSet& set : *sets) {
+        for (TreeCp& cp : set.cps) {
+            fits.push_back(times_fit(cp, newest_log(&cp)));
+            media[set.medium] += fits.back();
+        }
+    }
+    auto fit = fits.begin();
+    for (TreeSet& set : *sets) {
+        for (TreeCp& cp : set.cps) {
+            TreeFile* const newest = newest_log(&cp);
+            cp.own_times = (*fit ? *fit : media[set.medium]) >= 0;
+            ++fit;
+            if (newest && cp.own_times) {
+                newest->end =
+                    ShortTime(std::max(newest->name.time(), local_time(newest->modified)));
+            }
+        }
     }
 }
 
@@ -78,6 +133,7 @@ void LogTree::finish() {
         }
         set.time = has_time(set.time) ? set.time : first;
     }
+    find_ends(&sets);
     std::stable_sort(sets.begin(), sets.end(),
                      [](const TreeSet& a, const TreeSet& b) { return a.time < b.time; });
 }
