@@ -51,6 +51,9 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     EXPECT_EQ(Json::parse(m_out), Json::parse(R"({"cp":"cp_wcdma","output":"all","files":13,
         "left_out":0,"bytes":300007,"damages":0,"notes":0})"));
 
+    EXPECT_EQ(run("frames " + INTERNAL + "*/*_09-[012]0-00.log --since 09:19"), 0) << m_err;
+    EXPECT_TRUE(said("/11-cp_wcdma-") && !said("/12-")) << m_out;
+
     // Nothing is replaced unasked, and nothing but the file is left.
     EXPECT_EQ(run("join . -o all"), 4);
     EXPECT_TRUE(complained("kestlog: all: File exists; use --force to replace it\n")) << m_err;

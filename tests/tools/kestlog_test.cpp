@@ -283,7 +283,8 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
         {"--type 3 " + both, {"7a65726f", "7e74776f", "7468726565"}},
         {"--type 0x03 --sub-type 2 " + both, {"7a65726f", "7468726565"}},
         {"--limit 2 " + both, {"7a65726f", "6f6e65"}},
-        {"--since 09:15 --until 2016-03-02 " + both, {"6f6e65", "7e74776f", "7468726565"}},
+        {"--since 09:15 --until 2016-03-02 " + both,
+         {"7a65726f", "6f6e65", "7e74776f", "7468726565"}},
         {"--until 09:14 " + both, {"7a65726f"}},
         {"--type 3 - <" + WCN_LOG, {"7e74776f", "7468726565"}},
     };

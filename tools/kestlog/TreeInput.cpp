@@ -8,7 +8,9 @@
 #include <time.h>
 #include <unistd.h>
 
-#include <algorithm>
+#include <map>
+#include <set>
+#include <utility>
 
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
@@ -73,6 +75,25 @@ bool cut_tree(const CommandLine& line, LogTree* tree, int* status) {
     }
     tree->cut(since, until);
     return true;
+}
+
+// The FILEs of a CP in one directory are one set, as in a tree: each lasts until the next begins.
+void add_files(const Args& paths, LogTree* tree) {
+    std::map<std::pair<std::string, std::string>, size_t> sets;  // by directory and CP
+    std::set<std::string> added;
+    for (const std::string& path : paths) {
+        if (!added.insert(path).second) {
+            continue;
+        }
+        tree->add_file(path);
+        const TreeCp& cp = tree->sets.back().cps[0];
+        const auto [set, is_new] =
+            sets.insert({{cp.files[0].dir->path, cp.name}, tree->sets.size() - 1});
+        if (!is_new) {
+            tree->sets[set->second].cps[0].files.push_back(cp.files[0]);
+            tree->sets.pop_back();
+        }
+    }
 }
 
 }  // namespace
@@ -156,20 +177,22 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
 
 bool select_files(const CommandLine& line, Args* files, int* status) {
     LogTree tree;
-    for (const std::string& path : line.params()) {
-        tree.add_file(path);
-    }
+    add_files(line.params(), &tree);
     tree.finish();
     if (!cut_tree(line, &tree, status)) {
         return false;
     }
+    std::set<std::string> kept;
+    for (const TreeSet& set : tree.sets) {
+        for (const TreeCp& cp : set.cps) {
+            for (const TreeFile& file : cp.files) {
+                kept.insert(file.path());
+            }
+        }
+    }
     for (const std::string& path : line.params()) {
-        const auto holds = [&path](const TreeSet& set) {
-            return set.shown == path && !set.cps[0].files.empty();
-        };
         // One that cannot be read is not left out, but an error.
-        if (access(path.c_str(), R_OK) < 0 ||
-            std::any_of(tree.sets.begin(), tree.sets.end(), holds)) {
+        if (access(path.c_str(), R_OK) < 0 || kept.count(path) > 0) {
             files->push_back(path);
         }
     }
