@@ -121,6 +121,10 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
     EXPECT_EQ(cp["types"].dump(), R"([{"type":5,"sub_type":6,"count":1,"bytes":3,"rate":0},)"
                                   R"({"type":157,"sub_type":1,"count":1,"bytes":3,"rate":0}])");
     only(json["findings"], {{"code", "name"}, {"path", CARD_TEXT}});
+    // Another handset changes nothing.
+    write("other/data/modem_log/2016-03-01-09-13-00/cp_wcdma/cp_wcdma.version", "baseband 9");
+    const Json both = report("handset other", 3);
+    EXPECT_EQ(both["timeline"], json["timeline"]);
     // A copy that has its own times does not tell how long the newest file lasts.
     const std::string wcn = DAY + "../cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log";
     write(wcn, "");

@@ -124,10 +124,13 @@ LogTime CardReport::last_byte(const FilePlace& place) {
     const LogTime written = place.cp->own_times ? local_time(log.modified) : log.end.time();
     const bool newest = log.name.number == 0;
     const LogTime last = written < start || log.end.time() < written ? log.end.time() : written;
-    // A set ends where the next begins.
-    const auto next =
+    // A set ends where the handset's next begins.
+    const auto later =
         std::upper_bound(m_tree.sets.begin(), m_tree.sets.end(), start,
                          [](const LogTime& time, const TreeSet& set) { return time < set.time; });
+    const auto next = std::find_if(later, m_tree.sets.end(), [&place](const TreeSet& set) {
+        return set.handset == place.set->handset;
+    });
     return newest && next != m_tree.sets.end() ? std::min(last, next->time) : last;
 }
 
@@ -171,7 +174,7 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
     if (type == LT_LOG) {
         add_log(place, report, &cp);
     } else if (type == LT_VERSION) {
-        add_version(place, &cp);
+        add_version(place);
     } else if (type == LT_RINGBUF || type == LT_SLEEP_LOG || type == LT_WCDMA_IQ) {
         TimelineItem item;
         item.from = item.to = file.name.time();
@@ -203,7 +206,7 @@ void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum
     item.set = place.set;
     item.name = log.name.text();
     m_timeline.add(place.cp->name, TK_LOG, item);
-    add_gaps(place, item.to, cp);
+    add_gaps(place, item.to);
 
     ++cp->logs;
     cp->log_size += log.size;
@@ -219,12 +222,13 @@ void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum
     cp->missing += log.missing;
 }
 
-void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) {
+void CardReport::add_gaps(const FilePlace& place, const LogTime& to) {
+    Last& last = last_of(place);
     const TreeFile& log = *place.file;
     TimelineItem gap;
     gap.set = place.set;
     LogTime first = log.name.time();
-    if (m_options.whole && cp->last_set != place.set && !place.set->name.empty() &&
+    if (m_options.whole && last.set != place.set && !place.set->name.empty() &&
         seconds_between(place.set->time, first) > PAUSE_SECONDS) {
         gap.from = place.set->time;
         gap.to = first;
@@ -232,8 +236,8 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) 
         m_timeline.add(place.cp->name, TK_TRIMMED, gap);
         first = place.set->time;
     }
-    if (seconds_between(cp->last_byte, first) > PAUSE_SECONDS) {
-        gap.from = cp->last_byte;
+    if (seconds_between(last.byte, first) > PAUSE_SECONDS) {
+        gap.from = last.byte;
         gap.to = first;
         gap.words = "nothing was logged";
         m_timeline.add(place.cp->name, TK_SILENCE, gap);
@@ -244,22 +248,23 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp) 
         gap.words = missing_text(log);
         m_timeline.add(place.cp->name, TK_MISSING, gap);
     }
-    cp->last_set = place.set;
-    cp->last_byte = std::max(cp->last_byte, log.missing ? log.end.time() : to);
+    last.set = place.set;
+    last.byte = std::max(last.byte, log.missing ? log.end.time() : to);
 }
 
-void CardReport::add_version(const FilePlace& place, CpSum* cp) {
+void CardReport::add_version(const FilePlace& place) {
+    Last& last = last_of(place);
     int ignored;  // the check has told it
     const std::string version = read_version(place.file->path(), &ignored);
-    const bool changed = !cp->version.empty() && cp->version != version;
+    const bool changed = !last.version.empty() && last.version != version;
     if (changed) {
         TimelineItem item;
         item.from = item.to = place.set->time;
         item.set = place.set;
-        item.words = cp->version + " -> " + version;
+        item.words = last.version + " -> " + version;
         m_timeline.add(place.cp->name, TK_FIRMWARE, item);
     }
-    cp->version = version;
+    last.version = version;
     add_row("versions", MAX_ROWS,
             {{"cp", json_text(place.cp->name)},
              {"set", json_text(place.set->name)},

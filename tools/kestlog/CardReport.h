@@ -56,9 +56,12 @@ private:
         uint64_t sequence_gaps = 0, missing = 0;
         uint64_t damages = 0, notes = 0;
         std::map<int, TypeSum> types;  // by type * 256 + sub-type
-        std::string version;           // the last
-        LogTime last_byte;             // of the last log file
-        const TreeSet* last_set = nullptr;
+    };
+    // What was the last of a CP of one handset.
+    struct Last {
+        std::string version;
+        LogTime byte;                  // of its last log file
+        const TreeSet* set = nullptr;  // of that
     };
     struct SetSum {
         uint64_t files = 0, size = 0, damages = 0;
@@ -72,8 +75,9 @@ private:
 
     LogTime last_byte(const FilePlace& log);
     void add_log(const FilePlace& place, const FileReport& report, CpSum* cp);
-    void add_gaps(const FilePlace& place, const LogTime& to, CpSum* cp);
-    void add_version(const FilePlace& place, CpSum* cp);
+    void add_gaps(const FilePlace& place, const LogTime& to);
+    void add_version(const FilePlace& place);
+    Last& last_of(const FilePlace& place) { return m_last[{place.set->handset, place.cp->name}]; }
     void add_database(const TreeFile& file);
     void add_spectrum(const FilePlace& place);
     void add_crashes();
@@ -89,6 +93,7 @@ private:
     Json m_json;
     Timeline m_timeline;
     std::map<std::string, CpSum> m_cps;
+    std::map<std::pair<size_t, std::string>, Last> m_last;  // by handset and CP
     std::map<const TreeSet*, SetSum> m_sets;
     std::vector<std::pair<FilePlace, Waveform>> m_waveforms;
     std::vector<Crash> m_dsp_crashes;

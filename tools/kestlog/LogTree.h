@@ -68,6 +68,7 @@ struct TreeSet {
     std::string medium;  // for humans: "internal", "card" or what the ROOT is called
     LogTime time;        // of its name or, without one, of its first file
     std::vector<TreeCp> cps;
+    size_t handset = 0;  // each ROOT is taken for another one
 };
 
 // A time of the file system, in this machine's zone.

@@ -83,19 +83,19 @@ int times_fit(const TreeCp& cp, const TreeFile* newest) {
 // Gives the newest log files the end that their last write tells, where it can be believed.
 void find_ends(std::vector<TreeSet>* sets) {
     // Where a CP's files tell nothing, those of the other CPs on its medium do.
-    std::map<std::string, int> media;
+    std::map<std::pair<size_t, std::string>, int> media;
     std::vector<int> fits;
     for (TreeSet& set : *sets) {
         for (TreeCp& cp : set.cps) {
             fits.push_back(times_fit(cp, newest_log(&cp)));
-            media[set.medium] += fits.back();
+            media[{set.handset, set.medium}] += fits.back();
         }
     }
     auto fit = fits.begin();
     for (TreeSet& set : *sets) {
         for (TreeCp& cp : set.cps) {
             TreeFile* const newest = newest_log(&cp);
-            cp.own_times = (*fit ? *fit : media[set.medium]) >= 0;
+            cp.own_times = (*fit ? *fit : media[{set.handset, set.medium}]) >= 0;
             ++fit;
             if (newest && cp.own_times) {
                 newest->end =

@@ -156,14 +156,20 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
         return false;
     }
     bool any = false;
+    size_t handset = 0;
     for (const std::string& root : roots) {
         const size_t told = tree->failures.size();
+        const size_t before = tree->sets.size();
         if (tree->add(root, files)) {
             any = true;
         } else if (tree->failures.size() == told) {
             tree->failures.push_back(
                 root + (root == "-" ? ": no archive of a log tree" : ": not a log tree"));
         }
+        for (size_t i = before; i < tree->sets.size(); ++i) {
+            tree->sets[i].handset = handset;
+        }
+        ++handset;
     }
     tree->finish();
     if (!cut_tree(line, tree, status)) {
