@@ -97,7 +97,8 @@ public:
     // when everything has been added.
     void finish();
     // Leaves out the files that ended before since or began after until. A time that is not set
-    // does not count; nor does a file without a time. Sets and CPs stay.
+    // does not count; nor does a file without a time. CPs that lose all but their version go, too,
+    // and sets without a CP.
     void cut(const LogTime& since, const LogTime& until);
     // The newest time in the tree: of a name or of the end of a log file.
     LogTime newest() const;

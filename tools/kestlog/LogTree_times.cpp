@@ -139,16 +139,27 @@ void LogTree::finish() {
 }
 
 void LogTree::cut(const LogTime& since, const LogTime& until) {
+    if (!has_time(since) && !has_time(until)) {
+        return;
+    }
     const auto outside = [&](const TreeFile& file) {
         return has_time(file.name.time()) && ((has_time(since) && file.end.time() < since) ||
                                               (has_time(until) && until < file.name.time()));
     };
+    const auto is_version = [](const TreeFile& file) { return file.name.type == LT_VERSION; };
     for (TreeSet& set : sets) {
-        for (TreeCp& cp : set.cps) {
-            cp.files.erase(std::remove_if(cp.files.begin(), cp.files.end(), outside),
-                           cp.files.end());
+        for (auto cp = set.cps.begin(); cp != set.cps.end();) {
+            std::vector<TreeFile>& files = cp->files;
+            const auto end = std::remove_if(files.begin(), files.end(), outside);
+            const bool less = end != files.end();
+            files.erase(end, files.end());
+            const bool lost = less && std::all_of(files.begin(), files.end(), is_version);
+            cp = lost ? set.cps.erase(cp) : cp + 1;
         }
     }
+    sets.erase(std::remove_if(sets.begin(), sets.end(),
+                              [](const TreeSet& set) { return set.cps.empty(); }),
+               sets.end());
 }
 
 LogTime LogTree::newest() const {
