@@ -55,9 +55,14 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
         {"--card usb.tar handset", {"card", "internal"}, "4 files"},
         {"handset usb", {"card", "internal", "usb"}, "5 files"},
         {"handset/data handset handset/data/modem_log", {"handset card", "data"}, "4 files"},
-        {"handset --since 09:15:01", {"card", "internal"}, "2 files"},
-        {"handset --since 09:15 --until '2016-03-01 09:16'", {"card", "internal"}, "3 files"},
+        {"handset --since 2016-03-01_09-15-01", {"card", "internal"}, "2 files"},
+        {"handset --since 2016-03-01T09:15 --until '2016-03-01 09:16'",
+         {"card", "internal"},
+         "3 files"},
         {"handset --until 2016-02-29", {"card"}, "1 files"},
+        {"handset --since 2016-03-01-09-15-00 --until 2016-03-01T09:15:00",
+         {"card", "internal"},
+         "3 files"},
         {"handset --since -10m --until -5m", {"card", "internal"}, "3 files"},
     };
     ASSERT_EQ(run("--version; tar cf usb.tar usb"), 0);
@@ -75,6 +80,7 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
     EXPECT_EQ(run("verify handset handset/data/" + MODEM + " nowhere"), 2);
     EXPECT_TRUE(said("4 files"));
     EXPECT_EQ(run("ls --since noon handset"), 1);
+    EXPECT_EQ(run("ls --until 2015-02-29 handset"), 1);
 }
 
 TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {

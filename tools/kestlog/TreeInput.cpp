@@ -30,6 +30,10 @@ struct TimeForm {
 constexpr TimeForm FORMS[] = {
     {"%Y-%m-%d %H:%M:%S", true,  0},
     {"%Y-%m-%d %H:%M",    true,  59},
+    {"%Y-%m-%dT%H:%M:%S", true,  0},
+    {"%Y-%m-%dT%H:%M",    true,  59},
+    {"%Y-%m-%d_%H-%M-%S", true,  0},   // as in the name of a file
+    {"%Y-%m-%d-%H-%M-%S", true,  0},   // as that of a set
     {"%Y-%m-%d",          true,  24 * 60 * 60 - 1},
     {"%H:%M:%S",          false, 0},
     {"%H:%M",             false, 59},
@@ -131,6 +135,14 @@ bool parse_time(const std::string& text, const LogTime& newest, bool end, LogTim
             t.tm_year = newest.year - 1900;
             t.tm_mon = newest.month - 1;
             t.tm_mday = newest.day;
+        }
+        struct tm day = {};
+        day.tm_year = t.tm_year;
+        day.tm_mon = t.tm_mon;
+        day.tm_mday = t.tm_mday;
+        timegm(&day);
+        if (form.day && day.tm_mday != t.tm_mday) {
+            return false;  // 30 February
         }
         *time = time_of(timegm(&t) + (end ? form.rest : 0));
         return true;

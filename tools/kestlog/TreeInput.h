@@ -22,8 +22,9 @@ bool select_files(const CommandLine& line, Args* files, int* status);
 // Prints the failures of the tree; ES_OK without one, else ES_UNREADABLE.
 int tell_failures(const LogTree& tree);
 
-// T of --since and --until: "2016-03-01 09:15:00", "2016-03-01" (whose end counts when end is
-// set), "09:15" on the day of newest, or "-10m", "-2h" before newest. False when it is none.
+// T of --since and --until: "2016-03-01 09:15:00", also with a "T" or as it stands in the names
+// of files and sets, "2016-03-01" (whose end counts when end is set), "09:15" on the day of newest,
+// or "-10m", "-2h" before newest. False when it is none.
 bool parse_time(const std::string& text, const LogTime& newest, bool end, LogTime* time);
 
 // For differences: the seconds from 1970 on in the time's own zone.
