@@ -383,7 +383,8 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
     EXPECT_EQ(run("ls --tree data"), 0);
     EXPECT_EQ(m_out.find("data\n`-- 2"), 0u) << m_out;
     EXPECT_TRUE(said("\n    `-- cp_gnss\n        |-- 2-cp_gnss-2")) << m_out;
-    EXPECT_EQ(run("ls --json data"), 0);
+    EXPECT_EQ(run("ls --json data//"), 0);
+    EXPECT_TRUE(said("\"path\":\"data/modem_log/2")) << m_out;
     EXPECT_LT(m_out.find("\"kind\":\"log\",\"number\":2,"), m_out.find("\"number\":0,")) << m_out;
 }
 

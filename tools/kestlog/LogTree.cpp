@@ -137,7 +137,10 @@ bool LogTree::add(const std::string& path, Files files) {
     return add_as(base_name(path), path, files);
 }
 
-bool LogTree::add_as(const std::string& medium, const std::string& path, Files files) {
+bool LogTree::add_as(const std::string& medium, const std::string& given, Files files) {
+    // A slash at the end would be doubled in the paths below.
+    const size_t last = given.find_last_not_of('/');
+    const std::string path = last == std::string::npos ? given : given.substr(0, last + 1);
     struct stat st;
     m_medium = medium;
     if (path == "-" || (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode))) {

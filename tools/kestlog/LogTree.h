@@ -128,7 +128,7 @@ private:
     const TreeDir* tree_dir(const std::string& path);
     std::string shown(const std::string& path) const;
     bool first_visit(const std::string& path);
-    bool add_as(const std::string& medium, const std::string& path, Files files);
+    bool add_as(const std::string& medium, const std::string& given, Files files);
     bool add_archive(const std::string& path);
     bool add_media(const std::string& path);
     bool add_medium(const std::string& path, const std::string& name);
