@@ -14,6 +14,7 @@ using Json = nlohmann::ordered_json;
 
 const std::string HANDSET = "handset/data/";
 const std::string DAY = HANDSET + "modem_log/2016-03-01-08-00-00/cp_wcdma/";
+const std::string OTHER = "other/data/modem_log/";
 const std::string CARD = "handset/storage/sdcard0/modem_log/";
 // The name is text, wherever it is shown.
 const std::string HOSTILE = "<script>alert(1)<\xff";
@@ -82,6 +83,8 @@ protected:
         write(on_card + log_at(0, "09-31-00"), TIME_RECORD);
         write(on_card + "cp_wcdma.version", "baseband 2");
         write(CARD + HOSTILE + "/x", "x");
+        write(OTHER + "2016-03-01-09-13-00/cp_wcdma/cp_wcdma.version", "baseband 9");
+        write(OTHER + "1970-01-01-00-00-05/cp_wcdma/0-cp_wcdma-1970-01-01_00-00-06.log", "x");
     }
 };
 
@@ -121,10 +124,14 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
     EXPECT_EQ(cp["types"].dump(), R"([{"type":5,"sub_type":6,"count":1,"bytes":3,"rate":0},)"
                                   R"({"type":157,"sub_type":1,"count":1,"bytes":3,"rate":0}])");
     only(json["findings"], {{"code", "name"}, {"path", CARD_TEXT}});
-    // Another handset changes nothing.
-    write("other/data/modem_log/2016-03-01-09-13-00/cp_wcdma/cp_wcdma.version", "baseband 9");
+    // Another handset changes nothing, nor does its clock that was not set.
     const Json both = report("handset other", 3);
-    EXPECT_EQ(both["timeline"], json["timeline"]);
+    EXPECT_EQ(both["from"].dump() + both["to"].dump(), json["from"].dump() + json["to"].dump());
+    EXPECT_EQ(both["timeline"].size(), json["timeline"].size() + 1);
+    only(both["timeline"], {{"from", "1970-01-01 00:00:06"}, {"to", "1970-01-01 00:00:06"}});
+    for (const Json& item : json["timeline"]) {
+        only(both["timeline"], item);
+    }
     // A copy that has its own times does not tell how long the newest file lasts.
     const std::string wcn = DAY + "../cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log";
     write(wcn, "");
@@ -253,8 +260,8 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
         GTEST_SKIP() << "no chromium is installed: the page is not tried in a browser";
     }
     write_day();
-    const Json json = report("handset", 3);
-    run("report handset -o page.html");
+    const Json json = report("handset other", 3);
+    run("report handset other -o page.html");
     // Keys and wheel as a reader would use them, then what they show.
     write("page.html", m_root.read_file("page.html") + R"(<script>
         const chart = document.querySelector('#chart svg');
@@ -291,7 +298,8 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
         cells += "<td class=\"number\">" + grouped(json["cps"][0][key]) + "</td>";
     }
     EXPECT_NE(dom.find("<td class=\"cp\">cp_wcdma</td>" + cells), std::string::npos) << cells;
-    EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size());
+    EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size() - 1);
+    EXPECT_NE(dom.find("not set for 1 of 13 items and 1 of 4 sets"), std::string::npos);
     EXPECT_NE(dom.find(">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<"),
               std::string::npos);
     EXPECT_NE(dom.find("<p id=\"detail\" aria-live=\"polite\">cp_wcdma · nothing since the start"),

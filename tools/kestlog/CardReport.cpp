@@ -16,8 +16,11 @@ namespace {
 // went on; their times have a resolution of a second.
 constexpr int64_t PAUSE_SECONDS = 2;
 
+// 0 also where the clock was set in between.
 int64_t seconds_between(const LogTime& from, const LogTime& to) {
-    return has_time(from) && has_time(to) ? seconds_of(to) - seconds_of(from) : 0;
+    return has_time(from) && has_time(to) && clock_was_set(from) == clock_was_set(to)
+               ? seconds_of(to) - seconds_of(from)
+               : 0;
 }
 
 std::string base64(const std::vector<uint8_t>& bytes) {
@@ -131,7 +134,8 @@ LogTime CardReport::last_byte(const FilePlace& place) {
     const auto next = std::find_if(later, m_tree.sets.end(), [&place](const TreeSet& set) {
         return set.handset == place.set->handset;
     });
-    return newest && next != m_tree.sets.end() ? std::min(last, next->time) : last;
+    const LogTime end = newest && next != m_tree.sets.end() ? std::min(last, next->time) : last;
+    return clock_was_set(start) == clock_was_set(end) ? end : start;
 }
 
 void CardReport::find(const std::string& path, const Finding& finding) {
@@ -167,7 +171,7 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
     set.size += file.size;
     set.damages += m_file_damages;
     if (has_time(file.name.time())) {
-        set.from = has_time(set.from) ? std::min(set.from, file.name.time()) : file.name.time();
+        take_earlier(&set.from, file.name.time());
         set.to = std::max(set.to, file.name.is_log() ? last_byte(place) : file.name.time());
     }
     const LogType type = file.name.type;

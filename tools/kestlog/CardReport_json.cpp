@@ -54,9 +54,7 @@ void CardReport::write_totals() {
                  {"size", sum.size},
                  {"damages", sum.damages}});
         for (const LogTime& time : {m_options.whole ? set.time : LogTime(), sum.from}) {
-            if (has_time(time)) {
-                from = has_time(from) ? std::min(from, time) : time;
-            }
+            take_earlier(&from, time);
         }
         to = std::max({to, sum.to, from});
     }

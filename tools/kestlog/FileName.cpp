@@ -171,6 +171,18 @@ bool has_time(const LogTime& time) {
     return LogTime() < time;
 }
 
+bool clock_was_set(const LogTime& time) {
+    return time.year >= 2000;
+}
+
+void take_earlier(LogTime* first, const LogTime& time) {
+    const bool set = clock_was_set(time);
+    if (has_time(time) &&
+        (!has_time(*first) || (set == clock_was_set(*first) ? time < *first : set))) {
+        *first = time;
+    }
+}
+
 std::string time_text(const LogTime& time) {
     if (!in_calendar(time)) {
         return "-";

@@ -69,6 +69,11 @@ private:
 };
 
 bool has_time(const LogTime& time);
+// No handset is as old as what its clock shows before it is set.
+bool clock_was_set(const LogTime& time);
+// Makes *first the time if that is earlier. One of a clock that was not set counts only as long as
+// there is no other.
+void take_earlier(LogTime* first, const LogTime& time);
 // "2016-03-01 09:15:00", or "-" without a time.
 std::string time_text(const LogTime& time);
 

@@ -56,14 +56,21 @@ const lanes = data.cps.map((cp) => cp.cp);
 const media = [...new Set(data.sets.map((set) => set.medium))];
 const medium = (item) => 'm' + Math.max(0, media.indexOf(item.medium)) % 4;
 const rank = (item) => ORDER.includes(item.kind) ? ORDER.indexOf(item.kind) : ORDER.length;
-const items = data.timeline
+const timed = data.timeline
     .map((item) => ({...item, t0: seconds(item.from), t1: seconds(item.to),
         lane: lanes.indexOf(item.cp)}))
     .filter((item) => item.t0 >= 0 && item.lane >= 0)
-    .map((item) => ({...item, t1: item.t1 >= item.t0 ? item.t1 : item.t0}))
+    .map((item) => ({...item, t1: item.t1 >= item.t0 ? item.t1 : item.t0}));
+const timedSets = data.sets.filter((set) => seconds(set.time) >= 0);
+// What a clock that was not set has named is drawn only when there is nothing else.
+const SET_CLOCK = Date.UTC(2000, 0, 1) / 1000;
+const wasSet = (t) => t >= SET_CLOCK;
+const any = timed.some((item) => wasSet(item.t0)) ||
+    timedSets.some((set) => wasSet(seconds(set.time)));
+const sets = timedSets.filter((set) => !any || wasSet(seconds(set.time)));
+const items = timed.filter((item) => !any || wasSet(item.t0))
     .sort((a, b) => rank(a) - rank(b) || a.t0 - b.t0);
 const byTime = items.slice().sort((a, b) => a.t0 - b.t0);
-const sets = data.sets.filter((set) => seconds(set.time) >= 0);
 const best = Object.create(null);  // the highest rate of a lane
 for (const item of items) {
     best[item.cp] = Math.max(best[item.cp] || 1, item.kind === 'log' && item.rate || 0);
@@ -310,6 +317,13 @@ if (data.most_merged > 1) {
     byId('merged').hidden = false;
     byId('merged').textContent = 'There is too much to draw all of it: up to ' +
         number(data.most_merged) + ' neighbours are drawn as one. The tables count everything.';
+}
+if (items.length < timed.length || sets.length < timedSets.length) {
+    byId('unset').hidden = false;
+    byId('unset').textContent = 'The clock was not set for ' +
+        number(timed.length - items.length) + ' of ' + number(timed.length) + ' items and ' +
+        number(timedSets.length - sets.length) + ' of ' + number(timedSets.length) +
+        ' sets: their times lie before 2000, so they are not drawn. The tables count them.';
 }
 draw();
 
