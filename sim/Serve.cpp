@@ -15,6 +15,19 @@ const double STEP_S = 0.01;
 const uint8_t DSP_STREAM = 0xD0;
 const size_t DSP_PIECE = 16 << 10;
 
+// The text as one word of a shell.
+std::string shell_word(const std::string& text) {
+    if (text.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789"
+                               "/._-+:@%,") == std::string::npos) {
+        return text;
+    }
+    std::string word = "'";
+    for (const char c : text) {
+        word += c == '\'' ? std::string("'\\''") : std::string(1, c);
+    }
+    return word + "'";
+}
+
 }  // namespace
 
 Serve::Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
@@ -55,7 +68,8 @@ int Serve::run() {
 
 void Serve::show_place() {
     const SimHandset& handset = m_stage.handset();
-    const char* root = handset.root().c_str();
+    const std::string root = shell_word(handset.root());
+    const auto& medium = m_stage.logs().media()[handset.sd_inserted() ? 1 : 0];
     printf(
         "The control socket is ready: local stream socket, abstract, \"kestmodem@%s\".\n"
         "    KESTMODEM_ROOT=%s kestctl status\n"
@@ -63,7 +77,7 @@ void Serve::show_place() {
         "    kestlog ls %s\n"
         "The service's messages are in %s.\n"
         "Ctrl-C ends it.\n\n",
-        root, root, root, m_stage.logs().media()[handset.sd_inserted() ? 1 : 0].log_root.c_str(),
+        handset.root().c_str(), root.c_str(), root.c_str(), shell_word(medium.log_root).c_str(),
         handset.path("kestmodem.log").c_str());
     fflush(stdout);
 }

@@ -10,6 +10,7 @@ it writes when such a card is played again is read here once more, without the s
 import collections
 import os
 import re
+import shlex
 import shutil
 import subprocess
 import sys
@@ -135,6 +136,17 @@ def test_recorded_speed(temp):
     assert streams(log_root) == streams(card)
 
 
+def test_served_root_can_be_pasted(temp):
+    root = temp + "/a b'c"
+    served = subprocess.Popen([KESTSIM, "--serve", "--root", root], stdout=subprocess.PIPE, text=True)
+    try:
+        line = next(line for line in served.stdout if "kestctl status" in line)
+    finally:
+        served.terminate()
+        served.communicate()
+    assert shlex.split(line) == ["KESTMODEM_ROOT=" + root, "kestctl", "status"], line
+
+
 def test_interrupted_script(temp):
     ran = subprocess.Popen([PLAY, f"{RECORDINGS}/iq_save.in"], env={**os.environ, "TMPDIR": temp})
     while not os.listdir(temp):
@@ -150,7 +162,7 @@ def test_fast_keeps_what_is_given(temp):
     assert "; 100 KB/s from" in ran.stdout and " for 30 s;" in ran.stdout, ran.stdout
 
 
-for test in test_fast_keeps_what_is_given, test_interrupted_script, test_all_comes_back, test_bad_card, test_recorded_speed:
+for test in [value for name, value in list(globals().items()) if name.startswith("test_")]:
     with tempfile.TemporaryDirectory(prefix="kest-replay-") as directory:
         print("==", test.__name__)
         test(directory)
