@@ -3,6 +3,7 @@
 #include "sim/Serve.h"
 
 #include <stdio.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cmath>
@@ -14,6 +15,14 @@ using Diag = SimDiagResponder;
 const double STEP_S = 0.01;
 const uint8_t DSP_STREAM = 0xD0;
 const size_t DSP_PIECE = 16 << 10;
+// From the last of a dump to the word that the modem is alive: the service is to have read it.
+const double REVIVAL_S = 1;
+
+volatile sig_atomic_t s_crash_wanted;
+
+void on_crash_wanted(int) {
+    s_crash_wanted = 1;
+}
 
 // The text as one word of a shell.
 std::string shell_word(const std::string& text) {
@@ -37,6 +46,10 @@ Serve::Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupte
       m_dsp_stream(DSP_STREAM) {}
 
 int Serve::run() {
+    struct sigaction action = {};
+    action.sa_handler = on_crash_wanted;
+    action.sa_flags = SA_RESTART;
+    sigaction(SIGUSR1, &action, nullptr);
     const bool started = m_stage.set_up();
     if (started) {
         // The three places for clients are for others.
@@ -51,6 +64,7 @@ int Serve::run() {
         while (m_stage.wait(STEP_S)) {
             feed_audio_dsp();
             mind_wcn();
+            mind_modem();
         }
         m_stage.clear_line();
         if (!*m_interrupted) {
@@ -74,11 +88,12 @@ void Serve::show_place() {
         "The control socket is ready: local stream socket, abstract, \"kestmodem@%s\".\n"
         "    KESTMODEM_ROOT=%s kestctl status\n"
         "    KESTMODEM_ROOT=%s kestctl watch\n"
+        "    kill -USR1 %d    # the modem crashes\n"
         "    kestlog ls %s\n"
         "The service's messages are in %s.\n"
         "Ctrl-C ends it.\n\n",
-        handset.root().c_str(), root.c_str(), root.c_str(), shell_word(medium.log_root).c_str(),
-        handset.path("kestmodem.log").c_str());
+        handset.root().c_str(), root.c_str(), root.c_str(), static_cast<int>(getpid()),
+        shell_word(medium.log_root).c_str(), handset.path("kestmodem.log").c_str());
     fflush(stdout);
 }
 
@@ -103,4 +118,25 @@ void Serve::mind_wcn() {
     const Diag& diag = m_stage.wcn_diag();
     m_stage.wcn().running = diag.requests(Diag::RING_BUFFER) == diag.finished(Diag::RING_BUFFER) &&
                             diag.requests(Diag::SLEEP_LOG) == diag.finished(Diag::SLEEP_LOG);
+}
+
+// One crash at a time: its memory is asked for, then it is alive and logs again.
+void Serve::mind_modem() {
+    const unsigned dumps = m_stage.modem_diag().finished(Diag::DUMP);
+    if (m_crash == RUNS && s_crash_wanted && m_stage.modem_supervisor().connected()) {
+        s_crash_wanted = 0;
+        m_crash = DUMPS;
+        m_dumps = dumps;
+        m_stage.modem().running = false;
+        m_stage.say("the modem crashes");
+        m_stage.modem_supervisor().send("Modem Assert: simulated");
+    } else if (m_crash == DUMPS && dumps > m_dumps) {
+        m_crash = REVIVES;
+        m_alive_at = m_stage.now() + REVIVAL_S;
+    } else if (m_crash == REVIVES && m_stage.now() >= m_alive_at) {
+        m_crash = RUNS;
+        m_stage.say("the modem is alive");
+        m_stage.modem_supervisor().send("Modem Alive");
+        m_stage.modem().running = true;
+    }
 }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The simulated handset without scenes, for authors of control clients: the service runs in it,
 // the CPs log, answer requests for ring buffers and sleep logs, and that is all, until somebody
-// ends it. Says where the control socket is.
+// ends it; at SIGUSR1 the modem crashes. Says where the control socket is.
 #ifndef SIM_SERVE_H_
 #define SIM_SERVE_H_
 
@@ -24,12 +24,16 @@ private:
     void show_place();
     void feed_audio_dsp();
     void mind_wcn();
+    void mind_modem();
 
     const DemoOptions& m_options;
     const volatile sig_atomic_t* m_interrupted;
     DemoStage m_stage;
     const SimStream m_dsp_stream;
     uint64_t m_dsp_fed = 0;
+    enum { RUNS, DUMPS, REVIVES } m_crash = RUNS;
+    unsigned m_dumps = 0;  // before the crash
+    double m_alive_at = 0;
 };
 
 #endif  // SIM_SERVE_H_

@@ -8,6 +8,7 @@ Cards are made of what the service wrote while KESTSIM_PLAY played some of the R
 it writes when such a card is played again is read here once more, without the simulator's code.
 """
 import collections
+import glob
 import os
 import re
 import shlex
@@ -136,15 +137,19 @@ def test_recorded_speed(temp):
     assert streams(log_root) == streams(card)
 
 
-def test_served_root_can_be_pasted(temp):
+def test_served_for_clients(temp):
     root = temp + "/a b'c"
     served = subprocess.Popen([KESTSIM, "--serve", "--root", root], stdout=subprocess.PIPE, text=True)
     try:
-        line = next(line for line in served.stdout if "kestctl status" in line)
+        said = list(iter(served.stdout.readline, "Ctrl-C ends it.\n"))
+        assert shlex.split(said[2]) == ["KESTMODEM_ROOT=" + root, "kestctl", "status"], said
+        for _ in range(2):
+            subprocess.run(["sh", "-c", next(line for line in said if "kill" in line)], check=True)
+            assert any("is alive" in line for line in served.stdout)
     finally:
         served.terminate()
         served.communicate()
-    assert shlex.split(line) == ["KESTMODEM_ROOT=" + root, "kestctl", "status"], line
+    assert len(glob.glob(glob.escape(root) + "/data/modem_log/*/cp_wcdma/*.dmp")) == 2
 
 
 def test_interrupted_script(temp):
