@@ -17,6 +17,8 @@ const uint8_t DSP_STREAM = 0xD0;
 const size_t DSP_PIECE = 16 << 10;
 // From the last of a dump to the word that the modem is alive: the service is to have read it.
 const double REVIVAL_S = 1;
+// It is alive again after so long in any case: nobody asks for a dump while its log is off.
+const double MAX_CRASH_S = 10;
 
 volatile sig_atomic_t s_crash_wanted;
 
@@ -127,10 +129,11 @@ void Serve::mind_modem() {
         s_crash_wanted = 0;
         m_crash = DUMPS;
         m_dumps = dumps;
+        m_alive_at = m_stage.now() + MAX_CRASH_S;
         m_stage.modem().running = false;
         m_stage.say("the modem crashes");
         m_stage.modem_supervisor().send("Modem Assert: simulated");
-    } else if (m_crash == DUMPS && dumps > m_dumps) {
+    } else if (m_crash == DUMPS && (dumps > m_dumps || m_stage.now() >= m_alive_at)) {
         m_crash = REVIVES;
         m_alive_at = m_stage.now() + REVIVAL_S;
     } else if (m_crash == REVIVES && m_stage.now() >= m_alive_at) {
