@@ -12,6 +12,7 @@
 #include <fstream>
 #include <regex>
 
+#include "channels/DspChunkHeader.h"
 #include "sim/ServiceProcess.h"
 #include "sim/SimControlClient.h"
 #include "sim/SimDiagResponder.h"
@@ -224,6 +225,31 @@ TEST_F(KestlogFollowTreeTest, FilesOfOthersDamageAndLostDirectories) {
     EXPECT_TRUE(follow.says(event("damage", "a\\\\u001b\\[2J.*\"code\":\"name\"")));
     EXPECT_EQ(occurrences(follow.text(), "2-cp_wcn"), 1u) << follow.text();
     EXPECT_EQ(occurrences(follow.text(), "\"damage\":true"), 2u) << follow.text();
+}
+
+TEST_F(KestlogFollowTreeTest, ADumpInTheLogOfAnAudioDspIsTold) {
+    const std::string stem = DSP + "0-agdsp-2016-03-01_09-15-00.log";
+    const std::string full(DSP_CHUNK_MAX_DATA, 'd');
+    const std::string end = chunk(4, DUMP, "end");
+    m_root.write_file(stem, chunk(0, DUMP, "not new"));
+    Following follow({KESTLOG, "--json", "follow", m_root.path("modem_log")}, false);
+    EXPECT_TRUE(follow.says(event("ready", "\"files\":1")));
+    std::ofstream(m_root.path(stem), std::ios::app) << chunk(1, DUMP, full);
+    EXPECT_TRUE(follow.says(
+        event("crash", "\"cp\":\"agdsp\".*\"memory dump\",\"size\":0,\"state\":\"begins\"")));
+    // It goes on in the next file, whose last chunk is not whole at first.
+    follow.send(SIGSTOP);
+    rename(stem, DSP + "1-agdsp-2016-03-01_09-15-00.log");
+    std::ofstream next(m_root.path(DSP + "0-agdsp-2016-03-01_09-16-00.log"));
+    next << chunk(2, DUMP, full) << chunk(3, LOG, "in between") << end.substr(0, 21) << std::flush;
+    follow.send(SIGCONT);
+    EXPECT_TRUE(follow.says(event("rotation", "\"cp\":\"agdsp\"")));
+    next << end.substr(21) << std::flush;
+    EXPECT_TRUE(follow.says(
+        event("crash", "0-agdsp-2016-03-01_09-16-00.*\"size\":65499,\"state\":\"complete\"")));
+    follow.send(SIGINT);
+    EXPECT_EQ(follow.finish(), 0);
+    EXPECT_EQ(occurrences(follow.text(), "\"crash\""), 2u) << follow.text();
 }
 
 TEST_F(KestlogFollowTreeTest, TheKernelsLimits) {

@@ -19,8 +19,7 @@ DirWatches::~DirWatches() {
     }
 }
 
-bool DirWatches::open(bool sizes) {
-    m_sizes = sizes;
+bool DirWatches::open() {
     m_fd = inotify_init1(IN_NONBLOCK | IN_CLOEXEC);
     return m_fd >= 0;
 }
@@ -34,7 +33,7 @@ DirWatches::Result DirWatches::add(const std::string& path, Kind kind, const std
     if (kind != PLACE) {
         mask |= IN_CLOSE_WRITE;
     }
-    if (kind == FILES && m_sizes) {
+    if (kind == WRITES) {
         mask |= IN_MODIFY;
     }
     const int wd = inotify_add_watch(m_fd, path.c_str(), mask);

@@ -16,7 +16,8 @@ public:
     enum Kind {
         PLACE,  // where only directories of certain names count
         LOGS,   // a log root or a set: every directory in it counts
-        FILES   // a CP's directory
+        FILES,  // a CP's directory
+        WRITES  // one of which every write to a file is reported, too
     };
     struct Watch {
         std::string path;
@@ -31,8 +32,8 @@ public:
     DirWatches(const DirWatches&) = delete;
     DirWatches& operator=(const DirWatches&) = delete;
 
-    // With sizes every write to a file is reported. False, with errno, on failure.
-    bool open(bool sizes);
+    // False, with errno, on failure.
+    bool open();
     int fd() const { return m_fd; }
 
     void begin();
@@ -47,7 +48,6 @@ public:
 
 private:
     int m_fd = -1;
-    bool m_sizes = false;
     unsigned m_round = 0;
     std::map<int, Watch> m_watches;
 };

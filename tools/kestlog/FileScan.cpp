@@ -9,28 +9,12 @@
 #include <algorithm>
 
 #include "channels/DiagFrameParser.h"
-#include "channels/DspChunkHeader.h"
 #include "channels/ModemImage.h"
 #include "channels/modem_dump_end.h"
 #include "core/text.h"
 #include "kestlog/FrameIndex.h"
 
 const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
-
-namespace {
-
-// A dump whose last write is more recent than this may still be in progress.
-constexpr time_t DUMP_IDLE_SECONDS = 10;
-
-bool begins_with_magic(const uint8_t* data, size_t len) {
-    const uint32_t magic = TIME_SYNC_MAGIC;
-    return len > 0 && memcmp(data, &magic, std::min(len, sizeof(magic))) == 0;
-}
-
-// A modem's log should begin with a time record, and any log may.
-bool record_due(const FileName& name) {
-    return name.is_log() && name.of_modem();
-}
 
 int chunk_kind(const DspChunkHeader& header) {
     static const uint8_t TYPES[CK_NUM] = {DSP_CHUNK_LOG, DSP_CHUNK_PCM, DSP_CHUNK_DUMP};
@@ -42,7 +26,6 @@ int chunk_kind(const DspChunkHeader& header) {
     return -1;
 }
 
-// The wrong field of a chunk's header, or null; stores the length of the chunk's data.
 const char* chunk_fault(const DspChunkHeader& header, size_t* data_len) {
     const uint16_t least = make_dsp_chunk_header(0, 0, 0).len;
     *data_len = header.len >= least ? static_cast<size_t>(header.len - least) : 0;
@@ -66,6 +49,21 @@ const char* chunk_fault(const DspChunkHeader& header, size_t* data_len) {
         return "second length";
     }
     return header.type != good.type || chunk_kind(header) < 0 ? "type" : nullptr;
+}
+
+namespace {
+
+// A dump whose last write is more recent than this may still be in progress.
+constexpr time_t DUMP_IDLE_SECONDS = 10;
+
+bool begins_with_magic(const uint8_t* data, size_t len) {
+    const uint32_t magic = TIME_SYNC_MAGIC;
+    return len > 0 && memcmp(data, &magic, std::min(len, sizeof(magic))) == 0;
+}
+
+// A modem's log should begin with a time record, and any log may.
+bool record_due(const FileName& name) {
+    return name.is_log() && name.of_modem();
 }
 
 class Scanner {

@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "channels/DspChunkHeader.h"
 #include "channels/TimeSyncRecord.h"
 #include "kestlog/FileName.h"
 #include "kestlog/LogReader.h"
@@ -37,6 +38,10 @@ struct Piece {
 // Kinds of chunks, as indices.
 enum ChunkKind : int { CK_LOG, CK_PCM, CK_DUMP, CK_NUM };
 extern const char* const CHUNK_KINDS[CK_NUM];  // their names
+// Of a header; negative when it is none of them.
+int chunk_kind(const DspChunkHeader& header);
+// The wrong field of a chunk's header, or null; stores the length of the chunk's data.
+const char* chunk_fault(const DspChunkHeader& header, size_t* data_len);
 
 struct FileReport {
     bool chunked = false;  // an audio DSP log, else frames or anything

@@ -64,7 +64,7 @@ Follower::~Follower() {
 int Follower::run() {
     m_wake = s_wake = eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC);
     m_mounts = open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC);
-    if (m_wake < 0 || !m_watches.open(m_output.has_table())) {
+    if (m_wake < 0 || !m_watches.open()) {
         return failure(ES_UNREADABLE, std::string("cannot watch directories: ") + strerror(errno));
     }
     struct sigaction action = {};
@@ -174,7 +174,7 @@ void Follower::take_change(const inotify_event& event, const DirWatches::Watch* 
         return;
     }
     const std::string name = event.name;
-    LiveTree::Dir* const dir = watch->kind == DirWatches::FILES ? m_tree.dir(watch->path) : nullptr;
+    LiveTree::Dir* const dir = watch->kind >= DirWatches::FILES ? m_tree.dir(watch->path) : nullptr;
     m_reread |= watch->names.count(name) > 0;
     if (event.mask & IN_ISDIR) {
         m_reread |= watch->kind == DirWatches::LOGS;

@@ -96,7 +96,9 @@ void Follower::watch_tree(const LogTree& tree) {
         }
         watch(set.shown, DirWatches::LOGS);
         for (const TreeCp& cp : set.cps) {
-            watch(cp.shown, DirWatches::FILES);
+            // A crash of an audio DSP shows in its log alone.
+            const bool writes = m_output.has_table() || cp_type_of(cp.name) == CT_AGDSP;
+            watch(cp.shown, writes ? DirWatches::WRITES : DirWatches::FILES);
         }
     }
 }

@@ -8,6 +8,14 @@
 
 #include "common/text.h"
 
+namespace {
+
+bool is_dsp_log(const FileName& name) {
+    return name.is_log() && name.cp_type == CT_AGDSP;
+}
+
+}  // namespace
+
 LiveEvent LiveTree::ready() const {
     uint64_t files = 0;
     uint64_t size = 0;
@@ -49,7 +57,7 @@ void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
     }
     const File file = it->second;
     dir.files.erase(it);
-    for (std::set<Place>* places : {&m_closed, &m_written}) {
+    for (std::set<Place>* places : {&m_closed, &m_written, &m_grown}) {
         if (places->erase({&dir, from})) {
             places->insert({&dir, to});
         }
@@ -64,14 +72,19 @@ void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
     }
 }
 
+void LiveTree::forget(const Place& place) {
+    for (std::set<Place>* places : {&m_closed, &m_written, &m_grown}) {
+        places->erase(place);
+    }
+}
+
 void LiveTree::removed(Dir& dir, const std::string& name) {
     const auto it = dir.files.find(name);
     if (it != dir.files.end()) {
         ++dir.deleted;
         dir.deleted_size += it->second.size;
         dir.files.erase(it);
-        m_closed.erase({&dir, name});
-        m_written.erase({&dir, name});
+        forget({&dir, name});
     }
 }
 
@@ -80,6 +93,9 @@ void LiveTree::written(Dir& dir, const std::string& name) {
     if (it != dir.files.end()) {
         it->second.unchecked = true;
         m_written.insert({&dir, name});
+        if (is_dsp_log(FileName(name))) {
+            m_grown.insert({&dir, name});
+        }
     }
 }
 
@@ -98,20 +114,20 @@ void LiveTree::database_written(const std::string& root) {
 }
 
 void LiveTree::add(Dir& dir, const std::string& name, const File& file, bool tell) {
-    const auto [it, is_new] = dir.files.insert({name, file});
+    const bool is_new = dir.files.insert({name, file}).second;
     if (is_new && tell) {
-        it->second.unchecked = true;
-        m_written.insert({&dir, name});
+        written(dir, name);
         m_sums[cp_of(dir, name)].grown += file.size;
         tell_new(dir, FileName(name));
+    } else if (is_new && name.compare(0, 2, "0-") == 0 && is_dsp_log(FileName(name))) {
+        read_dumps(dir, FileName(name), false);  // what it holds is no news
     }
 }
 
 void LiveTree::tell_new(Dir& dir, const FileName& name) {
     const std::string shown = escape_text(name.text());
     if (name.type == LT_DUMP) {
-        tell("crash", dir, name, std::string(name.kind()) + " begins: " + shown,
-             {{"state", "begins"}});
+        tell_crash(dir, name, name.kind(), dir.files.at(name.text()).size, false);
         return;
     }
     if (name.is_crash() || !name.exact) {
@@ -158,6 +174,15 @@ void LiveTree::tell(const char* event, const Dir& dir, const FileName& name,
                       {"size", dir.files.at(name.text()).size}});
     told.json.update(more);
     m_tell(told);
+}
+
+void LiveTree::tell_crash(const Dir& dir, const FileName& name, const std::string& kind,
+                          uint64_t size, bool complete) {
+    const std::string shown = escape_text(name.text());
+    tell("crash", dir, name,
+         complete ? kind + " is complete: " + shown + ", " + size_text(size)
+                  : kind + " begins: " + shown,
+         {{"kind", kind}, {"size", size}, {"state", complete ? "complete" : "begins"}});
 }
 
 void LiveTree::tell_damage(const Dir& dir, const FileName& name, const Finding& finding) {

@@ -15,6 +15,7 @@
 #include <utility>
 #include <vector>
 
+#include "kestlog/DumpWatch.h"
 #include "kestlog/FileScan.h"
 #include "kestlog/LiveEvent.h"
 #include "kestlog/LogTree.h"
@@ -27,6 +28,7 @@ public:
         bool unchecked = false;         // written to since it was last checked
         bool seen = false;              // while the tree is taken
         uint64_t checked = UINT64_MAX;  // its size when it was checked after it was closed
+        uint64_t known = 0;             // an audio DSP's log: up to where its dumps are known
     };
     // A CP's directory. One that is gone is kept: a card that comes back is no news.
     struct Dir {
@@ -36,6 +38,7 @@ public:
         std::map<std::string, File> files;  // by name
         uint64_t deleted = 0;               // files, not yet told
         uint64_t deleted_size = 0;
+        DumpWatch dumps;
     };
     // Of all files of a CP.
     struct Sum {
@@ -66,8 +69,8 @@ public:
     void closed(Dir& dir, const std::string& name);  // after it was written to
     void database_written(const std::string& root);
 
-    // For when no more changes are known: checks the files that were closed and tells what was
-    // deleted.
+    // For when no more changes are known: tells dumps of an audio DSP, checks the files that were
+    // closed and tells what was deleted.
     void settle();
     // At the end: checks what was written to and is still open.
     void check_open();
@@ -86,11 +89,16 @@ private:
     void add(Dir& dir, const std::string& name, const File& file, bool tell);
     void tell_new(Dir& dir, const FileName& name);
     void tell_deleted(Dir& dir);
+    void tell_dumps();
+    bool read_dumps(Dir& dir, const FileName& name, bool tell);
     void tell(const char* event, const Dir& dir, const FileName& name, const std::string& words,
               const Json& more);
+    void tell_crash(const Dir& dir, const FileName& name, const std::string& kind, uint64_t size,
+                    bool complete);
     void tell_damage(const Dir& dir, const FileName& name, const Finding& finding);
     bool check(Dir& dir, const FileName& name, bool is_closed);
     void look(Dir& dir, const std::string& name);
+    void forget(const Place& place);
 
     const std::function<void(const LiveEvent&)> m_tell;
     const volatile sig_atomic_t& m_stop;
@@ -100,6 +108,7 @@ private:
     std::map<std::string, Dir> m_dirs;
     std::set<Place> m_closed;   // to be checked
     std::set<Place> m_written;  // to be looked at
+    std::set<Place> m_grown;    // to be looked into for dumps
     std::map<std::string, Sum> m_sums;
 };
 

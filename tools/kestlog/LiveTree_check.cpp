@@ -25,6 +25,7 @@ void judge_closed(const FileName& name, Finding* finding) {
 }  // namespace
 
 void LiveTree::settle() {
+    tell_dumps();
     for (auto it = m_closed.begin(); it != m_closed.end() && !m_stop;) {
         it = check(*it->first, FileName(it->second), true) ? m_closed.erase(it) : std::next(it);
     }
@@ -33,6 +34,33 @@ void LiveTree::settle() {
             tell_deleted(dir);
         }
     }
+}
+
+void LiveTree::tell_dumps() {
+    std::vector<Place> places(m_grown.begin(), m_grown.end());
+    std::stable_sort(places.begin(), places.end(), [](const Place& a, const Place& b) {
+        return FileName(a.second).number > FileName(b.second).number;  // oldest first
+    });
+    for (const Place& place : places) {
+        if (read_dumps(*place.first, FileName(place.second), true)) {
+            m_grown.erase(place);
+        }
+    }
+}
+
+// False when the file has another name already, which the next change tells.
+bool LiveTree::read_dumps(Dir& dir, const FileName& name, bool tell) {
+    LogReader in;
+    if (!in.open(dir.path + "/" + name.text(), false)) {
+        return errno != ENOENT;
+    }
+    const auto visit = [&](bool complete, uint64_t bytes) {
+        if (tell) {
+            tell_crash(dir, name, "memory dump", bytes, complete);
+        }
+    };
+    dir.dumps.read(in, &dir.files.at(name.text()).known, visit);
+    return true;
 }
 
 void LiveTree::check_open() {
@@ -88,10 +116,7 @@ bool LiveTree::check(Dir& dir, const FileName& name, bool is_closed) {
         file.checked = in.size();
     }
     if (name.is_crash() && is_closed && (!name.framed_dump || report.end_marker)) {
-        tell("crash", dir, name,
-             std::string(name.kind()) + " is complete: " + escape_text(name.text()) + ", " +
-                 size_text(file.size),
-             {{"state", "complete"}});
+        tell_crash(dir, name, name.kind(), file.size, true);
     }
     return true;
 }

@@ -100,8 +100,7 @@ void LiveTree::leave(const std::set<std::string>& sets, const std::set<std::stri
         if (dir.present && dirs.count(path) == 0) {
             dir.present = false;
             for (const auto& [name, file] : dir.files) {
-                m_closed.erase({&dir, name});
-                m_written.erase({&dir, name});
+                forget({&dir, name});
             }
         }
     }

@@ -50,6 +50,15 @@ bool LogReader::open(const std::string& path, bool follow) {
     return true;
 }
 
+bool LogReader::seek(uint64_t offset) {
+    if (m_piped || offset >= m_size || lseek(m_fd, static_cast<off_t>(offset), SEEK_SET) < 0) {
+        return false;
+    }
+    m_offset = offset;
+    m_left = m_size - offset;
+    return true;
+}
+
 void LogReader::drain() {
     for (size_t got; peek(1, got), got > 0;) {
         skip(got);

@@ -33,6 +33,8 @@ public:
 
     // Of the file or, of a pipe, what has been read so far.
     uint64_t size() const { return m_piped ? m_offset + (m_end - m_start) : m_size; }
+    // Goes on there, before anything was read. False, with nothing read, where the file has ended.
+    bool seek(uint64_t offset);
     // Skips all that is left.
     void drain();
     time_t modified() const { return m_modified; }
