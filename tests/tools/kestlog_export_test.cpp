@@ -109,6 +109,13 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
         EXPECT_TRUE(said(part)) << part << m_out;
     }
 
+    // The report counts the same ones.
+    EXPECT_EQ(run("report --json ."), 3);
+    EXPECT_TRUE(
+        said("\"frames\":4,\"chunks\":0,\"broken\":1,\"payload\":29,"
+             "\"other_bytes\":23,"))
+        << m_out;
+
     // Less, and more, of it.
     m_status = 0;
     EXPECT_EQ(fields("export . --cp CP_WCDMA --type 0x3b", "kestdiag.seq kestdiag.payload"),

@@ -143,6 +143,7 @@ private:
         uint64_t first_broken = 0;
         uint64_t framed = 0;
         const uint64_t start = m_in.offset();
+        m_report.tail = start;
         bool between = true;  // frames: the parser holds nothing
         for (size_t got; !m_stop;) {
             const uint8_t* data = m_in.peek(1, got);
@@ -153,6 +154,7 @@ private:
             if (used > 0) {
                 framed += used;
                 m_in.skip(used);
+                m_report.tail = m_in.offset();
                 continue;
             }
             uint8_t* body;
@@ -173,6 +175,7 @@ private:
                 --used;
             }
             m_in.skip(used);
+            m_report.tail = m_in.offset();
         }
         const uint64_t all = m_in.offset() - start;
         m_report.other += all - std::min(all, framed);

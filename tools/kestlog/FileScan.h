@@ -51,6 +51,7 @@ struct FileReport {
     uint64_t broken = 0;   // bytes between flags with another length in their header
     uint64_t payload = 0;  // of intact frames or chunks, without headers
     uint64_t other = 0;    // bytes outside intact frames and chunks
+    uint64_t tail = 0;     // where a frame may begin that ends in the next file
     bool end_marker = false;
     struct {
         uint64_t count = 0;

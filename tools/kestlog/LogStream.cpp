@@ -35,6 +35,12 @@ std::vector<const TreeFile*> logs_in_order(const TreeCp& cp) {
     return logs;
 }
 
+const TreeFile* next_log(const std::vector<const TreeFile*>& logs, size_t i) {
+    const bool goes_on =
+        i + 1 < logs.size() && logs[i]->name.number == logs[i + 1]->name.number + 1;
+    return goes_on ? logs[i + 1] : nullptr;
+}
+
 std::vector<LogStream> log_streams(const LogTree& tree) {
     std::map<std::string, std::vector<Place>> cps;
     for (const TreeSet& set : tree.sets) {

@@ -23,6 +23,8 @@ struct LogStream {
 
 // The log files of a directory by number, oldest first, whatever the clock said.
 std::vector<const TreeFile*> logs_in_order(const TreeCp& cp);
+// Of these the one that goes on where the i-th ends, or null.
+const TreeFile* next_log(const std::vector<const TreeFile*>& logs, size_t i);
 
 // The streams of all CPs that have log files, by name. The tree must stay as it is.
 std::vector<LogStream> log_streams(const LogTree& tree);

@@ -6,8 +6,9 @@
 #include <string.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "core/open_file.h"
-#include "kestlog/FileScan.h"
 
 namespace {
 
@@ -77,4 +78,23 @@ bool SplitFrame::join(const TreeFile& file, uint64_t from, uint64_t size, const 
     m_begin = from + used - m_parser.raw_size();
     m_head = used - tail;
     return m_header.len == m_len;
+}
+
+void SplitFrame::end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
+                          const PieceVisitor& visit, FileReport* report) {
+    const uint64_t start = (report->has_record ? sizeof(TimeSyncRecord) : 0) + m_head;
+    report->other -= std::min<uint64_t>(report->other, m_head);
+    m_head = 0;
+    if (!next || report->chunked || !join(file, std::max(report->tail, start), size, *next)) {
+        return;
+    }
+    const uint64_t raw = size - m_begin;
+    const size_t payload = m_len - sizeof(m_header);
+    ++report->frames;
+    report->payload += payload;
+    report->other -= std::min(report->other, raw);
+    if (visit) {
+        visit({m_begin, static_cast<size_t>(raw), m_header.seq_num, m_header.len, m_header.type,
+               m_header.sub_type, m_body + sizeof(m_header), payload, true, nullptr});
+    }
 }

@@ -10,6 +10,7 @@
 #include <string>
 
 #include "channels/DiagFrameParser.h"
+#include "kestlog/FileScan.h"
 #include "kestlog/LogTree.h"
 
 class SplitFrame {
@@ -17,6 +18,14 @@ public:
     // Whether the bytes of the file from that offset to its size, and what the next file begins
     // with, are an intact frame. Both are opened again for it.
     bool join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next);
+
+    // After a log file was scanned, oldest first: the frame that begins in it counts in its report
+    // and goes to the visitor, if any, as the last one; what ended the frame before does not count
+    // as bytes outside frames. next: where the log goes on, or null.
+    void end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
+                  const PieceVisitor& visit, FileReport* report);
+    // Instead, when the file could not be read.
+    void skip_file() { m_head = 0; }
 
     // Of the frame, until the next call: its header, and what was decoded, header included.
     const DiagHeader& header() const { return m_header; }

@@ -10,6 +10,7 @@
 #include "kestlog/ChunkSequence.h"
 #include "kestlog/LogStream.h"
 #include "kestlog/Report.h"
+#include "kestlog/SplitFrame.h"
 
 namespace {
 
@@ -38,16 +39,16 @@ public:
     }
 
 private:
-    // By time; but the numbers of chunks go on from log file to log file, whatever the clock said.
+    // What is in the log goes on from file to file, whatever the clock said.
     void look_at_all(const TreeSet& set, const TreeCp& cp) {
-        const bool chunked = cp_type_of(cp.name) == CT_AGDSP;
-        if (chunked) {
-            for (const TreeFile* log : logs_in_order(cp)) {
-                look({&set, &cp, log});
-            }
+        const std::vector<const TreeFile*> logs = logs_in_order(cp);
+        for (size_t i = 0; i < logs.size(); ++i) {
+            m_next = next_log(logs, i);
+            look({&set, &cp, logs[i]});
         }
-        for (const TreeFile& file : cp.files) {
-            if (!chunked || !file.name.is_log()) {
+        m_next = nullptr;
+        for (const TreeFile& file : cp.files) {  // by time
+            if (!file.name.is_log()) {
                 look({&set, &cp, &file});
             }
         }
@@ -113,6 +114,7 @@ private:
             } else {
                 m_visitor.unreadable(file.shown() + ": " + strerror(errno));
             }
+            m_split.skip_file();
             return;
         }
         if (file.name.is_log() && file.name.cp_type == CT_AGDSP) {
@@ -124,6 +126,7 @@ private:
             scan_file(in, file.name, take, FP_LENGTH, report);
         } else {
             scan_file(in, file.name, visit, FP_LENGTH, report);
+            m_split.end_file(file, in.size(), m_next, visit, report);
         }
         if (in.error()) {
             m_visitor.unreadable(file.shown() + ": " + strerror(in.error()));
@@ -141,6 +144,8 @@ private:
     const LogTree& m_tree;
     TreeVisitor& m_visitor;
     ChunkSequence m_sequence;
+    SplitFrame m_split;
+    const TreeFile* m_next = nullptr;  // the log file that goes on where the one in hand ends
 };
 
 }  // namespace

@@ -28,7 +28,6 @@
 namespace {
 
 constexpr int ANY = -1;
-constexpr uint64_t RECORD = sizeof(TimeSyncRecord);
 
 // What of a file goes to one file.
 struct Content {
@@ -94,11 +93,8 @@ public:
     // False when the output failed; *status is set then.
     bool extract(const TreeSet& set, const TreeCp& cp, int* status) {
         const std::vector<const TreeFile*> logs = logs_in_order(cp);
-        m_head = 0;
         for (size_t i = 0; i < logs.size(); ++i) {
-            const bool goes_on =
-                i + 1 < logs.size() && logs[i]->name.number == logs[i + 1]->name.number + 1;
-            m_next = goes_on ? logs[i + 1] : nullptr;
+            m_next = next_log(logs, i);
             if (!extract({&set, &cp, logs[i]}, status)) {
                 return false;
             }
@@ -222,11 +218,10 @@ private:
     bool scan(const StreamFile& place, bool named, int* status) {
         const TreeFile& file = *place.file;
         const std::string path = file.shown();
-        const size_t head = m_head;
-        m_head = 0;
         LogReader in;
         if (!in.open(file.path(), named)) {
             m_problems.unreadable(path, errno);
+            m_split.skip_file();
             return true;
         }
         std::deque<Part> parts;
@@ -238,7 +233,6 @@ private:
         FileReport report;
         const Part* failed = nullptr;
         End end;
-        uint64_t tail = 0;  // where a frame may begin that ends in the next file
         const auto take_all = [&](const Piece& piece) {
             for (Part& part : parts) {
                 failed = !failed && !take(file, piece, &part) ? &part : failed;
@@ -248,7 +242,6 @@ private:
         scan_file(
             in, file.name,
             [&](const Piece& piece) {
-                tail = piece.offset + piece.size - (piece.intact ? 0 : 1);
                 if (!file.name.is_log() && !piece.kind && is_end(piece)) {
                     end.seen = true;
                     end.counted += piece.intact ? 1 : 0;
@@ -257,11 +250,7 @@ private:
                 return piece.kind && !is_chosen() ? take_dump(file, piece) : take_all(piece);
             },
             FP_DATA, &report);
-        report.other -= std::min<uint64_t>(report.other, head);
-        if (m_next && !report.chunked && !failed) {
-            take_split(file, std::max(tail, (report.has_record ? RECORD : 0) + head), in.size(),
-                       take_all, &report);
-        }
+        m_split.end_file(file, in.size(), failed ? nullptr : m_next, take_all, &report);
         for (Part& part : parts) {
             failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
         }
@@ -276,22 +265,6 @@ private:
         }
         tell(path, report, in.error());
         return true;
-    }
-
-    // The frame that begins in the file and ends in the next.
-    void take_split(const TreeFile& file, uint64_t tail, uint64_t size, const PieceVisitor& take,
-                    FileReport* report) {
-        if (!m_split.join(file, tail, size, *m_next)) {
-            return;
-        }
-        const DiagHeader& header = m_split.header();
-        const uint64_t raw = size - m_split.begin();
-        m_head = m_split.head();
-        ++report->frames;
-        report->other -= std::min(report->other, raw);
-        take({m_split.begin(), static_cast<size_t>(raw), header.seq_num, header.len, header.type,
-              header.sub_type, m_split.body() + sizeof(header), m_split.len() - sizeof(header),
-              true, nullptr});
     }
 
     void tell(const std::string& path, const FileReport& report, int error) {
@@ -413,7 +386,6 @@ private:
     DspDumps m_dumps{[this](const DspDump& dump) { end_dump(dump); }};
     SplitFrame m_split;
     const TreeFile* m_next = nullptr;  // the log file that goes on where the one in hand ends
-    size_t m_head = 0;                 // bytes of it that have been taken with the one before
 };
 
 }  // namespace
