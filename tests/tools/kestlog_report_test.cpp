@@ -260,7 +260,10 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
         GTEST_SKIP() << "no chromium is installed: the page is not tried in a browser";
     }
     write_day();
+    const std::string dsp_log = "2016-03-01-09-13-00/agdsp/0-agdsp-2016-03-01_09-14-00.log";
+    write(OTHER + dsp_log, chunk(1, LOG, "one") + chunk(3, LOG, "three"));
     const Json json = report("handset other", 3);
+    only(json["timeline"], {{"cp", "agdsp"}, {"kind", "log"}, {"sequence_gaps", 1}});
     run("report handset other -o page.html");
     // Keys and wheel as a reader would use them, then what they show.
     write("page.html", m_root.read_file("page.html") + R"(<script>
@@ -295,11 +298,13 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
     for (const char* key :
          {"files", "size", "logs", "log_size", "seconds", "rate", "frames", "chunks", "broken",
           "payload", "other_bytes", "sequence_gaps", "missing", "damages", "notes"}) {
-        cells += "<td class=\"number\">" + grouped(json["cps"][0][key]) + "</td>";
+        cells += "<td class=\"number\">" + grouped(only(json["cps"], {{"cp", "cp_wcdma"}})[key]) +
+                 "</td>";
     }
     EXPECT_NE(dom.find("<td class=\"cp\">cp_wcdma</td>" + cells), std::string::npos) << cells;
     EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size() - 1);
-    EXPECT_NE(dom.find("not set for 1 of 13 items and 1 of 4 sets"), std::string::npos);
+    EXPECT_EQ(occurrences(dom, "class=\"lost\""), 2u);  // with the one of the legend
+    EXPECT_NE(dom.find("not set for 1 of 15 items and 1 of 4 sets"), std::string::npos);
     EXPECT_NE(dom.find(">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<"),
               std::string::npos);
     EXPECT_NE(dom.find("<p id=\"detail\" aria-live=\"polite\">cp_wcdma · nothing since the start"),

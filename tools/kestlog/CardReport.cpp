@@ -207,6 +207,7 @@ void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum
     item.size = log.size;
     item.seconds = static_cast<uint64_t>(std::max<int64_t>(0, seconds_between(item.from, item.to)));
     item.damages = m_file_damages;
+    item.sequence_gaps = report.sequence_gaps;
     item.set = place.set;
     item.name = log.name.text();
     m_timeline.add(place.cp->name, TK_LOG, item);

@@ -14,6 +14,7 @@ void TimelineItem::merge(const TimelineItem& next) {
     size += next.size;
     seconds += next.seconds;
     damages += next.damages;
+    sequence_gaps += next.sequence_gaps;
     items += next.items;
 }
 
@@ -67,6 +68,9 @@ Json Timeline::json() const {
                 object["name"] = json_text(item.name);
                 object["size"] = item.size;
                 object["damages"] = item.damages;
+            }
+            if (item.sequence_gaps) {
+                object["sequence_gaps"] = item.sequence_gaps;
             }
             if (item.seconds) {
                 object["rate"] = item.size / item.seconds;

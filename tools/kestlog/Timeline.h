@@ -29,6 +29,7 @@ struct TimelineItem {
     uint64_t size = 0;
     uint64_t seconds = 0;  // that the files last together
     uint64_t damages = 0;
+    uint64_t sequence_gaps = 0;
     const TreeSet* set = nullptr;
     std::string name;   // of the first file
     std::string words;  // of the first item

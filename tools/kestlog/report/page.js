@@ -52,6 +52,9 @@ const LETTERS = {'ring buffer': 'R', 'sleep log': 'S', 'I/Q samples': 'Q', firmw
 const NAMES = {log: 'log file', trimmed: 'nothing since the start of the set',
     silence: 'nothing was logged', missing: 'missing numbers', crash: 'crash',
     firmware: 'other firmware'};
+// Above and below a bar.
+const LINES = {damaged: {member: 'damages', text: 'damage'},
+    lost: {member: 'sequence_gaps', text: 'sequence gaps: chunks are lost'}};
 const lanes = data.cps.map((cp) => cp.cp);
 const media = [...new Set(data.sets.map((set) => set.medium))];
 const medium = (item) => 'm' + Math.max(0, media.indexOf(item.medium)) % 4;
@@ -105,6 +108,9 @@ function describe(item) {
     }
     if (item.damages) {
         parts.push(number(item.damages) + ' damages');
+    }
+    if (item.sequence_gaps) {
+        parts.push(number(item.sequence_gaps) + ' sequence gaps');
     }
     if (item.medium) {
         parts.push('on ' + item.medium + (item.set ? ', set ' + item.set : ''));
@@ -202,6 +208,10 @@ function draw() {
             if (item.damages) {
                 node(group, 'rect', {x: left, y: top - 4, width: Math.max(4, wide), height: 4,
                     class: 'damaged'});
+            }
+            if (item.sequence_gaps) {
+                node(group, 'rect', {x: left, y: top + BAR, width: Math.max(4, wide), height: 4,
+                    class: 'lost'});
             }
             if (wide > 70 && item.rate !== undefined) {
                 const from = Math.max(left, LABELS);
@@ -302,6 +312,8 @@ function legend(kind, text) {
     } else if (SPANS.includes(kind)) {
         node(picture, 'rect', {y: 2, width: 18, height: 14, class: kind,
             fill: 'url(#hatch-' + kind + ')'});
+    } else if (kind in LINES) {
+        node(picture, 'rect', {y: 7, width: 18, height: 4, class: kind});
     } else {
         symbol(picture, kind, 9, 9);
     }
@@ -311,6 +323,11 @@ media.slice(0, 4).forEach((name, i) => legend('m' + i, 'log on ' + name));
 for (const kind of SPANS.concat(['crash'], Object.keys(LETTERS))) {
     if (items.some((item) => item.kind === kind)) {
         legend(kind, NAMES[kind] || kind);
+    }
+}
+for (const kind in LINES) {
+    if (items.some((item) => item.kind === 'log' && item[LINES[kind].member])) {
+        legend(kind, LINES[kind].text);
     }
 }
 if (data.most_merged > 1) {
