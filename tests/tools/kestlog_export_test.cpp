@@ -125,6 +125,14 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
                      "kestdiag.seq frame.interface_name kestdiag.length kestdiag.payload_len "
                      "kestdiag.bad_length"),
               "7|cp_wcdma|8|0|\n8|cp_wcdma|99|8|1\n");
+    // FILEs of one log are one, each once; what was not given is not missing.
+    EXPECT_EQ(fields("export " + MODEM_LOG + " " + OLD_MODEM_LOG + " " + MODEM_LOG,
+                     "frame.interface_id kestdiag.seq"),
+              "0|1\n0|2\n0|3\n0|7\n");
+    m_status = 3;
+    EXPECT_EQ(fields("export " + OLD_DSP_LOG, "kestdiag.seq frame.comment"),
+              "7|1-agdsp-2016-03-01_09-00-00.log: time of its name\n"
+              "9|20 bytes before this packet are in no intact chunk\n");
     EXPECT_EQ(run("export --json --type 0x3a . -o new.pcapng"), 3);
     EXPECT_TRUE(
         said("{\"file\":\"new.pcapng\",\"interfaces\":2,\"files\":4,\"left_out\":2,"

@@ -81,7 +81,7 @@ void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
                     continue;
                 }
                 const ExportSource source = {&set, &dir, &file, ShortTime(file.name.time())};
-                if (has_frames(file, source.given())) {
+                if (has_frames(file, set.given)) {
                     sources.push_back(source);
                 } else {
                     ++left_out;

@@ -19,9 +19,6 @@ struct ExportSource {
     uint32_t interface = 0;          // in ExportPlan::interfaces
     uint32_t queue = 0;              // on it: 0 is the log, and each other file has its own
     const TreeFile* next = nullptr;  // the log file that goes on where this one ends
-
-    // By its own path, not found in a directory.
-    bool given() const { return set->shown == file->shown(); }
 };
 
 // A CP in a set.

@@ -27,7 +27,7 @@ int FrameExporter::add(const ExportSource& source) {
     m_source = &source;
     m_report = &report;
     m_begun = m_any = m_named = false;
-    if (!in.open(source.file->path(), source.given())) {
+    if (!in.open(source.file->path(), source.set->given)) {
         const int error = errno;
         lost(error);
         return failure(ES_UNREADABLE, shown + ": " + strerror(error));
@@ -43,7 +43,7 @@ int FrameExporter::add(const ExportSource& source) {
     }
     tell_damage(shown, report);
     const int status = scan_status(in, shown, report);
-    if (status == ES_OK && source.given() && !source.file->name.exact && !report.chunked &&
+    if (status == ES_OK && source.set->given && !source.file->name.exact && !report.chunked &&
         report.frames == 0 && !(m_wanted.broken && report.broken > 0)) {
         return failure(ES_UNREADABLE, shown + ": no frames or chunks in it");
     }

@@ -165,10 +165,24 @@ void LogTree::add_file(const std::string& path) {
     const size_t slash = path.rfind('/') + 1;
     const std::string dir = path.substr(0, slash);
     const FileName name(path.substr(slash));
-    m_dirs.push_back({dir, dir, m_medium});
-    sets.push_back({"", path, m_medium, {}, {{name.cp(), path, {}}}});
-    sets.back().cps[0].files.push_back(
-        {name, &m_dirs.back(), static_cast<uint64_t>(st.st_size), modified_time(st)});
+    if (!m_given_files.insert(path).second) {
+        return;
+    }
+    const auto known =
+        name.exact ? m_given.insert({{dir, name.cp()}, sets.size()}).first : m_given.end();
+    const size_t index = known == m_given.end() ? sets.size() : known->second;
+    if (index == sets.size()) {
+        m_dirs.push_back({dir, dir, m_medium});
+        sets.push_back({"", path, m_medium, {}, {{name.cp(), path, {}}}});
+        sets.back().given = true;
+    }
+    TreeCp& cp = sets[index].cps[0];
+    const TreeDir* const in = cp.files.empty() ? &m_dirs.back() : cp.files[0].dir;
+    if (!cp.files.empty()) {
+        sets[index].shown = cp.shown =
+            dir.empty() ? "." : dir.substr(0, std::max<size_t>(slash - 1, 1));
+    }
+    cp.files.push_back({name, in, static_cast<uint64_t>(st.st_size), modified_time(st)});
 }
 
 bool LogTree::add_archive(const std::string& path) {

@@ -11,6 +11,7 @@
 
 #include <deque>
 #include <functional>
+#include <map>
 #include <memory>
 #include <set>
 #include <string>
@@ -69,6 +70,7 @@ struct TreeSet {
     LogTime time;        // of its name or, without one, of its first file
     std::vector<TreeCp> cps;
     size_t handset = 0;  // each ROOT is taken for another one
+    bool given = false;  // by the paths of its files, which may be links or pipes
 };
 
 // A time of the file system, in this machine's zone.
@@ -86,7 +88,9 @@ public:
     // with FILES_TOO also a single file of any name, or standard input. False when it is not one of
     // them or not there. What cannot be read goes to failures. Nothing is added twice.
     bool add(const std::string& path, Files files = DIRECTORIES_ONLY);
-    // Adds a single file of any name, as a set of its own; it need not be there.
+    // Adds a single file of any name; it need not be there. Those of one CP in one directory are a
+    // set, in which only what lies between two of them is missing; any other file is one of its
+    // own.
     void add_file(const std::string& path);
     // Adds what is a ROOT as the card, before any other. With it a handset's root does not take
     // the card that it has itself. False also when it is not there.
@@ -141,6 +145,8 @@ private:
     std::string m_medium;                         // of what is being added
     std::pair<std::string, std::string> m_alias;  // the prefix of paths, and what is shown for it
     std::set<std::pair<dev_t, ino_t>> m_visited;
+    std::map<std::pair<std::string, std::string>, size_t> m_given;  // sets, by directory and CP
+    std::set<std::string> m_given_files;
     bool m_card_given = false;
     size_t m_roots = 0;
     size_t m_archives = 0;

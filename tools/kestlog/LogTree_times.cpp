@@ -17,7 +17,7 @@ bool older(const TreeFile& a, const TreeFile& b) {
 }
 
 // The newest log file has number 0, and each older one the next number.
-void find_missing(std::vector<TreeFile>* files) {
+void find_missing(std::vector<TreeFile>* files, bool given) {
     std::vector<TreeFile*> logs;
     for (TreeFile& file : *files) {
         file.end = ShortTime(file.name.time());
@@ -30,7 +30,7 @@ void find_missing(std::vector<TreeFile>* files) {
     std::stable_sort(logs.begin(), logs.end(), [](const TreeFile* a, const TreeFile* b) {
         return a->name.number < b->name.number;
     });
-    uint32_t due = 0;
+    uint32_t due = given && !logs.empty() ? logs[0]->name.number : 0;
     const TreeFile* newer = nullptr;
     for (TreeFile* log : logs) {
         const uint32_t number = log->name.number;
@@ -124,7 +124,7 @@ void LogTree::finish() {
         LogTime first;
         for (TreeCp& cp : set.cps) {
             std::sort(cp.files.begin(), cp.files.end(), older);
-            find_missing(&cp.files);
+            find_missing(&cp.files, set.given);
             for (const TreeFile& file : cp.files) {
                 if (has_time(file.name.time())) {
                     first = has_time(first) ? std::min(first, file.name.time()) : file.name.time();

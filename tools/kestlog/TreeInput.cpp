@@ -8,9 +8,7 @@
 #include <time.h>
 #include <unistd.h>
 
-#include <map>
 #include <set>
-#include <utility>
 
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
@@ -79,25 +77,6 @@ bool cut_tree(const CommandLine& line, LogTree* tree, int* status) {
     }
     tree->cut(since, until);
     return true;
-}
-
-// The FILEs of a CP in one directory are one set, as in a tree: each lasts until the next begins.
-void add_files(const Args& paths, LogTree* tree) {
-    std::map<std::pair<std::string, std::string>, size_t> sets;  // by directory and CP
-    std::set<std::string> added;
-    for (const std::string& path : paths) {
-        if (!added.insert(path).second) {
-            continue;
-        }
-        tree->add_file(path);
-        const TreeCp& cp = tree->sets.back().cps[0];
-        const auto [set, is_new] =
-            sets.insert({{cp.files[0].dir->path, cp.name}, tree->sets.size() - 1});
-        if (!is_new) {
-            tree->sets[set->second].cps[0].files.push_back(cp.files[0]);
-            tree->sets.pop_back();
-        }
-    }
 }
 
 }  // namespace
@@ -195,7 +174,9 @@ bool open_tree(const CommandLine& line, const Args& roots, LogTree* tree, int* s
 
 bool select_files(const CommandLine& line, Args* files, int* status) {
     LogTree tree;
-    add_files(line.params(), &tree);
+    for (const std::string& path : line.params()) {
+        tree.add_file(path);
+    }
     tree.finish();
     if (!cut_tree(line, &tree, status)) {
         return false;

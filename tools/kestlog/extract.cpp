@@ -115,7 +115,7 @@ private:
 
     bool extract(const StreamFile& place, int* status) {
         const TreeFile& file = *place.file;
-        const bool named = file.shown() == place.cp->shown;
+        const bool named = place.set->given;
         if (is_plain(file.name) && !is_chosen()) {
             return copy(file, named ? Links::FOLLOW : Links::REFUSE, status);
         }

@@ -44,7 +44,7 @@ constexpr Command COMMANDS[] = {
     {"join",   "ROOT...", 1, ANY, run_join,   "write a CP's log as one stream, oldest first"},
     {"extract", "FILE|ROOT...", 1, ANY, run_extract, "write memory images, ring buffers or the payloads of a type to files"},
     {"split",  "FILE...", 1, ANY, run_split,  "write the log, PCM and dump data of an audio DSP log to files"},
-    {"export", "ROOT...|FILE", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
+    {"export", "FILE|ROOT...", 1, ANY, run_export, "write a capture (pcapng) for Wireshark"},
 #ifdef KEST_WAV
     {"wav",    "FILE|ROOT...", 1, ANY, run_wav, "write the PCM data of an audio DSP log to a WAV file"},
 #endif

@@ -75,15 +75,13 @@ std::vector<Input> choose_files(const LogTree& tree, const std::vector<LogStream
         }
         const std::vector<PlannedFile> plan = plan_stream(stream);
         for (size_t i = 0; i < plan.size(); ++i) {
-            const bool named = stream.files[i].set->shown == plan[i].file->shown();
-            inputs.push_back({plan[i], named});
+            inputs.push_back({plan[i], stream.files[i].set->given});
         }
     }
     for (const TreeSet& set : tree.sets) {
         for (const TreeCp& cp : set.cps) {
             for (const TreeFile& file : cp.files) {
-                const bool named = set.shown == file.shown();
-                if (named && (!file.name.is_log() || file.name.cp_type != CT_AGDSP)) {
+                if (set.given && (!file.name.is_log() || file.name.cp_type != CT_AGDSP)) {
                     inputs.push_back({{&file, false, false, {}}, true});
                 }
             }
