@@ -119,6 +119,8 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
         {"cp_wcn", {in(0, "09-00-00", "ab"), copied("ab")}, "", 3, "ab", "damage: a copy of "},
         {"cp_wcn", {in(0, "09-00-00", "ab"), copied("xyz")},
          "", 3, "abxyz", "damage: started at the same second as "},
+        {"cp_wcn", {in(0, "09-00-00", "a"), {"copy/modem_log/2016-03-01-09-30-00/", 0, "09-30-00", "b"}},
+         "", 0, "ab", "09-30-00.log: note: from another ROOT than the one before\n"},
         {"cp_wcdma", {in(0, "09-00-00", TIME_RECORD.substr(0, 15))},
          "", 3, "", "damage: the time record is cut off (at byte 0)\n"},
         {"agdsp", {in(1, "09-00-00", TIME_RECORD + three.substr(0, 50)), in(0, "09-10-00", three)},

@@ -94,6 +94,22 @@ void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
     }
 }
 
+// Two media of a handset may be two ROOTs, but so may two handsets.
+void find_other_roots(const LogStream& stream, std::vector<PlannedFile>* plan) {
+    const TreeSet* before = nullptr;
+    for (size_t i = 0; i < plan->size(); ++i) {
+        const TreeSet* const set = stream.files[i].set;
+        PlannedFile& each = (*plan)[i];
+        if (each.left_out) {
+            continue;
+        }
+        if (before && before->handset != set->handset && !set->given) {
+            each.findings.push_back({false, "root", "from another ROOT than the one before", -1});
+        }
+        before = set;
+    }
+}
+
 void find_gaps(std::vector<PlannedFile>* plan) {
     std::map<const TreeDir*, size_t> newest;  // of each directory
     size_t last = 0;
@@ -135,6 +151,7 @@ std::vector<PlannedFile> plan_stream(const LogStream& stream) {
         }
     }
     find_copies(stream, &plan);
+    find_other_roots(stream, &plan);
     find_gaps(&plan);
     return plan;
 }
