@@ -252,6 +252,29 @@ TEST_F(KestlogFollowTreeTest, ADumpInTheLogOfAnAudioDspIsTold) {
     EXPECT_EQ(occurrences(follow.text(), "\"crash\""), 2u) << follow.text();
 }
 
+// By the time it looks, the service has counted up further.
+TEST_F(KestlogFollowTreeTest, ASizeThatIsNotKnownIsNotTold) {
+    const auto log = [](int number, int begun) {
+        return WCN + std::to_string(number) + "-cp_wcn-2016-03-01_09-1" + std::to_string(begun) +
+               "-00.log";
+    };
+    m_root.write_file(log(0, 0), "x");
+    Following follow({KESTLOG, "follow", m_root.path("modem_log")}, false);
+    EXPECT_TRUE(follow.says("following 1 set"));
+    follow.send(SIGSTOP);
+    for (int last = 1; last <= 3; ++last) {
+        for (int begun = 0; begun < last; ++begun) {
+            rename(log(last - begun - 1, begun), log(last - begun, begun));
+        }
+        m_root.write_file(log(0, last), "full");
+    }
+    follow.send(SIGCONT);
+    EXPECT_TRUE(follow.says("_09-12-00.log follows 1-cp_wcn-2016-03-01_09-11-00.log\n"));
+    EXPECT_TRUE(follow.says("_09-13-00.log follows 1-cp_wcn-2016-03-01_09-12-00.log, 4 bytes\n"));
+    follow.close_pipe();
+    EXPECT_EQ(follow.finish(), 0);
+}
+
 TEST_F(KestlogFollowTreeTest, TheKernelsLimits) {
     m_root.write_file(WCN + "0-cp_wcn-2016-03-01_09-15-00.log", "x");
     Following follow({KESTLOG, "follow", m_root.path("modem_log")}, false);

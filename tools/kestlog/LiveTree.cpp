@@ -44,7 +44,7 @@ void LiveTree::created(Dir& dir, const std::string& name) {
     if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name)) {
         return;
     }
-    add(dir, name, {there ? static_cast<uint64_t>(st.st_size) : 0}, true);
+    add(dir, name, {there ? static_cast<uint64_t>(st.st_size) : 0, there}, true);
 }
 
 void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
@@ -151,10 +151,14 @@ void LiveTree::tell_new(Dir& dir, const FileName& name) {
         return;
     }
     look(dir, before);
-    const uint64_t size = dir.files.at(before).size;
-    tell("rotation", dir, name,
-         "rotation: " + shown + " follows " + escape_text(before) + ", " + size_text(size),
-         {{"before", json_text(before)}, {"before_size", size}});
+    std::string words = "rotation: " + shown + " follows " + escape_text(before);
+    Json more = {{"before", json_text(before)}};
+    // When there was no time to look, it has the next name already.
+    if (const File& full = dir.files.at(before); full.sized) {
+        words += ", " + size_text(full.size);
+        more["before_size"] = full.size;
+    }
+    tell("rotation", dir, name, words, more);
 }
 
 std::string LiveTree::cp_of(const Dir& dir, const std::string& name) {

@@ -25,6 +25,7 @@ public:
     // There may be very many: what its name says is read again when it is asked for.
     struct File {
         uint64_t size = 0;
+        bool sized = true;              // the size is known
         bool unchecked = false;         // written to since it was last checked
         bool seen = false;              // while the tree is taken
         uint64_t checked = UINT64_MAX;  // its size when it was checked after it was closed

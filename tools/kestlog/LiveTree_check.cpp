@@ -125,9 +125,10 @@ void LiveTree::look(Dir& dir, const std::string& name) {
     struct stat st;
     if (lstat((dir.path + "/" + name).c_str(), &st) == 0) {
         const uint64_t size = static_cast<uint64_t>(st.st_size);
-        uint64_t& known = dir.files.at(name).size;
-        m_sums[cp_of(dir, name)].grown += size - std::min(size, known);
-        known = size;
+        File& known = dir.files.at(name);
+        m_sums[cp_of(dir, name)].grown += size - std::min(size, known.size);
+        known.size = size;
+        known.sized = true;
     }
 }
 
