@@ -109,10 +109,11 @@ local function dissect_prefix(buffer, tree)
     local len = buffer(4, 2):le_uint()
     sub:add(f.flags, buffer(0, 4))
     local item = sub:add_le(f.chunk_len, buffer(4, 2))
-    local good = len == buffer:len() - FLAGS_LEN
+    local right = buffer:reported_len() - FLAGS_LEN
+    local good = len == right
     if not good then
         item:add_proto_expert_info(e.bad_length, string.format(
-            "The chunk's length is %d where %d is right", len, buffer:len() - FLAGS_LEN))
+            "The chunk's length is %d where %d is right", len, right))
     end
     sub:add_le(f.reserved, buffer(6, 2))
     sub:add_le(f.mark, buffer(8, 2))
@@ -132,6 +133,7 @@ end
 
 function kestdiag.dissector(buffer, pinfo, root)
     local captured = buffer:len()
+    local whole = buffer:reported_len()  -- a capture may hold the first bytes of packets only
     pinfo.cols.protocol = "KESTDIAG"
     local tree = root:add(kestdiag, buffer())
     if captured < HEADER_LEN then
@@ -150,10 +152,10 @@ function kestdiag.dissector(buffer, pinfo, root)
     local len = buffer(start + 4, 2):le_uint()
     local kind = buffer(start + 6, 1):uint()
     local sub_kind = buffer(start + 7, 1):uint()
-    local payload_len = captured - start - HEADER_LEN
+    local payload_len = whole - start - HEADER_LEN
     local sub_name = SUB_TYPES[kind] and SUB_TYPES[kind][sub_kind]
-    local is_end = start == 0 and payload_len == #DUMP_END and
-        buffer(HEADER_LEN, payload_len):raw() == DUMP_END
+    local is_end = start == 0 and payload_len == #DUMP_END and captured > HEADER_LEN and
+        buffer(HEADER_LEN):raw() == DUMP_END:sub(1, captured - HEADER_LEN)
 
     local seq_item = tree:add_le(f.seq, buffer(start, 4))
     local len_item = tree:add_le(f.length, buffer(start + 4, 2))
@@ -164,8 +166,8 @@ function kestdiag.dissector(buffer, pinfo, root)
         tree:add(f.sub_name, buffer(start + 7, 1), sub_name):set_generated()
     end
     tree:add(f.payload_len, payload_len):set_generated()
-    if payload_len > 0 then
-        tree:add(f.payload, buffer(start + HEADER_LEN, payload_len))
+    if captured > start + HEADER_LEN then
+        tree:add(f.payload, buffer(start + HEADER_LEN))
     end
 
     local words = string.format("%s, %s, %d bytes", TYPES[kind] or string.format("type 0x%02x", kind),
@@ -174,10 +176,10 @@ function kestdiag.dissector(buffer, pinfo, root)
         -- The header of this frame does not matter.
         tree:add(f.dump_end, true):set_generated()
         words = "end of the memory dump"
-    elseif len ~= captured - start then
+    elseif len ~= whole - start then
         good = false
         len_item:add_proto_expert_info(e.bad_length, string.format(
-            "The header's length is %d where %d is right", len, captured - start))
+            "The header's length is %d where %d is right", len, whole - start))
         words = words .. " [wrong length]"
     end
     follow_sequence(pinfo, good and not is_end and seq or nil)

@@ -116,6 +116,11 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
              "\"other_bytes\":23,"))
         << m_out;
 
+    // What holds the first bytes of packets only has no wrong length.
+    EXPECT_EQ(shell("editcap -s 24 read.pcapng cut.pcapng"), 0);
+    EXPECT_EQ(fields("cut.pcapng", "kestdiag.payload_len kestdiag.bad_length kestdiag.dump_end"),
+              "7||\n1000||\n3||\n0||\n26||\n0||\n60000||\n21||1\n0||\n");
+
     // Less, and more, of it.
     m_status = 0;
     EXPECT_EQ(fields("export . --cp CP_WCDMA --type 0x3b", "kestdiag.seq kestdiag.payload"),
