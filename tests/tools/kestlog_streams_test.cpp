@@ -273,12 +273,15 @@ TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
               "one.two.far.");
     EXPECT_EQ(run("wav renamed " + backwards + "b.wav"), 4);
     write("renamed", "foreign");
+    write("short", chunk(1, PCM, "abc"));
     for (const std::string args :
-         {"renamed ", "nowhere ", "data/modem_log/../.. --until 2015-01-01 "}) {
+         {"renamed ", "short ", "nowhere ", "data/modem_log/../.. --until 2015-01-01 "}) {
         EXPECT_EQ(run("wav " + args + sound + "none.wav"), 2) << args;
     }
-    for (const char* args : {"--rate 1 --channels 1 --format s16 -o x", "--rate 0 --format u8 -o x",
-                             "--rate 9 --channels 2000 --format u8 -o x", "--rate 1 --format u8"}) {
+    for (const char* args :
+         {"--rate 1 --channels 1 --format s16 -o x", "--rate 0 --format u8 -o x",
+          "--rate 9 --channels 2000 --format u8 -o x",
+          "--rate 9999999 --channels 1024 --format s16le -o x", "--rate 1 --format u8"}) {
         EXPECT_EQ(run("wav . " + std::string(args)), 1) << args;
     }
     EXPECT_FALSE(m_root.exists("none.wav"));

@@ -57,8 +57,16 @@ bool read_sound(const CommandLine& line, Sound* sound, int* status) {
         *status = line.usage_error("-o FILE is missing");
         return false;
     }
-    return read_number(line, "rate", 9999999, &sound->rate, status) &&
-           read_number(line, "channels", WavFile::MAX_CHANNELS, &sound->channels, status);
+    if (!read_number(line, "rate", 9999999, &sound->rate, status) ||
+        !read_number(line, "channels", WavFile::MAX_CHANNELS, &sound->channels, status)) {
+        return false;
+    }
+    const uint64_t frame = static_cast<uint64_t>(sound->channels) * sound->format->bytes;
+    if (frame * static_cast<uint64_t>(sound->rate) > UINT32_MAX) {
+        *status = line.usage_error("a WAV file cannot have 4 GiB of sound a second");
+        return false;
+    }
+    return true;
 }
 
 struct Input {
@@ -149,8 +157,9 @@ public:
         if (!good(m_wav.close())) {
             return ES_OUTPUT;
         }
-        if (m_chunks == 0) {
-            return std::max(m_problems.status(), failure(ES_UNREADABLE, "found no PCM chunks"));
+        if (m_chunks == 0 || (m_wav.frames() == 0 && m_dropped > 0)) {
+            const char* const what = m_chunks == 0 ? "found no PCM chunks" : "no sample is whole";
+            return std::max(m_problems.status(), failure(ES_UNREADABLE, what));
         }
         uint64_t copied;
         int error = 0;
