@@ -32,8 +32,12 @@ void Follower::reread() {
         watch_root(m_card, {""});
     }
     for (const std::string& root : m_roots) {
-        if (is_dir(root)) {
-            tree.add(root);  // else its logs are still to come
+        if (is_dir(root)) {  // else its logs are still to come
+            const size_t told = tree.failures.size();
+            tree.add(root);
+            if (!is_dir(root)) {
+                tree.failures.resize(told);  // it has just gone, which is told
+            }
         }
         watch_root(root, {"", PATH_DATA_PARTITION, CARD_IN_ROOT});
     }
