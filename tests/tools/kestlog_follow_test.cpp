@@ -199,6 +199,8 @@ TEST_F(KestlogFollowTreeTest, FilesOfOthersDamageAndLostDirectories) {
     follow.send(SIGSTOP);  // by the time it looks, the first name is gone
     m_root.write_file("h/" + WCN + ".2-cp.part", "x");
     rename("h/" + WCN + ".2-cp.part", "h/" + WCN + "2-cp_wcn-2016-03-01_09-00-00.log");
+    m_root.write_file("h/" + WCN + "3.part", "x");
+    rename("h/" + WCN + "3.part", "h/" + WCN + "._3");  // which is left out
     follow.send(SIGCONT);
     EXPECT_TRUE(follow.says(event(
         "file", "\"file\":\"2-cp_wcn-2016-03-01_09-00-00.log\",\"kind\":\"log\",\"size\":1")));

@@ -57,19 +57,22 @@ void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
     }
     const File file = it->second;
     dir.files.erase(it);
+    if (!FileName(from).exact) {
+        // What copies a tree gives a file its name when it is whole.
+        for (const std::string& name : {from, to}) {
+            dir.files.erase(name);
+            forget({&dir, name});
+        }
+        created(dir, to);
+        closed(dir, to);
+        return;
+    }
     for (std::set<Place>* places : {&m_closed, &m_written, &m_grown}) {
         if (places->erase({&dir, from})) {
             places->insert({&dir, to});
         }
     }
-    if (FileName(from).exact) {
-        dir.files[to] = file;  // the service counts its files up
-    } else {
-        // What copies a tree gives a file its name when it is whole.
-        dir.files.erase(to);
-        created(dir, to);
-        closed(dir, to);
-    }
+    dir.files[to] = file;  // the service counts its files up
 }
 
 void LiveTree::forget(const Place& place) {
