@@ -449,6 +449,10 @@ INSIDE(ssize_t, write, (fd, data, len), int fd, const void* data, size_t len) {
         world().message(without_root(text.c_str()));
         return static_cast<ssize_t>(len);
     }
+    if (g_fds[fd].cls == FD_CLIENT) {
+        const Outside outside;
+        world().service_answers({static_cast<const char*>(data), len});
+    }
     const int fault = begin(CALL_WRITE, place_of_fd(fd));
     if (fault > 0) {
         if (g_fds[fd].cls == FD_IQ_FILE) {

@@ -22,12 +22,13 @@ namespace {
 
 enum Kind {
     DOES,     // OK
-    MAY,      // OK or an error: it depends on what is going on
-    WRONG,    // the error of the argument
+    MAY,      // OK or this error: it depends on what is going on
+    WRONG,    // this error
+    TELLS,    // OK; dumps of the stream are told from now on, or not
     SETS,     // OK; sets the setting to the argument
     GETS,     // OK and the setting
     RELOADS,  // OK; switches the logging of streams as the other service's file says
-    SAVES     // OK or an error, when the transaction ends
+    SAVES     // OK or an error, when the transaction ends; the argument when the CP refuses
 };
 
 struct Request {
@@ -69,14 +70,14 @@ std::vector<Request> make_requests() {
         {"DISABLE_MD", DOES, 0, 0},
         {"MINI_DUMP", WRONG, 3, 0},
         {"GET_LOG_STATE NONE", WRONG, 9, 0},
-        {"kestctl clear", MAY, 0, 0},
+        {"kestctl clear", MAY, 4, 0},
         {"kestctl reload", RELOADS, 0, 0},
         {"ENABLE_IQ WCDMA WCDMA", DOES, 0, 0},
         {"ENABLE_IQ WCDMA GSM", WRONG, 2, 0},
-        {"DISABLE_IQ WCDMA", MAY, 0, 0},
-        {"SUBSCRIBE WCDMA DUMP", DOES, 0, 0},
-        {"SUBSCRIBE WCN DUMP", DOES, 0, 0},
-        {"UNSUBSCRIBE GNSS DUMP", DOES, 0, 0},
+        {"DISABLE_IQ WCDMA", MAY, 3, 0},
+        {"SUBSCRIBE WCDMA DUMP", TELLS, ST_WCDMA, 1},
+        {"SUBSCRIBE WCN DUMP", TELLS, ST_WCN, 1},
+        {"UNSUBSCRIBE WCN DUMP", TELLS, ST_WCN, 0},
         {"NONSENSE", WRONG, 1, 0},
         {"kestctl", WRONG, 1, 0},
         {"SET_LOG_FILE_SIZE ten", WRONG, 2, 0},
@@ -90,8 +91,8 @@ std::vector<Request> make_requests() {
         requests.push_back({"DISABLE_LOG " + name, SETS, LOGGED + stream, 0});
         requests.push_back({"GET_LOG_STATE " + name, GETS, LOGGED + stream, 0});
         if (stream != ST_DSP) {
-            requests.push_back({"SAVE_RINGBUF " + name, SAVES, stream, 0});
-            requests.push_back({"SAVE_SLEEP_LOG " + name, SAVES, stream, 0});
+            requests.push_back({"SAVE_RINGBUF " + name, SAVES, LOGGED + stream, 7});
+            requests.push_back({"SAVE_SLEEP_LOG " + name, SAVES, LOGGED + stream, 6});
         }
     }
     return requests;
@@ -121,6 +122,10 @@ unsigned value_of(unsigned which, const std::string& line) {
 
 bool is_error(const std::string& line, const char* codes) {
     return line.size() == 7 && line.compare(0, 6, "ERROR ") == 0 && strchr(codes, line[6]);
+}
+
+bool depends_on_setting(const Request& request) {
+    return request.kind == GETS || request.kind == SAVES;
 }
 
 // What the request sets, each with its new value.
@@ -153,18 +158,23 @@ bool agrees(Setting& setting, unsigned value, const Setting& expected, bool cont
 
 bool acceptable(const Request& request, const std::string& line, const Setting& expected,
                 bool contested, bool newest) {
+    const std::string error = "ERROR " + std::to_string(request.what);
     switch (request.kind) {
         case DOES:
         case SETS:
+        case TELLS:
             return line == "OK";
         case RELOADS:
             return line == "OK" || (g_state->faulted && is_error(line, "3"));
         case MAY:
-            return line == "OK" || is_error(line, "34");
+            return line == "OK" || line == error;
         case SAVES:
-            return line == "OK" || is_error(line, "345678");
+            if (!expected.uncertain && !contested && (line == "ERROR 5") == (expected.value != 0)) {
+                return false;
+            }
+            return line == "OK" || is_error(line, request.argument == 6 ? "34568" : "34578");
         case WRONG:
-            return line == "ERROR " + std::to_string(request.what);
+            return line == error;
         case GETS: {
             const unsigned value = value_of(request.what, line);
             return line == value_text(request.what, value) &&
@@ -234,7 +244,7 @@ void Clients::ask(Client& client, uint64_t index) {
         }
     }
     client.asked.push_back({index, g_state->boot_ns, contested,
-                            request.kind == GETS ? *setting_of(request.what) : Setting()});
+                            depends_on_setting(request) ? *setting_of(request.what) : Setting()});
     ++g_state->counters.requests;
 }
 
@@ -348,9 +358,11 @@ void Clients::take_line(Client& client, const std::string& line) {
             [](const Asked& later) { return !set_by(request_of(later.index)).empty(); });
         if (acceptable(done, line, asked.expected, asked.contested, newest)) {
             if (done.kind == SAVES && line == "OK") {
-                world().check_saved(done.what, done.text.compare(0, 12, "SAVE_RINGBUF") == 0
-                                                   ? "_ringbuf_"
-                                                   : "_sleeplog_");
+                world().check_saved(done.what - LOGGED,
+                                    done.argument == 6 ? "_sleeplog_" : "_ringbuf_");
+            }
+            if (done.kind == TELLS && client.dumps[done.what].told != (done.argument == 1)) {
+                client.dumps[done.what] = {done.argument == 1};
             }
             if (done.kind == SETS && done.what >= LOGGED && !done.argument && !asked.contested &&
                 client.asked.empty()) {
@@ -365,14 +377,17 @@ void Clients::take_line(Client& client, const std::string& line) {
 void Clients::take_notice(Client& client, const std::string& line) {
     const bool start = line.compare(0, 14, "CP_DUMP_START ") == 0;
     const std::string cp = line.substr(start ? 14 : 12);
-    const unsigned stream = cp == "WCDMA" ? ST_WCDMA : ST_WCN;
+    const unsigned stream = cp == "WCDMA" ? ST_WCDMA : cp == "WCN" ? ST_WCN : ST_GNSS;
     Dump& dump = client.dumps[stream];
     ++g_state->counters.dumps;
+    if (!dump.told && !g_state->reply_lost) {
+        fail_run("notice", "'%s', which the client did not ask for", line.c_str());
+    }
     // A client that subscribed during a dump hears its end only.
     if (start ? dump.open : !dump.open && dump.heard) {
         fail_run("notice", "'%s', a dump is %s", line.c_str(), dump.open ? "open" : "not open");
     }
-    dump = {true, start, g_state->boot_ns};
+    dump = {dump.told, true, start, g_state->boot_ns};
 }
 
 int64_t Clients::connected_count() const {
@@ -431,7 +446,8 @@ void Clients::mark_uncertain(Client& client) {
     // What was asked behind it has the value of before as well.
     for (Asked& asked : client.asked) {
         const Request& request = request_of(asked.index);
-        asked.expected.uncertain = asked.expected.uncertain ||
-                                   (request.kind == GETS && setting_of(request.what)->uncertain);
+        asked.expected.uncertain =
+            asked.expected.uncertain ||
+            (depends_on_setting(request) && setting_of(request.what)->uncertain);
     }
 }

@@ -53,6 +53,7 @@ private:
     };
     // What a client was told of the dumps of a stream's CP.
     struct Dump {
+        bool told = false;  // it is subscribed: the replies so far say so
         bool heard = false;
         bool open = false;
         int64_t since = 0;

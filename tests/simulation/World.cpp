@@ -161,7 +161,7 @@ void World::no_setting_is_certain() {
 void World::service_dies() {
     g_state->dump_unconfirmed = false;
     m_clients.mark_uncertain();
-    if (g_state->save_failed || !m_clients.quiet()) {
+    if (g_state->save_failed) {
         no_setting_is_certain();
     }
     if (g_state->save_cut) {

@@ -60,6 +60,7 @@ public:
     // The stamps of the property file, in virtual time.
     void set_times(const char* path, struct stat& st) const;
     void message(const std::string& text);
+    void service_answers(const std::string& line);
     void progress() { m_idle_passes = 0; }
     void rule_fired(Call call, Place place);
 
@@ -86,6 +87,7 @@ private:
     void check_descriptors() const;
     void check_totals() const;
     void check_settings() const;
+    void check_settings_kept() const;
     void check_quota() const;
     void check_room_made();
     void check_card_left(bool due);
@@ -107,6 +109,7 @@ private:
     Clients m_clients;
     Media m_media;
     unsigned m_idle_passes = 0;
+    bool m_clears = false;  // the service, for the client that it answers next
     unsigned m_refused_since_deletion = UINT32_MAX / 2;
     unsigned m_refused = 0;           // blocks in a row, by a full medium
     uint64_t m_refused_from = 0;      // bytes read until the first of them

@@ -153,8 +153,10 @@ void World::message(const std::string& text) {
     }
     if (text.find("save config") != std::string::npos) {
         g_state->save_failed = true;
+        check_settings_kept();
     }
     const auto says = [&text](const char* words) { return text.find(words) != std::string::npos; };
+    m_clears = m_clears || says("remove CP log");
     if (!says("save log error") && !says("bytes lost") && !says("DSP dump error")) {
         return;
     }
@@ -168,6 +170,22 @@ void World::message(const std::string& text) {
     ledger::excuse(m_last_stream);
     check_room_made();
     check_card_left(due);
+}
+
+// The errors that tell the state of a CP, while one is in it. Logs are cleared while nothing runs.
+void World::service_answers(const std::string& line) {
+    bool busy = false, off = false, down = false;
+    for (unsigned stream = 0; stream < CHANNEL_COUNT; ++stream) {
+        const LogPipeHandler& channel = *m_controller->get_cp(STREAM_TYPES[stream]);
+        busy = busy || channel.state() > CWS_WORKING;
+        off = off || !channel.enabled();
+        down = down || channel.state() == CWS_NOT_WORKING;
+    }
+    if ((line == "ERROR 4\n" && !busy) || (line == "ERROR 5\n" && !off) ||
+        (line == "ERROR 8\n" && !down) || (m_clears && (line == "OK\n") == busy)) {
+        fail_run("reply", "in no such state: %s", line.c_str());
+    }
+    m_clears = false;
 }
 
 // Whether the medium in use is above its quota and may not delete anything.

@@ -60,9 +60,18 @@ void World::check_saved(unsigned stream, const char* kind) const {
     }
 }
 
+// Neither a failed write nor a kill leaves nothing. A copy of the default may not have begun.
+void World::check_settings_kept() const {
+    std::ifstream in(m_root + SETTINGS_PATH);
+    if (in && in.peek() == EOF && !g_state->starting) {
+        fail_run("settings", "the settings file is empty");
+    }
+}
+
 // The settings file has what was set last.
 void World::check_settings() const {
     static const char* const KEYS[] = {"log_file_size", "data_log_size", "sd_log_size"};
+    check_settings_kept();
     if (g_state->faulted || g_state->save_failed || !m_clients.quiet()) {
         return;
     }
@@ -163,6 +172,7 @@ void World::check_card_left(bool due) {
 }
 
 void World::check_between_lives() const {
+    check_settings_kept();
     m_media.check_bytes();
     m_media.check_libraries(std::nullopt);
 }
