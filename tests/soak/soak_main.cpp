@@ -182,13 +182,18 @@ bool play_everything(const std::string& program, double seconds) {
     do {
         play_round(stage);
         rss_kb = std::max(rss_kb, stage.service().rss_kb());
-        open = stage.service().descriptors().size();
-        if (rounds++ == 0) {
-            first_rss_kb = rss_kb;
-            first_open = open;
-        }
+        // A client that has left is noticed a moment later.
+        stage.wait_until(
+            [&] {
+                open = stage.service().descriptors().size();
+                return rounds == 0 || open <= first_open;
+            },
+            1);
+        first_open = rounds == 0 ? open : first_open;
+        // An emulator and the sanitizers keep memory of the first rounds.
+        first_rss_kb = ++rounds <= 2 ? rss_kb : first_rss_kb;
         printf("\nround %u: RSS %zu KB, %zu descriptors\n", rounds, rss_kb, open);
-    } while (!stage.over() && stage.now() < seconds);
+    } while (!stage.over() && (rounds < 2 || stage.now() < seconds));
     storm.stop();
     good = stage.service().alive() || complain("the service has ended");
     good = (stage.handset().settle(stage.logs(), 60000) || complain("logs without an end")) && good;
@@ -196,7 +201,7 @@ bool play_everything(const std::string& program, double seconds) {
     stage.service().stop();
     stage.take_down();
     printf(
-        "%u rounds in %.0f s, %u pairs of requests beside, RSS %zu KB after the first and at "
+        "%u rounds in %.0f s, %u pairs of requests beside, RSS %zu KB after two and at "
         "most %zu KB, %zu and %zu descriptors; checks: %u passed, %zu failed\n",
         rounds, stage.now(), storm.good(), first_rss_kb, rss_kb, first_open, open, stage.passed(),
         stage.failures().size());
@@ -209,7 +214,7 @@ bool play_everything(const std::string& program, double seconds) {
     if (rss_kb > first_rss_kb + RSS_GROWTH_KB) {
         good = complain("the memory grows");
     }
-    if (open != first_open) {
+    if (open > first_open) {
         good = complain("descriptors are left over");
     }
     stage.handset().remove_root();
