@@ -15,6 +15,7 @@ namespace fs = std::filesystem;
 
 namespace {
 
+const char SETTINGS[] = "data/local/tmp/kestmodem/kest_modem.conf";
 const int SHORT_PATIENCE_MS = 400;  // for a step that may never come about
 const int LONG_PATIENCE_MS = 10000;
 const int ROUNDS = 2;  // a machine under load can make a step of the second round fail
@@ -55,8 +56,9 @@ bool FaultPlayer::play_with_fault(const std::string& script, const ScriptResult&
     m_plan->last = 0;
     m_patience_ms = PATIENCE_MS;
     const std::string text = settings();
-    // A start that failed, or has not come so far, leaves them to the next one.
-    if (played && m_service.alive() && !text.empty() && !settings_whole(text)) {
+    // A start that has not come so far leaves them to the next one.
+    if (played && m_service.alive() && fs::exists(m_handset.path(SETTINGS)) &&
+        !settings_whole(text)) {
         return fail("the settings file is not whole:\n" + text);
     }
     ScriptResult result;
@@ -203,7 +205,7 @@ std::vector<std::string> FaultPlayer::log_roots() const {
 }
 
 std::string FaultPlayer::settings() const {
-    return read_text_file(m_handset.path("data/local/tmp/kestmodem/kest_modem.conf"));
+    return read_text_file(m_handset.path(SETTINGS));
 }
 
 std::set<std::string> FaultPlayer::records() const {

@@ -180,5 +180,5 @@ int main(int argc, char** argv) {
     const Totals& totals = campaign.totals();
     printf("%u runs, %u with a fault, %u failed; log bytes lost in %u, at most %zu\n", totals.runs,
            totals.hits, totals.failures, totals.with_loss, totals.most_lost);
-    return totals.failures > 0 ? 1 : 0;
+    return totals.failures > 0 || (totals.hits == 0 && options.n == 0) ? 1 : 0;
 }
