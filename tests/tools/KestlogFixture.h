@@ -44,8 +44,8 @@ const std::string THREE_CHUNKS =
 class KestlogTest : public ::testing::Test {
 protected:
     // Runs it; output in m_out and m_err. The arguments go through a shell in the root.
-    int run(const std::string& args) {
-        const std::string line = "cd " + m_root.root() + " && '" KESTLOG "' " + args + " >" +
+    int run(const std::string& args, const std::string& program = "'" KESTLOG "'") {
+        const std::string line = "cd " + m_root.root() + " && " + program + " " + args + " >" +
                                  m_root.path("out") + " 2>" + m_root.path("err");
         const int status = system(line.c_str());
         m_out = m_root.read_file("out");

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // A card that somebody made to harm its reader, through every command of the real kestlog.
+#include <deque>
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <sstream>
@@ -30,9 +31,15 @@ for name, kind in [('/abs', '0'), ('../up', '0'), ('modem_log/dev', '3'), ('mode
     tar.addfile(entry)
     zip.writestr(name, 'x'))";
 
+// Also in a pipe its status is known.
+const std::string WATCHED =
+    "kestlog() { '" KESTLOG "' \"$@\"; s=$?; echo $s >o/status; return $s; }; kestlog";
+
 class HostileCard : public KestlogTest {
 protected:
-    const char* path(const std::string& rel) { return (m_path = m_root.path(rel)).c_str(); }
+    const char* path(const std::string& rel) {
+        return m_paths.emplace_back(m_root.path(rel)).c_str();
+    }
     // Good sets among bad ones, on a file system that keeps any time where there is one.
     void SetUp() override {
         m_shm = make_temp_dir("/dev/shm", "kestlog-test");
@@ -76,7 +83,8 @@ protected:
         chmod(path(BAD + "cp_3mode"), 0700);
         std::filesystem::remove_all(m_shm.empty() ? m_root.root() : m_shm);
     }
-    std::string m_shm, m_path;
+    std::string m_shm;
+    std::deque<std::string> m_paths;
 };
 
 TEST_F(HostileCard, HarmsNoCommandAndHidesNothing) {
@@ -114,7 +122,8 @@ TEST_F(HostileCard, HarmsNoCommandAndHidesNothing) {
         for (const std::string json : {"", "--json "}) {
             std::filesystem::remove_all(path("o"));
             m_root.make_dir("o");
-            EXPECT_EQ(run(json + c.args), c.status) << json << c.args << "\n" << m_err;
+            EXPECT_EQ(run(json + c.args, WATCHED), c.status) << json << c.args << "\n" << m_err;
+            EXPECT_EQ(m_root.read_file("o/status"), std::to_string(c.status) + "\n") << c.args;
             const std::string text = m_out + m_err + m_root.read_file("o/err");
             EXPECT_EQ(text.find_first_of("\x1b\r\a\xff\xc3"), std::string::npos) << c.args;
             EXPECT_EQ(occurrences(text, "runtime error") + occurrences(text, "Sanitizer"), 0u);
