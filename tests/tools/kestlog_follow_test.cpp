@@ -287,6 +287,9 @@ TEST_F(KestlogFollowTreeTest, TheKernelsLimits) {
     unsigned count = 0;
     std::ifstream(limit) >> count;
     ASSERT_GT(count, 0u);
+    if (count > 100000) {
+        GTEST_SKIP() << limit << " is " << count;
+    }
     for (unsigned i = 0; i < count; ++i) {
         const std::string stem = "-cp_wcn-2016-03-01_09-15-00.log";
         rename(WCN + std::to_string(i) + stem, WCN + std::to_string(i + 1) + stem);
