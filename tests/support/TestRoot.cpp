@@ -41,7 +41,9 @@ std::vector<std::string> sorted_names(const std::string& dir, bool directories) 
 
 }  // namespace
 
-TestRoot::TestRoot() : m_root(make_temp_dir("/tmp", "kestmodem-test")) {
+// Its path is a part of the names of sockets, which have 107 bytes at most.
+TestRoot::TestRoot()
+    : m_root(make_temp_dir(temp_dir().size() <= 60 ? temp_dir() : "/tmp", "kestmodem-test")) {
     if (m_root.empty()) {
         die("make a directory");
     }
