@@ -9,6 +9,7 @@ it writes when such a card is played again is read here once more, without the s
 """
 import collections
 import glob
+import itertools
 import os
 import re
 import shlex
@@ -141,7 +142,7 @@ def test_served_for_clients(temp):
     root = temp + "/a b'c"
     served = subprocess.Popen([KESTSIM, "--serve", "--root", root], stdout=subprocess.PIPE, text=True)
     try:
-        said = list(iter(served.stdout.readline, "Ctrl-C ends it.\n"))
+        said = list(itertools.takewhile("Ctrl-C ends it.\n".__ne__, served.stdout))
         assert shlex.split(said[2]) == ["KESTMODEM_ROOT=" + root, "kestctl", "status"], said
         for _ in range(2):
             subprocess.run(["sh", "-c", next(line for line in said if "kill" in line)], check=True)
@@ -154,7 +155,7 @@ def test_served_for_clients(temp):
 
 def test_interrupted_script(temp):
     ran = subprocess.Popen([PLAY, f"{RECORDINGS}/iq_save.in"], env={**os.environ, "TMPDIR": temp})
-    while not os.listdir(temp):
+    while not os.listdir(temp) and ran.poll() is None:
         time.sleep(0.001)
     ran.terminate()
     assert ran.wait() == 1
