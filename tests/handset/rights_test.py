@@ -84,6 +84,7 @@ def start_as_init(top, root, program):
 
 
 def main():
+    os.umask(0o022)
     if sys.argv[1] == "--start":
         start_as_init(sys.argv[2], os.environ["KESTMODEM_ROOT"], sys.argv[3])
     top, build = (os.path.abspath(path) for path in sys.argv[1:3])
@@ -97,8 +98,9 @@ def main():
     with tempfile.TemporaryDirectory(prefix="kest_rights") as work:
         os.chmod(work, 0o755)
         program = shutil.copy(build + "/kestmodem", work)  # where every user may run it
+        os.chmod(program, 0o755)
         if os.path.exists(build + "/kestmodem.elf"):  # what that runs in an emulator
-            shutil.copy(build + "/kestmodem.elf", work)
+            os.chmod(shutil.copy(build + "/kestmodem.elf", work), 0o755)
         starter = work + "/start"
         with open(starter, "w", encoding="utf-8") as f:
             f.write(f"#!/bin/sh\nexec python3 '{os.path.abspath(__file__)}' --start '{top}' '{program}'\n")
