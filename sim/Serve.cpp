@@ -20,12 +20,6 @@ const double REVIVAL_S = 1;
 // It is alive again after so long in any case: nobody asks for a dump while its log is off.
 const double MAX_CRASH_S = 10;
 
-volatile sig_atomic_t s_crash_wanted;
-
-void on_crash_wanted(int) {
-    s_crash_wanted = 1;
-}
-
 // The text as one word of a shell.
 std::string shell_word(const std::string& text) {
     if (text.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789"
@@ -41,17 +35,15 @@ std::string shell_word(const std::string& text) {
 
 }  // namespace
 
-Serve::Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupted)
+Serve::Serve(const DemoOptions& options, const volatile sig_atomic_t* interrupted,
+             volatile sig_atomic_t* crash_wanted)
     : m_options(options),
       m_interrupted(interrupted),
+      m_crash_wanted(crash_wanted),
       m_stage(options, interrupted),
       m_dsp_stream(DSP_STREAM) {}
 
 int Serve::run() {
-    struct sigaction action = {};
-    action.sa_handler = on_crash_wanted;
-    action.sa_flags = SA_RESTART;
-    sigaction(SIGUSR1, &action, nullptr);
     const bool started = m_stage.set_up();
     if (started) {
         // The three places for clients are for others.
@@ -125,8 +117,8 @@ void Serve::mind_wcn() {
 // One crash at a time: its memory is asked for, then it is alive and logs again.
 void Serve::mind_modem() {
     const unsigned dumps = m_stage.modem_diag().finished(Diag::DUMP);
-    if (m_crash == RUNS && s_crash_wanted && m_stage.modem_supervisor().connected()) {
-        s_crash_wanted = 0;
+    if (m_crash == RUNS && *m_crash_wanted && m_stage.modem_supervisor().connected()) {
+        *m_crash_wanted = 0;
         m_crash = DUMPS;
         m_dumps = dumps;
         m_alive_at = m_stage.now() + MAX_CRASH_S;

@@ -20,9 +20,14 @@ namespace fs = std::filesystem;
 namespace {
 
 volatile sig_atomic_t s_interrupted = 0;
+volatile sig_atomic_t s_crash_wanted = 0;
 
 void on_signal(int) {
     s_interrupted = 1;
+}
+
+void on_crash_wanted(int) {
+    s_crash_wanted = 1;
 }
 
 // scripts/demo --help prints the same file.
@@ -169,6 +174,10 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    struct sigaction crash = {};
+    crash.sa_handler = on_crash_wanted;
+    crash.sa_flags = SA_RESTART;
+    sigaction(SIGUSR1, &crash, nullptr);  // first of all: it may come as soon as this runs
     DemoOptions options;
     const int stop = parse_options(argc, argv, options);
     if (stop != 0) {
@@ -198,7 +207,7 @@ int main(int argc, char** argv) {
         return Replay(options, &s_interrupted).run();
     }
     if (options.serve) {
-        return Serve(options, &s_interrupted).run();
+        return Serve(options, &s_interrupted, &s_crash_wanted).run();
     }
     return Demo(options, &s_interrupted).run();
 }
