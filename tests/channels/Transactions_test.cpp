@@ -7,31 +7,20 @@ namespace {
 struct Transaction {
     bool dump;
     std::string request;  // of a client, for all but a dump
-    int diag_type;
     const char* file;
     const char* no_file;  // message
 };
-const Transaction DUMP = {true, "", 0, "_memory_",
-                          "open_dump_file(): open dump file cp_wcdma_memory"};
+const Transaction DUMP = {true, "", "_memory_", "open_dump_file(): open dump file cp_wcdma_memory"};
 const Transaction RINGBUF = {
-    false, "SAVE_RINGBUF WCDMA\n", 0x3A, "_ringbuf_",
+    false, "SAVE_RINGBUF WCDMA\n", "_ringbuf_",
     "LogFile* CpRingBufConsumer::open_file(): open ring buffer file cp_wcdma_ringbuf"};
 const Transaction SLEEP_LOG = {
-    false, "SAVE_SLEEP_LOG WCDMA\n", 0x3B, "_sleeplog_",
+    false, "SAVE_SLEEP_LOG WCDMA\n", "_sleeplog_",
     "LogFile* CpSleepLogConsumer::open_file(): open sleep log file cp_wcdma_sleeplog"};
 
 class TransactionsTest : public FaultFixture {
 protected:
     TransactionsTest() { faults::set_time(0); }
-
-    bool begin(const Transaction& transaction, Client& client) {
-        if (transaction.dump) {
-            return begin_dump();
-        }
-        diag_dev.forget();
-        return client.say(transaction.request) &&
-               pump([&] { return diag_dev.received() == frame(transaction.diag_type, 0); });
-    }
 };
 
 TEST_F(TransactionsTest, OneThatCannotStartLeavesNothingBehind) {
@@ -73,18 +62,6 @@ TEST_F(TransactionsTest, OneThatCannotStartLeavesNothingBehind) {
             EXPECT_EQ(resources(), before);
             end_service();
         }
-    }
-}
-
-TEST_F(TransactionsTest, TheServiceEndsWithOneRunning) {
-    for (const Transaction& transaction : {DUMP, RINGBUF, SLEEP_LOG}) {
-        boot_modem(transaction.dump);
-        Client client;
-        ASSERT_EQ(ask(client, "FLUSH\n", "OK\n"), "OK\n");
-        const size_t descriptors = lasting_descriptors();
-        ASSERT_TRUE(begin(transaction, client));
-        end_service();
-        EXPECT_LT(lasting_descriptors(), descriptors);
     }
 }
 
