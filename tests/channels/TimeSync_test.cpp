@@ -27,6 +27,7 @@ class TimeSyncTest : public ChannelFixture {
 protected:
     ~TimeSyncTest() override {
         faults::reset();
+        faults::instead = {};
         set_zone("UTC0");
     }
 };
@@ -35,11 +36,14 @@ protected:
 TEST_F(TimeSyncTest, HangingServicesDoNotBlockTheLoop) {
     FullService time_service("cp_time_sync_server"), modemd("modemd"), wcnd("external_wcn_kest");
     const Fifo fifo(root.path("log_w"));
+    useconds_t waited = 0;
+    faults::instead.usleep = [&](useconds_t us) { return waited += us, 0; };
     EXPECT_EQ(boot("stream cp_wcdma on 5 3\n"), 0);
     EXPECT_TRUE(feed(fifo, "log"));
     ctrl->flush();
     EXPECT_EQ(content("cp_wcdma"), "log");
     EXPECT_TRUE(log.has("connect CP time sync server error [11(")) << log.text();
+    EXPECT_EQ(waited, 1000000u);
 }
 
 TEST_F(TimeSyncTest, ZoneIsTheDifferenceOfTheHoursFoldedAtMidnight) {

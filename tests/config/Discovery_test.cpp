@@ -63,6 +63,7 @@ TEST_F(DiscoveryTest, ModemTypeByPriority) {
         root.set_prop(std::string("persist.modem.") + modem.mode + ".enable", "1");
         LogConfig::propget_wan_modem_type();
         EXPECT_EQ(LogConfig::wan_modem_type(), modem.type);
+        EXPECT_EQ(cp_image_prop_suffix(modem.type), modem.mode + std::string(".nvp"));
     }
     for (const auto& modem : ORDER) {
         root.set_prop(std::string("persist.modem.") + modem.mode + ".enable", "0");

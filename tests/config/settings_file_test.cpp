@@ -11,6 +11,8 @@
 
 namespace {
 
+const std::string ON = DEFAULTS + "stream\tcp_wcn\ton\t1\t1\n";
+
 class SettingsFileTest : public ConfigFixture {
 protected:
     SettingsFileTest() {
@@ -34,11 +36,58 @@ protected:
     }
     ~SettingsFileTest() override { faults::instead = {}; }
 
+    // A start with this text in the settings file finds the stream, on or off, and has
+    // nothing to say.
+    void expect_whole(const std::string& text) {
+        root.write_file("moment.conf", text);
+        LogConfig config(root.path("moment.conf").c_str());
+        log.clear();
+        EXPECT_EQ(read(config), 0);
+        EXPECT_TRUE(log.text().empty() && config.find_stream(CT_WCN)) << log.text() << text;
+    }
+
     // Called before each call that changes the file. False: it fails.
     std::function<bool()> before_change = [] { return true; };
     size_t most = SIZE_MAX;  // bytes that one write takes
     size_t room = SIZE_MAX;  // bytes that fit into the file
 };
+
+TEST_F(SettingsFileTest, KillsFaultsAndAFullMediumLeaveTheOldSettingsOrTheNew) {
+    most = 4096;  // a kill between two pages is a moment of its own
+    const std::string line = "stream cp_wcn off 1 1";
+    std::string commented = line;
+    while (commented.size() < 10000) {
+        commented += "\n# settings\n";
+    }
+    for (const std::string& old : {DEFAULTS + line + "    \n", commented, line}) {
+        for (size_t failing = 0; failing < 8; ++failing) {  // 0: the medium is full
+            SCOPED_TRACE(std::to_string(old.size()) + ", fault " + std::to_string(failing));
+            root.write_file("kest_modem.conf", old);
+            LogConfig config(file.c_str());
+            ASSERT_EQ(read(config), 0);
+            config.set_stream(CT_WCN, true);
+            std::vector<std::string> moments;
+            before_change = [&] {
+                moments.push_back(root.read_file("kest_modem.conf"));
+                return moments.size() != failing;
+            };
+            room = failing ? SIZE_MAX : old.size() + 9;
+            const int result = config.save();
+            const bool fails = failing ? moments.size() >= failing : ON.size() > room;
+            EXPECT_EQ(result, fails ? -1 : 0);
+            before_change = [] { return true; };
+            room = SIZE_MAX;
+            EXPECT_EQ(config.dirty(), fails);
+            moments.push_back(root.read_file("kest_modem.conf"));
+            EXPECT_TRUE(!fails || failing > 1 || moments.back() == old);
+            for (const std::string& moment : moments) {
+                expect_whole(moment);
+            }
+            EXPECT_EQ(config.save(), 0);
+            EXPECT_EQ(root.read_file("kest_modem.conf"), ON);
+        }
+    }
+}
 
 TEST_F(SettingsFileTest, TheDefaultReplacesWhatIsMissingEmptyOrAnUnfinishedCopy) {
     const std::string whole = "stream cp_wcn on 1 2\n" + std::string(5000, '#');
@@ -106,7 +155,7 @@ TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
     // A default that cannot be read: it left an empty file, that is, settings without streams.
     faults::only_on("");
     faults::fail(faults::READ, 1, EIO, faults::FOREVER);
-    EXPECT_TRUE(refused("2"));
+    EXPECT_TRUE(refused("2") && faults::hit(faults::READ));
     EXPECT_FALSE(root.exists("kest_modem.conf"));
     faults::reset();
     // An empty file that was there before is no copy, though it could not be opened at first.
@@ -116,7 +165,7 @@ TEST_F(SettingsFileTest, WhatCannotBeReadToItsEndIsNoConfiguration) {
     faults::fail(faults::OPEN, 1, EMFILE, 2);
     LogConfig config(file.c_str());
     EXPECT_EQ(read(config), 0);
-    EXPECT_TRUE(root.exists("kest_modem.conf"));
+    EXPECT_TRUE(root.exists("kest_modem.conf") && faults::hit(faults::OPEN));
 }
 
 }  // namespace
