@@ -88,6 +88,7 @@ TEST_F(ControlOperationsTest, ActOnTheRunningObjectsAndTheFile) {
         {[&] { return turn(true, CT_WCN, CT_TD); }, {"off", "on"}, {"2 devices: wcdma gnss", "3 devices: wcdma wcn gnss"}},
         {[&] { return turn(false, CT_TD, CT_GNSS, CT_GNSS); }, {"ss\ton", "ss\toff"}, {"2 devices: wcdma gnss", "1 devices: wcdma"}},
         {[&] { return c->enable_wcdma_iq(CT_GNSS); }, {"\n\n\n", "\n\niq cp_gnss WCDMA\n\n"}, {"", ""}},
+        {[&] { return c->enable_wcdma_iq(CT_GNSS) + c->disable_wcdma_iq(CT_GNSS); }, {"\n\n\n", "\n\niq cp_gnss \n\n"}, {"", ""}},
         // clang-format on
     };
     const Fifo wcn(root.path("wcn"));

@@ -190,15 +190,16 @@ TEST_F(Properties, ReadersInSeveralThreadsGetWholeValues) {
     const std::string b(40, 'b');
     m_root.set_prop("k", a);
     std::atomic<bool> stop(false);
-    std::atomic<int> wrong(0);
+    std::atomic<int> reads(0), wrong(0);
     auto reader = [&] {
         while (!stop) {
             const std::string value = get("k");
+            ++reads;
             wrong += value != a && value != b;
         }
     };
     std::thread first(reader), second(reader);
-    for (int i = 0; i < 200; ++i) {
+    for (int i = 0; i < 200 || reads < 1000; ++i) {
         m_root.set_prop("k", i % 2 ? a : b);
     }
     stop = true;

@@ -12,9 +12,12 @@ namespace {
 class FailingMediumTest : public StorageTest {
 protected:
     FailingMediumTest() {
-        static Multiplexer mux;  // outlives the manager
-        EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &mux), 0);
+        EXPECT_EQ(m_mgr.init(m_root.path("sd").c_str(), nullptr, &mux()), 0);
         m_store = m_mgr.create_storage(&m_channel);
+    }
+    static Multiplexer& mux() {
+        static Multiplexer mux;  // outlives the manager
+        return mux;
     }
     // How many of that many blocks are lost.
     int lost_of(int blocks, const std::string& block) {
@@ -35,6 +38,24 @@ TEST_F(FailingMediumTest, WantOfDescriptorsKeepsTheCard) {
     m_store->stop();
     EXPECT_EQ(m_store->write("x", 1), -1);
     EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
+}
+
+// It seems to work each time it is tried.
+TEST_F(FailingMediumTest, ACardThatKeepsFailingRestsEachTimeLonger) {
+    boot_clock::freeze();
+    plug_card();
+    faults::only_on("/sd/modem_log/2");
+    faults::fail(faults::OPEN, 1, EIO, faults::FOREVER);
+    EXPECT_EQ(lost_of(20, "x"), 2);
+    for (const unsigned int s : {3u, 6u, 12u, 24u, 48u, 96u, 192u, 384u, 600u, 600u}) {
+        boot_clock::advance(s * 1000 - 1);
+        mux().timer_mgr().process_timers();
+        EXPECT_EQ(lost_of(2, "x"), 0) << s;
+        boot_clock::advance(1);
+        mux().timer_mgr().process_timers();
+        EXPECT_EQ(lost_of(2, "x"), 1) << s;
+    }
+    boot_clock::real();
 }
 
 bool on_card(int fd) {
@@ -321,6 +342,7 @@ TEST_F(FailingMediumTest, WhatAScanLeftOutIsNotDeleted) {
         ASSERT_EQ(internal().stat(), 0);
         internal().trim(16);
         check_sums(internal());
+        EXPECT_TRUE(faults::hit(c.call));
         faults::reset();
         EXPECT_EQ(m_root.list(dir).size() * 16, c.left);
         for (int i = 0; i < 16; ++i) {

@@ -92,6 +92,7 @@ TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
     for (int i = 0; i < 151; ++i) {
         EXPECT_EQ(internal().check_quota(), -1);
     }
+    EXPECT_GE(faults::calls(faults::LSTAT), 1600);
     EXPECT_LE(faults::calls(faults::LSTAT), 6500);  // four times
 }
 
