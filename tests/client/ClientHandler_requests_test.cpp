@@ -44,4 +44,11 @@ TEST_F(ClientRequestsTest, TheTableOfRequestsTellsTheTruth) {
     }
 }
 
+TEST_F(ClientRequestsTest, ALineOfMoreThan255BytesEndsTheConnection) {
+    const std::string longest = "FLUSH" + std::string(250, ' ');
+    Client client(TEST_SERVER);
+    talk(client, longest + "\n", "OK\n");
+    EXPECT_TRUE(client.say(longest + " \n") && pump([&] { return client.ended(); }));
+}
+
 }  // namespace

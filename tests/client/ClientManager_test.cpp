@@ -41,6 +41,18 @@ TEST_F(ClientManagerTest, FullLoop) {
     }));
 }
 
+// Its socket fills up; whatever the client misses, nobody waits for it.
+TEST_F(ClientManagerTest, AClientThatDoesNotReadHoldsUpNobody) {
+    Client lazy(TEST_SERVER), other(TEST_SERVER);
+    talk(lazy, "SUBSCRIBE WCN DUMP\n", "OK\n");
+    for (int i = 0; i < 20000; ++i) {
+        manager->notify_cp_dump(CT_WCN, CDE_START);
+    }
+    talk(other, "GET_LOG_FILE_SIZE\n", "OK 5\n");
+    EXPECT_LT(lazy.heard().size(), 20000 * strlen("CP_DUMP_START WCN\n"));
+    EXPECT_EQ(lazy.heard().size() % strlen("CP_DUMP_START WCN\n"), 0u) << "whole lines";
+}
+
 // A client of that user, who must be this one unless this one is root.
 std::unique_ptr<Client> client_of(uid_t uid) {
     const uid_t own = geteuid();

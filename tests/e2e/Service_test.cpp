@@ -100,6 +100,21 @@ TEST_F(ServiceTest, WhatItMakesHasItsModeInSpiteOfTheParentsMask) {
     }
 }
 
+// Its reply to a client that has left must not end the service.
+TEST_F(ServiceTest, AClientMayLeaveAtAnyTime) {
+    root.write_file(CONFIG, "");
+    run();
+    ASSERT_TRUE(wait_until([] { return Client().say("\n"); }));
+    process.signal(SIGSTOP);  // it finds the request of one who is gone
+    EXPECT_TRUE(Client().say("FLUSH\n"));
+    process.signal(SIGCONT);
+    Client other;
+    EXPECT_TRUE(other.say("FLUSH\n"));
+    EXPECT_TRUE(wait_until([&] { return other.heard().size() >= 3 || other.ended(); }));
+    EXPECT_EQ(other.heard(), "OK\n") << process.alive();
+    process.stop();
+}
+
 // Between two marked blocks, the system calls are those of the log path and no others.
 TEST_F(ServiceTest, ABlockCostsFiveSystemCallsAtMost) {
     if (system("strace -f -o /dev/null true 2>/dev/null") != 0) {
