@@ -314,6 +314,9 @@ TEST_F(KestlogStreamsTest, SigmfDescribesACaptureThatStaysWhereItIs) {
     EXPECT_NE(meta["global"]["core:description"].get<std::string>().find("2016-03-01 09:15:00"),
               std::string::npos);
     EXPECT_EQ(run("sigmf " + stem + ".bin" + told), 4);
+    write(INTERNAL + "cp_wcdma/cp_wcdma.version", "caf\u00e9");
+    EXPECT_EQ(run("sigmf -o - " + stem + ".bin" + told), 3);
+    EXPECT_EQ(Json::parse(m_out)["global"]["core:hw"], "cp_wcdma, firmware caf\u00e9");
 
     // A renamed capture says nothing of itself.
     write("caf\u00e9.bin", "12");

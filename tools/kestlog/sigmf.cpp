@@ -81,11 +81,11 @@ std::string firmware_version(const Capture& capture, Problems* problems) {
     return version;
 }
 
-// The dataset's name as it is, if JSON can hold it.
-Json dataset_name(const std::string& name) {
-    const Json text = name;
+// A text as it is, if JSON can hold it.
+Json own_text(const std::string& bytes) {
+    const Json text = bytes;
     const bool utf8 = Json::parse(text.dump(-1, ' ', false, Json::error_handler_t::ignore)) == text;
-    return utf8 ? text : Json(json_text(name));
+    return utf8 ? text : Json(json_text(bytes));
 }
 
 Json make_meta(const Capture& capture, const Settings& settings, const std::string& firmware) {
@@ -95,7 +95,7 @@ Json make_meta(const Capture& capture, const Settings& settings, const std::stri
                    {"core:datatype", settings.datatype},
                    {"core:sample_rate", number(settings.rate)},
                    {"core:num_channels", 1},
-                   {"core:dataset", dataset_name(name.text())}};
+                   {"core:dataset", own_text(name.text())}};
     if (const uint64_t rest = capture.size % settings.sample_bytes) {
         global["core:trailing_bytes"] = rest;
     }
@@ -103,7 +103,7 @@ Json make_meta(const Capture& capture, const Settings& settings, const std::stri
     if (!name.cp().empty()) {
         description += " of " + name.cp();
         global["core:hw"] =
-            json_text(name.cp() + (firmware.empty() ? "" : ", firmware " + firmware));
+            own_text(name.cp() + (firmware.empty() ? "" : ", firmware " + firmware));
     }
     // SigMF times are in UTC, and a name does not say the zone: so there is no core:datetime.
     if (has_time(name.time())) {
