@@ -132,13 +132,17 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
     for (const Json& item : json["timeline"]) {
         only(both["timeline"], item);
     }
-    // A copy that has its own times does not tell how long the newest file lasts.
+    // A copy that has its own times does not tell how long the newest file lasts, so neither a rate
+    // nor what is said of the time after it counts on that.
+    write(DAY + log_at(0, "09-12-00"), TIME_RECORD + frame(std::string(60000, 'y')));
     const std::string wcn = DAY + "../cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log";
     write(wcn, "");
     written_last(wcn, 100000);
     written_last(DAY + log_at(3, "09-00-00"), 5000);
-    only(report("handset", 3)["timeline"],
-         {{"size", 16}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
+    const Json copy = report("handset", 3);
+    only(copy["timeline"], {{"size", 60026}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
+    EXPECT_EQ(copy["timeline"].dump().find("silence"), std::string::npos);
+    EXPECT_EQ(only(copy["cps"], {{"rate", 3042 / 720}})["types"][0]["rate"], 0);
     only(report("handset --since 09:31", 3)["timeline"], {{"kind", "log"}, {"medium", "card"}});
     // Of a part nobody can say what was there before.
     const Json part = report("handset --since 09:05", 3);
@@ -157,16 +161,20 @@ TEST_F(ReportTest, ALotIsMergedAndStillCounted) {
                  i / 60 % 60, i % 60);
         std::ofstream(m_root.path(dir + name)) << "12";
     }
+    // What the clock was set behind has no length.
+    write(dir + "6000-cp_gnss-1970-01-01_00-00-05.log", std::string(1000, 'x'));
     const Json json = report(".");
     EXPECT_EQ(json["most_merged"], 2);
     uint64_t files = 0, size = 0;
     for (const Json& item : json["timeline"]) {
         files += item.value("files", 0u);
         size += item.value("size", 0u);
+        EXPECT_GE(item["from"], "2016");
+        EXPECT_LE(item.value("rate", 0u), 2u) << item;
     }
     EXPECT_LE(json["timeline"].size(), 5003u);
-    EXPECT_EQ(files, 6000u);
-    EXPECT_EQ(size, 12000u);
+    EXPECT_EQ(files, 6001u);
+    EXPECT_EQ(size, 13000u);
 }
 
 // A tone an eighth of the rate above the middle, half of full scale: -6 dB.
@@ -216,6 +224,14 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
         firsts += all["waveforms"][0]["channels"][0][0].dump() + " ";
     }
     EXPECT_EQ(firsts, "-508 492 252 493 -749 493 -511 493 -313 627 ");
+    for (int day = 10; day < 32; ++day) {
+        const std::string date = "2016-03-" + std::to_string(day);
+        write("many/modem_log/" + date + "-00-00-00/agdsp/0-agdsp-" + date + "_00-00-00.log",
+              chunk(1, day == 10 ? LOG : PCM, "12"));
+    }
+    const Json many = report("many --pcm-rate 1 --pcm-format s8");
+    EXPECT_EQ(many["waveforms"].size(), 20u);
+    EXPECT_EQ(many.value("more_waveforms", 0), 1);
     EXPECT_TRUE(report(".")["spectra"].empty());
     EXPECT_EQ(m_err, "");
     report(". --until 2000-01-01" + pictures);

@@ -39,6 +39,16 @@ std::string base64(const std::vector<uint8_t>& bytes) {
     return text;
 }
 
+// Whether it is known how long the log file lasts: not where only its start is known or the clock
+// was set meanwhile.
+bool length_is_known(const FilePlace& place) {
+    const TreeFile& log = *place.file;
+    const LogTime start = log.name.time(), end = log.end.time();
+    const bool newest = log.first_missing() == 0;
+    return clock_was_set(start) == clock_was_set(end) && !log.disordered &&
+           (!newest || (place.cp->own_times && !(local_time(log.modified) < start)));
+}
+
 size_t count_cps(const LogTree& tree) {
     std::set<std::string> names;
     for (const TreeSet& set : tree.sets) {
@@ -81,43 +91,50 @@ PieceVisitor CardReport::begin(const FilePlace& place) {
         return nullptr;
     }
     CpSum* const cp = &m_cps[place.cp->name];
-    Waveform* waveform = nullptr;
-    if (place.file->name.cp_type == CT_AGDSP) {
+    const bool of_dsp = place.file->name.cp_type == CT_AGDSP;
+    const bool timed = length_is_known(place);
+    if (of_dsp) {
         m_dsp_dumps.enter({place.set, place.cp, place.file});
     }
-    if (m_options.pcm && place.file->name.cp_type == CT_AGDSP) {
-        const auto found =
-            std::find_if(m_waveforms.begin(), m_waveforms.end(), [&place](const auto& entry) {
-                return entry.first.set == place.set && entry.first.cp == place.cp;
-            });
-        if (found != m_waveforms.end()) {
-            waveform = &found->second;
-        } else if (m_waveforms.size() < MAX_PICTURES) {
-            m_waveforms.push_back({place, Waveform(*m_options.pcm, m_options.pcm_channels)});
-            waveform = &m_waveforms.back().second;
-        }
-    }
-    return [this, cp, waveform](const Piece& piece) {
+    return [this, cp, of_dsp, timed](const Piece& piece) {
         if (!piece.intact) {
             return true;
         }
         TypeSum& sum = cp->types[piece.type * 256 + piece.sub_type];
         ++sum.count;
         sum.bytes += piece.data_len;
-        if (piece.kind && m_place.file->name.cp_type == CT_AGDSP) {
+        sum.timed_bytes += timed ? piece.data_len : 0;
+        if (piece.kind && of_dsp) {
             m_dsp_dumps.take(piece);
-        }
-        if (waveform && piece.kind) {
-            if (piece.seq_num != m_next_seq) {
-                waveform->restart();
-            }
-            m_next_seq = piece.seq_num + 1;
-            if (piece.kind == CHUNK_KINDS[CK_PCM]) {
-                waveform->add(piece.data, piece.data_len);
+            if (m_options.pcm) {
+                add_pcm(piece);
             }
         }
         return true;
     };
+}
+
+// The files of a CP in a set come one after the other.
+void CardReport::add_pcm(const Piece& piece) {
+    const bool begun = !m_waveforms.empty() && m_waveforms.back().first.cp == m_place.cp;
+    if (begun && piece.seq_num != m_next_seq) {
+        m_waveforms.back().second.restart();
+    }
+    m_next_seq = piece.seq_num + 1;
+    if (piece.kind != CHUNK_KINDS[CK_PCM] || piece.data_len == 0) {
+        return;
+    }
+    if (!begun && m_waveforms.size() == MAX_PICTURES) {
+        if (m_no_waveform != m_place.cp) {
+            add_row("waveforms", 0, nullptr);  // counts it
+        }
+        m_no_waveform = m_place.cp;
+        return;
+    }
+    if (!begun) {
+        m_waveforms.push_back({m_place, Waveform(*m_options.pcm, m_options.pcm_channels)});
+    }
+    m_waveforms.back().second.add(piece.data, piece.data_len);
 }
 
 // When the file was written to last or, when nothing tells that, when the next one began.
@@ -206,6 +223,7 @@ void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum
     item.files = 1;
     item.size = log.size;
     item.seconds = static_cast<uint64_t>(std::max<int64_t>(0, seconds_between(item.from, item.to)));
+    item.timed_size = length_is_known(place) ? log.size : 0;
     item.damages = m_file_damages;
     item.sequence_gaps = report.sequence_gaps;
     item.set = place.set;
@@ -215,6 +233,7 @@ void CardReport::add_log(const FilePlace& place, const FileReport& report, CpSum
 
     ++cp->logs;
     cp->log_size += log.size;
+    cp->timed_size += item.timed_size;
     cp->seconds += item.seconds;
     cp->frames += report.frames;
     for (const auto& chunks : report.chunks) {
@@ -241,7 +260,7 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to) {
         m_timeline.add(place.cp->name, TK_TRIMMED, gap);
         first = place.set->time;
     }
-    if (seconds_between(last.byte, first) > PAUSE_SECONDS) {
+    if (last.known && seconds_between(last.byte, first) > PAUSE_SECONDS) {
         gap.from = last.byte;
         gap.to = first;
         gap.words = "nothing was logged";
@@ -253,8 +272,10 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to) {
         gap.words = missing_text(log);
         m_timeline.add(place.cp->name, TK_MISSING, gap);
     }
+    const LogTime end = log.missing ? log.end.time() : to;
+    last.known = length_is_known(place) && (last.known || !(end < last.byte));
     last.set = place.set;
-    last.byte = std::max(last.byte, log.missing ? log.end.time() : to);
+    last.byte = std::max(last.byte, end);
 }
 
 void CardReport::add_version(const FilePlace& place) {

@@ -48,10 +48,11 @@ private:
     struct TypeSum {
         uint64_t count = 0;
         uint64_t bytes = 0;
+        uint64_t timed_bytes = 0;  // in files whose length is known
     };
     struct CpSum {
         uint64_t files = 0, size = 0;
-        uint64_t logs = 0, log_size = 0, seconds = 0;
+        uint64_t logs = 0, log_size = 0, timed_size = 0, seconds = 0;
         uint64_t frames = 0, chunks = 0, broken = 0, payload = 0, other = 0;
         uint64_t sequence_gaps = 0, missing = 0;
         uint64_t damages = 0, notes = 0;
@@ -61,6 +62,7 @@ private:
     struct Last {
         std::string version;
         LogTime byte;                  // of its last log file
+        bool known = true;             // whether that is its end
         const TreeSet* set = nullptr;  // of that
     };
     struct SetSum {
@@ -76,6 +78,7 @@ private:
     LogTime last_byte(const FilePlace& log);
     void add_log(const FilePlace& place, const FileReport& report, CpSum* cp);
     void add_gaps(const FilePlace& place, const LogTime& to);
+    void add_pcm(const Piece& piece);
     void add_version(const FilePlace& place);
     Last& last_of(const FilePlace& place) { return m_last[{place.set->handset, place.cp->name}]; }
     void add_database(const TreeFile& file);
@@ -98,7 +101,8 @@ private:
     std::vector<std::pair<FilePlace, Waveform>> m_waveforms;
     std::vector<Crash> m_dsp_crashes;
     DspDumps m_dsp_dumps{[this](const DspDump& dump) { add_crash(dump, &m_dsp_crashes); }};
-    uint32_t m_next_seq = 0;  // of PCM data in one file
+    uint32_t m_next_seq = 0;                // of PCM data in one file
+    const TreeCp* m_no_waveform = nullptr;  // the last one with PCM data that gets none
     uint64_t m_files = 0, m_size = 0;
     uint64_t m_damages = 0, m_notes = 0, m_unreadable = 0;
     uint64_t m_file_damages = 0;

@@ -63,7 +63,7 @@ void CardReport::write_totals() {
     }
     for (const auto& [place, waveform] : m_waveforms) {
         if (waveform.samples()) {
-            add_row("waveforms", MAX_PICTURES, waveform_json(place, waveform));
+            m_json["waveforms"].push_back(waveform_json(place, waveform));
         }
     }
     m_json["timeline"] = m_timeline.json();
@@ -89,7 +89,7 @@ Json CardReport::cp_json(const std::string& name, const CpSum& sum) const {
                              {"sub_type", type % 256},
                              {"count", amount.count},
                              {"bytes", amount.bytes}});
-            add_rate(&types.back(), amount.bytes, sum.seconds);
+            add_rate(&types.back(), amount.timed_bytes, sum.seconds);
         } else {
             ++more;
         }
@@ -101,7 +101,7 @@ Json CardReport::cp_json(const std::string& name, const CpSum& sum) const {
         {"payload", sum.payload}, {"other_bytes", sum.other}, {"sequence_gaps", sum.sequence_gaps},
         {"missing", sum.missing}, {"damages", sum.damages},   {"notes", sum.notes},
         {"types", types}};
-    add_rate(&json, sum.log_size, sum.seconds);
+    add_rate(&json, sum.timed_size, sum.seconds);
     if (more) {
         json["more_types"] = more;
     }

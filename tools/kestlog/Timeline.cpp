@@ -6,12 +6,11 @@
 #include <nlohmann/json.hpp>
 
 void TimelineItem::merge(const TimelineItem& next) {
-    if (has_time(next.from)) {
-        from = has_time(from) ? std::min(from, next.from) : next.from;
-    }
+    take_earlier(&from, next.from);
     to = std::max(to, next.to);
     files += next.files;
     size += next.size;
+    timed_size += next.timed_size;
     seconds += next.seconds;
     damages += next.damages;
     sequence_gaps += next.sequence_gaps;
@@ -73,7 +72,7 @@ Json Timeline::json() const {
                 object["sequence_gaps"] = item.sequence_gaps;
             }
             if (item.seconds) {
-                object["rate"] = item.size / item.seconds;
+                object["rate"] = item.timed_size / item.seconds;
             }
             if (!item.words.empty()) {
                 object["words"] = json_text(item.words);

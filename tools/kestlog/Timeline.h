@@ -27,7 +27,8 @@ struct TimelineItem {
     LogTime from, to;
     uint64_t files = 0;
     uint64_t size = 0;
-    uint64_t seconds = 0;  // that the files last together
+    uint64_t timed_size = 0;  // of the files whose length is known
+    uint64_t seconds = 0;     // that these last together
     uint64_t damages = 0;
     uint64_t sequence_gaps = 0;
     const TreeSet* set = nullptr;
