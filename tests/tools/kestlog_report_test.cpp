@@ -83,7 +83,7 @@ protected:
         write(on_card + log_at(0, "09-31-00"), TIME_RECORD);
         write(on_card + "cp_wcdma.version", "baseband 2");
         write(CARD + HOSTILE + "/x", "x");
-        write(OTHER + "2016-03-01-09-13-00/cp_wcdma/cp_wcdma.version", "baseband 9");
+        write(OTHER + "2016-03-01-09-13-00/cp_wcdma/cp_wcdma.version", "b\u00e4seband 9");
         write(OTHER + "1970-01-01-00-00-05/cp_wcdma/0-cp_wcdma-1970-01-01_00-00-06.log", "x");
     }
 };
@@ -132,8 +132,7 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
     for (const Json& item : json["timeline"]) {
         only(both["timeline"], item);
     }
-    // A copy that has its own times does not tell how long the newest file lasts, so neither a rate
-    // nor what is said of the time after it counts on that.
+    // A copy that has its own times does not tell how long the newest file lasts, nor its rate.
     write(DAY + log_at(0, "09-12-00"), TIME_RECORD + frame(std::string(60000, 'y')));
     const std::string wcn = DAY + "../cp_wcn/0-cp_wcn-2016-03-01_09-00-00.log";
     write(wcn, "");
@@ -230,8 +229,7 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
               chunk(1, day == 10 ? LOG : PCM, "12"));
     }
     const Json many = report("many --pcm-rate 1 --pcm-format s8");
-    EXPECT_EQ(many["waveforms"].size(), 20u);
-    EXPECT_EQ(many.value("more_waveforms", 0), 1);
+    EXPECT_EQ(many["waveforms"].size() + many.value("more_waveforms", 0u), 21u);
     EXPECT_TRUE(report(".")["spectra"].empty());
     EXPECT_EQ(m_err, "");
     report(". --until 2000-01-01" + pictures);
@@ -277,18 +275,41 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
     }
     write_day();
     const std::string dsp_log = "2016-03-01-09-13-00/agdsp/0-agdsp-2016-03-01_09-14-00.log";
-    write(OTHER + dsp_log, chunk(1, LOG, "one") + chunk(3, LOG, "three"));
-    const Json json = report("handset other", 3);
+    write(OTHER + dsp_log, chunk(1, PCM, "one") + chunk(3, LOG, "three"));
+    // A second that only a name has, and a time before 1970.
+    write(OTHER + "2016-03-01-09-13-00/cp_wcdma/mini_dump_2016-03-01_09-13-60.bin", "leap");
+    write(OTHER + "1969-12-31-19-00-00/cp_wcdma/mini_dump_1969-12-31_19-00-05.bin", "west");
+    write(OTHER + "2016-03-01-09-13-00/cp_wcdma/cp_wcdma_wiq_2016-03-01_09-13-30.bin", "short");
+    const std::string args =
+        "handset other --iq-rate 1 --iq-format ci8 --pcm-rate 0.0001 --pcm-format s8";
+    const Json json = report(args, 3);
     only(json["timeline"], {{"cp", "agdsp"}, {"kind", "log"}, {"sequence_gaps", 1}});
-    run("report handset other -o page.html");
-    // Keys and wheel as a reader would use them, then what they show.
+    run("report " + args + " -o page.html");
+    // Keys, wheel and pointer as a reader would use them, then what they show.
     write("page.html", m_root.read_file("page.html") + R"(<script>
         const chart = document.querySelector('#chart svg');
         const range = () => document.getElementById('range').textContent;
         const press = (key) => chart.dispatchEvent(new KeyboardEvent('keydown', {key: key}));
+        const strays = [['down', 2], ['move', 2], ['down', 1], ['cancel', 0], ['move', 1],
+            ['down', 1], ['move', 0]];  // none of these drags
+        const stray = ([type, buttons], i) => chart.dispatchEvent(new PointerEvent('pointer' + type,
+            {clientX: 300 + 50 * i, buttons: buttons, button: buttons & 2, bubbles: true}));
         const seen = [];
-        const todo = [() => press('+'), () => press('ArrowRight'), () => press('n'),
-            () => chart.dispatchEvent(new WheelEvent('wheel', {deltaY: 1})), () => press('0')];
+        const todo = [() => press('+'),
+            () => { strays.forEach(stray); press('ArrowRight'); }, () => press('n'),
+            () => chart.dispatchEvent(new WheelEvent('wheel', {deltaY: 1})), () => press('0'),
+            () => document.querySelectorAll('td button')[2].click(), () => press('0'), more];
+        function more() {  // the page again, without times and with what a far larger tree has
+            const title = document.title, again = document.createElement('script');
+            const had = JSON.parse(data.textContent);
+            document.body.append(unset.cloneNode(true));
+            data.textContent = JSON.stringify({...had, sets: [], more_sets: 11, more_spectra: 12,
+                more_waveforms: 13, cps: had.cps.map((cp) => ({...cp, more_types: 7})),
+                timeline: [1, 2, 3, 4, 5].map((i) => ({medium: 'no ' + i, from: '-', to: '-'}))});
+            again.textContent = document.scripts[1].textContent;
+            document.body.append(again);
+            document.title = title;
+        }
         setInterval(() => {
             if (range() !== seen[seen.length - 1]) {  // the last action has been drawn
                 seen.push(range());
@@ -318,19 +339,25 @@ TEST_F(ReportTest, ABrowserShowsTheNumbersAndNoError) {
                  "</td>";
     }
     EXPECT_NE(dom.find("<td class=\"cp\">cp_wcdma</td>" + cells), std::string::npos) << cells;
-    EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size() - 1);
+    EXPECT_EQ(occurrences(dom, "class=\"item\""), json["timeline"].size() - 2);
+    EXPECT_EQ(occurrences(dom, "title=\"Show it\""), json["crashes"].size() - 1);
     EXPECT_EQ(occurrences(dom, "class=\"lost\""), 2u);  // with the one of the legend
-    EXPECT_NE(dom.find("not set for 1 of 15 items and 1 of 4 sets"), std::string::npos);
-    EXPECT_NE(dom.find(">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<"),
-              std::string::npos);
-    EXPECT_NE(dom.find("<p id=\"detail\" aria-live=\"polite\">cp_wcdma · nothing since the start"),
-              std::string::npos);
+    for (const char* shown :
+         {"not set for 2 of 18 items and 2 of 5 sets",
+          ">handset/storage/sdcard0/modem_log/&lt;script&gt;alert(1)&lt;\xc3\xbf<",
+          "<p id=\"detail\" aria-live=\"polite\">cp_wcdma · nothing since the start",
+          "drawn and listed; there are 11 more", "and 12 more", "and 13 more", "and 14 more",
+          "\"m4\" fill-opacity=\"0.55\"></rect></svg><span>log on no 5<", ">b\u00e4seband 9<",
+          ", 30,000 s at", "short for a spectrum (256",
+          "<div id=\"line\" hidden=", ">Nothing here has a time.<"}) {
+        EXPECT_NE(dom.find(shown), std::string::npos) << shown;
+    }
     const std::string ALL = "2016-03-01 07:58:10 to 2016-03-01 09:32:49|";
     const std::string shown =
         ALL +
         "2016-03-01 08:21:50 to 2016-03-01 09:09:09|2016-03-01 08:33:40 to 2016-03-01 09:20:59|"
         "2016-03-01 07:58:10 to 2016-03-01 08:45:30|2016-03-01 07:58:10 to 2016-03-01 08:57:19|" +
-        ALL;
+        ALL + "2016-03-01 09:09:00 to 2016-03-01 09:19:00|" + ALL;
     EXPECT_NE(dom.find("<title>" + shown), std::string::npos)
         << dom.substr(dom.find("<title>"), 400);
 }

@@ -3,7 +3,18 @@
 // an attribute's value, never through markup.
 'use strict';
 (function () {
-const data = JSON.parse(document.getElementById('data').textContent);
+// Names come byte by byte, each as the code point of its number: those in UTF-8 become it again.
+const utf8 = new TextDecoder('utf-8', {fatal: true, ignoreBOM: true});
+function readable(text) {
+    try {
+        return /[\x80-\xff]/.test(text)
+            ? utf8.decode(Uint8Array.from(text, (c) => c.charCodeAt(0))) : text;
+    } catch (error) {
+        return text;
+    }
+}
+const data = JSON.parse(document.getElementById('data').textContent,
+    (key, value) => typeof value === 'string' ? readable(value) : value);
 const byId = (id) => document.getElementById(id);
 const SVG = 'http://www.w3.org/2000/svg';
 
@@ -19,12 +30,26 @@ function node(parent, tag, attributes, text) {
     return parent.appendChild(made);
 }
 
+// How many are left out of a list.
+function noteMore(parent, count) {
+    if (count) {
+        node(parent, 'p', {class: 'note'}, 'and ' + number(count) + ' more');
+    }
+}
+
 const number = (n) => n === null || n === undefined ? '-' : n.toLocaleString('en-US');
 // The local time of a handset is read and written as if it were UTC: no zone of the reader counts.
-const seconds = (text) => Date.parse(text.replace(' ', 'T') + 'Z') / 1000;
+// A name may give a second 60 or a day 31 of any month, which only a sum takes. NaN without a time.
+function seconds(text) {
+    const [, year, month, day, hour, minute, second] =
+        /^(\d+)-(\d+)-(\d+) (\d+):(\d+):(\d+)$/.exec(text) || [];
+    return new Date(0).setUTCFullYear(year, month - 1, day) / 1000 +
+        hour * 3600 + minute * 60 + Number(second);
+}
 const clock = (s) => new Date(s * 1000).toISOString().slice(0, 19).replace('T', ' ');
 const scaled = (n, unit) => n >= 1e6 ? (n / 1e6).toFixed(1) + ' M' + unit
     : n >= 1e3 ? (n / 1e3).toFixed(1) + ' k' + unit : n + ' ' + unit;
+const rounded = (n) => n.toLocaleString('en-US', {maximumSignificantDigits: 4});
 
 // ---- the head
 byId('roots').textContent = data.roots.join('  ');
@@ -56,15 +81,17 @@ const NAMES = {log: 'log file', trimmed: 'nothing since the start of the set',
 const LINES = {damaged: {member: 'damages', text: 'damage'},
     lost: {member: 'sequence_gaps', text: 'sequence gaps: chunks are lost'}};
 const lanes = data.cps.map((cp) => cp.cp);
-const media = [...new Set(data.sets.map((set) => set.medium))];
-const medium = (item) => 'm' + Math.max(0, media.indexOf(item.medium)) % 4;
+const COLOURS = 8;
+const media = [...new Set(data.sets.concat(data.timeline).map((each) => each.medium))]
+    .filter((name) => name !== undefined);
+const medium = (item) => 'm' + Math.max(0, media.indexOf(item.medium)) % COLOURS;
 const rank = (item) => ORDER.includes(item.kind) ? ORDER.indexOf(item.kind) : ORDER.length;
 const timed = data.timeline
     .map((item) => ({...item, t0: seconds(item.from), t1: seconds(item.to),
         lane: lanes.indexOf(item.cp)}))
-    .filter((item) => item.t0 >= 0 && item.lane >= 0)
+    .filter((item) => !Number.isNaN(item.t0) && item.lane >= 0)
     .map((item) => ({...item, t1: item.t1 >= item.t0 ? item.t1 : item.t0}));
-const timedSets = data.sets.filter((set) => seconds(set.time) >= 0);
+const timedSets = data.sets.filter((set) => !Number.isNaN(seconds(set.time)));
 // What a clock that was not set has named is drawn only when there is nothing else.
 const SET_CLOCK = Date.UTC(2000, 0, 1) / 1000;
 const wasSet = (t) => t >= SET_CLOCK;
@@ -293,15 +320,19 @@ chart.addEventListener('wheel', (event) => {
 }, {passive: false});
 let held = null;
 chart.addEventListener('pointerdown', (event) => {
-    held = {at: share(event), from: view[0]};
+    held = event.button ? null : {at: share(event), from: view[0]};
 });
 window.addEventListener('pointermove', (event) => {
-    if (held) {
+    if (!event.buttons) {  // it was released elsewhere
+        held = null;
+    } else if (held) {
         const length = view[1] - view[0];
         show(held.from - (share(event) - held.at) * length, length);
     }
 });
-window.addEventListener('pointerup', () => { held = null; });
+for (const end of ['pointerup', 'pointercancel']) {
+    window.addEventListener(end, () => { held = null; });
+}
 window.addEventListener('resize', redraw);
 
 function legend(kind, text) {
@@ -319,7 +350,7 @@ function legend(kind, text) {
     }
     node(entry, 'span', {}, text);
 }
-media.slice(0, 4).forEach((name, i) => legend('m' + i, 'log on ' + name));
+media.forEach((name, i) => legend('m' + i % COLOURS, 'log on ' + name));
 for (const kind of SPANS.concat(['crash'], Object.keys(LETTERS))) {
     if (items.some((item) => item.kind === kind)) {
         legend(kind, NAMES[kind] || kind);
@@ -330,19 +361,31 @@ for (const kind in LINES) {
         legend(kind, LINES[kind].text);
     }
 }
+function tell(id, text) {
+    byId(id).hidden = false;
+    byId(id).textContent = text;
+}
 if (data.most_merged > 1) {
-    byId('merged').hidden = false;
-    byId('merged').textContent = 'There is too much to draw all of it: up to ' +
-        number(data.most_merged) + ' neighbours are drawn as one. The tables count everything.';
+    tell('merged', 'There is too much to draw all of it: up to ' + number(data.most_merged) +
+        ' neighbours are drawn as one. The tables count everything.');
+}
+if (data.more_sets) {
+    tell('more-sets', 'Only the starts of the first ' + number(data.sets.length) +
+        ' sets are drawn and listed; there are ' + number(data.more_sets) + ' more.');
 }
 if (items.length < timed.length || sets.length < timedSets.length) {
-    byId('unset').hidden = false;
-    byId('unset').textContent = 'The clock was not set for ' +
+    tell('unset', 'The clock was not set for ' +
         number(timed.length - items.length) + ' of ' + number(timed.length) + ' items and ' +
-        number(timedSets.length - sets.length) + ' of ' + number(timedSets.length) +
-        ' sets: their times lie before 2000, so they are not drawn. The tables count them.';
+        number(timedSets.length - sets.length) + ' of ' + (data.more_sets ? 'the first ' : '') +
+        number(timedSets.length) +
+        ' sets: their times lie before 2000, so they are not drawn. The tables count them.');
 }
-draw();
+if (starts.length) {
+    draw();
+} else {
+    byId('line').hidden = true;
+    tell('unset', 'Nothing here has a time.');
+}
 
 // ---- spectra and waveforms
 function figure(title) {
@@ -360,15 +403,17 @@ if (data.spectra.length) {
     node(byId('pictures'), 'h2', {}, 'I/Q captures');
 }
 for (const each of data.spectra) {
-    const length = (each.samples / each.rate).toPrecision(4);
+    const length = rounded(each.samples / each.rate);
     const text = each.cp + ' · ' + each.name + ' · ' + number(each.samples) + ' samples of ' +
         each.format + ', ' + length + ' s from left to right · up: frequency from ' +
         number(-each.rate / 2) + ' to ' + number(each.rate / 2) + ' Hz';
-    const canvas = node(figure(text), 'canvas', {width: Math.max(1, each.columns),
-        height: each.bins, role: 'img', 'aria-label': 'Spectrum over time'});
+    const made = figure(text);
     if (!each.columns) {
+        made.firstChild.textContent += ' · too short for a spectrum (' + each.bins + ' samples)';
         continue;
     }
+    const canvas = node(made, 'canvas', {width: each.columns, height: each.bins, role: 'img',
+        'aria-label': 'Spectrum over time'});
     const levels = Array.from(atob(each.levels), (c) => c.charCodeAt(0));
     // All colours go to the levels that there are.
     const low = levels.reduce((a, b) => Math.min(a, b), 255);
@@ -385,13 +430,14 @@ for (const each of data.spectra) {
     }
     context.putImageData(image, 0, 0);
 }
+noteMore(byId('pictures'), data.more_spectra);
 if (data.waveforms.length) {
     node(byId('pictures'), 'h2', {}, 'PCM data');
 }
 for (const each of data.waveforms) {
     const text = each.cp + (each.set ? ' · set ' + each.set : '') + ' · ' +
         number(each.samples) + ' samples of ' + each.format + ' a channel, ' +
-        (each.samples / each.rate).toPrecision(4) + ' s at ' + number(each.rate) +
+        rounded(each.samples / each.rate) + ' s at ' + number(each.rate) +
         ' Hz · least and greatest of every ' + number(each.samples_per_point);
     const made = figure(text);
     for (const points of each.channels) {
@@ -408,10 +454,11 @@ for (const each of data.waveforms) {
         node(picture, 'path', {d: path + 'Z', class: 'wave', 'vector-effect': 'non-scaling-stroke'});
     }
 }
+noteMore(byId('pictures'), data.more_waveforms);
 
 // ---- tables
 // Columns: heading and either a key of the row or a function of it. Numbers stand to the right.
-function table(list, caption, rows, columns) {
+function table(list, caption, rows, columns, more) {
     if (!rows.length) {
         return;
     }
@@ -432,18 +479,17 @@ function table(list, caption, rows, columns) {
             const content = value(row, key);
             const cell = node(line, 'td', {class: classes[i]},
                 columnIsNumber[i] ? number(content) : content === null ? '-' : content);
-            if (key === 'time' && list === 'crashes') {
+            const at = key === 'time' && list === 'crashes' ? seconds(row.time) : NaN;
+            if (at >= first && at <= last) {
                 const button = node(cell, 'button', {type: 'button', title: 'Show it'}, '↑');
                 button.addEventListener('click', () => {
-                    show(seconds(row.time) - 300, 600);
+                    show(at - 300, 600);
                     byId('time').scrollIntoView();
                 });
             }
         });
     }
-    if (data['more_' + list]) {
-        node(place, 'p', {class: 'note'}, 'and ' + number(data['more_' + list]) + ' more');
-    }
+    noteMore(place, more || data['more_' + list]);
 }
 const WHERE = [['medium', 'medium'], ['set', 'set']];
 const hex = (n) => '0x' + n.toString(16).padStart(2, '0');
@@ -460,7 +506,8 @@ table('types', 'Types of frames and chunks in the logs',
     data.cps.flatMap((cp) => cp.types.map((type) => ({cp: cp.cp, ...type}))),
     [['co-processor', 'cp'], ['type', (row) => hex(row.type)],
         ['sub-type', (row) => hex(row.sub_type)], ['count', 'count'],
-        ['bytes of payload', 'bytes'], ['bytes/s', 'rate']]);
+        ['bytes of payload', 'bytes'], ['bytes/s', 'rate']],
+    data.cps.reduce((sum, cp) => sum + (cp.more_types || 0), 0));
 table('sets', 'Sets', data.sets, [['set', (row) => row.set || row.path], ['medium', 'medium'],
     ['from', 'from'], ['to', 'to'], ['co-processors', 'cps'], ['files', 'files'],
     ['bytes', 'size'], ['damages', 'damages']]);
