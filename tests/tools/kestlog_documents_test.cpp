@@ -109,7 +109,7 @@ const struct {
     {"join", {"--cp agdsp -o all ."}},
     {"extract", {"-o images ."}},
 #ifdef KEST_WAV
-    {"wav", {"--rate 8000 --channels 1 --format s16le -o sound.wav ."}},
+    {"wav", {"--rate 8000 --channels 1 --format u8 -o sound.wav ."}},
 #endif
     {"sigmf", {"--datatype ci16_le --rate 1 --frequency 1 -o meta iq"}},
     {"follow", {CHANGES}},  // the last: it deletes
