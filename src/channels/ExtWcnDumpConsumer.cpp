@@ -16,6 +16,10 @@ constexpr size_t END_MARKER_LEN = sizeof(END_MARKER) - 1;
 // The marker comes in a short chunk. In a longer one the same bytes are memory content.
 constexpr size_t MARKER_CHUNK_LIMIT = 4096;
 
+bool ends_dump(const uint8_t* chunk, size_t len) {
+    return len < MARKER_CHUNK_LIMIT && find_bytes(chunk, len, END_MARKER, END_MARKER_LEN);
+}
+
 }  // namespace
 
 ExtWcnDumpConsumer::ExtWcnDumpConsumer(const char* cp_name, CpStorage* storage,
@@ -24,10 +28,6 @@ ExtWcnDumpConsumer::ExtWcnDumpConsumer(const char* cp_name, CpStorage* storage,
 
 ExtWcnDumpConsumer::~ExtWcnDumpConsumer() {
     m_storage->unsubscribe_ext_stor_umount_evt(this);
-}
-
-bool ExtWcnDumpConsumer::ends_dump(const uint8_t* chunk, size_t len) {
-    return len < MARKER_CHUNK_LIMIT && find_bytes(chunk, len, END_MARKER, END_MARKER_LEN);
 }
 
 int ExtWcnDumpConsumer::start() {

@@ -15,9 +15,6 @@ public:
     int start() override;
     bool process(DeviceFileHandler::DataBuffer& buf) override;
 
-    // True when the chunk ends the dump: it has the marker and is a short one.
-    static bool ends_dump(const uint8_t* chunk, size_t len);
-
     static void on_ext_stor_umount(void* consumer);
 };
 

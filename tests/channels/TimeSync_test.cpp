@@ -66,6 +66,8 @@ TEST_F(TimeSyncTest, ZoneIsTheDifferenceOfTheHoursFoldedAtMidnight) {
         set_zone(c.tz);
         faults::set_time(midnight + c.hour * 3600 + c.minute * 60);
         EXPECT_EQ(time_zone_hours(), c.zone) << c.tz << " at " << c.hour << ":" << c.minute;
+        EXPECT_EQ(make_time_sync_record({1, 0, 1, 0}, c.zone).seconds,
+                  0x10001u + 3600u * static_cast<uint32_t>(c.zone));
     }
     faults::set_time(-1);
     EXPECT_EQ(time_zone_hours(), 0);

@@ -7,9 +7,6 @@
 #include <sys/stat.h>
 #include <time.h>
 
-#include <atomic>
-#include <thread>
-
 #include "support/TestRoot.h"
 #include "support/faults.h"
 
@@ -183,29 +180,6 @@ TEST_F(Properties, WallClockJumps) {
     for (int i = 0; i < 3; ++i) {
         EXPECT_EQ(opens_of_one_read(), 1);
     }
-}
-
-TEST_F(Properties, ReadersInSeveralThreadsGetWholeValues) {
-    const std::string a(91, 'a');
-    const std::string b(40, 'b');
-    m_root.set_prop("k", a);
-    std::atomic<bool> stop(false);
-    std::atomic<int> reads(0), wrong(0);
-    auto reader = [&] {
-        while (!stop) {
-            const std::string value = get("k");
-            ++reads;
-            wrong += value != a && value != b;
-        }
-    };
-    std::thread first(reader), second(reader);
-    for (int i = 0; i < 200 || reads < 1000; ++i) {
-        m_root.set_prop("k", i % 2 ? a : b);
-    }
-    stop = true;
-    first.join();
-    second.join();
-    EXPECT_EQ(wrong, 0);
 }
 
 }  // namespace

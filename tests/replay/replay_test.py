@@ -153,15 +153,6 @@ def test_served_for_clients(temp):
     assert len(glob.glob(glob.escape(root) + "/data/modem_log/*/cp_wcdma/*.dmp")) == 2
 
 
-def test_example_of_the_manual_page(temp):
-    with open(f"{RECORDINGS}/../../docs/man/kestsim.1") as f:
-        example = re.findall(r"^\.nf\n(.*?)^\.fi", f.read(), re.S | re.M)[-1].replace("\\-", "-")
-    subprocess.run(["bash", "-c", "set -e; trap 'kill $!; wait $!' EXIT\n" +
-                    example.replace("/tmp/h1", temp + "/h1") +
-                    f"until ls {temp}/h1/data/modem_log/*/cp_wcdma/*.dmp; do kill -0 $!; sleep 0.1; done"],
-                   check=True, env={**os.environ, "PATH": os.path.dirname(KESTSIM) + ":" + os.environ["PATH"]})
-
-
 def test_interrupted_script(temp):
     ran = subprocess.Popen([PLAY, f"{RECORDINGS}/iq_save.in"], env={**os.environ, "TMPDIR": temp})
     while not os.listdir(temp) and ran.poll() is None:
