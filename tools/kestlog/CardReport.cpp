@@ -263,7 +263,7 @@ void CardReport::add_gaps(const FilePlace& place, const LogTime& to) {
     if (last.known && seconds_between(last.byte, first) > PAUSE_SECONDS) {
         gap.from = last.byte;
         gap.to = first;
-        gap.words = "nothing was logged";
+        gap.words = "no log: the CP was silent or off, or the quota deleted files";
         m_timeline.add(place.cp->name, TK_SILENCE, gap);
     }
     if (log.missing) {

@@ -86,6 +86,7 @@ void LiveTree::removed(Dir& dir, const std::string& name) {
     if (it != dir.files.end()) {
         ++dir.deleted;
         dir.deleted_size += it->second.size;
+        dir.deleted_name = name;
         dir.files.erase(it);
         forget({&dir, name});
     }
@@ -198,13 +199,19 @@ void LiveTree::tell_damage(const Dir& dir, const FileName& name, const Finding& 
 }
 
 void LiveTree::tell_deleted(Dir& dir) {
-    LiveEvent event("deleted", dir.medium + " " + dir.cp,
-                    files_text(dir.deleted, dir.deleted_size) + " deleted");
+    const bool one = dir.deleted == 1;
+    const std::string files =
+        one ? escape_text(dir.deleted_name) + ", " + size_text(dir.deleted_size)
+            : files_text(dir.deleted, dir.deleted_size);
+    LiveEvent event("deleted", dir.medium + " " + dir.cp, "deleted: " + files);
     event.json.update({{"medium", json_text(dir.medium)},
                        {"set", json_text(dir.set)},
                        {"cp", json_text(dir.cp)},
                        {"files", dir.deleted},
                        {"size", dir.deleted_size}});
+    if (one) {
+        event.json["file"] = json_text(dir.deleted_name);
+    }
     dir.deleted = dir.deleted_size = 0;
     m_tell(event);
 }

@@ -39,6 +39,7 @@ public:
         std::map<std::string, File> files;  // by name
         uint64_t deleted = 0;               // files, not yet told
         uint64_t deleted_size = 0;
+        std::string deleted_name;  // of the last of them
         DumpWatch dumps;
     };
     // Of all files of a CP.

@@ -17,7 +17,7 @@
 // Kinds of items, in the order in which they are drawn.
 constexpr char TK_LOG[] = "log";
 constexpr char TK_TRIMMED[] = "trimmed";  // no log from the start of a set on
-constexpr char TK_SILENCE[] = "silence";  // nothing was logged between two files
+constexpr char TK_SILENCE[] = "silence";  // no log between two files
 constexpr char TK_MISSING[] = "missing";  // numbers are missing
 constexpr char TK_CRASH[] = "crash";
 constexpr char TK_FIRMWARE[] = "firmware";  // another version than before

@@ -74,8 +74,9 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
         print_json(object);
         return;
     }
-    printf("%s%12llu  %-16s %s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),
-           file.name.kind(), escape_text(file.name.text()).c_str());
+    printf("%s%12llu  %-16s %s%s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),
+           file.name.kind(), escape_text(file.name.text()).c_str(),
+           set ? "" : ("  on " + escape_text(file.dir->medium)).c_str());
 }
 
 // A line of the tree; the margin of the lines below it.

@@ -75,7 +75,7 @@ const SPANS = ['trimmed', 'silence', 'missing'];
 const ORDER = ['log'].concat(SPANS);
 const LETTERS = {'ring buffer': 'R', 'sleep log': 'S', 'I/Q samples': 'Q', firmware: 'F'};
 const NAMES = {log: 'log file', trimmed: 'nothing since the start of the set',
-    silence: 'nothing was logged', missing: 'missing numbers', crash: 'crash',
+    silence: 'no log', missing: 'missing numbers', crash: 'crash',
     firmware: 'other firmware'};
 // Above and below a bar.
 const LINES = {damaged: {member: 'damages', text: 'damage'},
