@@ -4,20 +4,11 @@
 
 #include <algorithm>
 
-namespace {
-
-const uint8_t FLAG = 0x7e;
-const uint8_t ESCAPE = 0x7d;
-const uint8_t ESCAPE_XOR = 0x20;
-const size_t HEADER_SIZE = 8;
-
-}  // namespace
-
 std::vector<uint8_t> DiagFrame::enclose(const std::vector<uint8_t>& body) {
     std::vector<uint8_t> out = {FLAG};
     out.reserve(body.size() + body.size() / 16 + 2);
     for (uint8_t byte : body) {
-        if (byte == FLAG || byte == ESCAPE) {
+        if (must_escape(byte)) {
             out.push_back(ESCAPE);
             byte ^= ESCAPE_XOR;
         }

@@ -20,11 +20,17 @@ constexpr char DUMP_END[] = "\nmodem_memdump_finish";      // of a modem, in a f
 constexpr char CHIP_DUMP_END[] = "corbet_memdump_finish";  // of the WCN chip, unframed
 
 struct DiagFrame {
+    static constexpr uint8_t FLAG = 0x7e;
+    static constexpr uint8_t ESCAPE = 0x7d;
+    static constexpr uint8_t ESCAPE_XOR = 0x20;
+    static constexpr size_t HEADER_SIZE = 8;
+
     uint32_t sequence = 0;
     uint8_t type = 0;
     uint8_t sub_type = 0;
     std::vector<uint8_t> payload;
 
+    static bool must_escape(uint8_t byte) { return byte == FLAG || byte == ESCAPE; }
     // The bytes on the wire.
     std::vector<uint8_t> encode() const;
     // A body of any content on the wire: escaped, between two flags.

@@ -6,12 +6,13 @@
 
 #include <algorithm>
 
+#include "sim/DiagFrame.h"
+
 namespace {
 
-// Each block: magic (3 bytes), CP, block number (8 bytes, little-endian), noise.
-const uint8_t MAGIC[3] = {0xa5, 'C', 'P'};
-const size_t NUMBER_AT = 4;
-const size_t NOISE_AT = 12;
+const uint64_t TYPES = 5;
+const uint8_t FIRST_TYPE = 0x10;     // of no exchange
+const uint8_t NEVER_ESCAPED = 0xdf;  // a mask: what remains is neither flag nor escape
 
 uint64_t mix(uint64_t x) {
     x += 0x9e3779b97f4a7c15u;
@@ -22,20 +23,36 @@ uint64_t mix(uint64_t x) {
 
 }  // namespace
 
-void SimStream::make_block(uint64_t number, uint8_t* block) const {
-    memcpy(block, MAGIC, sizeof MAGIC);
-    block[3] = m_cp;
-    for (size_t i = 0; i < 8; ++i) {
-        block[NUMBER_AT + i] = static_cast<uint8_t>(number >> (8 * i));
-    }
+void SimStream::make_block(uint32_t number, uint8_t* block) const {
     uint64_t noise = mix(number ^ (static_cast<uint64_t>(m_seed) << 32) ^ m_cp);
-    for (size_t i = NOISE_AT; i < BLOCK_SIZE; i += 4) {
-        block[i] = static_cast<uint8_t>(noise);
-        block[i + 1] = static_cast<uint8_t>(noise >> 8);
-        block[i + 2] = static_cast<uint8_t>(noise >> 16);
-        block[i + 3] = static_cast<uint8_t>(noise >> 24);
-        noise = mix(noise);
+    // Some types are more frequent than others.
+    const uint64_t type = std::min(noise % TYPES, noise / TYPES % TYPES);
+    uint8_t header[DiagFrame::HEADER_SIZE] = {};
+    for (size_t i = 0; i < 4; ++i) {
+        header[i] = static_cast<uint8_t>(number >> (8 * i));
     }
+    header[6] = static_cast<uint8_t>(FIRST_TYPE + type);
+    header[7] = static_cast<uint8_t>(noise >> 32) & 1;
+    const auto escapes = std::count_if(header, header + 4, DiagFrame::must_escape);
+    // The payload has the room that the escaped header leaves.
+    header[4] = static_cast<uint8_t>(BLOCK_SIZE - 2 - static_cast<size_t>(escapes));
+    size_t at = 0;
+    block[at++] = DiagFrame::FLAG;
+    for (const uint8_t byte : header) {
+        if (DiagFrame::must_escape(byte)) {
+            block[at++] = DiagFrame::ESCAPE;
+            block[at++] = byte ^ DiagFrame::ESCAPE_XOR;
+        } else {
+            block[at++] = byte;
+        }
+    }
+    while (at < BLOCK_SIZE - 1) {
+        noise = mix(noise);
+        for (int i = 0; i < 8 && at < BLOCK_SIZE - 1; ++i) {
+            block[at++] = static_cast<uint8_t>(noise >> (8 * i)) & NEVER_ESCAPED;
+        }
+    }
+    block[at] = DiagFrame::FLAG;
 }
 
 void SimStream::fill(uint64_t pos, uint8_t* dst, size_t len) const {
@@ -43,7 +60,7 @@ void SimStream::fill(uint64_t pos, uint8_t* dst, size_t len) const {
     while (len > 0) {
         const size_t from = pos % BLOCK_SIZE;
         const size_t n = std::min(len, BLOCK_SIZE - from);
-        make_block(pos / BLOCK_SIZE, block);
+        make_block(static_cast<uint32_t>(pos / BLOCK_SIZE), block);
         memcpy(dst, block + from, n);
         dst += n;
         pos += n;
@@ -54,17 +71,21 @@ void SimStream::fill(uint64_t pos, uint8_t* dst, size_t len) const {
 bool SimStream::locate(const uint8_t* data, size_t len, size_t* offset, uint64_t* pos) const {
     uint8_t block[BLOCK_SIZE];
     for (size_t at = 0; at + BLOCK_SIZE <= len; ++at) {
-        if (memcmp(data + at, MAGIC, sizeof MAGIC) != 0) {
+        if (data[at] != DiagFrame::FLAG) {
             continue;
         }
-        uint64_t number = 0;
-        for (size_t i = 8; i > 0; --i) {
-            number = (number << 8) | data[at + NUMBER_AT + i - 1];
+        uint32_t number = 0;
+        const uint8_t* from = data + at + 1;
+        for (int i = 0; i < 4; ++i) {
+            const bool escaped = *from == DiagFrame::ESCAPE;
+            from += escaped ? 1 : 0;
+            const int byte = *from++ ^ (escaped ? DiagFrame::ESCAPE_XOR : 0);
+            number |= static_cast<uint32_t>(byte) << (8 * i);
         }
         make_block(number, block);
         if (memcmp(data + at, block, BLOCK_SIZE) == 0) {
             *offset = at;
-            *pos = number * BLOCK_SIZE;
+            *pos = uint64_t{number} * BLOCK_SIZE;
             return true;
         }
     }
@@ -77,7 +98,7 @@ size_t SimStream::match(uint64_t pos, const uint8_t* data, size_t len) const {
     while (done < len) {
         const size_t from = (pos + done) % BLOCK_SIZE;
         const size_t n = std::min(len - done, BLOCK_SIZE - from);
-        make_block((pos + done) / BLOCK_SIZE, block);
+        make_block(static_cast<uint32_t>((pos + done) / BLOCK_SIZE), block);
         for (size_t i = 0; i < n; ++i) {
             if (data[done + i] != block[from + i]) {
                 return done + i;

@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // The endless log stream of one simulated CP. Every byte is a pure function of the CP,
 // a seed and the byte's position, so nothing that was fed has to be remembered to be
-// checked. The stream consists of 32-byte blocks that carry their own number: a piece of
-// it found in a file says by itself where in the stream it belongs.
+// checked. The stream consists of 64-byte blocks, each a diag frame whose sequence number
+// is that of the block: a piece of it found in a file says by itself where in the stream it
+// belongs, for the first 256 GiB.
 #ifndef SIM_SIMSTREAM_H_
 #define SIM_SIMSTREAM_H_
 
@@ -11,7 +12,7 @@
 
 class SimStream {
 public:
-    static constexpr size_t BLOCK_SIZE = 32;
+    static constexpr size_t BLOCK_SIZE = 64;
 
     explicit SimStream(uint8_t cp, uint32_t seed = 1) : m_cp(cp), m_seed(seed) {}
 
@@ -26,7 +27,7 @@ public:
     size_t match_back(uint64_t pos, const uint8_t* data_end, size_t len) const;
 
 private:
-    void make_block(uint64_t number, uint8_t* block) const;
+    void make_block(uint32_t number, uint8_t* block) const;
 
     uint8_t m_cp;
     uint32_t m_seed;

@@ -14,6 +14,7 @@ import os
 import re
 import shlex
 import shutil
+import struct
 import subprocess
 import sys
 import tempfile
@@ -150,7 +151,16 @@ def test_served_for_clients(temp):
     finally:
         served.terminate()
         served.communicate()
-    assert len(glob.glob(glob.escape(root) + "/data/modem_log/*/cp_wcdma/*.dmp")) == 2
+    logs = glob.escape(root) + "/data/modem_log/*/"
+    assert len(glob.glob(logs + "cp_wcdma/*.dmp")) == 2
+    # What the co-processors log can be tried on whatever reads frames.
+    with open(max(glob.glob(logs + "cp_gnss/*.log"), key=os.path.getsize), "rb") as f:
+        frames = [re.sub(b"}(.)", lambda m: bytes([m[1][0] ^ 0x20]), body, flags=re.S)
+                  for body in re.findall(b"~([^~]+)~", f.read())]
+    first = int.from_bytes(frames[0][:4], "little")
+    for number, frame in enumerate(frames, first):
+        assert frame[:6] == struct.pack("<IH", number, len(frame)), frame
+    assert len(frames) > 1000 and len({frame[6] for frame in frames}) > 1
 
 
 def test_interrupted_script(temp):
