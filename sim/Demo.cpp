@@ -151,9 +151,10 @@ bool Demo::write_report() {
         return true;
     }
     std::string text;
-    const int status = run_program(
-        {m_options.reader, "report", "--force", "-o", m_options.report, m_stage.handset().root()},
-        &text);
+    const int status = run_program({m_options.reader, "report", "--force", "--iq-format=ci16_le",
+                                    "--iq-rate=3840000", "--pcm-format=s16le", "--pcm-rate=16000",
+                                    "-o", m_options.report, m_stage.handset().root()},
+                                   &text);
     std::error_code ec;
     const std::string path = fs::absolute(m_options.report, ec).string();
     if (status == 0) {

@@ -11,17 +11,34 @@
 #include <vector>
 
 #include "sim/device_control.h"
+#include "sim/noise.h"
 
 namespace {
 
-// Samples pos to pos + len of the seed; pos is a multiple of 8.
+// A circle in sixteenths; 16 bits leave room for the noise.
+const int16_t COSINE[] = {16000,  14782,  11314,  6123,  0, -6123, -11314, -14782,
+                          -16000, -14782, -11314, -6123, 0, 6123,  11314,  14782};
+const size_t SAMPLE_SIZE = 4;
+const uint64_t HOP_SAMPLES = 1 << 16;
+
+// Bytes pos to pos + len of the seed's samples; pos is a multiple of 8. They are pairs of 16 bits,
+// little-endian: a carrier that hops between eight frequencies, in noise.
 void make_samples(uint8_t* dst, size_t pos, size_t len, uint32_t seed) {
+    const uint64_t start = static_cast<uint64_t>(seed) << 32;
     for (size_t done = 0; done < len; done += sizeof(uint64_t)) {
-        uint64_t x = (static_cast<uint64_t>(seed) << 32) + (pos + done) / sizeof(uint64_t);
-        x = (x ^ (x >> 30)) * 0xBF58476D1CE4E5B9u;
-        x = (x ^ (x >> 27)) * 0x94D049BB133111EBu;
-        x ^= x >> 31;
-        memcpy(dst + done, &x, std::min(sizeof x, len - done));
+        const uint64_t hop = (pos + done) / SAMPLE_SIZE / HOP_SAMPLES;
+        const uint64_t turn = 2 * (noise_of(start + hop) % 8) + 1;
+        uint64_t noise = noise_of(~start - (pos + done));
+        uint8_t bytes[sizeof(uint64_t)];
+        for (size_t i = 0; i < sizeof bytes; i += 2) {
+            const uint64_t sine = i % SAMPLE_SIZE == 0 ? 0 : 12;  // a quarter behind
+            const uint64_t angle = turn * ((pos + done + i) / SAMPLE_SIZE) + sine;
+            const int value = COSINE[angle % 16] + static_cast<int>(noise % 4096) - 2048;
+            bytes[i] = static_cast<uint8_t>(value);
+            bytes[i + 1] = static_cast<uint8_t>(value >> 8);
+            noise >>= 16;
+        }
+        memcpy(dst + done, bytes, std::min(sizeof bytes, len - done));
     }
 }
 

@@ -7,6 +7,7 @@
 #include <algorithm>
 
 #include "sim/DiagFrame.h"
+#include "sim/noise.h"
 
 namespace {
 
@@ -14,17 +15,10 @@ const uint64_t TYPES = 5;
 const uint8_t FIRST_TYPE = 0x10;     // of no exchange
 const uint8_t NEVER_ESCAPED = 0xdf;  // a mask: what remains is neither flag nor escape
 
-uint64_t mix(uint64_t x) {
-    x += 0x9e3779b97f4a7c15u;
-    x = (x ^ (x >> 30)) * 0xbf58476d1ce4e5b9u;
-    x = (x ^ (x >> 27)) * 0x94d049bb133111ebu;
-    return x ^ (x >> 31);
-}
-
 }  // namespace
 
 void SimStream::make_block(uint32_t number, uint8_t* block) const {
-    uint64_t noise = mix(number ^ (static_cast<uint64_t>(m_seed) << 32) ^ m_cp);
+    uint64_t noise = noise_of(number ^ (static_cast<uint64_t>(m_seed) << 32) ^ m_cp);
     // Some types are more frequent than others.
     const uint64_t type = std::min(noise % TYPES, noise / TYPES % TYPES);
     uint8_t header[DiagFrame::HEADER_SIZE] = {};
@@ -47,7 +41,7 @@ void SimStream::make_block(uint32_t number, uint8_t* block) const {
         }
     }
     while (at < BLOCK_SIZE - 1) {
-        noise = mix(noise);
+        noise = noise_of(noise);
         for (int i = 0; i < 8 && at < BLOCK_SIZE - 1; ++i) {
             block[at++] = static_cast<uint8_t>(noise >> (8 * i)) & NEVER_ESCAPED;
         }

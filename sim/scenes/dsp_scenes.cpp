@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The audio DSP logs, delivers PCM data and asserts; all of it goes into one log.
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 
 #include "sim/DemoStage.h"
@@ -14,6 +15,23 @@ namespace {
 std::vector<uint8_t> stream_bytes(uint8_t id, size_t len) {
     std::vector<uint8_t> bytes(len);
     SimStream(id).fill(0, bytes.data(), len);
+    return bytes;
+}
+
+// A scale: 16-bit samples of 16 kHz, little-endian.
+std::vector<uint8_t> music(size_t len) {
+    const int NOTES[] = {0, 2, 4, 5, 7, 9, 11, 12};  // halftones
+    const size_t NOTE_LEN = 6250;                    // samples
+    const double SECOND = 16000;
+    std::vector<uint8_t> bytes;
+    for (size_t n = 0; bytes.size() < len; ++n) {
+        const double pitch = 440 * std::pow(2, NOTES[n / NOTE_LEN % std::size(NOTES)] / 12.0);
+        const double fade = 1 - static_cast<double>(n % NOTE_LEN) / NOTE_LEN;
+        const double phase = 2 * std::acos(-1.0) * pitch * static_cast<double>(n) / SECOND;
+        const int value = static_cast<int>(20000 * fade * std::sin(phase));
+        bytes.push_back(static_cast<uint8_t>(value));
+        bytes.push_back(static_cast<uint8_t>(value >> 8));
+    }
     return bytes;
 }
 
@@ -42,7 +60,7 @@ void play_audio_dsp(DemoStage& stage) {
     SimDspDevice& dsp = stage.handset().audio_dsp();
     const size_t piece = 4321;  // that the DSP writes at a time
     const auto log = stream_bytes(0xD0, 300000);
-    const auto pcm = stream_bytes(0xD3, 200000);
+    const auto pcm = music(200000);
     stage.say("The audio DSP logs and delivers PCM data");
     size_t log_done = 0;
     size_t pcm_done = 0;
