@@ -159,6 +159,19 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
               0);
     EXPECT_EQ(run("join . nowhere --cp cp_wcn"), 2);
     EXPECT_EQ(m_out, "a");
+    // Only what was read is counted.
+    write(OLD_DSP_LOG, "abc");
+    for (const std::string& log : {WCN_LOG, DSP_LOG}) {
+        write(log, "b");
+        EXPECT_EQ(chmod(m_root.path(log).c_str(), 0), 0);
+    }
+    const std::string user =
+        geteuid() ? "" : "setpriv --bounding-set -dac_override,-dac_read_search ";
+    for (const char* args : {"cp_wcn", "agdsp", "agdsp --kind log"}) {
+        run(std::string("join data modem_log --json --force -o one --cp ") + args, user + KESTLOG);
+        EXPECT_TRUE(said(R"("files":)" + std::to_string(args[0] == 'c' ? 1 : 2))) << m_out;
+        EXPECT_TRUE(complained("Permission denied")) << m_err;
+    }
 }
 
 // A dump of 3 MiB in frames, its image byte for byte.

@@ -41,7 +41,6 @@ public:
                 ++m_left_out;
                 continue;
             }
-            ++m_files;
             const bool chunked = each.file->name.cp_type == CT_AGDSP;
             if ((chunked && !take_chunks(each, path)) ||
                 (m_kind.empty() && !copy(*each.file, path))) {
@@ -93,6 +92,7 @@ private:
         if (got < 0 || fstat(fd, &st) < 0) {
             return unreadable(path, errno);
         }
+        ++m_files;
         bool cut;
         const size_t record = time_record_len(head, static_cast<size_t>(got), file.name, &cut);
         if (record > 0 && cut && file.name.cp_type != CT_AGDSP) {
@@ -123,6 +123,7 @@ private:
         if (!in.open(each.file->path(), false)) {
             return m_kind.empty() || unreadable(path, errno);  // else copy() tells
         }
+        m_files += m_kind.empty() ? 0 : 1;  // else copy() counts it
         FileReport report;
         bool good = true;
         m_sequence.enter(*each.file->dir);
