@@ -90,6 +90,19 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
     const auto copied = [](const std::string& content) {
         return Log{"copy/modem_log/2016-03-01-09-00-00/", 0, "09-00-00", content};
     };
+    // Files of one start, as in a CP that logs fast, down to number 0.
+    const auto at_once = [&](const std::vector<std::string>& set,
+                             const std::vector<std::string>& copy) {
+        std::vector<Log> logs;
+        for (size_t i = 0; i < set.size() + copy.size(); ++i) {
+            const bool in_set = i < set.size();
+            logs.push_back(in_set ? in(0, "09-00-00", set[i]) : copied(copy[i - set.size()]));
+            logs.back().number =
+                static_cast<int>((in_set ? set.size() : set.size() + copy.size()) - 1 - i);
+        }
+        return logs;
+    };
+    const std::vector<std::string> many(40, "a"), less(39, "a"), other(40, "x");
     const struct {
         std::string cp;
         std::vector<Log> logs;
@@ -118,6 +131,14 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
         {"cp_wcn", {in(0, "09-00-00", "ab"), copied("ab")}, "", 3, "ab", "damage: a copy of "},
         {"cp_wcn", {in(0, "09-00-00", "ab"), copied("xyz")},
          "", 3, "abxyz", "damage: started at the same second as "},
+        {"cp_gnss", at_once({"a", "bc"}, {"a", "bc"}), "", 3, "abc", "damage: a copy of "},
+        {"cp_gnss", at_once({"a", "a"}, {"a"}), "", 3, "aa", "damage: a copy of "},
+        {"cp_gnss", at_once({"", "ab"}, {"", "ab"}), "", 3, "ab", "damage: a copy of "},
+        {"cp_gnss", at_once({"a", "ab"}, {"ab"}), "", 3, "aab", "damage: a copy of "},
+        {"cp_gnss", at_once({"a", "bc"}, {"a", "bcd", "e"}), "", 3, "abcde", "damage: the beginning of "},
+        {"cp_gnss", at_once({"a", "b"}, {"a", "x"}), "", 3, "abx", "damage: started at the same second as "},
+        {"cp_gnss", at_once(many, less), "", 3, std::string(40, 'a'), "damage: a copy of "},
+        {"cp_gnss", at_once(many, other), "", 3, std::string(40, 'a') + std::string(40, 'x'), "damage: started at "},
         {"cp_wcn", {in(0, "09-00-00", "a"), {"copy/modem_log/2016-03-01-09-30-00/", 0, "09-30-00", "b"}},
          "", 0, "ab", "09-30-00.log: note: from another ROOT than the one before\n"},
         {"cp_wcdma", {in(0, "09-00-00", TIME_RECORD.substr(0, 15))},
@@ -141,6 +162,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
         EXPECT_EQ(run("join " + roots + c.args), c.status) << c.words << m_err;
         EXPECT_EQ(m_out, c.stream) << c.words;
         EXPECT_TRUE(c.words.empty() ? m_err.empty() : complained(c.words)) << c.words << m_err;
+        EXPECT_EQ(complained("started"), c.words.find("started") != std::string::npos) << m_err;
         ASSERT_EQ(
             system(
                 ("cd " + m_root.root() + " && rm -r data/* storage copy 2>/dev/null; :").c_str()),

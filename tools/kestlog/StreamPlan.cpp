@@ -6,6 +6,7 @@
 #include <strings.h>
 
 #include <algorithm>
+#include <deque>
 #include <map>
 #include <set>
 
@@ -39,58 +40,112 @@ bool same_beginning(const TreeFile& a, const TreeFile& b) {
     }
 }
 
-// What two copies of a file in sets of the same name have in common, even when one was
-// renumbered since.
-std::string identity(const TreeFile& file) {
-    const std::string name = file.name.text();
-    return name.substr(std::min(name.find('-'), name.size()));
-}
+// With how many others a file is compared: no CP begins more files in a second, and so the work
+// stays small in a hostile tree where thousands have one start.
+constexpr size_t COMPARED = 8;
 
 void leave_out(PlannedFile* file, const char* code, const std::string& words) {
     file->left_out = true;
     file->findings.push_back({true, code, words + "; left out", -1});
 }
 
-// Looks for copies among the files, which are from sets of the same name.
-void find_copies_in(const std::vector<PlannedFile*>& files) {
-    std::map<std::string, PlannedFile*> known;
-    for (PlannedFile* newer : files) {
-        const auto [it, fresh] = known.insert({identity(*newer->file), newer});
-        PlannedFile* const older = it->second;
-        if (fresh || older->file->dir == newer->file->dir) {
-            continue;
+// Places in a list of files, of those that may still be found.
+using Places = std::deque<PlannedFile**>;
+
+// Whether the file is found again among others. Each is then no longer among these, as there may
+// be several with the same content.
+bool find_copy(PlannedFile* file, bool whole, Places* others) {
+    const TreeFile& newer = *file->file;
+    const auto end = others->begin() + static_cast<ptrdiff_t>(std::min(others->size(), COMPARED));
+    const auto it = std::find_if(others->begin(), end, [&](PlannedFile** other) {
+        const TreeFile& older = *(*other)->file;
+        return whole == (older.size == newer.size) && same_beginning(older, newer);
+    });
+    if (it == end) {
+        return false;
+    }
+    const TreeFile& older = *(**it)->file;
+    if (older.size < newer.size) {
+        leave_out(**it, "copy", "the beginning of " + newer.shown());
+        **it = file;
+    } else {
+        leave_out(file, "copy", (whole ? "a copy of " : "the beginning of ") + older.shown());
+    }
+    others->erase(it);
+    return true;
+}
+
+// Looks for the files of a directory among those of others, and adds what was not found to them.
+void find_copies_in(std::vector<PlannedFile*> files, std::vector<PlannedFile*>* known) {
+    Places others;
+    for (size_t i = 0; i < std::min(known->size(), files.size() + COMPARED); ++i) {
+        others.push_back(&(*known)[i]);
+    }
+    // What has the same size may be just the same; only of the rest one may have grown.
+    for (const bool whole : {true, false}) {
+        std::vector<PlannedFile*> rest;
+        for (PlannedFile* file : files) {
+            if (!find_copy(file, whole, &others)) {
+                rest.push_back(file);
+            }
         }
-        if (!same_beginning(*older->file, *newer->file)) {
-            newer->findings.push_back({true, "double",
-                                       "started at the same second as " + older->file->shown() +
-                                           " in a set of the same name",
-                                       -1});
-        } else if (older->file->size < newer->file->size) {
-            leave_out(older, "copy", "the beginning of " + newer->file->shown());
-            it->second = newer;
-        } else {
-            leave_out(
-                newer, "copy",
-                (older->file->size == newer->file->size ? "a copy of " : "the beginning of ") +
-                    older->file->shown());
+        files.swap(rest);
+    }
+    // Where all others were found, the copy was made before these files were begun.
+    for (PlannedFile* file : files) {
+        if (!others.empty()) {
+            file->findings.push_back({true, "double",
+                                      "started at the same second as " +
+                                          (*others[0])->file->shown() +
+                                          " in a set of the same name",
+                                      -1});
+        }
+    }
+    known->insert(known->end(), files.begin(), files.end());
+}
+
+// Looks for copies among the files, which are from sets of the same name. Copies have one start;
+// their numbers may differ, as one may have been renumbered since.
+void find_copies_among(const std::vector<PlannedFile*>& files) {
+    std::map<LogTime, std::vector<PlannedFile*>> starts;
+    for (PlannedFile* file : files) {
+        starts[file->file->name.time()].push_back(file);
+    }
+    for (const auto& [time, begun] : starts) {
+        std::map<const TreeDir*, size_t> places;
+        std::vector<std::vector<PlannedFile*>> dirs;  // in the order of the stream
+        for (PlannedFile* file : begun) {
+            const auto [it, fresh] = places.insert({file->file->dir, dirs.size()});
+            dirs.resize(dirs.size() + (fresh ? 1 : 0));
+            dirs[it->second].push_back(file);
+        }
+        std::vector<PlannedFile*> known;
+        for (const std::vector<PlannedFile*>& dir : dirs) {
+            find_copies_in(dir, &known);
         }
     }
 }
 
 // Set by set, as there may be very many files: mostly a name is that of a single set.
 void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
-    std::map<std::string, std::set<const TreeSet*>> sets;
+    struct Sets {
+        const TreeSet* first;
+        bool several = false;
+        std::vector<PlannedFile*> files;
+    };
+    std::map<std::string, Sets> sets;
     for (const StreamFile& place : stream.files) {
-        sets[place.set->name].insert(place.set);
+        Sets& same = sets.insert({place.set->name, {place.set, false, {}}}).first->second;
+        same.several |= same.first != place.set && !place.set->name.empty();
+    }
+    for (size_t i = 0; i < plan->size(); ++i) {
+        Sets& same = sets.at(stream.files[i].set->name);
+        if (same.several && !(*plan)[i].left_out) {
+            same.files.push_back(&(*plan)[i]);
+        }
     }
     for (const auto& [name, same] : sets) {
-        std::vector<PlannedFile*> files;
-        for (size_t i = 0; i < plan->size() && same.size() > 1 && !name.empty(); ++i) {
-            if (same.count(stream.files[i].set)) {
-                files.push_back(&(*plan)[i]);
-            }
-        }
-        find_copies_in(files);
+        find_copies_among(same.files);
     }
 }
 
