@@ -8,7 +8,7 @@
 #include <algorithm>
 #include <deque>
 #include <map>
-#include <set>
+#include <utility>
 
 #include "kestlog/ExitStatus.h"
 #include "kestlog/LogReader.h"
@@ -104,6 +104,28 @@ void find_copies_in(std::vector<PlannedFile*> files, std::vector<PlannedFile*>* 
     known->insert(known->end(), files.begin(), files.end());
 }
 
+// Looks for copies that stand beside their originals under the name of a file that was set aside.
+// Two such files of the service may both be empty, but hold the same only by chance.
+void leave_out_namesakes(std::vector<PlannedFile*>* files) {
+    for (size_t i = 0; i < files->size(); ++i) {
+        PlannedFile* const older = (*files)[i];
+        const size_t end = std::min(files->size(), i + 1 + COMPARED);
+        for (size_t k = i + 1; k < end && !older->left_out; ++k) {
+            PlannedFile* const newer = (*files)[k];
+            const bool aside = older->file->name.aside();
+            if ((aside || newer->file->name.aside()) && !newer->left_out &&
+                older->file->size == newer->file->size && older->file->size > 0 &&
+                same_beginning(*older->file, *newer->file)) {
+                leave_out(aside ? older : newer, "copy",
+                          "a copy of " + (aside ? newer : older)->file->shown());
+            }
+        }
+    }
+    files->erase(std::remove_if(files->begin(), files->end(),
+                                [](const PlannedFile* file) { return file->left_out; }),
+                 files->end());
+}
+
 // Looks for copies among the files, which are from sets of the same name. Copies have one start;
 // their numbers may differ, as one may have been renumbered since.
 void find_copies_among(const std::vector<PlannedFile*>& files) {
@@ -120,7 +142,8 @@ void find_copies_among(const std::vector<PlannedFile*>& files) {
             dirs[it->second].push_back(file);
         }
         std::vector<PlannedFile*> known;
-        for (const std::vector<PlannedFile*>& dir : dirs) {
+        for (std::vector<PlannedFile*>& dir : dirs) {
+            leave_out_namesakes(&dir);
             find_copies_in(dir, &known);
         }
     }
@@ -130,17 +153,21 @@ void find_copies_among(const std::vector<PlannedFile*>& files) {
 void find_copies(const LogStream& stream, std::vector<PlannedFile>* plan) {
     struct Sets {
         const TreeSet* first;
-        bool several = false;
+        bool compared = false;
         std::vector<PlannedFile*> files;
     };
-    std::map<std::string, Sets> sets;
+    // What has no name is a set of its own.
+    std::map<std::pair<std::string, const TreeSet*>, Sets> sets;
+    const auto key = [](const TreeSet* set) {
+        return std::pair(set->name, set->name.empty() ? set : nullptr);
+    };
     for (const StreamFile& place : stream.files) {
-        Sets& same = sets.insert({place.set->name, {place.set, false, {}}}).first->second;
-        same.several |= same.first != place.set && !place.set->name.empty();
+        Sets& same = sets.insert({key(place.set), {place.set, false, {}}}).first->second;
+        same.compared |= same.first != place.set || (place.file->name.aside() && !place.set->given);
     }
     for (size_t i = 0; i < plan->size(); ++i) {
-        Sets& same = sets.at(stream.files[i].set->name);
-        if (same.several && !(*plan)[i].left_out) {
+        Sets& same = sets.at(key(stream.files[i].set));
+        if (same.compared && !(*plan)[i].left_out) {
             same.files.push_back(&(*plan)[i]);
         }
     }
@@ -180,8 +207,9 @@ void find_gaps(std::vector<PlannedFile>* plan) {
             continue;
         }
         each.last = i == last;
-        if (file.doubled && !file.set_aside) {
-            each.findings.push_back({true, "double", "two log files with this number", -1});
+        if (file.doubled) {
+            each.findings.push_back(
+                {!file.set_aside, "double", "two log files with this number", -1});
         }
         // What follows a file of the stream is missing only when something newer is there; what
         // --until has cut off is not missing.

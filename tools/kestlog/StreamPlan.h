@@ -20,7 +20,8 @@ struct PlannedFile {
 
 // In the order of the stream. Trimmed oldest files are no gap, numbers that are missing before a
 // newer file are. A file that is there twice, because a set was copied, is read to find out
-// whether one copy is the beginning of the other; the shorter one is then left out.
+// whether one copy is the beginning of the other; the shorter one is then left out. So is what
+// holds the same as a namesake that it was set aside for.
 std::vector<PlannedFile> plan_stream(const LogStream& stream);
 
 // The stream that --cp names, or the only one. Null when there is none, after printing why, with
