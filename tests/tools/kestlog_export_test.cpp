@@ -64,7 +64,7 @@ protected:
 
 TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) {
     const std::string third = numbered(3, 0x3b, 0x01, "goes on ~ in the next file");
-    const std::string broken = altered(numbered(8, 1, 1, "too long"), 5, 99);
+    const std::string broken = altered(numbered(8, 1, 1, "too long"), 5, 99) + "~short~";
     write(OLD_MODEM_LOG, TIME_RECORD + numbered(1, 0x3a, 0x64, "one") + "junk!" +
                              numbered(2, 0x3a, 0, "") + third.substr(0, 20));
     write(MODEM_LOG, TIME_RECORD + third.substr(20) + numbered(7, 0x55, 0x66, "") + broken);
@@ -93,7 +93,7 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
               "begins in 1-cp_wcdma-2016-03-01_09-00-00.log, ends in "
               "0-cp_wcdma-2016-03-01_09-15-00.log\n"
               "1456823700.000000000|1|0|7|8|0x55|0x66||0|4||"
-              "0-cp_wcdma-2016-03-01_09-15-00.log: time of its record; 18 bytes at the end of "
+              "0-cp_wcdma-2016-03-01_09-15-00.log: time of its record; 25 bytes at the end of "
               "0-cp_wcdma-2016-03-01_09-15-00.log are in no intact frame\n"
               "1456823700.000000000|1|1|0|60008|0x01|0x02||60000|||"
               "cp_wcdma_memory_2016-03-01_09-15-00.dmp: time of its name\n"
@@ -111,7 +111,7 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
 
     // The report counts the same ones.
     EXPECT_EQ(run("report --json ."), 3);
-    EXPECT_TRUE(said("\"payload\":29,\"other_bytes\":23,")) << m_out;
+    EXPECT_TRUE(said("\"payload\":29,\"other_bytes\":30,")) << m_out;
 
     // What holds the first bytes of packets only has no wrong length.
     EXPECT_EQ(shell("editcap -s 24 read.pcapng cut.pcapng"), 0);
@@ -125,8 +125,8 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
     EXPECT_EQ(fields("export card --since 10:00", "kestdiag.seq"), "1\n");
     EXPECT_EQ(fields("export --broken " + MODEM_LOG,
                      "kestdiag.seq frame.interface_name kestdiag.length kestdiag.payload_len "
-                     "kestdiag.bad_length"),
-              "7|cp_wcdma|8|0|\n8|cp_wcdma|99|8|1\n");
+                     "kestdiag.bad_length kestdiag.short"),
+              "7|cp_wcdma|8|0||\n8|cp_wcdma|99|8|1|\n|cp_wcdma||||1\n");
     // FILEs of one log are one, each once; what was not given is not missing.
     EXPECT_EQ(fields("export " + MODEM_LOG + " " + OLD_MODEM_LOG + " " + MODEM_LOG,
                      "frame.interface_id kestdiag.seq"),
@@ -138,7 +138,7 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
     EXPECT_EQ(run("export --json --type 0x3a . -o new.pcapng"), 3);
     EXPECT_TRUE(
         said("{\"file\":\"new.pcapng\",\"interfaces\":2,\"files\":4,\"left_out\":2,"
-             "\"packets\":2,\"broken\":0,\"other_bytes\":43}\n"))
+             "\"packets\":2,\"broken\":0,\"other_bytes\":50}\n"))
         << m_out;
 }
 

@@ -279,19 +279,21 @@ TEST_F(KestlogTest, FramesStandInColumnsWhateverTheirNumbers) {
 
 TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
     write_good_tree();
-    write(WCN_LOG, frame("one", 0x9d, 1) + frame("~two", 3, 1) + frame("three", 3, 2));
+    write(WCN_LOG, frame("one", 0x9d, 1) + frame("~two", 3, 1) + frame("three", 3, 2) + "~12~");
     write(WCN + "1-cp_wcn-2016-03-01_09-00-00.log", frame("zero", 3, 2));
     const std::string both = WCN + "1-cp_wcn-2016-03-01_09-00-00.log " + WCN_LOG;
     const struct {
         std::string args;
         std::vector<std::string> payloads;  // their beginning as hexadecimal text
     } CASES[] = {
-        {WCN_LOG, {"6f6e65", "7e74776f", "7468726565"}},
+        {WCN_LOG, {"6f6e65", "7e74776f", "7468726565", "3132"}},
+        {"--type 0 " + both, {}},
+        {"--sub-type 0 " + both, {}},
         {"--type 3 " + both, {"7a65726f", "7e74776f", "7468726565"}},
         {"--type 0x03 --sub-type 2 " + both, {"7a65726f", "7468726565"}},
         {"--limit 2 " + both, {"7a65726f", "6f6e65"}},
         {"--since 09:15 --until 2016-03-02 " + both,
-         {"7a65726f", "6f6e65", "7e74776f", "7468726565"}},
+         {"7a65726f", "6f6e65", "7e74776f", "7468726565", "3132"}},
         {"--until 09:14 " + both, {"7a65726f"}},
         {"--type 3 - <" + WCN_LOG, {"7e74776f", "7468726565"}},
     };
@@ -306,6 +308,7 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
     }
     EXPECT_EQ(run("frames --hex " + both), 0);
     EXPECT_TRUE(said(WCN_LOG + ":\n"));
+    EXPECT_TRUE(said("  no header                          2 bytes  wrong length\n")) << m_out;
     EXPECT_TRUE(said("\n    000000  7e 74 77 6f                                      ~two\n"));
     ASSERT_EQ(system(("cat " + m_root.path(DSP_LOG) + " | (cd " + m_root.root() +
                       "; '" KESTLOG "' info - >o; cat " + DSP_LOG +

@@ -233,6 +233,10 @@ private:
                              memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0;
             m_report.end_marker |= end;
             piece.intact = header.len == len || end;
+        } else {
+            piece.data = body;
+            piece.data_len = len;
+            piece.headless = true;
         }
         visit_frame(header, piece);
         return piece.intact;

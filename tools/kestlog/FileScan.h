@@ -31,8 +31,9 @@ struct Piece {
     uint8_t sub_type;
     const uint8_t* data;  // behind the header; of a frame null unless payload is wanted
     size_t data_len;
-    bool intact;       // that length is right
-    const char* kind;  // of a chunk, else null
+    bool intact;            // that length is right
+    const char* kind;       // of a chunk, else null
+    bool headless = false;  // too short for a header: all of it is data
 };
 
 // Kinds of chunks, as indices.

@@ -80,10 +80,10 @@ bool FrameExporter::take(const Piece& piece) {
         begin();
     }
     m_tail = piece.offset + piece.size - (piece.intact ? 0 : 1);
-    if (!piece.data || !(piece.intact || m_wanted.broken)) {
+    if (!piece.intact && (!m_wanted.broken || (piece.headless && m_wanted.type >= 0))) {
         return true;  // it counts with the bytes before the next one
     }
-    const size_t head = piece.kind ? DSP_CHUNK_HEADER_LEN : sizeof(DiagHeader);
+    const size_t head = piece.headless ? 0 : piece.kind ? DSP_CHUNK_HEADER_LEN : sizeof(DiagHeader);
     const uint8_t* const body = piece.data - head;
     const size_t len = head + piece.data_len;
     if (piece.offset > m_end) {
@@ -102,8 +102,10 @@ bool FrameExporter::take(const Piece& piece) {
     }
     if (!piece.intact) {
         ++m_totals.broken;
-        m_writer.comment("broken: its header says " + std::to_string(piece.len_field) +
-                         " bytes, there are " + std::to_string(len));
+        m_writer.comment(piece.headless
+                             ? "broken: too short for a header"
+                             : "broken: its header says " + std::to_string(piece.len_field) +
+                                   " bytes, there are " + std::to_string(len));
     }
     if (m_source->file->name.framed_dump && piece.data_len == MODEM_DUMP_END_LEN &&
         memcmp(piece.data, MODEM_DUMP_END, MODEM_DUMP_END_LEN) == 0) {

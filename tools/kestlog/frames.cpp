@@ -24,6 +24,11 @@ struct Wanted {
     bool hex = false;
     bool json = false;
     bool several = false;  // files
+
+    bool takes(const Piece& piece) const {
+        return (type < 0 || (type == piece.type && !piece.headless)) &&
+               (sub_type < 0 || (sub_type == piece.sub_type && !piece.headless));
+    }
 };
 
 class FramePrinter {
@@ -67,6 +72,12 @@ private:
     void print_facts(const Piece& piece) {
         LineBuffer::Short line(m_out);
         line.add(m_offset, piece.offset);
+        if (piece.headless) {
+            line.add("  no header                      ");
+            line.add(m_data_len, piece.data_len);
+            line.add(" bytes");
+            return;
+        }
         line.add("  seq ");
         line.add(m_seq, piece.seq_num);
         line.add(" type 0x");
@@ -106,14 +117,16 @@ private:
         m_out.add(std::string_view(m_file));
         m_out.add("\"offset\":");
         m_out.add(piece.offset);
-        m_out.add(",\"seq\":");
-        m_out.add(piece.seq_num);
-        m_out.add(",\"type\":");
-        m_out.add(piece.type);
-        m_out.add(",\"sub_type\":");
-        m_out.add(piece.sub_type);
-        m_out.add(",\"len\":");
-        m_out.add(piece.len_field);
+        if (!piece.headless) {
+            m_out.add(",\"seq\":");
+            m_out.add(piece.seq_num);
+            m_out.add(",\"type\":");
+            m_out.add(piece.type);
+            m_out.add(",\"sub_type\":");
+            m_out.add(piece.sub_type);
+            m_out.add(",\"len\":");
+            m_out.add(piece.len_field);
+        }
         m_out.add(",\"payload\":");
         m_out.add(piece.data_len);
         m_out.add(std::string_view(piece.intact ? ",\"intact\":true" : ",\"intact\":false"));
@@ -152,8 +165,7 @@ int frames(const std::string& path, Wanted* wanted) {
         FramePrinter printer(*wanted, path);
         const PieceVisitor print = [&](const Piece& piece) {
             bool more = true;
-            if ((wanted->type < 0 || wanted->type == piece.type) &&
-                (wanted->sub_type < 0 || wanted->sub_type == piece.sub_type)) {
+            if (wanted->takes(piece)) {
                 more = printer.print(piece) && --wanted->limit > 0;
             }
             return more;
