@@ -5,7 +5,7 @@
 
 # The libraries of kestlog; without one of them it, or a command of it, is left out of a build.
 # shellcheck disable=SC2034
-kest_reader_libraries=(nlohmann-json3-dev libarchive-dev libsndfile1-dev)
+kest_reader_libraries=(nlohmann-json3-dev libarchive-dev zlib1g-dev libsndfile1-dev)
 
 # Whether there is what a Debian package brings. Looks for the tool itself, so that it also
 # tells on a system that has no such package.
@@ -26,6 +26,7 @@ kest_has() {
         libgtest-dev) kest_includes gtest/gtest.h ;;
         nlohmann-json3-dev) kest_includes nlohmann/json.hpp ;;
         libarchive-dev) kest_includes archive.h ;;
+        zlib1g-dev) kest_includes zlib.h ;;
         libsndfile1-dev) kest_includes sndfile.h ;;
         libclang-rt-*-dev) kest_links clang++ fuzzer,address LLVMFuzzerTestOneInput ;;
         sanitizers) kest_links c++ address,undefined main && kest_links c++ thread main ;;

@@ -16,6 +16,7 @@
 
 #include "core/system_paths.h"
 #include "kestlog/FileName.h"
+#include "kestlog/GzipInput.h"
 #include "kestlog/Progress.h"
 #include "kestlog/Report.h"
 
@@ -65,8 +66,7 @@ public:
         if (m_limit == 0 && statvfs(dir.c_str(), &fs) == 0) {
             m_limit = static_cast<uint64_t>(fs.f_bavail) * fs.f_frsize / 10 * 9;
         }
-        // None of those that run another program.
-        archive_read_support_filter_gzip(m_in);
+        // None of those that run another program; gzip's is ours.
         archive_read_support_filter_bzip2(m_in);
         archive_read_support_filter_xz(m_in);
         archive_read_support_filter_lzma(m_in);
@@ -82,14 +82,14 @@ public:
 
     Unpacked run() {
         struct archive_entry* entry;
-        const int opened = m_name == "-" ? archive_read_open_fd(m_in, STDIN_FILENO, BLOCK)
-                                         : archive_read_open_filename(m_in, m_name.c_str(), BLOCK);
-        if (opened != ARCHIVE_OK) {
+        if (!open_archive()) {
             return m_result;
         }
+        bool whole = true;
         for (int got; !m_full && (got = archive_read_next_header(m_in, &entry)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL) {
                 fail("", archive_error_string(m_in));
+                whole = false;
                 break;
             }
             if (got == ARCHIVE_RETRY) {
@@ -104,6 +104,9 @@ public:
             }
             take(entry);
         }
+        if (whole && !m_full && m_gzip.is_open() && !m_gzip.drain()) {
+            fail("", m_gzip.error());
+        }
         if (m_more) {
             m_result.failures.push_back(m_name + ": " + std::to_string(m_more) +
                                         " more entries are left out or damaged");
@@ -112,6 +115,21 @@ public:
     }
 
 private:
+    bool open_archive() {
+        if (m_name != "-" && !GzipInput::is_gzip(m_name)) {
+            return archive_read_open_filename(m_in, m_name.c_str(), BLOCK) == ARCHIVE_OK;
+        }
+        const auto read = [](struct archive* in, void* gzip, const void** data) -> la_ssize_t {
+            const la_ssize_t n = static_cast<GzipInput*>(gzip)->read(data);
+            if (n < 0) {
+                archive_set_error(in, EIO, "%s", static_cast<GzipInput*>(gzip)->error().c_str());
+            }
+            return n;
+        };
+        return m_gzip.open(m_name) &&
+               archive_read_open(m_in, &m_gzip, nullptr, read, nullptr) == ARCHIVE_OK;
+    }
+
     // entry: its name, or "" for the archive itself.
     void fail(const std::string& entry, const std::string& reason) {
         if (m_result.failures.size() == Unpacked::MAX_LINES && !entry.empty()) {
@@ -190,6 +208,9 @@ private:
                 fail(name, std::string("cut off: ") + archive_error_string(m_in));
                 return size;
             }
+            if (got == ARCHIVE_WARN) {  // a wrong sum in a zip
+                fail(name, std::string("damaged: ") + archive_error_string(m_in));
+            }
             const uint64_t end = static_cast<uint64_t>(offset) + len;
             if (offset < 0 || !has_room(end)) {
                 return size;
@@ -200,8 +221,10 @@ private:
                 return size;
             }
             size = std::max(size, end);
-            const int64_t packed = archive_filter_bytes(m_in, -1);
-            Progress::advance(static_cast<uint64_t>(packed - m_packed));
+            const uint64_t packed = m_gzip.is_open()
+                                        ? m_gzip.offset()
+                                        : static_cast<uint64_t>(archive_filter_bytes(m_in, -1));
+            Progress::advance(packed - m_packed);
             m_packed = packed;
         }
         // A hole at the end is no data.
@@ -246,12 +269,13 @@ private:
     const std::string m_name;
     const std::string m_dir;
     uint64_t m_limit;
+    GzipInput m_gzip;
     struct archive* m_in;
     Unpacked m_result;
     uint64_t m_entries = 0;
     uint64_t m_used = 0;
     uint64_t m_more = 0;
-    int64_t m_packed = 0;  // bytes of the archive itself so far
+    uint64_t m_packed = 0;  // bytes of the archive itself so far
     bool m_full = false;
 };
 
