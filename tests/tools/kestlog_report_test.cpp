@@ -375,6 +375,10 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
     EXPECT_EQ(m_out,
               "crash.tar: 2016-03-01 09:06:00 cp_wcdma on internal: mini dump, IPC record, memory "
               "dump; 9 files, 3116 bytes\n");
+    EXPECT_EQ(run("bundle handset -o new.tar"), 1);
+    EXPECT_NE(m_err.find("kestlog: 2016-03-01 09:06:00 cp_wcdma on internal: mini dump, "),
+              std::string::npos)
+        << m_err;
     m_root.make_dir("unpacked");
     ASSERT_EQ(
         system(("tar xf " + m_root.path("crash.tar") + " -C " + m_root.path("unpacked")).c_str()),

@@ -246,6 +246,8 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
           "cp time         7e017e0304057dff\n", "frames          2\n", "payload         60002\n"}) {
         EXPECT_TRUE(said(line)) << line << m_out;
     }
+    EXPECT_EQ(run("info " + MODEM + "cp_wcdma.version"), 0) << m_err;
+    EXPECT_EQ(m_out.find("bytes"), std::string::npos) << m_out;  // it holds no frames
     EXPECT_EQ(run("--json info " + DSP_LOG), 0) << m_err;
     EXPECT_TRUE(said("\"dump_bytes\":1000,\"sequence_gaps\":0,\"payload\":1007,")) << m_out;
 

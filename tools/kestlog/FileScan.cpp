@@ -83,6 +83,7 @@ public:
                          m_name.text() == DATABASE_NAME ||
                          (m_name.type == LT_DUMP && !m_name.framed_dump);
         m_report.chunked = is_chunked(m_in, m_name);
+        m_report.scanned = !raw && m_name.type != LT_VERSION && m_name.text() != DIGEST_NAME;
         if (got == 0 || raw) {
             return;
         }

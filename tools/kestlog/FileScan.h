@@ -45,6 +45,7 @@ int chunk_kind(const DspChunkHeader& header);
 const char* chunk_fault(const DspChunkHeader& header, size_t* data_len);
 
 struct FileReport {
+    bool scanned = false;  // for frames or chunks; other files hold none
     bool chunked = false;  // an audio DSP log, else frames or anything
     bool has_record = false;
     TimeSyncRecord record{};

@@ -27,6 +27,15 @@ std::string crash_line(const Crash& crash) {
            crash_text(crash);
 }
 
+void tell_crashes(const std::vector<Crash>& crashes) {
+    for (size_t i = 0; i < std::min(crashes.size(), MAX_CRASHES); ++i) {
+        failure(ES_UNREADABLE, crash_line(crashes[i]));
+    }
+    if (crashes.size() > MAX_CRASHES) {
+        failure(ES_UNREADABLE, "and " + std::to_string(crashes.size() - MAX_CRASHES) + " more");
+    }
+}
+
 // The crash nearest to the time, of any CP without a name; null, after printing which there are,
 // when none is near.
 const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time,
@@ -46,12 +55,7 @@ const Crash* find_crash(const std::vector<Crash>& crashes, const LogTime& time,
                                ? "there is no crash at all"
                                : "no crash " + (cp.empty() ? "" : "of " + cp + " ") +
                                      "within a day of " + time_text(time) + "; there are:");
-    for (size_t i = 0; i < std::min(crashes.size(), MAX_CRASHES); ++i) {
-        failure(ES_UNREADABLE, crash_line(crashes[i]));
-    }
-    if (crashes.size() > MAX_CRASHES) {
-        failure(ES_UNREADABLE, "and " + std::to_string(crashes.size() - MAX_CRASHES) + " more");
-    }
+    tell_crashes(crashes);
     return nullptr;
 }
 
@@ -134,14 +138,16 @@ int run_bundle(const CommandLine& line) {
     if (!read_whole(line, "minutes", 0, DAY_SECONDS / 60, &minutes, &status)) {
         return status;
     }
-    for (const char* option : {"crash", "output"}) {
-        if (!line.has(option)) {
-            return line.usage_error("--" + std::string(option) + " is missing");
-        }
+    if (!line.has("output")) {
+        return line.usage_error("--output is missing");
     }
     LogTree tree;
     if (!takes_binary(line, &status) || !open_tree(line, &tree, &status)) {
         return status;
+    }
+    if (!line.has("crash")) {
+        tell_crashes(find_crashes(tree, find_dsp_crashes(tree)));
+        return line.usage_error("--crash is missing: the time of one of these");
     }
     LogTime time;
     if (!parse_time(line.value("crash", ""), tree.newest(), false, &time)) {
@@ -180,9 +186,14 @@ int run_bundle(const CommandLine& line) {
                     {"size", bundle.bytes()},
                     {"unreadable", bundle.unreadable()}});
     } else {
-        printf("%s: %s; %llu files, %llu bytes\n", escape_text(out.path()).c_str(),
+        printf("%s: %s; %llu files, %llu bytes", escape_text(out.path()).c_str(),
                escape_text(about).c_str(), static_cast<unsigned long long>(bundle.files()),
                static_cast<unsigned long long>(bundle.bytes()));
+        if (bundle.unreadable()) {
+            printf("; %llu left out or not whole",
+                   static_cast<unsigned long long>(bundle.unreadable()));
+        }
+        printf("\n");
     }
     return bundle.unreadable() || !tree.failures.empty() ? ES_UNREADABLE : ES_OK;
 }

@@ -57,6 +57,9 @@ std::string cp_time(const TimeSyncRecord& record) {
 }
 
 void add_content(Facts* facts, const FileName& name, const FileReport& report) {
+    if (!report.scanned) {
+        return;
+    }
     if (report.has_record) {
         facts->add("time record", wall_clock(report.record));
         facts->add("cp time", cp_time(report.record));
