@@ -194,6 +194,12 @@ TEST_F(KestlogFollowTreeTest, FilesOfOthersDamageAndLostDirectories) {
     m_root.write_file("h/" + DSP + "1-agdsp-2016-03-01_09-00-00.log", cut);
     EXPECT_TRUE(
         follow.says(event("damage", "\"code\":\"cut\",\"meaning\":\"the last chunk is cut off")));
+    // A copy of a set is in progress: it is no damage that the rest is still to come.
+    m_root.write_file("copy/agdsp/1-agdsp-2016-03-02_09-00-00.log", cut);
+    rename("copy", "h/modem_log/2016-03-02-09-00-00");
+    EXPECT_TRUE(follow.says(event("set", "\"2016-03-02-09-00-00\"")));
+    m_root.write_file("h/modem_log/2016-03-02-09-00-00/agdsp/1-agdsp-2016-03-02_09-00-00.log",
+                      chunk(7, LOG, "data"));
     // What copies a tree gives a file its name at the end.
     m_root.write_file("h/" + DSP + "._thumb", "x");
     follow.send(SIGSTOP);  // by the time it looks, the first name is gone

@@ -1,11 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 // Comparing the tree as it was read with what is known of it.
+#include <time.h>
+
 #include <algorithm>
 
 #include "common/text.h"
 #include "kestlog/LiveTree.h"
 
 namespace {
+
+constexpr time_t REST_SECONDS = 2;
 
 std::string parent(const std::string& path) {
     return path.substr(0, path.rfind('/'));
@@ -176,9 +180,10 @@ void LiveTree::take_files(Dir& dir, const std::vector<const TreeFile*>& files, b
     for (const TreeFile* seen : fresh) {
         add(dir, seen->name.text(), {seen->size}, tell);
         // Whether it was closed meanwhile is not known; a file that the service has counted up,
-        // or writes in one go, was.
+        // or writes in one go, was. One that was just written to may be a copy in progress.
+        const bool at_rest = seen->modified < time(nullptr) - REST_SECONDS;
         if (tell && seen->size > 0 &&
-            (seen->name.is_log() ? seen->name.number > 0 : seen->name.type != LT_DUMP)) {
+            (seen->name.is_log() ? seen->name.number > 0 && at_rest : seen->name.type != LT_DUMP)) {
             closed(dir, seen->name.text());
         }
     }
