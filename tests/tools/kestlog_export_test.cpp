@@ -123,6 +123,8 @@ TEST_F(KestlogExportTest, PacketsAreTheFramesAndChunksWithTheTimesOfTheirFiles) 
     EXPECT_EQ(fields("export . --cp CP_WCDMA --type 0x3b", "kestdiag.seq kestdiag.payload"),
               "3|676f6573206f6e207e20696e20746865206e6578742066696c65\n");
     EXPECT_EQ(fields("export card --since 10:00", "kestdiag.seq"), "1\n");
+    EXPECT_EQ(run("export card --type 9 -o none"), 2);
+    EXPECT_TRUE(m_err == "kestlog: found nothing to export\n" && !m_root.exists("none")) << m_err;
     EXPECT_EQ(fields("export --broken " + MODEM_LOG,
                      "kestdiag.seq frame.interface_name kestdiag.length kestdiag.payload_len "
                      "kestdiag.bad_length kestdiag.short"),

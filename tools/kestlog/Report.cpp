@@ -58,7 +58,12 @@ int failure(int status, const std::string& words) {
 }
 
 int open_input(LogReader& in, const std::string& path) {
-    return in.open(path, true) ? ES_OK : failure(ES_UNREADABLE, path + ": " + strerror(errno));
+    if (in.open(path, true)) {
+        return ES_OK;
+    }
+    const char* const hint =
+        errno == EISDIR ? "; ls, verify, report, extract and export read it" : "";
+    return failure(ES_UNREADABLE, path + ": " + strerror(errno) + hint);
 }
 
 int for_each_file(const CommandLine& line,

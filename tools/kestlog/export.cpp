@@ -79,7 +79,10 @@ int run_export(const CommandLine& line) {
             break;
         }
     }
-    if (status == ES_UNREADABLE && exporter.totals().packets == 0) {
+    if (status <= ES_UNREADABLE && writer.good() && exporter.totals().packets == 0) {
+        if (status == ES_OK) {
+            status = failure(ES_UNREADABLE, "found nothing to export");
+        }
         return std::max(status, tell_failures(tree));  // a capture of nothing is not kept
     }
     if (!writer.finish() || !out.close()) {
