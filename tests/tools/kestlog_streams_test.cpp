@@ -202,6 +202,51 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
     }
 }
 
+// The halves of a frame are one where the log goes on, and nothing is made up where it does not.
+// All commands count the same.
+TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
+    const std::string one = frame("one"), half = frame("half and half");
+    const std::string begun = one + half.substr(0, 9), rest = half.substr(9) + one;
+    struct Log {
+        std::string set;
+        int number;
+        std::string content;
+    };
+    const struct {
+        std::vector<Log> logs;
+        uint64_t frames, other;
+    } CASES[] = {
+        {{{INTERNAL, 1, begun}, {INTERNAL, 0, rest}}, 3, 0},
+        // Trimmed where the numbers follow each other.
+        {{{INTERNAL, 2, begun}, {INTERNAL, 1, "hole" + rest}, {INTERNAL, 0, one}}, 3, 27},
+    };
+    const auto sum = [this](const std::string& key) {
+        uint64_t all = 0;
+        for (size_t at = 0, end; (end = m_out.find('\n', at)) != std::string::npos; at = end + 1) {
+            all += Json::parse(m_out.substr(at, end - at)).value(key, uint64_t{0});
+        }
+        return all;
+    };
+    for (const auto& c : CASES) {
+        SCOPED_TRACE(&c - CASES);
+        for (const Log& log : c.logs) {
+            write_log("a/" + log.set, "cp_wcn", log.number, log.set.substr(log.set.size() - 9, 8),
+                      log.content);
+        }
+        EXPECT_EQ(run("report --json a"), 0) << m_err;
+        const Json cp = Json::parse(m_out)["cps"][0];
+        EXPECT_EQ(cp["frames"], c.frames);
+        EXPECT_EQ(cp["other_bytes"], c.other);
+        EXPECT_EQ(run("export --json -o a/capture a"), 0) << m_err;
+        EXPECT_EQ(sum("packets"), c.frames);
+        EXPECT_EQ(sum("other_bytes"), c.other);
+        EXPECT_EQ(run("extract --json --type 0x9d -o a/to a"), 0) << m_err;
+        EXPECT_EQ(sum("frames"), c.frames);
+        EXPECT_EQ(sum("other_bytes"), c.other);
+        ASSERT_EQ(system(("rm -r " + m_root.path("a")).c_str()), 0);
+    }
+}
+
 // A dump of 3 MiB in frames, its image byte for byte.
 TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     const std::string memory = pattern_bytes(3 << 20, 9);

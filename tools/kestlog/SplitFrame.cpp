@@ -75,9 +75,12 @@ bool SplitFrame::join(const TreeFile& file, uint64_t from, uint64_t size, const 
         return false;
     }
     memcpy(&m_header, m_body, sizeof(m_header));
+    if (m_header.len != m_len) {
+        return false;
+    }
     m_begin = from + used - m_parser.raw_size();
     m_head = used - tail;
-    return m_header.len == m_len;
+    return true;
 }
 
 void SplitFrame::end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
