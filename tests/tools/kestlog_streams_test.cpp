@@ -207,6 +207,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
 TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
     const std::string one = frame("one"), half = frame("half and half");
     const std::string begun = one + half.substr(0, 9), rest = half.substr(9) + one;
+    const std::string OTHER = "other/data/modem_log/2016-03-01-09-30-00/";
     struct Log {
         std::string set;
         int number;
@@ -219,6 +220,13 @@ TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
         {{{INTERNAL, 1, begun}, {INTERNAL, 0, rest}}, 3, 0},
         // Trimmed where the numbers follow each other.
         {{{INTERNAL, 2, begun}, {INTERNAL, 1, "hole" + rest}, {INTERNAL, 0, one}}, 3, 27},
+        // On the other medium; a set of another handset may be begun between.
+        {{{INTERNAL, 0, begun}, {CARD_SET, 1, rest}, {CARD_SET, 0, one}}, 4, 0},
+        {{{INTERNAL, 0, begun}, {OTHER, 0, one}, {CARD_SET, 0, rest}}, 4, 0},
+        {{{INTERNAL, 0, begun}, {OTHER, 0, rest}}, 2, 23},
+        // The end of the older set or the start of the newer one is not there.
+        {{{INTERNAL, 1, begun}, {CARD_SET, 0, rest}}, 2, 23},
+        {{{INTERNAL, 0, begun}, {CARD_SET, 1, one}, {CARD_SET, 0, rest}}, 3, 23},
     };
     const auto sum = [this](const std::string& key) {
         uint64_t all = 0;
@@ -230,20 +238,21 @@ TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
     for (const auto& c : CASES) {
         SCOPED_TRACE(&c - CASES);
         for (const Log& log : c.logs) {
-            write_log("a/" + log.set, "cp_wcn", log.number, log.set.substr(log.set.size() - 9, 8),
+            write_log("all/" + log.set, "cp_wcn", log.number, log.set.substr(log.set.size() - 9, 8),
                       log.content);
         }
-        EXPECT_EQ(run("report --json a"), 0) << m_err;
+        const std::string roots = m_root.exists("all/other") ? " all all/other" : " all";
+        EXPECT_EQ(run("report --json" + roots), 0) << m_err;
         const Json cp = Json::parse(m_out)["cps"][0];
         EXPECT_EQ(cp["frames"], c.frames);
         EXPECT_EQ(cp["other_bytes"], c.other);
-        EXPECT_EQ(run("export --json -o a/capture a"), 0) << m_err;
+        EXPECT_EQ(run("export --json -o all/capture" + roots), 0) << m_err;
         EXPECT_EQ(sum("packets"), c.frames);
         EXPECT_EQ(sum("other_bytes"), c.other);
-        EXPECT_EQ(run("extract --json --type 0x9d -o a/to a"), 0) << m_err;
+        EXPECT_EQ(run("extract --json --type 0x9d -o all/to" + roots), 0) << m_err;
         EXPECT_EQ(sum("frames"), c.frames);
         EXPECT_EQ(sum("other_bytes"), c.other);
-        ASSERT_EQ(system(("rm -r " + m_root.path("a")).c_str()), 0);
+        ASSERT_EQ(system(("rm -r " + m_root.path("all")).c_str()), 0);
     }
 }
 

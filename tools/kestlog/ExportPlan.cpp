@@ -9,7 +9,6 @@
 #include <utility>
 
 #include "common/text.h"
-#include "kestlog/LogStream.h"
 #include "kestlog/small_files.h"
 
 namespace {
@@ -40,12 +39,16 @@ ExportInterface interface_of(const ExportSource& source) {
 }  // namespace
 
 ExportPlan::ExportPlan(const LogTree& tree, const std::string& cp) {
-    find_sources(tree, cp);
+    const NextLogs next = [&] {  // the streams are needed no longer then
+        const std::vector<LogStream> streams = log_streams(tree);
+        find_sources(tree, streams, cp);
+        return NextLogs(streams);
+    }();
     std::stable_sort(sources.begin(), sources.end(),
                      [](const ExportSource& a, const ExportSource& b) {
                          return a.order.time() < b.order.time();
                      });
-    find_interfaces();
+    find_interfaces(next);
 }
 
 uint64_t ExportPlan::size() const {
@@ -56,7 +59,8 @@ uint64_t ExportPlan::size() const {
     return bytes;
 }
 
-void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
+void ExportPlan::find_sources(const LogTree& tree, const std::vector<LogStream>& streams,
+                              const std::string& cp) {
     // A list that grows takes its space twice.
     size_t files = 0;
     for (const TreeSet& set : tree.sets) {
@@ -65,7 +69,7 @@ void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
         }
     }
     sources.reserve(files);
-    for (const LogStream& stream : log_streams(tree)) {
+    for (const LogStream& stream : streams) {
         LogTime order;
         for (const StreamFile& log : stream.files) {
             order = std::max(order, log.file->name.time());
@@ -91,12 +95,12 @@ void ExportPlan::find_sources(const LogTree& tree, const std::string& cp) {
     }
 }
 
-void ExportPlan::find_interfaces() {
+void ExportPlan::find_interfaces(const NextLogs& next) {
     std::map<std::pair<const TreeSet*, std::string>, uint32_t> numbers;
     std::vector<ExportSource*> last_logs;  // of each interface
     for (ExportSource& source : sources) {
-        const auto next = static_cast<uint32_t>(interfaces.size());
-        const auto [it, is_new] = numbers.insert({{source.set, source.cp->name}, next});
+        const auto number = static_cast<uint32_t>(interfaces.size());
+        const auto [it, is_new] = numbers.insert({{source.set, source.cp->name}, number});
         source.interface = it->second;
         if (is_new) {
             interfaces.push_back(interface_of(source));
@@ -107,9 +111,14 @@ void ExportPlan::find_interfaces() {
             continue;
         }
         ExportSource*& last = last_logs[source.interface];
-        if (last && last->file->name.number == source.file->name.number + 1) {
-            last->next = source.file;
+        if (last) {
+            last->next = next.after(*last->cp, *last->file, source.file);
         }
         last = &source;
+    }
+    for (ExportSource* const last : last_logs) {
+        if (last) {
+            last->next = next.after(*last->cp, *last->file, nullptr);
+        }
     }
 }

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "kestlog/LogTree.h"
+#include "kestlog/LogStream.h"
 
 // A file with frames or chunks.
 struct ExportSource {
@@ -41,8 +41,9 @@ struct ExportPlan {
     uint64_t left_out = 0;  // files that hold no frames
 
 private:
-    void find_sources(const LogTree& tree, const std::string& cp);
-    void find_interfaces();
+    void find_sources(const LogTree& tree, const std::vector<LogStream>& streams,
+                      const std::string& cp);
+    void find_interfaces(const NextLogs& next);
 };
 
 #endif  // KESTLOG_EXPORTPLAN_H_

@@ -60,18 +60,11 @@ void FrameExporter::begin() {
         m_time = m_report->record.seconds;
         m_end = sizeof(TimeSyncRecord);
     }
-    if (m_source->queue == 0) {
-        m_end += line().head;
-        line().head = 0;
-    }
+    m_end += m_split.take_head(*m_source->file);
     m_tail = m_end;
 }
 
-// The file, or its end, could not be read.
 void FrameExporter::lost(int error) {
-    if (m_source->queue == 0) {
-        line().head = 0;
-    }
     remark_next(file_name() + " could not be read: " + strerror(error));
 }
 
@@ -131,7 +124,6 @@ void FrameExporter::end(const LogReader& in) {
             m_writer.comment(escape_text("begins in " + file.name.text() + ", ends in " +
                                          m_source->next->name.text()));
         }
-        line().head = m_split.head();
         left = 0;
     }
     if (left > 0) {
@@ -151,9 +143,9 @@ bool FrameExporter::write(int64_t time, uint8_t type, const uint8_t* data, size_
         return false;
     }
     m_writer.add_packet(m_source->interface, m_source->queue, time, data, len);
-    if (!line().remarks.empty()) {
-        m_writer.comment(line().remarks);
-        line().remarks.clear();
+    if (!remarks().empty()) {
+        m_writer.comment(remarks());
+        remarks().clear();
     }
     m_any = true;
     ++m_totals.packets;
@@ -168,9 +160,8 @@ std::string FrameExporter::outside(uint64_t bytes, const std::string& where) {
 }
 
 void FrameExporter::remark_next(const std::string& text) {
-    std::string& remarks = line().remarks;
-    if (remarks.size() < MAX_REMARKS) {
-        remarks += (remarks.empty() ? "" : "; ") + escape_text(text);
+    if (remarks().size() < MAX_REMARKS) {
+        remarks() += (remarks().empty() ? "" : "; ") + escape_text(text);
     }
 }
 

@@ -31,25 +31,19 @@ public:
     };
 
     FrameExporter(const ExportPlan& plan, PcapngWriter* writer, const Wanted& wanted)
-        : m_writer(*writer), m_wanted(wanted), m_lines(plan.interfaces.size()) {}
+        : m_writer(*writer), m_wanted(wanted), m_remarks(plan.interfaces.size()) {}
 
     // Called for the sources of the plan, in their order. Prints damage; returns the exit status.
     int add(const ExportSource& source);
     const Totals& totals() const { return m_totals; }
 
 private:
-    // What one file of an interface leaves for the next.
-    struct Line {
-        std::string remarks;  // for the comment on the next packet
-        size_t head = 0;      // bytes of the next log file that are in a packet already
-    };
-
-    Line& line() { return m_lines[m_source->interface]; }
+    std::string& remarks() { return m_remarks[m_source->interface]; }
     std::string file_name() const { return m_source->file->name.text(); }
     void begin();
     bool take(const Piece& piece);
     void end(const LogReader& in);
-    void lost(int error);
+    void lost(int error);  // the file, or its end, could not be read
     bool write(int64_t time, uint8_t type, const uint8_t* data, size_t len);
     void remark_next(const std::string& text);
     void remark_last(const std::string& text);
@@ -57,7 +51,7 @@ private:
 
     PcapngWriter& m_writer;
     const Wanted m_wanted;
-    std::vector<Line> m_lines;  // of the interfaces
+    std::vector<std::string> m_remarks;  // for the comment on the next packet of each interface
     Totals m_totals;
     SplitFrame m_split;
 

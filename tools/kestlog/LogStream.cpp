@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <map>
+#include <set>
 
 namespace {
 
@@ -35,12 +36,6 @@ std::vector<const TreeFile*> logs_in_order(const TreeCp& cp) {
     return logs;
 }
 
-const TreeFile* next_log(const std::vector<const TreeFile*>& logs, size_t i) {
-    const bool goes_on =
-        i + 1 < logs.size() && logs[i]->name.number == logs[i + 1]->name.number + 1;
-    return goes_on ? logs[i + 1] : nullptr;
-}
-
 std::vector<LogStream> log_streams(const LogTree& tree) {
     std::map<std::string, std::vector<Place>> cps;
     for (const TreeSet& set : tree.sets) {
@@ -64,4 +59,34 @@ std::vector<LogStream> log_streams(const LogTree& tree) {
         places = std::vector<Place>();  // there may be very many
     }
     return streams;
+}
+
+NextLogs::NextLogs(const std::vector<LogStream>& streams) {
+    for (const LogStream& stream : streams) {
+        std::map<const TreeCp*, const TreeFile*> ends;
+        for (const StreamFile& log : stream.files) {
+            ends[log.cp] = log.file;
+        }
+        std::map<size_t, const StreamFile*> last_logs;  // of the handsets
+        std::set<const TreeCp*> begun;
+        for (const StreamFile& log : stream.files) {
+            const StreamFile*& last = last_logs[log.set->handset];
+            // By their times the files of two directories may be mixed. Sets are read in the
+            // order of the tree.
+            if (begun.insert(log.cp).second && last && last->file == ends[last->cp] &&
+                last->file->name.number == 0 && last->set < log.set) {
+                m_behind[last->cp] = log.file;
+            }
+            last = &log;
+        }
+    }
+}
+
+const TreeFile* NextLogs::after(const TreeCp& cp, const TreeFile& log,
+                                const TreeFile* newer) const {
+    if (newer) {
+        return log.name.number == newer->name.number + 1 ? newer : nullptr;
+    }
+    const auto found = m_behind.find(&cp);
+    return found == m_behind.end() ? nullptr : found->second;
 }

@@ -4,6 +4,7 @@
 #ifndef KESTLOG_LOGSTREAM_H_
 #define KESTLOG_LOGSTREAM_H_
 
+#include <map>
 #include <string>
 #include <vector>
 
@@ -23,10 +24,28 @@ struct LogStream {
 
 // The log files of a directory by number, oldest first, whatever the clock said.
 std::vector<const TreeFile*> logs_in_order(const TreeCp& cp);
-// Of these the one that goes on where the i-th ends, or null.
-const TreeFile* next_log(const std::vector<const TreeFile*>& logs, size_t i);
 
 // The streams of all CPs that have log files, by name. The tree must stay as it is.
 std::vector<LogStream> log_streams(const LogTree& tree);
+
+// Which log file may go on where another one ends: that of the next number or, behind the last of
+// a set, the oldest in the next set of the same handset that has logs of the CP, on any medium.
+// Between two handsets nothing goes on. The tree must stay as it is.
+class NextLogs {
+public:
+    // Of the tree's streams, which are needed no longer then.
+    explicit NextLogs(const std::vector<LogStream>& streams);
+
+    // newer: the log file behind it in its directory, or null. The result may be null, too.
+    const TreeFile* after(const TreeCp& cp, const TreeFile& log, const TreeFile* newer) const;
+    // The same of the i-th of logs_in_order(cp).
+    const TreeFile* after(const TreeCp& cp, const std::vector<const TreeFile*>& logs,
+                          size_t i) const {
+        return after(cp, *logs[i], i + 1 < logs.size() ? logs[i + 1] : nullptr);
+    }
+
+private:
+    std::map<const TreeCp*, const TreeFile*> m_behind;  // the last one of the directory
+};
 
 #endif  // KESTLOG_LOGSTREAM_H_

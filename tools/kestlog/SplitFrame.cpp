@@ -79,15 +79,24 @@ bool SplitFrame::join(const TreeFile& file, uint64_t from, uint64_t size, const 
         return false;
     }
     m_begin = from + used - m_parser.raw_size();
-    m_head = used - tail;
+    m_heads[&next] = used - tail;
     return true;
+}
+
+size_t SplitFrame::take_head(const TreeFile& file) {
+    const auto found = m_heads.find(&file);
+    const size_t head = found == m_heads.end() ? 0 : found->second;
+    if (head > 0) {
+        m_heads.erase(found);
+    }
+    return head;
 }
 
 void SplitFrame::end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
                           const PieceVisitor& visit, FileReport* report) {
-    const uint64_t start = (report->has_record ? sizeof(TimeSyncRecord) : 0) + m_head;
-    report->other -= std::min<uint64_t>(report->other, m_head);
-    m_head = 0;
+    const size_t head = take_head(file);
+    const uint64_t start = (report->has_record ? sizeof(TimeSyncRecord) : 0) + head;
+    report->other -= std::min<uint64_t>(report->other, head);
     if (!next || report->chunked || !join(file, std::max(report->tail, start), size, *next)) {
         return;
     }

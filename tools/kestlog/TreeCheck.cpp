@@ -16,7 +16,8 @@ namespace {
 
 class TreeCheck {
 public:
-    TreeCheck(const LogTree& tree, TreeVisitor& visitor) : m_tree(tree), m_visitor(visitor) {}
+    TreeCheck(const LogTree& tree, TreeVisitor& visitor)
+        : m_tree(tree), m_visitor(visitor), m_next_logs(log_streams(tree)) {}
 
     void run() {
         for (const std::string& path : m_tree.strays) {
@@ -43,7 +44,7 @@ private:
     void look_at_all(const TreeSet& set, const TreeCp& cp) {
         const std::vector<const TreeFile*> logs = logs_in_order(cp);
         for (size_t i = 0; i < logs.size(); ++i) {
-            m_next = next_log(logs, i);
+            m_next = m_next_logs.after(cp, logs, i);
             look({&set, &cp, logs[i]});
         }
         m_next = nullptr;
@@ -114,7 +115,6 @@ private:
             } else {
                 m_visitor.unreadable(file.shown() + ": " + strerror(errno));
             }
-            m_split.skip_file();
             return;
         }
         if (file.name.is_log() && file.name.cp_type == CT_AGDSP) {
@@ -144,6 +144,7 @@ private:
     const LogTree& m_tree;
     TreeVisitor& m_visitor;
     ChunkSequence m_sequence;
+    const NextLogs m_next_logs;
     SplitFrame m_split;
     const TreeFile* m_next = nullptr;  // the log file that goes on where the one in hand ends
 };

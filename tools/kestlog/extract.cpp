@@ -91,10 +91,28 @@ public:
     }
 
     // False when the output failed; *status is set then.
-    bool extract(const TreeSet& set, const TreeCp& cp, int* status) {
+    bool extract(const LogTree& tree, int* status) {
+        const NextLogs next(log_streams(tree));
+        for (const TreeSet& set : tree.sets) {
+            for (const TreeCp& cp : set.cps) {
+                if (!extract(set, cp, next, status)) {
+                    return false;
+                }
+            }
+        }
+        return true;
+    }
+
+    uint64_t outputs() const { return m_outputs.size(); }
+    int status() const { return m_problems.status(); }
+
+private:
+    bool is_chosen() const { return m_type != ANY || m_sub_type != ANY; }
+
+    bool extract(const TreeSet& set, const TreeCp& cp, const NextLogs& next, int* status) {
         const std::vector<const TreeFile*> logs = logs_in_order(cp);
         for (size_t i = 0; i < logs.size(); ++i) {
-            m_next = next_log(logs, i);
+            m_next = next.after(cp, logs, i);
             if (!extract({&set, &cp, logs[i]}, status)) {
                 return false;
             }
@@ -106,12 +124,6 @@ public:
                           (extract({&set, &cp, &file}, status) && finish_dump(status));
                });
     }
-
-    uint64_t outputs() const { return m_outputs.size(); }
-    int status() const { return m_problems.status(); }
-
-private:
-    bool is_chosen() const { return m_type != ANY || m_sub_type != ANY; }
 
     bool extract(const StreamFile& place, int* status) {
         const TreeFile& file = *place.file;
@@ -221,7 +233,6 @@ private:
         LogReader in;
         if (!in.open(file.path(), named)) {
             m_problems.unreadable(path, errno);
-            m_split.skip_file();
             return true;
         }
         std::deque<Part> parts;
@@ -399,12 +410,8 @@ int run_extract(const CommandLine& line) {
         return status;
     }
     const Progress progress(tree.size(), true);
-    for (const TreeSet& set : tree.sets) {
-        for (const TreeCp& cp : set.cps) {
-            if (!extractor.extract(set, cp, &status)) {
-                return status;
-            }
-        }
+    if (!extractor.extract(tree, &status)) {
+        return status;
     }
     status = std::max(extractor.status(), tell_failures(tree));
     if (extractor.outputs() == 0 && status == ES_OK) {
