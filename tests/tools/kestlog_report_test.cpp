@@ -432,6 +432,8 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
     const Json dumps = report("dsp.tar");
     only(dumps["timeline"], {{"kind", "crash"}, {"cp", "agdsp"}, {"size", 32751}});
     only(dumps["crashes"], {{"what", "part of a memory dump, without its start"}, {"size", 1}});
+    write(dsp + "0-agdsp-2016-03-01_11-01-00.log", "junk" + chunk(1, DUMP, "end"));
+    only(report("handset", 3)["crashes"], {{"what", "memory dump"}, {"damages", 1}});
     for (const char* wrong :
          {"-o x", "--crash noon -o x", "--crash 9:06", "--crash 9:06 -o x --minutes 9999"}) {
         EXPECT_EQ(run("bundle handset " + std::string(wrong)), 1) << wrong;

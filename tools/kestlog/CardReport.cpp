@@ -206,7 +206,7 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
         item.name = file.name.text();
         m_timeline.add(place.cp->name, file.name.kind(), item);
     }
-    if (of_crash(file) && m_file_damages) {
+    if (m_file_damages && (of_crash(file) || report.chunks[CK_DUMP].count > 0)) {
         m_damaged[&file] = m_file_damages;
     }
     if (type == LT_WCDMA_IQ && m_options.iq) {
