@@ -334,6 +334,36 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
         << m_out;
 }
 
+// As long as the numbers of the chunks follow each other, and those of another handset do not
+// count.
+TEST_F(KestlogStreamsTest, AnAudioDspsDumpGoesOnInTheNextSet) {
+    const std::string full = pattern_bytes(32748, 4), to = "to/agdsp_memory_2016-03-01_";
+    const std::string OTHER = "other/data/modem_log/2016-03-01-09-30-00/";
+    write_log(INTERNAL, "agdsp", 0, "09-00-00", chunk(7, LOG, "") + chunk(8, DUMP, full));
+    write_log(INTERNAL, "cp_wcn", 0, "09-00-00", frame("ring", 0x3a, 0x64));
+    write_log(OTHER, "agdsp", 0, "09-30-00", chunk(9, DUMP, "other"));
+    write_log(CARD_SET, "agdsp", 1, "10-00-00", chunk(9, DUMP, full));
+    write_log(CARD_SET, "agdsp", 0, "10-01-00", chunk(10, DUMP, "end"));
+    EXPECT_EQ(run("extract . other -o to"), 0) << m_err;
+    EXPECT_EQ(m_root.list("to").size(), 3u);
+    EXPECT_EQ(m_root.read_file(to + "09-00-00.bin"), full + full + "end");
+    EXPECT_EQ(m_root.read_file(to + "09-30-00.bin"), "other");
+    EXPECT_EQ(run("report --json . other"), 0) << m_err;
+    const Json crashes = Json::parse(m_out)["crashes"];
+    ASSERT_EQ(crashes.size(), 2u);
+    EXPECT_EQ(crashes[0]["what"], "memory dump");
+    EXPECT_EQ(crashes[0]["files"].size(), 3u);
+    EXPECT_EQ(crashes[1]["what"], "part of a memory dump, without its start");
+    EXPECT_EQ(run("bundle . --crash 09:00 --minutes 0 -o one.tar"), 0) << m_err;
+    EXPECT_EQ(run("report --json one.tar"), 0) << m_err;
+    EXPECT_EQ(Json::parse(m_out)["crashes"], Json::array({crashes[0]}));
+
+    write_log(CARD_SET, "agdsp", 1, "10-00-00", chunk(6, DUMP, full));
+    EXPECT_EQ(run("extract . --force -o to"), 0) << m_err;
+    EXPECT_EQ(occurrences(m_out, ": part of a memory image, "), 2u) << m_out;
+    EXPECT_EQ(m_root.read_file(to + "09-00-00.bin"), full);
+}
+
 // Stereo samples of 16 bits in chunks that end within a sample; the log's chunks lie between.
 TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
 #ifndef KEST_WAV

@@ -14,7 +14,7 @@ class ChunkSequence {
 public:
     // Before the first chunk of a file. In another set the numbers may begin anew.
     void enter(const TreeDir& dir) {
-        m_follows &= dir.path == m_dir;
+        m_other_dir |= dir.path != m_dir;
         m_dir = dir.path;
         m_first = true;
     }
@@ -23,7 +23,9 @@ public:
     // the numbers go back. Says in the report what the scan of one file cannot see: a gap
     // between two files.
     int32_t take(const Piece& chunk, FileReport* report) {
-        const int32_t missing = m_follows ? static_cast<int32_t>(chunk.seq_num - m_next) : 0;
+        m_anew = !m_follows || (m_other_dir && chunk.seq_num != m_next);
+        m_other_dir = false;
+        const int32_t missing = m_anew ? 0 : static_cast<int32_t>(chunk.seq_num - m_next);
         if (m_first && missing != 0) {
             ++report->sequence_gaps;
             report->add(false, "sequence",
@@ -36,10 +38,15 @@ public:
         m_next = chunk.seq_num + 1;
         return missing;
     }
+    // Whether no numbers before that chunk tell what is missing: it is the first one in its set,
+    // and does not go on where another set ended.
+    bool anew() const { return m_anew; }
 
 private:
     std::string m_dir;
     bool m_first = true;
+    bool m_other_dir = false;
+    bool m_anew = true;
     bool m_follows = false;
     uint32_t m_next = 0;
 };

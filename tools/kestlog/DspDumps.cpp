@@ -23,46 +23,49 @@ std::string DspDump::missing_words() const {
 }
 
 void DspDumps::enter(const StreamFile& place) {
-    if (!m_place.file || m_place.file->dir->path != place.file->dir->path) {
-        finish();
-        m_first = true;
-    }
     m_place = place;
-    m_sequence.enter(*place.file->dir);
+    m_log = &m_logs[place.set->handset];
+    m_log->sequence.enter(*place.file->dir);
 }
 
 bool DspDumps::take(const Piece& chunk) {
+    DspDump& dump = m_log->dump;
     FileReport ignored;
-    const int32_t missing = m_sequence.take(chunk, &ignored);
+    const int32_t missing = m_log->sequence.take(chunk, &ignored);
+    const bool anew = m_log->sequence.anew() || missing < 0;
     const bool of_dump = chunk.kind == CHUNK_KINDS[CK_DUMP];
     // Numbers that go back are those of a new run of the service. What another kind follows
     // behind a gap has ended in the gap.
-    if (m_dump.has_end || missing < 0 || (missing > 0 && !of_dump)) {
-        finish();
+    if (dump.has_end || anew || (missing > 0 && !of_dump)) {
+        finish(&dump);
     }
-    // The first number of all is 0.
-    const bool follows = m_first || missing < 0 ? chunk.seq_num == 0 : missing == 0;
-    m_first = false;
     if (!of_dump) {
-        m_dump.others += m_dump.chunks > 0 ? 1 : 0;
+        dump.others += dump.chunks > 0 ? 1 : 0;
         return false;
     }
-    if (m_dump.chunks++ == 0) {
-        m_dump.has_start = follows;
+    if (dump.chunks++ == 0) {
+        // The first number of all is 0.
+        dump.has_start = anew ? chunk.seq_num == 0 : missing == 0;
     } else {
-        m_dump.missing += static_cast<uint64_t>(missing);
+        dump.missing += static_cast<uint64_t>(missing);
     }
-    if (m_dump.files.empty() || m_dump.files.back().file != m_place.file) {
-        m_dump.files.push_back(m_place);
+    if (dump.files.empty() || dump.files.back().file != m_place.file) {
+        dump.files.push_back(m_place);
     }
-    m_dump.bytes += chunk.data_len;
-    m_dump.has_end = chunk.data_len < DSP_CHUNK_MAX_DATA;
+    dump.bytes += chunk.data_len;
+    dump.has_end = chunk.data_len < DSP_CHUNK_MAX_DATA;
     return true;
 }
 
 void DspDumps::finish() {
-    if (m_dump.chunks > 0) {
-        m_visit(m_dump);
+    for (auto& [handset, log] : m_logs) {
+        finish(&log.dump);
     }
-    m_dump = DspDump();
+}
+
+void DspDumps::finish(DspDump* dump) {
+    if (dump->chunks > 0) {
+        m_visit(*dump);
+    }
+    *dump = DspDump();
 }

@@ -1,13 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 // The memory dumps in an audio DSP's log, which is where the service puts them: the dump chunks in
-// a row, over the files of a directory, up to the first one that is not as large as it can be.
-// Owned by whoever goes through the chunks of the files, oldest first.
+// a row, over the files of a handset's sets, up to the first one that is not as large as it can be.
+// Into another set a dump goes on where the numbers of the chunks do. Owned by whoever goes through
+// the chunks of the files, those of each handset oldest first.
 #ifndef KESTLOG_DSPDUMPS_H_
 #define KESTLOG_DSPDUMPS_H_
 
 #include <stdint.h>
 
 #include <functional>
+#include <map>
 #include <string>
 #include <utility>
 #include <vector>
@@ -38,20 +40,27 @@ public:
     // The visitor gets each dump when it is over.
     explicit DspDumps(Visitor visit) : m_visit(std::move(visit)) {}
 
-    // Before the first chunk of a file. In another directory nothing goes on.
+    // Before the first chunk of a file.
     void enter(const StreamFile& place);
     // Takes the next chunk of any kind; whether it belongs to a dump, which is then dump().
     bool take(const Piece& chunk);
-    const DspDump& dump() const { return m_dump; }
+    const DspDump& dump() const { return m_log->dump; }
     // After the last file: what has begun is over.
     void finish();
 
 private:
+    // Of a handset.
+    struct Log {
+        ChunkSequence sequence;
+        DspDump dump;  // in progress, when it has chunks
+    };
+
+    void finish(DspDump* dump);
+
     const Visitor m_visit;
     StreamFile m_place{};
-    bool m_first = true;  // no chunk of this directory has been seen
-    ChunkSequence m_sequence;
-    DspDump m_dump;  // in progress, when it has chunks
+    std::map<size_t, Log> m_logs;
+    Log* m_log = nullptr;  // of the file that was entered
 };
 
 #endif  // KESTLOG_DSPDUMPS_H_

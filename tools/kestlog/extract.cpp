@@ -93,11 +93,23 @@ public:
     // False when the output failed; *status is set then.
     bool extract(const LogTree& tree, int* status) {
         const NextLogs next(log_streams(tree));
+        // A handset after the other: one dump is written at a time, and may go over its sets.
+        std::vector<const TreeSet*> sets;
         for (const TreeSet& set : tree.sets) {
-            for (const TreeCp& cp : set.cps) {
-                if (!extract(set, cp, next, status)) {
+            sets.push_back(&set);
+        }
+        std::stable_sort(sets.begin(), sets.end(), [](const TreeSet* a, const TreeSet* b) {
+            return a->handset < b->handset;
+        });
+        for (size_t i = 0; i < sets.size(); ++i) {
+            for (const TreeCp& cp : sets[i]->cps) {
+                if (!extract(*sets[i], cp, next, status)) {
                     return false;
                 }
+            }
+            const bool last = i + 1 == sets.size() || sets[i]->handset != sets[i + 1]->handset;
+            if (last && !finish_dump(status)) {
+                return false;
             }
         }
         return true;
@@ -118,11 +130,9 @@ private:
             }
         }
         m_next = nullptr;
-        return finish_dump(status) &&
-               std::all_of(cp.files.begin(), cp.files.end(), [&](const TreeFile& file) {
-                   return file.name.is_log() ||
-                          (extract({&set, &cp, &file}, status) && finish_dump(status));
-               });
+        return std::all_of(cp.files.begin(), cp.files.end(), [&](const TreeFile& file) {
+            return file.name.is_log() || extract({&set, &cp, &file}, status);
+        });
     }
 
     bool extract(const StreamFile& place, int* status) {
@@ -210,6 +220,9 @@ private:
             m_dump_failed ||
             (m_dumps.dump().chunks == 1 && !open(stem, named ? "" : ".dump", &m_dump)) ||
             !m_dump.write(piece.data, piece.data_len);
+        if (m_dumps.dump().has_end) {
+            m_dumps.finish();
+        }
         return !m_dump_failed;
     }
 
@@ -236,11 +249,19 @@ private:
             return true;
         }
         std::deque<Part> parts;
-        for (const Content& content : contents(file.name, is_chunked(in, file.name))) {
+        const bool chunked = is_chunked(in, file.name);
+        for (const Content& content : contents(file.name, chunked)) {
             parts.emplace_back();
             parts.back().content = content;
         }
-        m_dumps.enter(place);
+        // What is no log file stands alone.
+        const bool alone = chunked && !file.name.is_log();
+        if (alone && !finish_dump(status)) {
+            return false;
+        }
+        if (chunked) {
+            m_dumps.enter(place);
+        }
         FileReport report;
         const Part* failed = nullptr;
         End end;
@@ -275,7 +296,7 @@ private:
             }
         }
         tell(path, report, in.error());
-        return true;
+        return !alone || finish_dump(status);
     }
 
     void tell(const std::string& path, const FileReport& report, int error) {
