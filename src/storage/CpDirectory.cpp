@@ -234,6 +234,7 @@ uint64_t CpDirectory::delete_oldest(uint64_t wanted, Spare spare, const LogFile*
         }
         if (file->remove(m_path) < 0) {
             stuck = file;
+            m_set->media()->deletion_failed(errno);
             break;
         }
         const uint64_t size = file->counted();
@@ -243,6 +244,29 @@ uint64_t CpDirectory::delete_oldest(uint64_t wanted, Spare spare, const LogFile*
             break;
         }
         wanted -= size;
+    }
+    return removed;
+}
+
+uint64_t CpDirectory::trim_past_stuck(uint64_t wanted, Spare spare) {
+    MediaStorage* const media = m_set->media();
+    uint64_t removed = 0;
+    FileIter it = is_link(m_path) ? m_files.end() : m_files.begin();
+    while (it != m_files.end() && removed < wanted && media->may_pass_over()) {
+        LogFile* file = *it;
+        if (file->stuck() || is_spared(file, spare)) {
+            ++it;
+        } else if (file->remove(m_path) < 0) {
+            media->passed_over(errno);
+            ++it;
+        } else {
+            removed += file->counted();
+            it = drop(it);
+        }
+    }
+    m_size -= removed;
+    if (spare != Spare::NOTHING) {
+        renumber_first_log();
     }
     return removed;
 }

@@ -73,7 +73,8 @@ public:
     // Bytes that came or went; the set and the medium count them too.
     void add_size(uint64_t num);
     void dec_size(uint64_t num);
-    // Counts the listed files on the medium again and drops those that are gone.
+    // Counts the listed files on the medium again and drops those that are gone, or no files any
+    // more.
     // Only this directory's size changes. Returns how many files it looked at.
     size_t recount();
 
@@ -85,6 +86,10 @@ public:
     uint64_t trim_working_dir(uint64_t wanted);
     // The same, but deletes nothing but logs.
     uint64_t trim_logs(uint64_t wanted);
+    // Each of the three ends at a file that cannot be deleted. This goes on behind those: it
+    // passes over them, and over more that it finds as long as the medium allows that. Leaves
+    // what spare names.
+    uint64_t trim_past_stuck(uint64_t wanted, Spare spare);
 
 private:
     typedef android::List<LogFile*>::iterator FileIter;
@@ -95,6 +100,7 @@ private:
     android::String8 aside_name(const android::String8& name);
     bool taken_by_stranger(const android::String8& name,
                            const std::set<std::string_view>& listed) const;
+    bool is_replaced(const LogFile* file) const;
     FileIter drop(FileIter it);
     uint64_t delete_oldest(uint64_t wanted, Spare spare, const LogFile*& stuck);
     bool is_spared(const LogFile* file, Spare spare) const;

@@ -37,6 +37,12 @@ bool CpDirectory::taken_by_stranger(const android::String8& name,
     return listed.count(name.string()) == 0 && lstat(JoinedPath(m_path, name).string(), &st) == 0;
 }
 
+// Something else than a file has the place of a listed one: it is somebody else's.
+bool CpDirectory::is_replaced(const LogFile* file) const {
+    struct stat st;
+    return lstat(JoinedPath(m_path, file->name()).string(), &st) == 0 && !S_ISREG(st.st_mode);
+}
+
 // Each file gets its number plus 1, but at least 1 more than the next younger file gets. So two
 // files that share a number, because a renaming failed between them, get different ones.
 void CpDirectory::rotate_logs() {
@@ -82,6 +88,10 @@ void CpDirectory::rotate_logs() {
     // The oldest first: each one makes room for the next.
     for (size_t i = logs.size(); i-- > 0;) {
         const Numbered& log = logs[i];
+        if (is_replaced(log.file)) {
+            file_removed(log.file);
+            continue;
+        }
         errno = 0;  // not every failure sets it
         const bool next = log.target == uint64_t{log.number} + 1 || log.target > UINT32_MAX;
         const int result = next ? log.file->rotate(m_path)
@@ -94,7 +104,7 @@ void CpDirectory::rotate_logs() {
 
 // Keeps the numbers contiguous: the first log file gets the number after the oldest other one's.
 void CpDirectory::renumber_first_log() {
-    if (!m_first_log || leads_away()) {
+    if (!m_first_log || leads_away() || is_replaced(m_first_log.get())) {
         return;
     }
     for (LogFile* file : m_files) {

@@ -48,10 +48,11 @@ size_t CpDirectory::recount() {
         struct stat st;
         ++looked_at;
         const bool known = lstat(JoinedPath(m_path, file->name()).string(), &st) == 0;
-        if (!known && means_vanished(errno)) {
+        if (known ? !S_ISREG(st.st_mode) : means_vanished(errno)) {
             it = drop(it);
             continue;
         }
+        file->forget_stuck();             // it is time for another try
         if (known && !file->is_open()) {  // part of an open file may still be staged
             file->found(static_cast<uint64_t>(st.st_size));
         }

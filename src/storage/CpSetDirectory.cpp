@@ -127,7 +127,7 @@ size_t CpSetDirectory::recount() {
     return looked_at;
 }
 
-uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
+uint64_t CpSetDirectory::trim_with(Walk walk, uint64_t wanted, Spare spare) {
     uint64_t removed = 0;
     if (is_link(m_path)) {
         return removed;
@@ -136,9 +136,7 @@ uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
     while (it != m_dirs.end()) {
         CpDirectory* dir = *it;
         dir->found_empty();  // what it finds is trimmed
-        const uint64_t n = spare == Spare::NOTHING     ? dir->trim(wanted)
-                           : spare == Spare::PROTECTED ? dir->trim_working_dir(wanted)
-                                                       : dir->trim_logs(wanted);
+        const uint64_t n = walk(dir, wanted, spare);
         removed += n;
         if (dir->found_empty()) {
             it = m_dirs.erase(it);
@@ -157,9 +155,21 @@ uint64_t CpSetDirectory::trim_with(Spare spare, uint64_t wanted) {
 }
 
 uint64_t CpSetDirectory::trim(uint64_t wanted) {
-    return trim_with(Spare::NOTHING, wanted);
+    return trim_working_dir(wanted, Spare::NOTHING);
 }
 
 uint64_t CpSetDirectory::trim_working_dir(uint64_t wanted, Spare spare) {
-    return trim_with(spare, wanted);
+    return trim_with(
+        [](CpDirectory* dir, uint64_t bytes, Spare left) {
+            return left == Spare::NOTHING     ? dir->trim(bytes)
+                   : left == Spare::PROTECTED ? dir->trim_working_dir(bytes)
+                                              : dir->trim_logs(bytes);
+        },
+        wanted, spare);
+}
+
+uint64_t CpSetDirectory::trim_past_stuck(uint64_t wanted, Spare spare) {
+    return trim_with([](CpDirectory* dir, uint64_t bytes,
+                        Spare left) { return dir->trim_past_stuck(bytes, left); },
+                     wanted, spare);
 }

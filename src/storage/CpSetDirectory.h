@@ -65,9 +65,13 @@ public:
     uint64_t trim(uint64_t wanted);
     // The same for the set being written, but leaves the files that spare names.
     uint64_t trim_working_dir(uint64_t wanted, Spare spare);
+    // The same behind the files that these two could not delete.
+    uint64_t trim_past_stuck(uint64_t wanted, Spare spare);
 
 private:
-    uint64_t trim_with(Spare spare, uint64_t wanted);
+    typedef uint64_t (*Walk)(CpDirectory* dir, uint64_t wanted, Spare spare);
+
+    uint64_t trim_with(Walk walk, uint64_t wanted, Spare spare);
 
     MediaStorage* m_media;
     android::String8 m_path;

@@ -214,6 +214,7 @@ int LogFile::remove(const android::String8& dir_path) {
     const JoinedPath path(dir_path, m_name);
     if (unlink(path.string()) < 0 && errno != ENOENT) {
         err_log("delete %s error", path.string());
+        m_stuck = true;
         return -1;
     }
     return 0;

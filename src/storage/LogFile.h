@@ -93,6 +93,9 @@ public:
     int rename_to(const android::String8& dir_path, const android::String8& new_name);
     // Deletes the file from the medium; one that is gone already counts as deleted.
     int remove(const android::String8& dir_path);
+    // Whether the last remove() failed, since when nobody has forgotten it.
+    bool stuck() const { return m_stuck; }
+    void forget_stuck() { m_stuck = false; }
     // Deletes the file from the medium and from its directory: this object is gone afterwards.
     void discard();
     // False when the file vanished: it cannot be read and written on the medium any more.
@@ -122,6 +125,7 @@ private:
     LogTime m_time;
     uint32_t m_size;
     uint64_t m_counted;
+    bool m_stuck = false;
     int m_fd = -1;
     std::unique_ptr<uint8_t[]> m_buffer;  // while open
     size_t m_capacity = 0;

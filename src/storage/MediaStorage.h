@@ -85,6 +85,12 @@ public:
     // Something vanished from the medium: the totals may count what is no longer there.
     // check_quota counts again before it deletes anything because of them.
     void totals_uncertain() { m_uncertain = true; }
+    // A file could not be deleted in the present trim, for the reason error.
+    void deletion_failed(int error);
+    // The same of one behind which it goes on.
+    void passed_over(int error);
+    // Whether it may go on behind one more: on a dying medium each try may last.
+    bool may_pass_over() const { return m_passed_over < MAX_PASSED_OVER; }
     // Bytes of log data arrived for this medium, whether they can be written or not.
     void data_arrived(size_t len) { m_arrived += len; }
 
@@ -113,7 +119,10 @@ public:
     void clear_all();
 
 private:
+    static constexpr size_t MAX_PASSED_OVER = 16;
+
     uint64_t trim_sets_before(uint64_t wanted);
+    uint64_t trim_sets(uint64_t wanted, uint64_t (CpSetDirectory::*walk)(uint64_t, Spare));
     uint64_t trim_working_set(uint64_t wanted, Spare spare);
     int prepare_top_dir() const;
     int remake_log_root();
@@ -141,6 +150,8 @@ private:
     uint64_t m_size = 0;
     bool m_uncertain = false;         // something vanished since the last recount
     unsigned int m_refusals = 0;      // checks that failed in a row
+    size_t m_stuck = 0;               // files that the last trim could not delete
+    size_t m_passed_over = 0;         // those behind which it went on
     size_t m_recounted = 0;           // files that the last recount looked at
     uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; enough at first
 };

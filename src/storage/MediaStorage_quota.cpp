@@ -26,11 +26,24 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
     return removed + trim_working_set(wanted - std::min(wanted, removed), Spare::PROTECTED);
 }
 
+// A walk through the older sets leaves what is behind a file that cannot be deleted. That goes
+// after them, but before anything in the working set.
 uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
-    uint64_t removed = 0;
+    m_stuck = 0;
+    m_passed_over = 0;
     if (leads_away()) {
-        return removed;
+        return 0;
     }
+    uint64_t removed = trim_sets(wanted, &CpSetDirectory::trim_working_dir);
+    if (removed < wanted && m_stuck > 0) {
+        removed += trim_sets(wanted - removed, &CpSetDirectory::trim_past_stuck);
+    }
+    return removed;
+}
+
+uint64_t MediaStorage::trim_sets(uint64_t wanted,
+                                 uint64_t (CpSetDirectory::*walk)(uint64_t, Spare)) {
+    uint64_t removed = 0;
     android::List<CpSetDirectory*>::iterator it = m_sets.begin();
     while (it != m_sets.end()) {
         CpSetDirectory* set = *it;
@@ -39,7 +52,7 @@ uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
             continue;
         }
         set->found_empty();  // what it finds is trimmed
-        const uint64_t n = set->trim(wanted);
+        const uint64_t n = (set->*walk)(wanted, Spare::NOTHING);
         removed += n;
         if (set->found_empty()) {
             it = m_sets.erase(it);
@@ -61,9 +74,25 @@ uint64_t MediaStorage::trim_working_set(uint64_t wanted, Spare spare) {
     if (wanted == 0 || !m_working_set || leads_away()) {
         return 0;
     }
-    const uint64_t removed = m_working_set->trim_working_dir(wanted, spare);
+    const size_t stuck = m_stuck;
+    uint64_t removed = m_working_set->trim_working_dir(wanted, spare);
+    if (removed < wanted && m_stuck > stuck) {
+        removed += m_working_set->trim_past_stuck(wanted - removed, spare);
+    }
     m_size -= removed;
     return removed;
+}
+
+void MediaStorage::deletion_failed(int error) {
+    ++m_stuck;
+    if (error == EISDIR) {
+        m_uncertain = true;  // counting again drops what is no file
+    }
+}
+
+void MediaStorage::passed_over(int error) {
+    ++m_passed_over;
+    deletion_failed(error);
 }
 
 bool MediaStorage::above_quota() const {

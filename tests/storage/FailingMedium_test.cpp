@@ -193,8 +193,10 @@ TEST_F(FailingMediumTest, NamesAreNotTriedForEver) {
     EXPECT_EQ(lost_of(1, "x"), 1);
     faults::reset();
     EXPECT_EQ(lost_of(1, "x"), 0);
-    faults::instead.lstat = [](const char* path, struct stat* st) {
-        return strstr(path, ".log") ? real::lstat("/", st) : real::lstat(path, st);
+    m_root.write_file("some file", "");
+    faults::instead.lstat = [&](const char* path, struct stat* st) {
+        return strstr(path, ".log") ? real::lstat(m_root.path("some file").c_str(), st)
+                                    : real::lstat(path, st);
     };
     EXPECT_EQ(lost_of(1, "x"), 0);
     m_store->stop();
@@ -315,6 +317,75 @@ TEST_F(FailingMediumTest, ASetThatCannotBeMadeCostsLittle) {
     plug_card();
     EXPECT_EQ(lost_of(4, block), 0);
     EXPECT_EQ(m_root.list("sd/modem_log").size(), 4u) << "of six: room was made once";
+}
+
+// One file that cannot be deleted kept everything behind it, and so the medium full for good.
+TEST_F(FailingMediumTest, WhatCannotBeDeletedIsPassedOver) {
+    const std::string old = "data/modem_log/2016-02-0", block(16, 'x');
+    for (const char* file : {"1-00-00-00/cp_gnss/a", "1-00-00-00/cp_gnss/b", "1-00-00-00/cp_gnss/c",
+                             "2-00-00-00/cp_gnss/d"}) {
+        m_root.write_file(old + file, block);
+    }
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    bool stuck = true;
+    faults::instead.unlink = [&](const char* path) {
+        return stuck && strrchr(path, '/')[1] == 'c' ? (errno = EIO, -1) : real::unlink(path);
+    };
+    // Of unknown files the last one found is first: the order of a, b and c is not fixed.
+    EXPECT_EQ(internal().trim(48), 48u);
+    EXPECT_EQ(m_root.list(old + "1-00-00-00/cp_gnss"), Names{"c"});
+    EXPECT_FALSE(m_root.exists(old + "2-00-00-00"));
+    EXPECT_EQ(lost_of(1, block), 0);
+    for (const char* name : {"c1", "e", "f"}) {  // in the set in use, after the older one
+        m_store->create_file(name, LT_DUMP)->write(block.data(), block.size());
+    }
+    EXPECT_EQ(internal().trim(16), 16u);
+    EXPECT_EQ(m_root.find("cp_gnss/e").size() + m_root.find("cp_gnss/f").size(), 1u);
+    stuck = false;
+    EXPECT_EQ(internal().trim(16), 16u);
+    EXPECT_FALSE(m_root.exists(old + "1-00-00-00")) << "it is tried again";
+    check_sums(internal());
+
+    // On a dying medium each try may last.
+    for (int i = 0; i < 200; ++i) {
+        m_root.write_file(old + "1-00-00-00/cp_gnss/" + std::to_string(i), block);
+    }
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    faults::instead = {};
+    faults::only_on("/cp_gnss/");
+    faults::fail(faults::UNLINK, 1, EIO, faults::FOREVER);
+    const int before = faults::calls(faults::UNLINK);
+    EXPECT_EQ(internal().trim(16), 0u);
+    EXPECT_LE(faults::calls(faults::UNLINK) - before, 20);
+}
+
+// Somebody put directories in the place of log files.
+TEST_F(FailingMediumTest, ADirectoryIsNoLogFile) {
+    const std::string old = "data/modem_log/2016-02-01-00-00-00/cp_gnss/", block(70000, 'x');
+    const auto replace = [&](const std::string& file) {
+        ASSERT_EQ(unlink(m_root.path(file).c_str()), 0) << file;
+        m_root.make_dir(file);
+    };
+    m_root.write_file(old + "0-cp_gnss-2016-02-01_00-00-00.log", block);
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    replace(old + "0-cp_gnss-2016-02-01_00-00-00.log");
+    EXPECT_EQ(lost_of(2, block), 0);
+    internal().set_quota(150000);
+    EXPECT_EQ(internal().check_quota(), 0) << "counted again";
+    EXPECT_EQ(internal().size(), 140000u);
+    m_store->stop();
+    const std::string current = m_root.find("/0-cp_gnss").back();
+    replace(current);
+    EXPECT_EQ(lost_of(1, block), 0);
+    EXPECT_TRUE(m_root.exists(current)) << "it is not renamed";
+    internal().set_quota(1000000);
+    m_store->stop();
+    EXPECT_EQ(lost_of(1, block), 0);
+    internal().check_quota();
+    check_sums(internal());
 }
 
 // What a scan could not read was not known, and went with the directory that seemed empty.
