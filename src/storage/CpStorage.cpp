@@ -111,11 +111,22 @@ void CpStorage::make_room(MediaStorage* media) {
     if (media->free_space() == 0) {
         return;
     }
-    if (media->make_room_with_new_set()) {
-        media->free_space();
-    }
+    const bool freed = media->make_room_with_new_set() && media->free_space() == 0;
     m_quota_pending = true;
     flush();
+    if (!freed) {
+        report_deletions(media);
+    }
+}
+
+// Where there is no room because nothing can be deleted any more, nothing is written that could
+// tell that the medium fails: it hears of that as of a write. Returns the errno, or 0.
+int CpStorage::report_deletions(MediaStorage* media) {
+    const int error = media->deletion_error();
+    if (error != 0) {
+        m_manager->write_failed(media, error);
+    }
+    return error;
 }
 
 // Sees to it that there is a current file that may take len bytes more. The hooks for a new
@@ -146,7 +157,8 @@ bool CpStorage::prepare_write(size_t len) {
 // False while the medium is above its quota after an earlier write.
 bool CpStorage::pass_quota(MediaStorage* media) {
     if (m_quota_pending && media->check_quota() != 0 && !media->make_room_with_new_set()) {
-        errno = EDQUOT;  // for who reports the block that is lost
+        const int error = report_deletions(media);
+        errno = error != 0 ? error : EDQUOT;  // for who reports the block that is lost
         return false;
     }
     m_quota_pending = false;

@@ -84,6 +84,7 @@ private:
     void keep_quota(MediaStorage* media);
     bool has_room(MediaStorage* media);
     void make_room(MediaStorage* media);
+    int report_deletions(MediaStorage* media);
     bool prepare_file();
     bool open_log_file(MediaStorage* media);
     bool pass_quota(MediaStorage* media);

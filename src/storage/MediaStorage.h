@@ -91,6 +91,9 @@ public:
     void passed_over(int error);
     // Whether it may go on behind one more: on a dying medium each try may last.
     bool may_pass_over() const { return m_passed_over < MAX_PASSED_OVER; }
+    // The errno with which the last trim failed to delete files, if that says that the medium
+    // fails; else 0.
+    int deletion_error() const { return m_overwrite ? m_deletion_error : 0; }
     // Bytes of log data arrived for this medium, whether they can be written or not.
     void data_arrived(size_t len) { m_arrived += len; }
 
@@ -151,6 +154,7 @@ private:
     bool m_uncertain = false;         // something vanished since the last recount
     unsigned int m_refusals = 0;      // checks that failed in a row
     size_t m_stuck = 0;               // files that the last trim could not delete
+    int m_deletion_error = 0;         // see deletion_error()
     size_t m_passed_over = 0;         // those behind which it went on
     size_t m_recounted = 0;           // files that the last recount looked at
     uint64_t m_arrived = UINT32_MAX;  // bytes since the last set made for room; enough at first

@@ -31,6 +31,7 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
 uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
     m_stuck = 0;
     m_passed_over = 0;
+    m_deletion_error = 0;
     if (leads_away()) {
         return 0;
     }
@@ -85,6 +86,10 @@ uint64_t MediaStorage::trim_working_set(uint64_t wanted, Spare spare) {
 
 void MediaStorage::deletion_failed(int error) {
     ++m_stuck;
+    // Other reasons, such as rights, tell of the file only.
+    if (error == EIO || error == EROFS) {
+        m_deletion_error = error;
+    }
     if (error == EISDIR) {
         m_uncertain = true;  // counting again drops what is no file
     }

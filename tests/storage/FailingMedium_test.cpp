@@ -361,6 +361,37 @@ TEST_F(FailingMediumTest, WhatCannotBeDeletedIsPassedOver) {
     EXPECT_LE(faults::calls(faults::UNLINK) - before, 20);
 }
 
+// Nothing is written to such a card, full or above its quota, that could tell that it fails.
+TEST_F(FailingMediumTest, ACardOnWhichNothingCanBeDeletedIsLeft) {
+    const std::string block(70000, 'x');
+    m_mgr.set_file_size(100000);
+    for (const bool full : {false, true}) {
+        for (const int error : {EIO, EROFS, EPERM}) {
+            SCOPED_TRACE(std::string(full ? "full " : "quota ") + strerror(error));
+            m_root.write_file("sd/modem_log/2016-02-01-00-00-00/cp_gnss/old", block);
+            m_mgr.set_sd_size(full ? 0 : 80000);
+            plug_card();
+            faults::instead.unlink = [&](const char* path) {
+                return strstr(path, "/sd/") ? (errno = error, -1) : real::unlink(path);
+            };
+            faults::instead.write = [&](int fd, const void* data, size_t len) {
+                return full && on_card(fd) ? (errno = ENOSPC, ssize_t{-1})
+                                           : real::write(fd, data, len);
+            };
+            const uint64_t inside = internal().size();
+            const bool left = error != EPERM;  // that tells nothing of the card
+            EXPECT_EQ(lost_of(6, block), left ? 1 : full ? 6 : 5);
+            EXPECT_EQ(m_mgr.media_type(), left ? MT_INTERNAL : MT_EXTERNAL);
+            EXPECT_EQ(internal().size() > inside, left);
+            faults::instead = {};
+            m_mgr.set_sd_size(0);
+            pull_card();
+            lost_of(1, block);
+            remove_tree(m_root.path("sd/modem_log").c_str());
+        }
+    }
+}
+
 // Somebody put directories in the place of log files.
 TEST_F(FailingMediumTest, ADirectoryIsNoLogFile) {
     const std::string old = "data/modem_log/2016-02-01-00-00-00/cp_gnss/", block(70000, 'x');
