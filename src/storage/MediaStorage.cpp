@@ -225,5 +225,8 @@ void MediaStorage::clear_all() {
         err_log("%s is left alone", m_log_root.string());
         return;
     }
-    remove_numbered_entries(m_log_root);
+    const int status = remove_numbered_entries(m_log_root);
+    if (status != 0) {
+        info_log("not all logs in %s could be deleted, status %d", m_log_root.string(), status);
+    }
 }

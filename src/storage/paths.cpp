@@ -9,11 +9,30 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <vector>
+
+#include "storage/dir_entries.h"
+
 namespace {
+
+constexpr char RM[] = "rm -fr ";
+// One more path is added below this length; Linux takes 128 KiB.
+constexpr size_t MAX_COMMAND = 65536;
 
 bool is_ordinary(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') ||
            strchr("/._-+,:@%=", c);
+}
+
+// The paths of the entries whose name begins with a digit.
+std::vector<android::String8> numbered_entries(const android::String8& dir) {
+    std::vector<android::String8> paths;
+    for_each_entry(dir, [&](const char* name, const struct stat& /*st*/) {
+        if (name[0] >= '0' && name[0] <= '9') {
+            paths.emplace_back(JoinedPath(dir, android::String8(name)).string());
+        }
+    });
+    return paths;
 }
 
 }  // namespace
@@ -62,16 +81,30 @@ int remove_tree(const android::String8& path) {
     if (rmdir(path.string()) == 0) {
         return 0;
     }
-    android::String8 command("rm -fr ");
+    android::String8 command(RM);
     command.append(shell_path(path));
     return system(command.string());
 }
 
 int remove_numbered_entries(const android::String8& dir) {
-    android::String8 command("rm -fr ");
+    android::String8 command(RM);
     command.append(shell_path(dir));
     command.append("/[0-9]*");
-    return system(command.string());
+    int result = system(command.string());
+    if (result == 0) {
+        return 0;
+    }
+    // rm is not started at all where there are more names than the system passes to a program.
+    const std::vector<android::String8> left = numbered_entries(dir);
+    for (size_t i = 0; i < left.size();) {
+        command.setTo(RM);
+        do {
+            command.append(shell_path(left[i++]));
+            command.append(" ");
+        } while (i < left.size() && command.length() < MAX_COMMAND);
+        system(command.string());
+    }
+    return left.empty() || !numbered_entries(dir).empty() ? result : 0;
 }
 
 bool is_link(const android::String8& path) {

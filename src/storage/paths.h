@@ -28,8 +28,8 @@ android::String8 shell_path(const android::String8& path);
 // 0, or what system() returns.
 int remove_tree(const android::String8& path);
 
-// Deletes every entry of the directory whose name begins with a digit, by a shell. Result as
-// above.
+// Deletes every entry of the directory whose name begins with a digit, by a shell, or by several
+// where there are too many for one. Result as above.
 int remove_numbered_entries(const android::String8& dir);
 
 // Whether the path names a symbolic link, which may lead out of the log tree: a directory of

@@ -57,6 +57,7 @@ public:
     // The service makes a directory, perhaps of a new set.
     void set_begins(const std::string& path) const;
     int remove_by_shell(const char* command);
+    int remove_path(const std::string& path);
     // The stamps of the property file, in virtual time.
     void set_times(const char* path, struct stat& st) const;
     void message(const std::string& text);

@@ -107,10 +107,14 @@ int World::remove_by_shell(const char* command) {
     if (strncmp(command, prefix, strlen(prefix)) != 0) {
         fail_run("shell", "command '%s'", command);
     }
+    int result = 0;
     std::string path;
     bool quoted = false;
     for (const char* p = command + strlen(prefix); *p; ++p) {
-        if (*p == '\'') {
+        if (*p == ' ' && !quoted && !path.empty()) {
+            result |= remove_path(path);
+            path.clear();
+        } else if (*p == '\'') {
             quoted = !quoted;
         } else if (*p == '\\' && !quoted && p[1]) {
             path += *++p;
@@ -120,6 +124,10 @@ int World::remove_by_shell(const char* command) {
             path += *p;
         }
     }
+    return path.empty() ? result : result | remove_path(path);
+}
+
+int World::remove_path(const std::string& path) {
     const Place place = place_of(path.c_str());
     if (place != PLACE_DATA && place != PLACE_CARD) {
         fail_run("shell", "removes '%s'", path.c_str());

@@ -78,6 +78,16 @@ TEST_F(MediaStorageTest, TheTotalsFollowTheMedium) {
     check_sums(internal());
 }
 
+TEST_F(MediaStorageTest, WhatIsNotClearedIsSaid) {
+    init();
+    LogCapture log;
+    m_mgr.clear_all();
+    EXPECT_EQ(log.count("not all logs"), 0u) << log.text();
+    faults::fail(faults::SYSTEM, 1, EAGAIN, faults::FOREVER);
+    m_mgr.clear_all();
+    EXPECT_EQ(log.count("not all logs in " + m_root.path("data/modem_log")), 1u) << log.text();
+}
+
 // Counting looks at every file, and a check is made for every block that is refused.
 TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
     init();

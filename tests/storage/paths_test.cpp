@@ -3,6 +3,7 @@
 #include "storage/paths.h"
 
 #include <limits.h>
+#include <sys/resource.h>
 
 #include "storage/StorageFixture.h"
 
@@ -64,6 +65,26 @@ TEST_F(PathsTest, RemoveNumberedEntries) {
         EXPECT_EQ(m_root.list(dir), (Names{"-1", "modem_db.gz"}));
     }
     EXPECT_EQ(remove_numbered_entries("missing"), 0);
+}
+
+// More than one command takes: rm was not even started, and everything stayed.
+TEST_F(PathsTest, RemoveVeryManyNumberedEntries) {
+    const std::string dir = "x; touch pwned/" + std::string(240, '\'');
+    for (int i = 0; i < 1200; ++i) {  // 330 kB
+        m_root.write_file(dir + "/" + std::to_string(i) + "; touch pwned", "");
+    }
+    m_root.write_file(dir + "/modem_db.gz", "");
+    struct rlimit stack;
+    ASSERT_EQ(getrlimit(RLIMIT_STACK, &stack), 0);
+    const struct rlimit small = {1u << 20, stack.rlim_max};  // arguments get a quarter of it
+    ASSERT_EQ(setrlimit(RLIMIT_STACK, &small), 0);
+    EXPECT_EQ(remove_numbered_entries(dir.c_str()), 0);
+    EXPECT_EQ(setrlimit(RLIMIT_STACK, &stack), 0);
+    EXPECT_EQ(m_root.list(dir), Names{"modem_db.gz"});
+    m_root.write_file(dir + "/1", "");
+    faults::only_on("");
+    faults::fail(faults::SYSTEM, 1, EAGAIN, faults::FOREVER);
+    EXPECT_NE(remove_numbered_entries(dir.c_str()), 0);
 }
 
 TEST_F(PathsTest, DirectoriesAndLimit) {
