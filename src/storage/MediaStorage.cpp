@@ -42,6 +42,7 @@ void MediaStorage::forget_sets() {
     }
     m_sets.clear();
     m_size = 0;
+    m_vain_trims = 0;
 }
 
 // The kest directory belongs to another service, which may not have made it yet.
@@ -134,6 +135,7 @@ CpSetDirectory* MediaStorage::create_cp_set() {
         m_sets.push_back(set);
     }
     m_working_set = set;
+    m_vain_trims = 0;  // what was spared may go now
     return set;
 }
 

@@ -124,6 +124,7 @@ public:
 private:
     static constexpr size_t MAX_PASSED_OVER = 16;
 
+    uint64_t trim_unless_vain(uint64_t wanted);
     uint64_t trim_sets_before(uint64_t wanted);
     uint64_t trim_sets(uint64_t wanted, uint64_t (CpSetDirectory::*walk)(uint64_t, Spare));
     uint64_t trim_working_set(uint64_t wanted, Spare spare);
@@ -154,6 +155,7 @@ private:
     bool m_uncertain = false;         // something vanished since the last recount
     unsigned int m_refusals = 0;      // checks that failed in a row
     size_t m_stuck = 0;               // files that the last trim could not delete
+    size_t m_vain_trims = 0;          // that are left out, as the last one was in vain
     int m_deletion_error = 0;         // see deletion_error()
     size_t m_passed_over = 0;         // those behind which it went on
     size_t m_recounted = 0;           // files that the last recount looked at

@@ -26,6 +26,20 @@ uint64_t MediaStorage::trim(uint64_t wanted) {
     return removed + trim_working_set(wanted - std::min(wanted, removed), Spare::PROTECTED);
 }
 
+// For every block that is refused: after a trim that came across nothing but files that cannot be
+// deleted, as many times are left out, so that a block costs one such file and not all.
+uint64_t MediaStorage::trim_unless_vain(uint64_t wanted) {
+    if (m_vain_trims > 0) {
+        --m_vain_trims;
+        return 0;
+    }
+    const uint64_t removed = trim(wanted);
+    if (removed == 0 && m_stuck > 0) {
+        m_vain_trims = m_stuck - 1;
+    }
+    return removed;
+}
+
 // A walk through the older sets leaves what is behind a file that cannot be deleted. That goes
 // after them, but before anything in the working set.
 uint64_t MediaStorage::trim_sets_before(uint64_t wanted) {
@@ -122,7 +136,7 @@ int MediaStorage::check_quota() {
     if (above_quota() && m_overwrite) {
         info_log("data large: %u/%uM", static_cast<unsigned int>(m_size),
                  static_cast<unsigned int>(m_quota >> 20));
-        trim(m_size - m_quota);
+        trim_unless_vain(m_size - m_quota);
     }
     if (above_quota() && !recount_helps()) {
         return -1;
@@ -188,6 +202,7 @@ CpSetDirectory* MediaStorage::start_set() {
         const android::String8 old = m_working_set->path();
         m_manager->media_vanished(this);
         m_working_set = nullptr;
+        m_vain_trims = 0;
         free_space();
         set = create_cp_set();
         if (!set) {
@@ -200,7 +215,7 @@ CpSetDirectory* MediaStorage::start_set() {
 int MediaStorage::free_space() {
     // With a file size of 0 there is nothing to keep in proportion to: anything will do.
     const uint64_t wanted = std::max<uint64_t>(m_file_size, 1);
-    return m_overwrite && trim(wanted) >= std::max<uint64_t>(wanted / 2, 1) ? 0 : -1;
+    return m_overwrite && trim_unless_vain(wanted) >= std::max<uint64_t>(wanted / 2, 1) ? 0 : -1;
 }
 
 uint64_t MediaStorage::free_logs() {

@@ -361,6 +361,37 @@ TEST_F(FailingMediumTest, WhatCannotBeDeletedIsPassedOver) {
     EXPECT_LE(faults::calls(faults::UNLINK) - before, 20);
 }
 
+// Each block that was refused tried them all again, with two messages each.
+TEST_F(FailingMediumTest, ManyThatCannotBeDeletedAreTriedNowAndThen) {
+    const std::string block(70000, 'x');
+    for (int day = 10; day < 40; ++day) {
+        m_root.write_file("data/modem_log/2016-02-" + std::to_string(day) + "/cp_gnss/old", block);
+    }
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    EXPECT_EQ(lost_of(1, block), 0);
+    m_mgr.set_file_size(2000000);
+    for (const bool full : {false, true}) {
+        bool stuck = true;
+        int tries = 0;
+        faults::instead.unlink = [&](const char* path) {
+            ++tries;
+            return stuck ? (errno = EPERM, -1) : real::unlink(path);
+        };
+        faults::instead.write = [&](int fd, const void* data, size_t len) {
+            return full && stuck ? (errno = ENOSPC, ssize_t{-1}) : real::write(fd, data, len);
+        };
+        internal().set_quota(full ? 0 : internal().size() - 100);
+        lost_of(60, block);
+        EXPECT_GE(tries, 60);  // of 30 files
+        EXPECT_LE(tries, 250);
+        stuck = false;
+        EXPECT_LE(lost_of(40, block), 31);
+        EXPECT_EQ(internal().check_quota(), 0);
+        faults::instead = {};
+    }
+}
+
 // Nothing is written to such a card, full or above its quota, that could tell that it fails.
 TEST_F(FailingMediumTest, ACardOnWhichNothingCanBeDeletedIsLeft) {
     const std::string block(70000, 'x');
