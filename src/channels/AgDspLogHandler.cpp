@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "core/SavedErrno.h"
+#include "core/TimerManager.h"
 #include "core/log.h"
 #include "core/system_paths.h"
 #include "storage/CpStorage.h"
@@ -27,9 +28,12 @@ void complete_dump(int fd) {
 // How long the driver may take for the next part of a dump, and a step of that time.
 constexpr int DUMP_PATIENCE_MS = 3000;
 constexpr int DUMP_STEP_MS = 10;
-// More no dump has, in all, nor does it wait so long: the loop serves nothing else meanwhile.
+// More no dump has, in all, headers included, nor does it take so long: the loop serves nothing
+// else meanwhile. What has much to give gets time for it: a medium takes at least so many bytes a
+// millisecond.
 constexpr uint64_t MAX_DUMP = 512u << 20;
-constexpr int MAX_WAITED_MS = 60000;
+constexpr int64_t MAX_DUMP_MS = 60000;
+constexpr int64_t SLOWEST_MEDIUM = 4 << 10;
 // In a row; a device whose every read is interrupted has failed.
 constexpr int MAX_INTERRUPTIONS = 300;
 
@@ -43,6 +47,28 @@ void await_dump(int fd, bool first) {
         usleep(DUMP_STEP_MS * 1000);
     }
 }
+
+// The time that the dump takes. Without a clock it is not known: the size alone is limited then.
+class DumpTime {
+public:
+    // Whether that was too much for len bytes of data.
+    bool too_long(uint64_t len) {
+        struct timespec now;
+        if (!TimerManager::read_clock(now)) {
+            return false;
+        }
+        if (!m_begun) {
+            m_begun = true;
+            m_begin = now;
+        }
+        return TimerManager::diff_ms(now, m_begin) >=
+               MAX_DUMP_MS + static_cast<int64_t>(len) / SLOWEST_MEDIUM;
+    }
+
+private:
+    bool m_begun = false;
+    struct timespec m_begin = {};
+};
 
 }  // namespace
 
@@ -157,12 +183,19 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
         return;
     }
     bool stored = false;
+    bool awaited_in_vain = false;
     bool endless = false;
-    uint64_t total = 0;
-    int all_waited_ms = 0;
+    uint64_t data = 0;
+    uint64_t total = 0;  // with the headers
+    DumpTime time;
     int waited_ms = 0;      // since the last data
     int interruptions = 0;  // likewise
     for (;;) {
+        if (total >= MAX_DUMP || time.too_long(data)) {
+            err_log("no end of the AG-DSP dump");
+            endless = true;
+            break;
+        }
         const ssize_t n = read(notifier->fd(), s_io_buffer + DSP_CHUNK_HEADER_LEN, MAX_CHUNK);
         if (n < 0 && errno == EINTR && interruptions < MAX_INTERRUPTIONS) {
             ++interruptions;
@@ -174,12 +207,12 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
                 notifier->note_read(false);
                 return;
             }
-            if (waited_ms < DUMP_PATIENCE_MS && all_waited_ms < MAX_WAITED_MS) {
+            if (waited_ms < DUMP_PATIENCE_MS) {
                 await_dump(notifier->fd(), waited_ms == 0);
                 waited_ms += DUMP_STEP_MS;
-                all_waited_ms += DUMP_STEP_MS;
                 continue;
             }
+            awaited_in_vain = true;
         }
         if (n < 0) {
             err_log("read AG-DSP dump device error");
@@ -194,16 +227,13 @@ void AgDspLogHandler::save_dump(FileNotifier* notifier) {
             break;
         }
         stored = true;
+        data += len;
         total += len + DSP_CHUNK_HEADER_LEN;
-        if (total >= MAX_DUMP) {
-            err_log("no end of the AG-DSP dump");
-            endless = true;
-            break;
-        }
         waited_ms = 0;
         interruptions = 0;
     }
-    notifier->note_read(stored);
+    // One that keeps the loop waiting like that each time rests in between.
+    notifier->note_read(stored && !awaited_in_vain);
     complete_dump(notifier->fd());
     flush();
     if (endless) {

@@ -12,16 +12,16 @@ namespace {
 const long NS_PER_MS = 1000000;
 const long NS_PER_S = 1000000000;
 
-bool read_clock(struct timespec& now) {
-    return clock_gettime(CLOCK_BOOTTIME, &now) == 0;
-}
-
 }  // namespace
 
 TimerManager::~TimerManager() {
     for (auto it = m_timers.begin(); it != m_timers.end(); ++it) {
         delete *it;
     }
+}
+
+bool TimerManager::read_clock(struct timespec& now) {
+    return clock_gettime(CLOCK_BOOTTIME, &now) == 0;
 }
 
 struct timespec TimerManager::add_ms(const struct timespec& t, unsigned int ms) {

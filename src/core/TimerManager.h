@@ -59,6 +59,9 @@ public:
     // the next pass, even with 0 ms.
     void process_timers();
 
+    // The time on the clock of the timers. False, not logged, when it cannot be read.
+    static bool read_clock(struct timespec& now);
+
     // Time arithmetic on normalised values: t plus ms milliseconds; a minus b in
     // milliseconds, the difference of the nanoseconds cut towards zero; a before b.
     static struct timespec add_ms(const struct timespec& t, unsigned int ms);
