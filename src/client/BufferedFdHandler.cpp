@@ -6,7 +6,9 @@
 #include <unistd.h>
 
 BufferedFdHandler::BufferedFdHandler(int fd, LogController* ctrl, Multiplexer* mux, size_t capacity)
-    : FdHandler(fd, ctrl, mux), m_capacity(capacity), m_buffer(new uint8_t[capacity]) {}
+    : FdHandler(fd, ctrl, mux, SERVES_CONTROL),
+      m_capacity(capacity),
+      m_buffer(new uint8_t[capacity]) {}
 
 BufferedFdHandler::~BufferedFdHandler() = default;
 

@@ -35,7 +35,7 @@ int set_nonblock(int fd) {
 }  // namespace
 
 ClientManager::ClientManager(LogController* ctrl, Multiplexer* mux, size_t max_clients)
-    : FdHandler(-1, ctrl, mux), m_max_clients(max_clients) {}
+    : FdHandler(-1, ctrl, mux, SERVES_CONTROL), m_max_clients(max_clients) {}
 
 ClientManager::~ClientManager() {
     for (ClientHandler* client : m_clients) {

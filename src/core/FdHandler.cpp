@@ -7,10 +7,11 @@
 #include "core/Multiplexer.h"
 #include "core/log.h"
 
-FdHandler::FdHandler(int fd, LogController* ctrl, Multiplexer* mux)
+FdHandler::FdHandler(int fd, LogController* ctrl, Multiplexer* mux, Service service)
     : m_fd(fd),
       m_log_ctrl(ctrl),
       m_multiplexer(mux),
+      m_service(service),
       m_rest_timer(mux ? &mux->timer_mgr() : nullptr, on_rest_over, this) {}
 
 FdHandler::~FdHandler() {
@@ -23,10 +24,12 @@ FdHandler::~FdHandler() {
 }
 
 int FdHandler::add_events(int events) {
+    end_hold();
     return m_multiplexer->register_fd(this, events);
 }
 
 void FdHandler::poll_when_room(int events, const char* what) {
+    end_hold();
     if (m_multiplexer->register_when_room(this, events) < 0) {
         errno = ENOBUFS;
         err_log("no room to poll %s, waiting for it", what);
@@ -35,6 +38,18 @@ void FdHandler::poll_when_room(int events, const char* what) {
 
 void FdHandler::del_events(int events) {
     m_multiplexer->unregister_fd(this, events);
+}
+
+void FdHandler::hold_events() {
+    m_held = true;
+    m_multiplexer->pass_over(this);
+}
+
+void FdHandler::end_hold() {
+    if (m_held) {
+        m_held = false;
+        m_multiplexer->rest_changed();
+    }
 }
 
 int FdHandler::close() {

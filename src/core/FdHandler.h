@@ -23,9 +23,16 @@ public:
     static constexpr unsigned int IDLE_LIMIT = 10;
     static constexpr unsigned int REST_MS = 3000;
 
+    // Whom the handler serves, which decides when it waits for room in the loop's table.
+    enum Service {
+        SERVES_LOG,      // a log or crash material
+        SERVES_CONTROL,  // requests and supervisors: captures leave them room
+        SERVES_CAPTURE   // gives its place to those that serve a log
+    };
+
     // Takes over fd (-1: none open yet). Registers nothing. ctrl and mux are not owned
     // and outlive the handler.
-    FdHandler(int fd, LogController* ctrl, Multiplexer* mux);
+    FdHandler(int fd, LogController* ctrl, Multiplexer* mux, Service service = SERVES_LOG);
     // Leaves no registration behind, whatever events it was for, and closes the
     // descriptor if one is open.
     virtual ~FdHandler();
@@ -38,6 +45,7 @@ public:
 
     // The descriptor, -1 when none is open.
     int fd() const { return m_fd; }
+    Service service() const { return m_service; }
 
     LogController* log_ctrl() const { return m_log_ctrl; }
     Multiplexer* multiplexer() const { return m_multiplexer; }
@@ -47,12 +55,17 @@ public:
     int add_events(int events);
 
     // As add_events, but a handler for which the table has no room waits for it: the loop
-    // polls it as soon as another one leaves. what names the handler in the message.
+    // polls it as soon as others have left. what names the handler in the message.
     void poll_when_room(int events, const char* what);
 
     // Drops poll events; without any left the handler is no longer registered. To be
     // called before the descriptor is closed or replaced.
     void del_events(int events);
+
+    // The loop passes over the descriptor, which keeps its place or its turn for one, until
+    // events are added again.
+    void hold_events();
+    bool held() const { return m_held; }
 
     // Closes the descriptor, if any, and forgets it; the registration stays. Returns the
     // result of the system call, 0 when none was open.
@@ -81,7 +94,10 @@ protected:
 private:
     static void on_rest_over(void* handler);
     void end_rest();
+    void end_hold();
 
+    const Service m_service;
+    bool m_held = false;
     unsigned int m_idle_wakeups = 0;
     bool m_rest_logged = false;
     OneShotTimer m_rest_timer;

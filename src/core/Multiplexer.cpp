@@ -5,6 +5,7 @@
 #include <errno.h>
 
 #include "core/FdHandler.h"
+#include "core/log.h"
 #include "core/poll_error.h"
 
 size_t Multiplexer::find(const android::Vector<PollEntry>& entries, const FdHandler* h) {
@@ -35,9 +36,41 @@ int Multiplexer::register_fd(FdHandler* h, int events) {
     return 0;
 }
 
+// Without those that serve control, whose places are kept.
+bool Multiplexer::captures_may_grow() const {
+    size_t others = 0;
+    for (size_t i = 0; i < m_entries.size(); ++i) {
+        others += m_entries[i].handler->service() != FdHandler::SERVES_CONTROL;
+    }
+    return others < MAX_HANDLERS - CONTROL_PLACES;
+}
+
+bool Multiplexer::has_room(const FdHandler* h) const {
+    return m_entries.size() < MAX_HANDLERS &&
+           (h->service() != FdHandler::SERVES_CAPTURE || captures_may_grow());
+}
+
+void Multiplexer::displace_capture() {
+    for (size_t i = m_entries.size(); i-- > 0;) {
+        const PollEntry entry = m_entries[i];
+        if (entry.handler->service() == FdHandler::SERVES_CAPTURE) {
+            info_log("a capture waits for room to be polled");
+            leave_pass(entry.handler);
+            m_entries.removeAt(i);
+            m_waiting.insertAt(entry, 0);
+            m_changed = true;
+            return;
+        }
+    }
+}
+
 int Multiplexer::register_when_room(FdHandler* h, int events) {
-    if (register_fd(h, events) == 0) {
-        return 0;
+    const bool registered = find(m_entries, h) < m_entries.size();
+    if (!registered && h->service() == FdHandler::SERVES_LOG && !captures_may_grow()) {
+        displace_capture();
+    }
+    if (registered || has_room(h)) {
+        return register_fd(h, events);
     }
     const size_t i = find(m_waiting, h);
     if (i < m_waiting.size()) {
@@ -107,12 +140,20 @@ void Multiplexer::leave_pass(const FdHandler* h) {
     }
 }
 
+void Multiplexer::pass_over(const FdHandler* h) {
+    leave_pass(h);
+    m_changed = true;
+}
+
 void Multiplexer::remove_entry(size_t index) {
     leave_pass(m_entries[index].handler);
     m_entries.removeAt(index);
-    if (!m_waiting.isEmpty()) {
-        m_entries.push(m_waiting[0]);
-        m_waiting.removeAt(0);
+    for (size_t i = 0; i < m_waiting.size(); ++i) {
+        if (has_room(m_waiting[i].handler)) {
+            m_entries.push(m_waiting[i]);
+            m_waiting.removeAt(i);
+            break;
+        }
     }
     m_changed = true;
 }
@@ -121,7 +162,8 @@ void Multiplexer::build_poll_set() {
     m_poll_num = m_entries.size();
     for (size_t i = 0; i < m_poll_num; ++i) {
         const FdHandler* handler = m_entries[i].handler;
-        m_poll_fds[i].fd = handler->resting() ? -1 : handler->fd();  // poll passes over -1
+        const bool passed_over = handler->resting() || handler->held();
+        m_poll_fds[i].fd = passed_over ? -1 : handler->fd();  // poll passes over -1
         m_poll_fds[i].events = static_cast<short>(m_entries[i].events);
         m_poll_fds[i].revents = 0;
         m_handlers[i] = m_entries[i].handler;

@@ -21,6 +21,8 @@ class FdHandler;
 class Multiplexer {
 public:
     static constexpr size_t MAX_HANDLERS = 20;
+    // Of these, what captures leave to the control socket, three clients and two supervisors.
+    static constexpr size_t CONTROL_PLACES = 6;
 
     Multiplexer() = default;
     Multiplexer(const Multiplexer&) = delete;
@@ -30,8 +32,9 @@ public:
     // those it is registered for. 0, or -1 when MAX_HANDLERS others are registered.
     int register_fd(FdHandler* h, int events);
 
-    // As register_fd, but when the table is full (-1) h waits: it is registered as soon as
-    // another handler leaves. Handlers that wait are admitted in their order.
+    // As register_fd, but when there is no room (-1) h waits: it is registered as soon as others
+    // have left. Handlers that wait are admitted in their order, captures only as long as
+    // CONTROL_PLACES are left. For a handler that serves a log the youngest capture waits.
     int register_when_room(FdHandler* h, int events);
 
     // Drops events of h; a handler without events left is removed. Events that h is not
@@ -46,7 +49,10 @@ public:
     // Removes h with all its events, for a handler that is being destroyed.
     void forget(FdHandler* h);
 
-    // A handler's rest has begun or ended: the poll set is built afresh for the next pass.
+    // h is not called any more in the current pass; the poll set is built afresh.
+    void pass_over(const FdHandler* h);
+
+    // A handler's rest or hold has begun or ended: the poll set is built afresh for the next pass.
     void rest_changed() { m_changed = true; }
 
     // Runs the loop; never returns.
@@ -68,13 +74,16 @@ private:
 
     // Index of h's entry, or the number of entries when it has none.
     static size_t find(const android::Vector<PollEntry>& entries, const FdHandler* h);
+    bool has_room(const FdHandler* h) const;
+    bool captures_may_grow() const;
+    void displace_capture();
     void leave_pass(const FdHandler* h);
     void remove_entry(size_t index);
     void remove_waiting(FdHandler* h, int events);
     void build_poll_set();
 
     android::Vector<PollEntry> m_entries;
-    android::Vector<PollEntry> m_waiting;  // for room in m_entries, which is full then
+    android::Vector<PollEntry> m_waiting;  // for room in m_entries
     bool m_changed = true;                 // m_entries differs from what the arrays were built from
     size_t m_poll_num = 0;                 // slots in use in both arrays
     struct pollfd m_poll_fds[MAX_HANDLERS];

@@ -21,7 +21,7 @@ constexpr int PATIENCE_MS = 5000;
 
 IqStorRespHandler::IqStorRespHandler(int fd, LogController* ctrl, Multiplexer* mux,
                                      WcdmaIqManager* manager)
-    : FdHandler(fd, ctrl, mux), m_manager(manager) {}
+    : FdHandler(fd, ctrl, mux, SERVES_CAPTURE), m_manager(manager) {}
 
 void IqStorRespHandler::process(int /*events*/) {
     uint8_t response;

@@ -20,7 +20,8 @@
 #include "storage/log_name.h"
 
 WcdmaIqManager::WcdmaIqManager(CpChannel* channel)
-    : FdHandler(-1, channel->log_ctrl(), channel->multiplexer()), m_channel(channel) {}
+    : FdHandler(-1, channel->log_ctrl(), channel->multiplexer(), SERVES_CAPTURE),
+      m_channel(channel) {}
 
 WcdmaIqManager::~WcdmaIqManager() {
     stop();
@@ -127,12 +128,11 @@ int WcdmaIqManager::pause() {
         case IQS_IDLE:
             return -1;
         case IQS_SAVING:
-            del_events(POLLIN);
             wait_for_stop();
             settle_file();
             break;
         case IQS_WAITING:
-            del_events(POLLIN);
+            hold_events();
             break;
         case IQS_PAUSED:
             break;
@@ -154,6 +154,8 @@ int WcdmaIqManager::resume() {
 
 // ---- One buffer
 
+// While it saves and while it is paused the device keeps its place: without it, others that wait
+// with their devices could take all places for the ends of their threads, and nobody captures.
 void WcdmaIqManager::poll_device() {
     poll_when_room(POLLIN, "the I/Q memory device");
 }
@@ -209,7 +211,7 @@ void WcdmaIqManager::process(int /*events*/) {
     }
     m_cur_file->set_destroy_hook(on_file_destroyed, this);
     m_state = IQS_SAVING;
-    del_events(POLLIN);
+    hold_events();
 }
 
 int WcdmaIqManager::gen_iq_file_name(android::String8& name) {

@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // From a supervisor's message to files and notifications, through the real sockets.
+#include <list>
+
 #include "sim/SimSupervisor.h"
 #include "storage/MediaStorage.h"
 #include "support/ServiceFixture.h"
+#include "support/fake_devices.h"
 
 namespace {
 
@@ -32,6 +35,55 @@ TEST_F(CpEventsTest, EventsForNobody) {
     EXPECT_TRUE(log.has("CpEvent): kestcp: unknown MODEM type 1 asserts ["));
     ctrl->process_cp_evt(CT_WANMODEM, static_cast<CpStateHandler::CpEvent>(4));
     EXPECT_TRUE(log.has("CpEvent): unknown event 4 ["));
+}
+
+// Everything on took all places: nobody heard requests and supervisors any more.
+TEST_F(CpEventsTest, CapturesLeaveRoomForControl) {
+    FakeDevice device(root.path("dev/iq_mem"));
+    std::list<Fifo> devices;
+    std::string settings;
+    for (const char* name : {"log", "pcm", "mem"}) {
+        devices.emplace_back(root.path("dev/audio_dsp_") + name);
+    }
+    for (const char* kind : {"w", "t", "tl", "lf", "l", "wcn"}) {
+        devices.emplace_back(root.path(kind));
+        for (const std::string use : {".log", ".diag"}) {
+            root.set_prop("ro.modem." + (kind + use), root.path(kind));
+        }
+    }
+    const std::string modems[] = {"cp_wcdma", "cp_td-scdma", "cp_3mode", "cp_4mode", "cp_5mode"};
+    for (const std::string& name : modems) {
+        settings += "stream " + name + " on 5 3\niq " + name + " WCDMA\n";
+    }
+    ASSERT_EQ(boot(settings + "stream cp_wcn on 5 3\nstream cp_gnss on 5 3\nstream agdsp on 5 3\n"),
+              0);
+    std::list<Client> clients;
+    for (int i = 0; i < 3; ++i) {
+        clients.emplace_back();
+        ASSERT_EQ(ask(clients.back(), "SUBSCRIBE WCN DUMP\n", "OK\n"), "OK\n");
+    }
+    EXPECT_EQ(Filler::free_slots(mux()), 1u);
+    EXPECT_FALSE(log.has("no room to poll server"));
+    EXPECT_FALSE(log.has("no room to poll modemd"));
+    EXPECT_FALSE(log.has("no room to poll external_wcn_kest"));
+    EXPECT_FALSE(log.has("no room to poll log device"));
+    // The first captures go on, whoever waits; the last one takes its turn when they end.
+    const auto captured = [&](const std::string& name) {
+        device.fill(0, 100);
+        return pump([&] {
+            const std::vector<std::string> files = root.tree("data/modem_log");
+            return std::any_of(files.begin(), files.end(), [&](const std::string& file) {
+                return file.find("/" + name + "_wiq_") != std::string::npos;
+            });
+        });
+    };
+    for (int i = 0; i < 3; ++i) {
+        ASSERT_TRUE(captured("cp_wcdma")) << i;
+        ASSERT_EQ(ctrl->clear_log(), 0);
+    }
+    const CpType first[] = {CT_WCDMA, CT_TD, CT_3MODE, CT_4MODE};
+    ASSERT_EQ(ctrl->disable_log(first, 4), 0);
+    EXPECT_TRUE(captured("cp_5mode"));
 }
 
 // With its log off a modem that crashed again and again filled the medium.
