@@ -5,6 +5,7 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "channels/DiagDeviceHandler.h"
@@ -14,6 +15,18 @@
 #include "core/log.h"
 #include "storage/CpStorage.h"
 #include "storage/StorageManager.h"
+
+namespace {
+
+// Whether both descriptors are of one file that has an end: opened anew it begins again.
+bool same_file(int a, int b) {
+    struct stat sa;
+    struct stat sb;
+    return fstat(a, &sa) == 0 && fstat(b, &sb) == 0 && sa.st_dev == sb.st_dev &&
+           sa.st_ino == sb.st_ino && (S_ISREG(sa.st_mode) || S_ISBLK(sa.st_mode));
+}
+
+}  // namespace
 
 uint8_t LogPipeHandler::s_io_buffer[IO_BUFFER_SIZE];
 
@@ -58,13 +71,18 @@ int LogPipeHandler::open_dev() {
 
 // A driver may have hung up the descriptor for good, when it was reset with its CP, say: one that
 // gave nothing when it was last read is replaced. The new one is opened first, so that what waits
-// in the device survives.
+// in the device survives. A file in its place is kept, to be read on when it has grown.
 void LogPipeHandler::renew_dev() {
     if (m_fd >= 0 && idle_wakeups() > 0) {
         const int old = m_fd;
         del_events(POLLIN);
         m_fd = -1;
         open_dev();
+        if (m_fd >= 0 && same_file(m_fd, old)) {
+            close();
+            m_fd = old;
+            return;
+        }
         ::close(old);
     }
 }

@@ -98,6 +98,31 @@ TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnew) {
     EXPECT_EQ(content("cp_gnss"), "onetwothreefour");
 }
 
+// A file in the place of the device was logged again with each rest, until the quota was full of
+// it.
+TEST_F(LogPipeHandlerTest, AFileIsReadOnce) {
+    boot_clock::freeze();
+    root.write_file("gnss", "one");
+    ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
+    gnss = ctrl->get_cp(CT_GNSS);
+    for (int i = 0; i < 3; ++i) {
+        pass(15);
+        gnss->process_alive();
+        boot_clock::advance(3000);
+    }
+    root.write_file("gnss", "onetwo");
+    pass(15);
+    // Another file, or a device, is opened all the same.
+    unlink(root.path("gnss").c_str());
+    root.write_file("gnss", "three");
+    for (int i = 0; i < 2; ++i) {
+        boot_clock::advance(3000);
+        pass(15);
+    }
+    ctrl.reset();
+    EXPECT_EQ(content("cp_gnss"), "onetwothree");
+}
+
 // No timer can be made then: the device stayed closed for good.
 TEST_F(LogPipeHandlerTest, MissingDeviceIsOpenedAtAFlushWhenThereIsNoClock) {
     boot_clock::fail();
