@@ -179,6 +179,9 @@ void MediaStorage::drop_working_set() {
     m_sets.erase(find_object(m_sets, vanished));
     m_size -= vanished->size();
     delete vanished;
+    // The card may be another one: what it holds counts, what the old one held does not.
+    m_rescan = true;
+    totals_uncertain();
 }
 
 LogFile* MediaStorage::create_file(const android::String8& cp_name, LogType type, bool& new_dir,

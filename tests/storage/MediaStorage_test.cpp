@@ -88,6 +88,24 @@ TEST_F(MediaStorageTest, WhatIsNotClearedIsSaid) {
     EXPECT_EQ(log.count("not all logs in " + m_root.path("data/modem_log")), 1u) << log.text();
 }
 
+// The card was changed between two writes: of the new one nothing was counted, nor trimmed.
+TEST_F(MediaStorageTest, WhatLiesInAnotherTreeCounts) {
+    init();
+    make("cp")->write("12345678", 8);
+    m_root.write_file(ROOT + "2016-01-01-00-00-00/cp/f", "old card");
+    internal().clear();
+    ASSERT_EQ(internal().stat(), 0);
+    make("cp")->write("1", 1);
+    remove_tree(m_root.path(ROOT).c_str());
+    m_root.write_file(ROOT + "2016-02-01-00-00-00/cp/f", "123456");
+    make("cp")->write("123", 3);
+    internal().set_quota(5);
+    EXPECT_EQ(internal().check_quota(), 0);
+    EXPECT_EQ(internal().size(), 3u);
+    EXPECT_TRUE(m_root.find("f").empty());
+    check_sums(internal());
+}
+
 // Counting looks at every file, and a check is made for every block that is refused.
 TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
     init();
