@@ -24,6 +24,7 @@ protected:
 
 const std::string INTERNAL = "data/modem_log/2016-03-01-09-00-00/";
 const std::string CARD_SET = "storage/sdcard0/modem_log/2016-03-01-10-00-00/";
+const std::string OTHER_SET = "other/data/modem_log/2016-03-01-09-30-00/";
 
 // Both media, a record in each file, fed in pieces that end anywhere.
 TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
@@ -207,7 +208,6 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
 TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
     const std::string one = frame("one"), half = frame("half and half");
     const std::string begun = one + half.substr(0, 9), rest = half.substr(9) + one;
-    const std::string OTHER = "other/data/modem_log/2016-03-01-09-30-00/";
     struct Log {
         std::string set;
         int number;
@@ -222,8 +222,8 @@ TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
         {{{INTERNAL, 2, begun}, {INTERNAL, 1, "hole" + rest}, {INTERNAL, 0, one}}, 3, 27},
         // On the other medium; a set of another handset may be begun between.
         {{{INTERNAL, 0, begun}, {CARD_SET, 1, rest}, {CARD_SET, 0, one}}, 4, 0},
-        {{{INTERNAL, 0, begun}, {OTHER, 0, one}, {CARD_SET, 0, rest}}, 4, 0},
-        {{{INTERNAL, 0, begun}, {OTHER, 0, rest}}, 2, 23},
+        {{{INTERNAL, 0, begun}, {OTHER_SET, 0, one}, {CARD_SET, 0, rest}}, 4, 0},
+        {{{INTERNAL, 0, begun}, {OTHER_SET, 0, rest}}, 2, 23},
         // The end of the older set or the start of the newer one is not there.
         {{{INTERNAL, 1, begun}, {CARD_SET, 0, rest}}, 2, 23},
         {{{INTERNAL, 0, begun}, {CARD_SET, 1, one}, {CARD_SET, 0, rest}}, 3, 23},
@@ -338,10 +338,9 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
 // count.
 TEST_F(KestlogStreamsTest, AnAudioDspsDumpGoesOnInTheNextSet) {
     const std::string full = pattern_bytes(32748, 4), to = "to/agdsp_memory_2016-03-01_";
-    const std::string OTHER = "other/data/modem_log/2016-03-01-09-30-00/";
     write_log(INTERNAL, "agdsp", 0, "09-00-00", chunk(7, LOG, "") + chunk(8, DUMP, full));
     write_log(INTERNAL, "cp_wcn", 0, "09-00-00", frame("ring", 0x3a, 0x64));
-    write_log(OTHER, "agdsp", 0, "09-30-00", chunk(9, DUMP, "other"));
+    write_log(OTHER_SET, "agdsp", 0, "09-30-00", chunk(9, DUMP, "other"));
     write_log(CARD_SET, "agdsp", 1, "10-00-00", chunk(9, DUMP, full));
     write_log(CARD_SET, "agdsp", 0, "10-01-00", chunk(10, DUMP, "end"));
     EXPECT_EQ(run("extract . other -o to"), 0) << m_err;
