@@ -6,6 +6,8 @@
 #include <stdlib.h>
 #include <sys/stat.h>
 
+#include <algorithm>
+
 #include "common/text.h"
 
 namespace {
@@ -15,6 +17,10 @@ bool is_dsp_log(const FileName& name) {
 }
 
 }  // namespace
+
+std::string LiveTree::lasting_name(const FileName& name) {
+    return name.is_log() ? name.text().substr(name.text().find('-')) : name.text();
+}
 
 LiveEvent LiveTree::ready() const {
     uint64_t files = 0;
@@ -41,28 +47,35 @@ void LiveTree::created(Dir& dir, const std::string& name) {
     struct stat st;
     // When it is gone the next change says where to, and its size is looked at there.
     const bool there = lstat((dir.path + "/" + name).c_str(), &st) == 0;
-    if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name)) {
+    if ((there && !S_ISREG(st.st_mode)) || is_foreign_name(name) ||
+        (!there && has_next_name(dir, FileName(name)))) {
         return;
     }
     add(dir, name, {there ? static_cast<uint64_t>(st.st_size) : 0, there}, true);
 }
 
+// Whether the tree was read after the service counted the log file up.
+bool LiveTree::has_next_name(const Dir& dir, const FileName& name) {
+    const std::string lasting = lasting_name(name);
+    return name.is_log() && std::any_of(dir.files.begin(), dir.files.end(), [&](const auto& file) {
+               const size_t at = file.first.find('-');
+               return at != std::string::npos &&
+                      file.first.compare(at, std::string::npos, lasting) == 0 &&
+                      FileName(file.first).is_log();
+           });
+}
+
 void LiveTree::moved(Dir& dir, const std::string& from, const std::string& to) {
     const auto it = dir.files.find(from);
-    if (it == dir.files.end()) {
-        // Known by its new name already, or a stranger's.
-        created(dir, to);
-        closed(dir, to);
-        return;
+    const bool counted_up = it != dir.files.end() && FileName(from).exact;
+    const File file = counted_up ? it->second : File();
+    if (it != dir.files.end()) {
+        dir.files.erase(it);
     }
-    const File file = it->second;
-    dir.files.erase(it);
-    if (!FileName(from).exact) {
-        // What copies a tree gives a file its name when it is whole.
-        for (const std::string& name : {from, to}) {
-            dir.files.erase(name);
-            forget({&dir, name});
-        }
+    if (!counted_up) {
+        // Known by its new name already, a stranger's, or what copies a tree gives a file its name
+        // when it is whole.
+        forget({&dir, from});
         created(dir, to);
         closed(dir, to);
         return;

@@ -82,6 +82,9 @@ public:
 private:
     // That a file belongs to: in a renamed directory its own name tells.
     static std::string cp_of(const Dir& dir, const std::string& name);
+    // What the service's counting up leaves as it is, by which log files are told apart.
+    static std::string lasting_name(const FileName& name);
+    static bool has_next_name(const Dir& dir, const FileName& name);
     typedef std::pair<Dir*, std::string> Place;  // a file's directory and name
 
     void take_roots(const std::set<std::string>& roots, bool tell);

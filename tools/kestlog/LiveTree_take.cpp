@@ -15,11 +15,6 @@ std::string parent(const std::string& path) {
     return path.substr(0, path.rfind('/'));
 }
 
-// Log files are told apart by what the service's counting up leaves as it is.
-std::string lasting_name(const FileName& name) {
-    return name.is_log() ? name.text().substr(name.text().find('-')) : name.text();
-}
-
 }  // namespace
 
 void LiveTree::take(LogTree& tree, const std::set<std::string>& roots) {
