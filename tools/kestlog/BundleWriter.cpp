@@ -23,7 +23,7 @@ la_ssize_t write_out(struct archive*, void* out, const void* data, size_t len) {
 // "data/modem_log/".
 std::string log_root_of(const TreeSet& set) {
     // Of several handsets the medium has the handset's name before its own.
-    std::string medium = set.medium;
+    std::string medium = set.medium();
     std::string path = cut_ending(&medium, MEDIUM_INTERNAL) ? PATH_DATA_PARTITION
                        : cut_ending(&medium, MEDIUM_CARD)   ? CARD_IN_ROOT
                                                             : "";

@@ -72,7 +72,6 @@ CardReport::CardReport(const LogTree& tree, const ReportOptions& options)
         m_json[list] = Json::array();
     }
     for (const TreeSet& set : tree.sets) {
-        m_sets[&set];
         for (const TreeCp& cp : set.cps) {
             m_cps[cp.name];
         }
@@ -181,7 +180,7 @@ void CardReport::end(const FilePlace& place, const FileReport& report) {
         return;
     }
     CpSum& cp = m_cps[place.cp->name];
-    SetSum& set = m_sets[place.set];
+    SetSum& set = sum_of(*place.set);
     ++cp.files;
     cp.size += file.size;
     ++set.files;
@@ -294,7 +293,7 @@ void CardReport::add_version(const FilePlace& place) {
     add_row("versions", MAX_ROWS,
             {{"cp", json_text(place.cp->name)},
              {"set", json_text(place.set->name)},
-             {"medium", json_text(place.set->medium)},
+             {"medium", json_text(place.set->medium())},
              {"version", json_text(version)},
              {"changed", changed}});
 }
@@ -356,7 +355,7 @@ void CardReport::add_crashes() {
         add_row("crashes", MAX_ROWS,
                 {{"cp", json_text(crash.cp->name)},
                  {"set", json_text(crash.set->name)},
-                 {"medium", json_text(crash.set->medium)},
+                 {"medium", json_text(crash.set->medium())},
                  {"time", time_text(crash.time)},
                  {"what", json_text(item.words)},
                  {"size", item.size},

@@ -6,6 +6,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include <algorithm>
 #include <map>
 #include <memory>
 #include <string>
@@ -80,6 +81,9 @@ private:
     void add_gaps(const FilePlace& place, const LogTime& to);
     void add_pcm(const Piece& piece);
     void add_version(const FilePlace& place);
+    SetSum& sum_of(const TreeSet& set) {
+        return m_sets[std::min(static_cast<size_t>(&set - m_tree.sets.data()), MAX_ROWS)];
+    }
     Last& last_of(const FilePlace& place) { return m_last[{place.set->handset, place.cp->name}]; }
     void add_database(const TreeFile& file);
     void add_spectrum(const FilePlace& place);
@@ -97,7 +101,7 @@ private:
     Timeline m_timeline;
     std::map<std::string, CpSum> m_cps;
     std::map<std::pair<size_t, std::string>, Last> m_last;  // by handset and CP
-    std::map<const TreeSet*, SetSum> m_sets;
+    std::map<size_t, SetSum> m_sets;  // by place in the tree; of all beyond MAX_ROWS one
     std::vector<std::pair<FilePlace, Waveform>> m_waveforms;
     std::vector<Crash> m_dsp_crashes;
     DspDumps m_dsp_dumps{[this](const DspDump& dump) { add_crash(dump, &m_dsp_crashes); }};

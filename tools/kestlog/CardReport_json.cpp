@@ -41,11 +41,11 @@ void CardReport::set_roots(const std::vector<std::string>& roots) {
 void CardReport::write_totals() {
     LogTime from, to;
     for (const TreeSet& set : m_tree.sets) {
-        const SetSum& sum = m_sets[&set];
+        const SetSum& sum = sum_of(set);
         add_row("sets", MAX_ROWS,
                 {{"set", json_text(set.name)},
-                 {"medium", json_text(set.medium)},
-                 {"path", json_text(set.shown)},
+                 {"medium", json_text(set.medium())},
+                 {"path", json_text(set.shown())},
                  {"time", time_text(set.time)},
                  {"from", time_text(sum.from)},
                  {"to", time_text(sum.to)},
@@ -125,7 +125,7 @@ Json CardReport::waveform_json(const FilePlace& place, const Waveform& waveform)
     }
     return {{"cp", json_text(place.cp->name)},
             {"set", json_text(place.set->name)},
-            {"medium", json_text(place.set->medium)},
+            {"medium", json_text(place.set->medium())},
             {"format", m_options.pcm->pcm},
             {"rate", m_options.pcm_rate},
             {"samples", waveform.samples()},

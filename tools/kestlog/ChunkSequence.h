@@ -14,8 +14,8 @@ class ChunkSequence {
 public:
     // Before the first chunk of a file. In another set the numbers may begin anew.
     void enter(const TreeDir& dir) {
-        m_other_dir |= dir.path != m_dir;
-        m_dir = dir.path;
+        m_other_dir |= dir.path() != m_dir;
+        m_dir = dir.path();
         m_first = true;
     }
 

@@ -28,9 +28,9 @@ ExportInterface interface_of(const ExportSource& source) {
     int ignored;
     const std::string cp = source.file->name.cp();
     const std::string version =
-        cp.empty() ? "" : read_version(version_path(source.file->dir->path, cp), &ignored);
+        cp.empty() ? "" : read_version(version_path(source.file->dir->path(), cp), &ignored);
     std::string description =
-        set.name.empty() ? set.shown : "set " + set.name + " on " + set.medium;
+        set.name.empty() ? set.shown() : "set " + set.name + " on " + set.medium();
     description += version.empty() ? "" : ", firmware " + version;
     return {escape_text(source.cp->name.empty() ? source.file->name.text() : source.cp->name),
             escape_text(description), 1};

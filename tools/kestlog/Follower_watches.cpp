@@ -94,15 +94,15 @@ void Follower::watch_root(const std::string& root, const std::vector<const char*
 
 void Follower::watch_tree(const LogTree& tree) {
     for (const TreeSet& set : tree.sets) {
-        const std::string above = parent(set.shown);
+        const std::string above = parent(set.shown());
         if (m_log_roots.count(above)) {
             watch(above, DirWatches::LOGS);  // a ROOT that is one itself
         }
-        watch(set.shown, DirWatches::LOGS);
+        watch(set.shown(), DirWatches::LOGS);
         for (const TreeCp& cp : set.cps) {
             // A crash of an audio DSP shows in its log alone.
             const bool writes = m_output.has_table() || cp_type_of(cp.name) == CT_AGDSP;
-            watch(cp.shown, writes ? DirWatches::WRITES : DirWatches::FILES);
+            watch(cp.dir->name(), writes ? DirWatches::WRITES : DirWatches::FILES);
         }
     }
 }

@@ -23,24 +23,24 @@ void LiveTree::take(LogTree& tree, const std::set<std::string>& roots) {
     std::set<std::string> sets, dirs;
     std::map<std::string, std::string> newest;  // set of each log root
     for (const TreeSet& set : tree.sets) {
-        sets.insert(set.shown);
-        newest[parent(set.shown)] = set.shown;
+        sets.insert(set.shown());
+        newest[parent(set.shown())] = set.shown();
         for (const TreeCp& cp : set.cps) {
-            dirs.insert(cp.shown);
+            dirs.insert(cp.dir->name());
         }
     }
     take_roots(roots, tell);
     leave(sets, dirs);
     for (TreeSet& set : tree.sets) {
-        const bool is_new = m_sets.count(set.shown) == 0;
-        m_sets[set.shown] = true;
+        const bool is_new = m_sets.count(set.shown()) == 0;
+        m_sets[set.shown()] = true;
         if (is_new && tell) {
             tell_set(set);
         }
         // A renamed directory may hold the files of several CPs.
         std::map<std::string, std::vector<const TreeFile*>> files;
         for (const TreeCp& cp : set.cps) {
-            std::vector<const TreeFile*>& all = files[cp.shown];
+            std::vector<const TreeFile*>& all = files[cp.dir->name()];
             for (const TreeFile& file : cp.files) {
                 all.push_back(&file);
             }
@@ -48,11 +48,11 @@ void LiveTree::take(LogTree& tree, const std::set<std::string>& roots) {
         for (const auto& [path, all] : files) {
             Dir& dir = m_dirs[path];
             dir.path = path;
-            dir.medium = set.medium;
+            dir.medium = set.medium();
             dir.set = set.name;
             dir.cp = file_part(path);
             dir.present = true;
-            take_files(dir, all, tell && (!is_new || newest[parent(set.shown)] == set.shown));
+            take_files(dir, all, tell && (!is_new || newest[parent(set.shown())] == set.shown()));
         }
         for (TreeCp& cp : set.cps) {
             cp.files = std::vector<TreeFile>();
@@ -114,12 +114,12 @@ void LiveTree::tell_set(const TreeSet& set) {
             size += file.size;
         }
     }
-    const std::string name = set.name.empty() ? set.shown : set.name;
-    LiveEvent event("set", set.medium,
+    const std::string name = set.name.empty() ? set.shown() : set.name;
+    LiveEvent event("set", set.medium(),
                     "new set: " + escape_text(name) + ", " + files_text(files, size));
-    event.json.update({{"medium", json_text(set.medium)},
+    event.json.update({{"medium", json_text(set.medium())},
                        {"set", json_text(set.name)},
-                       {"path", json_text(set.shown)},
+                       {"path", json_text(set.shown())},
                        {"files", files},
                        {"size", size}});
     m_tell(event);

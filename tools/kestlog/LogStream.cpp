@@ -63,23 +63,39 @@ std::vector<LogStream> log_streams(const LogTree& tree) {
 
 NextLogs::NextLogs(const std::vector<LogStream>& streams) {
     for (const LogStream& stream : streams) {
-        std::map<const TreeCp*, const TreeFile*> ends;
         for (const StreamFile& log : stream.files) {
-            ends[log.cp] = log.file;
+            if (m_directories.empty() || m_directories.back().cp != log.cp) {
+                m_directories.push_back({log.cp, nullptr, nullptr, false});
+            }
+        }
+    }
+    std::sort(m_directories.begin(), m_directories.end(),
+              [](const Directory& a, const Directory& b) { return a.cp < b.cp; });
+    const auto same = [](const Directory& a, const Directory& b) { return a.cp == b.cp; };
+    m_directories.erase(std::unique(m_directories.begin(), m_directories.end(), same),
+                        m_directories.end());
+    for (const LogStream& stream : streams) {
+        for (const StreamFile& log : stream.files) {
+            find(log.cp).last = log.file;
         }
         std::map<size_t, const StreamFile*> last_logs;  // of the handsets
-        std::set<const TreeCp*> begun;
         for (const StreamFile& log : stream.files) {
             const StreamFile*& last = last_logs[log.set->handset];
+            Directory& own = find(log.cp);
             // By their times the files of two directories may be mixed. Sets are read in the
             // order of the tree.
-            if (begun.insert(log.cp).second && last && last->file == ends[last->cp] &&
-                last->file->name.number == 0 && last->set < log.set) {
-                m_behind[last->cp] = log.file;
+            if (!own.begun && last && last->file->name.number == 0 && last->set < log.set) {
+                Directory& other = find(last->cp);
+                other.behind = last->file == other.last ? log.file : other.behind;
             }
+            own.begun = true;
             last = &log;
         }
     }
+}
+
+NextLogs::Directory& NextLogs::find(const TreeCp* cp) {
+    return *std::lower_bound(m_directories.begin(), m_directories.end(), cp, before);
 }
 
 const TreeFile* NextLogs::after(const TreeCp& cp, const TreeFile& log,
@@ -87,6 +103,6 @@ const TreeFile* NextLogs::after(const TreeCp& cp, const TreeFile& log,
     if (newer) {
         return log.name.number == newer->name.number + 1 ? newer : nullptr;
     }
-    const auto found = m_behind.find(&cp);
-    return found == m_behind.end() ? nullptr : found->second;
+    const auto found = std::lower_bound(m_directories.begin(), m_directories.end(), &cp, before);
+    return found == m_directories.end() || found->cp != &cp ? nullptr : found->behind;
 }

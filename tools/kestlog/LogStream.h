@@ -4,7 +4,6 @@
 #ifndef KESTLOG_LOGSTREAM_H_
 #define KESTLOG_LOGSTREAM_H_
 
-#include <map>
 #include <string>
 #include <vector>
 
@@ -45,7 +44,17 @@ public:
     }
 
 private:
-    std::map<const TreeCp*, const TreeFile*> m_behind;  // the last one of the directory
+    struct Directory {
+        const TreeCp* cp;
+        const TreeFile* last;    // log file in it
+        const TreeFile* behind;  // that one, or null
+        bool begun;
+    };
+
+    static bool before(const Directory& directory, const TreeCp* cp) { return directory.cp < cp; }
+    Directory& find(const TreeCp* cp);
+
+    std::vector<Directory> m_directories;  // by cp: small, as there may be very many
 };
 
 #endif  // KESTLOG_LOGSTREAM_H_

@@ -48,14 +48,21 @@ off_t rewindable_input() {
     return good ? 0 : -1;
 }
 
+std::string without_slash(std::string path) {
+    if (path.size() > 1 && path.back() == '/') {
+        path.pop_back();
+    }
+    return path;
+}
+
 // The CP of that name in the set, which may be new.
-TreeCp* cp_of(TreeSet* set, const std::string& name, const std::string& dir) {
+TreeCp* cp_of(TreeSet* set, const std::string& name, const TreeDir& dir) {
     for (TreeCp& cp : set->cps) {
         if (cp.name == name) {
             return &cp;
         }
     }
-    set->cps.push_back({name, dir.substr(0, dir.size() - 1), {}});
+    set->cps.push_back({name, &dir, {}});
     return &set->cps.back();
 }
 
@@ -72,6 +79,16 @@ size_t count_entries(const std::string& path) {
 }
 
 }  // namespace
+
+std::string TreeDir::name() const {
+    const std::string text = without_slash(shown());
+    return text.empty() ? "." : text;
+}
+
+std::string TreeSet::shown() const {
+    const bool is_file = given && cps.size() == 1 && cps[0].files.size() == 1;
+    return is_file ? cps[0].files[0].shown() : dir->name();
+}
 
 bool LogTree::visit_dir(const std::string& path, const std::function<void(const Entry&)>& visit) {
     DIR* dir = opendir(path.c_str());
@@ -123,8 +140,14 @@ std::string LogTree::shown(const std::string& path) const {
                : path;
 }
 
-const TreeDir* LogTree::tree_dir(const std::string& path) {
-    m_dirs.push_back({path + "/", shown(path) + "/", m_medium});
+const TreeDir* LogTree::top_dir(const std::string& path, const std::string& shown) {
+    m_tops.push_back({path, shown, m_medium});
+    m_dirs.push_back({&m_tops.back(), ""});
+    return &m_dirs.back();
+}
+
+const TreeDir* LogTree::dir_below(const TreeDir& dir, const std::string& name) {
+    m_dirs.push_back({dir.top, dir.below + name + "/"});
     return &m_dirs.back();
 }
 
@@ -172,17 +195,12 @@ void LogTree::add_file(const std::string& path) {
         name.exact ? m_given.insert({{dir, name.cp()}, sets.size()}).first : m_given.end();
     const size_t index = known == m_given.end() ? sets.size() : known->second;
     if (index == sets.size()) {
-        m_dirs.push_back({dir, dir, m_medium});
-        sets.push_back({"", path, m_medium, {}, {{name.cp(), path, {}}}});
+        const TreeDir* const in = top_dir(dir, dir);
+        sets.push_back({"", in, {}, {{name.cp(), in, {}}}});
         sets.back().given = true;
     }
     TreeCp& cp = sets[index].cps[0];
-    const TreeDir* const in = cp.files.empty() ? &m_dirs.back() : cp.files[0].dir;
-    if (!cp.files.empty()) {
-        sets[index].shown = cp.shown =
-            dir.empty() ? "." : dir.substr(0, std::max<size_t>(slash - 1, 1));
-    }
-    cp.files.push_back({name, in, static_cast<uint64_t>(st.st_size), modified_time(st)});
+    cp.files.push_back({name, cp.dir, static_cast<uint64_t>(st.st_size), modified_time(st)});
 }
 
 bool LogTree::add_archive(const std::string& path) {
@@ -286,11 +304,14 @@ bool LogTree::add_directory(const std::string& path) {
     failures.resize(failures_before);
     if (is_root) {
         read_root(path);
-    } else if (is_set) {
-        read_set(path, name);
+        return true;
+    }
+    const TreeDir& dir = *top_dir(path + "/", shown(path) + "/");
+    if (is_set) {
+        read_set(dir, name);
     } else {
-        sets.push_back({"", shown(path), m_medium, {}, {}});
-        read_cp(path, name, &sets.back());
+        sets.push_back({"", &dir, {}, {}});
+        read_cp(dir, name, &sets.back());
     }
     return true;
 }
@@ -299,57 +320,56 @@ void LogTree::read_root(const std::string& path) {
     if (!first_visit(path)) {
         return;
     }
-    const TreeDir* const dir = tree_dir(path);
+    const TreeDir* const dir = top_dir(path + "/", shown(path) + "/");
     for (const Entry& entry : list_dir(path)) {
-        const std::string full = path + "/" + entry.name;
         LogTime time;
         if (entry.dir && parse_set_name(entry.name, &time)) {
-            read_set(full, entry.name);
+            read_set(*dir_below(*dir, entry.name), entry.name);
         } else if (entry.file && (entry.name == DATABASE_NAME || entry.name == DIGEST_NAME)) {
             root_files.push_back({FileName(entry.name), dir, entry.size, entry.modified});
         } else {
-            strays.push_back(shown(full));
+            strays.push_back(dir->shown() + entry.name);
         }
     }
 }
 
-void LogTree::read_set(const std::string& path, const std::string& name) {
-    if (!first_visit(path)) {
+void LogTree::read_set(const TreeDir& dir, const std::string& name) {
+    if (!first_visit(dir.path())) {
         return;
     }
-    sets.push_back({name, shown(path), m_medium, {}, {}});
+    sets.push_back({name, &dir, {}, {}});
     parse_set_name(name, &sets.back().time);
-    for (const Entry& entry : list_dir(path)) {
+    for (const Entry& entry : list_dir(without_slash(dir.path()))) {
         if (entry.dir && cp_type_of(entry.name) != CT_UNKNOWN) {
-            read_cp(path + "/" + entry.name, entry.name, &sets.back());
+            read_cp(*dir_below(dir, entry.name), entry.name, &sets.back());
         } else {
-            strays.push_back(shown(path + "/" + entry.name));
+            strays.push_back(dir.shown() + entry.name);
         }
     }
 }
 
-void LogTree::read_cp(const std::string& path, const std::string& name, TreeSet* set) {
+void LogTree::read_cp(const TreeDir& dir, const std::string& name, TreeSet* set) {
+    const std::string path = without_slash(dir.path());
     if (!first_visit(path)) {
         return;
     }
-    const TreeDir* const dir = tree_dir(path);
     const bool renamed = cp_type_of(name) == CT_UNKNOWN;
     const size_t strays_before = strays.size();
-    TreeCp* cp = renamed ? nullptr : cp_of(set, name, dir->shown);
+    TreeCp* cp = renamed ? nullptr : cp_of(set, name, dir);
     if (cp) {
         // A list that grows takes its space twice.
         cp->files.reserve(cp->files.size() + count_entries(path));
     }
     visit_dir(path, [&](const Entry& entry) {
         if (!entry.file) {
-            strays.push_back(dir->shown + entry.name);
+            strays.push_back(dir.shown() + entry.name);
             return;
         }
         const FileName file(entry.name);
         if (renamed) {
-            cp = cp_of(set, file.cp().empty() ? name : file.cp(), dir->shown);
+            cp = cp_of(set, file.cp().empty() ? name : file.cp(), dir);
         }
-        cp->files.push_back({file, dir, entry.size, entry.modified});
+        cp->files.push_back({file, &dir, entry.size, entry.modified});
     });
     std::sort(strays.begin() + static_cast<ptrdiff_t>(strays_before), strays.end());
     if (renamed) {

@@ -27,11 +27,22 @@ constexpr char CARD_IN_ROOT[] = "/storage/sdcard0";
 constexpr char MEDIUM_INTERNAL[] = "internal";
 constexpr char MEDIUM_CARD[] = "card";
 
-// A directory with files of the tree. Both paths end with "/".
-struct TreeDir {
+// A directory below which the tree has others. Both paths end with "/".
+struct TreeTop {
     std::string path;    // where to open the files
     std::string shown;   // the same for humans: a path in an archive begins with its name
-    std::string medium;  // as of a set
+    std::string medium;  // for humans: "internal", "card" or what the ROOT is called
+};
+
+// A directory of the tree. As there may be very many, what they have in common stands once.
+struct TreeDir {
+    const TreeTop* top;  // the tree's
+    std::string below;   // "", or the way from there, with "/" at its end
+
+    std::string path() const { return top->path + below; }
+    std::string shown() const { return top->shown + below; }
+    std::string name() const;  // shown, without "/" at its end
+    const std::string& medium() const { return top->medium; }
 };
 
 // There may be several hundred thousand.
@@ -51,26 +62,28 @@ struct TreeFile {
     bool disordered = false;  // by its number it is older than a log file with an earlier time
 
     uint32_t first_missing() const { return name.number - missing; }
-    std::string path() const { return dir->path + name.text(); }
-    std::string shown() const { return dir->shown + name.text(); }
+    std::string path() const { return dir->path() + name.text(); }
+    std::string shown() const { return dir->shown() + name.text(); }
 };
 static_assert(sizeof(TreeFile) <= 96, "a tree of 100,000 files stays small");
 
 struct TreeCp {
     std::string name;
-    std::string shown;            // its path for humans
+    const TreeDir* dir;           // the tree's
     std::vector<TreeFile> files;  // by time, oldest first
     bool own_times = true;        // the last writes are the handset's, not those of a copy
 };
 
 struct TreeSet {
     std::string name;    // "" when only a CP directory or a file was given
-    std::string shown;   // its path for humans
-    std::string medium;  // for humans: "internal", "card" or what the ROOT is called
+    const TreeDir* dir;  // the tree's
     LogTime time;        // of its name or, without one, of its first file
     std::vector<TreeCp> cps;
     size_t handset = 0;  // each ROOT is taken for another one
     bool given = false;  // by the paths of its files, which may be links or pipes
+
+    std::string shown() const;  // its path for humans
+    const std::string& medium() const { return dir->medium(); }
 };
 
 // A time of the file system, in this machine's zone.
@@ -129,7 +142,8 @@ private:
     bool visit_dir(const std::string& path, const std::function<void(const Entry&)>& visit);
     // The same by name.
     std::vector<Entry> list_dir(const std::string& path);
-    const TreeDir* tree_dir(const std::string& path);
+    const TreeDir* top_dir(const std::string& path, const std::string& shown);
+    const TreeDir* dir_below(const TreeDir& dir, const std::string& name);
     std::string shown(const std::string& path) const;
     bool first_visit(const std::string& path);
     bool add_as(const std::string& medium, const std::string& given, Files files);
@@ -138,9 +152,9 @@ private:
     bool add_medium(const std::string& path, const std::string& name);
     bool add_directory(const std::string& path);
     void read_root(const std::string& path);
-    void read_set(const std::string& path, const std::string& name);
+    void read_set(const TreeDir& dir, const std::string& name);
     // The directory of a CP or, under another name, of files that may be from several CPs.
-    void read_cp(const std::string& path, const std::string& name, TreeSet* set);
+    void read_cp(const TreeDir& dir, const std::string& name, TreeSet* set);
 
     std::string m_medium;                         // of what is being added
     std::pair<std::string, std::string> m_alias;  // the prefix of paths, and what is shown for it
@@ -150,7 +164,8 @@ private:
     bool m_card_given = false;
     size_t m_roots = 0;
     size_t m_archives = 0;
-    std::deque<TreeDir> m_dirs;  // which stay where they are
+    std::deque<TreeTop> m_tops;  // which stay where they are
+    std::deque<TreeDir> m_dirs;  // likewise
     uint64_t m_unpack_limit = 0;
     std::unique_ptr<TempDir> m_unpacked;  // with a directory for each archive
 };

@@ -88,14 +88,14 @@ void find_ends(std::vector<TreeSet>* sets) {
     for (TreeSet& set : *sets) {
         for (TreeCp& cp : set.cps) {
             fits.push_back(times_fit(cp, newest_log(&cp)));
-            media[{set.handset, set.medium}] += fits.back();
+            media[{set.handset, set.medium()}] += fits.back();
         }
     }
     auto fit = fits.begin();
     for (TreeSet& set : *sets) {
         for (TreeCp& cp : set.cps) {
             TreeFile* const newest = newest_log(&cp);
-            cp.own_times = (*fit ? *fit : media[{set.handset, set.medium}]) >= 0;
+            cp.own_times = (*fit ? *fit : media[{set.handset, set.medium()}]) >= 0;
             ++fit;
             if (newest && cp.own_times) {
                 newest->end =

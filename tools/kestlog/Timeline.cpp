@@ -60,7 +60,7 @@ Json Timeline::json() const {
                            {"to", time_text(item.to)}};
             if (item.set) {
                 object["set"] = json_text(item.set->name);
-                object["medium"] = json_text(item.set->medium);
+                object["medium"] = json_text(item.set->medium());
             }
             if (item.files) {
                 object["files"] = item.files;

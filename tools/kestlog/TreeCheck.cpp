@@ -71,7 +71,7 @@ private:
     // In each log root the database and its digest must both be there, or neither.
     void parsing_database(const TreeFile& file) {
         const std::string other =
-            file.dir->shown + (file.name.text() == DIGEST_NAME ? DATABASE_NAME : DIGEST_NAME);
+            file.dir->shown() + (file.name.text() == DIGEST_NAME ? DATABASE_NAME : DIGEST_NAME);
         const std::vector<TreeFile>& files = m_tree.root_files;
         if (std::none_of(files.begin(), files.end(),
                          [&](const TreeFile& f) { return f.shown() == other; })) {

@@ -23,7 +23,7 @@ constexpr int64_t DAY_SECONDS = 24 * 60 * 60;
 constexpr size_t MAX_CRASHES = 20;  // that an error lists
 
 std::string crash_line(const Crash& crash) {
-    return time_text(crash.time) + " " + crash.cp->name + " on " + crash.set->medium + ": " +
+    return time_text(crash.time) + " " + crash.cp->name + " on " + crash.set->medium() + ": " +
            crash_text(crash);
 }
 
@@ -66,9 +66,10 @@ void erase_if(std::vector<T>* list, Test test) {
 
 // The set beside which the file lies; null without one.
 const TreeSet* set_beside(const LogTree& tree, const TreeFile& root_file) {
-    const auto found = std::find_if(
-        tree.sets.begin(), tree.sets.end(),
-        [&root_file](const TreeSet& set) { return set.shown == root_file.dir->shown + set.name; });
+    const auto found =
+        std::find_if(tree.sets.begin(), tree.sets.end(), [&root_file](const TreeSet& set) {
+            return set.shown() == root_file.dir->shown() + set.name;
+        });
     return found == tree.sets.end() ? nullptr : &*found;
 }
 

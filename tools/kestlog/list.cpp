@@ -33,7 +33,7 @@ struct Sum {
 void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* cp,
                const Sum& sum) {
     if (json) {
-        Json object = {{"set", json_text(set.name)}, {"medium", json_text(set.medium)}};
+        Json object = {{"set", json_text(set.name)}, {"medium", json_text(set.medium())}};
         if (cp) {
             object["cp"] = json_text(cp->name);
         } else {
@@ -46,11 +46,11 @@ void print_sum(bool json, const char* indent, const TreeSet& set, const TreeCp* 
         print_json(object);
         return;
     }
-    const std::string name = cp ? cp->name : set.name.empty() ? set.shown : set.name;
+    const std::string name = cp ? cp->name : set.name.empty() ? set.shown() : set.name;
     printf("%s%-*s %12llu bytes  %4llu files  %s to %s%s\n", indent, cp ? 22 : 24,
            escape_text(name).c_str(), static_cast<unsigned long long>(sum.size),
            static_cast<unsigned long long>(sum.files), time_text(sum.first).c_str(),
-           time_text(sum.last).c_str(), cp ? "" : ("  on " + escape_text(set.medium)).c_str());
+           time_text(sum.last).c_str(), cp ? "" : ("  on " + escape_text(set.medium())).c_str());
 }
 
 void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile& file) {
@@ -59,7 +59,7 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
         if (set) {
             object["set"] = json_text(set->name);
         }
-        object["medium"] = json_text(file.dir->medium);
+        object["medium"] = json_text(file.dir->medium());
         if (cp) {
             object["cp"] = json_text(cp->name);
         }
@@ -76,7 +76,7 @@ void print_file(bool json, const TreeSet* set, const TreeCp* cp, const TreeFile&
     }
     printf("%s%12llu  %-16s %s%s\n", set ? "    " : "", static_cast<unsigned long long>(file.size),
            file.name.kind(), escape_text(file.name.text()).c_str(),
-           set ? "" : ("  on " + escape_text(file.dir->medium)).c_str());
+           set ? "" : ("  on " + escape_text(file.dir->medium())).c_str());
 }
 
 // A line of the tree; the margin of the lines below it.
@@ -86,7 +86,7 @@ std::string print_branch(const std::string& margin, bool last, const std::string
 }
 
 void print_set(const TreeSet& set, bool last) {
-    const std::string below = print_branch("", last, set.name.empty() ? set.shown : set.name);
+    const std::string below = print_branch("", last, set.name.empty() ? set.shown() : set.name);
     for (const TreeCp& cp : set.cps) {
         const std::string margin = print_branch(below, &cp == &set.cps.back(), cp.name);
         for (const TreeFile& file : cp.files) {
@@ -104,17 +104,17 @@ void print_tree(const LogTree& tree) {
                static_cast<unsigned long long>(file.size));
     }
     for (const TreeSet& set : tree.sets) {
-        last[set.medium] = &set;
+        last[set.medium()] = &set;
     }
     std::set<std::string> done;
     for (const TreeSet& first : tree.sets) {
-        if (!done.insert(first.medium).second) {
+        if (!done.insert(first.medium()).second) {
             continue;
         }
-        printf("%s\n", escape_text(first.medium).c_str());
+        printf("%s\n", escape_text(first.medium()).c_str());
         for (const TreeSet& set : tree.sets) {
-            if (set.medium == first.medium) {
-                print_set(set, &set == last[set.medium]);
+            if (set.medium() == first.medium()) {
+                print_set(set, &set == last[set.medium()]);
             }
         }
     }
