@@ -436,7 +436,7 @@ FALLIBLE(ssize_t, read, CALL_READ, place_of_fd(fd), (fd, data, len), int fd, voi
     }
     if (n > 0) {
         const Outside outside;
-        world().service_read(info, static_cast<const uint8_t*>(data), static_cast<size_t>(n));
+        world().service_read(info, static_cast<size_t>(n));
     }
     errno = error;
     return n;

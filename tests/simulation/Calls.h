@@ -10,8 +10,6 @@
 #include <stdint.h>
 #include <sys/types.h>
 
-#include <string>
-
 #include "simulation/State.h"
 
 enum Call : uint8_t {

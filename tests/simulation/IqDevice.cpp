@@ -7,8 +7,6 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
-#include <algorithm>
-
 #include "iq/IqStorRespHandler.h"
 #include "iq/iq_mem.h"
 #include "sim/files.h"

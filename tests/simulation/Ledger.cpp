@@ -43,7 +43,6 @@ void gap(unsigned stream, uint64_t to) {
     }
     s.excuse -= std::min(len, s.excuse);
     s.unplaced = 0;
-    s.lost += len;
     s.written = to;
 }
 

@@ -48,7 +48,6 @@ struct StreamState {
     uint64_t fed;       // given by the device so far
     uint64_t consumed;  // read by the service
     uint64_t written;   // up to where the service has written or lost them
-    uint64_t lost;      // of these
     uint64_t stored;    // bytes that went to a file
     uint64_t removed;   // of these: went with a file that was deleted
     // Bytes of answers that the service read as log data, because no exchange ran.

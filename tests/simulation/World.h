@@ -50,7 +50,7 @@ public:
     Place place_of(const char* path) const;
     void file_opened(const char* path, Place place, FdInfo& info, int fd) const;
     int open_device(const char* path);
-    void service_read(const FdInfo& info, const uint8_t* data, size_t len);
+    void service_read(const FdInfo& info, size_t len);
     void dump_confirmed(int fd);
     void reading_failed() { m_last_stream = STREAM_COUNT; }
     void service_deletes(const char* path, Place place);

@@ -64,7 +64,7 @@ int World::open_device(const char* path) {
     return name == "/dev/iq_mem" ? m_iq.open() : m_devices.open(name);
 }
 
-void World::service_read(const FdInfo& info, const uint8_t* /*data*/, size_t len) {
+void World::service_read(const FdInfo& info, size_t len) {
     progress();
     if (info.cls != FD_LOG_DEVICE) {
         return;

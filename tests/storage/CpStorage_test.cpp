@@ -5,7 +5,6 @@
 #include <errno.h>
 
 #include "storage/StorageFixture.h"
-#include "storage/paths.h"
 
 namespace {
 

@@ -108,9 +108,7 @@ protected:
     void set_card(bool in) { root.set_prop("init.svc.fuse_sdcard0", in ? "running" : ""); }
 
     Multiplexer& mux() { return ctrl->multiplexer(); }
-    bool pump(const std::function<bool()>& condition, int timeout_ms = 60000) {
-        return pump_until(mux(), condition, timeout_ms);
-    }
+    bool pump(const std::function<bool()>& condition) { return pump_until(mux(), condition); }
     // Passes of the loop, whatever there is to do.
     void pass(int times) {
         for (int i = 0; i < times; ++i) {

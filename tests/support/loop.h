@@ -21,9 +21,8 @@ inline void pump_once(Multiplexer& mux) {
 }
 
 // Runs the loop until the condition holds; false when the time is over.
-inline bool pump_until(Multiplexer& mux, const std::function<bool()>& condition,
-                       int timeout_ms = 60000) {
-    return wait_until(condition, timeout_ms, [&] { pump_once(mux); });
+inline bool pump_until(Multiplexer& mux, const std::function<bool()>& condition) {
+    return wait_until(condition, 60000, [&] { pump_once(mux); });
 }
 
 // Fills the loop's table, or sees how many handlers it still takes.
