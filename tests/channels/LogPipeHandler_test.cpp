@@ -71,28 +71,25 @@ TEST_F(LogPipeHandlerTest, ADeviceThatHungUpIsOpenedAnew) {
         EXPECT_EQ(symlink(device->path().c_str(), name.c_str()), 0);
         return device;
     };
-    const auto feed = [&](const Pty& device, const char* data) {
-        return device.put(data) && pump([&] { return device.pending() == 0; });
-    };
     auto device = connect();
     ASSERT_EQ(boot("stream cp_gnss on 5 3\n"), 0);
     gnss = ctrl->get_cp(CT_GNSS);
-    ASSERT_TRUE(feed(*device, "one"));
+    ASSERT_TRUE(supply(*device, "one"));
     const size_t descriptors = open_descriptors();
     gnss->process_alive();
-    EXPECT_TRUE(feed(*device, "two")) << "kept: it works";
+    EXPECT_TRUE(supply(*device, "two")) << "kept: it works";
     device.reset();
     ASSERT_TRUE(pump([&] { return log.has("read returns 0"); }));
     device = connect();
     gnss->process_alive();
-    EXPECT_TRUE(feed(*device, "three"));
+    EXPECT_TRUE(supply(*device, "three"));
     // Nobody tells that some CPs are alive.
     boot_clock::freeze();
     device.reset();
     ASSERT_TRUE(pump([&] { return log.has("gave nothing 10 times in a row"); }));
     device = connect();
     boot_clock::advance(3000);
-    EXPECT_TRUE(feed(*device, "four"));
+    EXPECT_TRUE(supply(*device, "four"));
     EXPECT_EQ(open_descriptors(), descriptors);
     ctrl.reset();
     EXPECT_EQ(content("cp_gnss"), "onetwothreefour");

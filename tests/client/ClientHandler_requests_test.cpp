@@ -28,19 +28,13 @@ TEST_F(ClientRequestsTest, TheTableOfRequestsTellsTheTruth) {
         {RK_WORD, "OK [A-Z]+\n"},
     };
     Client client(TEST_SERVER);
-    const auto reply_to = [&](const std::string& line) {
-        EXPECT_TRUE(client.say(line + "\n"));
-        pump([&] { return !client.heard().empty(); });
-        const std::string reply = client.heard();
-        client.forget();
-        return reply;
-    };
     for (const ControlRequest& request : CONTROL_REQUESTS) {
         const std::string right = request.words + examples.at(request.params);
         const std::string wrong = std::string(request.keyword()) + (*request.params ? "" : " x");
         const std::regex expected(replies.at(request.reply));
-        EXPECT_TRUE(std::regex_match(reply_to(right), expected)) << right;
-        EXPECT_TRUE(std::regex_match(reply_to(wrong), std::regex("ERROR [12]\n"))) << wrong;
+        EXPECT_TRUE(std::regex_match(ask(client, right + "\n", "?"), expected)) << right;
+        EXPECT_TRUE(std::regex_match(ask(client, wrong + "\n", "?"), std::regex("ERROR [12]\n")))
+            << wrong;
     }
 }
 

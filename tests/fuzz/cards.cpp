@@ -11,6 +11,8 @@
 
 #include "fuzz/fuzz.h"
 #include "kestlog/program.h"
+#include "sim/files.h"
+#include "support/TestRoot.h"
 
 namespace {
 
@@ -49,11 +51,8 @@ const char* const COMMANDS[] = {
 
 struct Card {
     Card() {
-        const char* const memory = fs::is_directory("/dev/shm") ? "/dev/shm" : "/tmp";
-        std::string name = memory + std::string("/kest_fuzz.XXXXXX");
-        FUZZ_CHECK(mkdtemp(name.data()));
-        top = name;
-        FUZZ_CHECK(freopen("/dev/null", "w", stdout));
+        top = make_temp_dir(fs::is_directory("/dev/shm") ? "/dev/shm" : "/tmp", "kest_fuzz");
+        FUZZ_CHECK(!top.empty() && freopen("/dev/null", "w", stdout));
     }
     ~Card() { fs::remove_all(top); }
 
@@ -72,11 +71,6 @@ struct Card {
     fs::path top, dir;
 };
 
-std::string content(const fs::path& path) {
-    std::ifstream file(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(file), {});
-}
-
 int run(const Card& card, const std::string& command, const std::string& cp) {
     std::vector<std::string> args = {"kestlog"};
     std::istringstream words(command);
@@ -92,12 +86,7 @@ int run(const Card& card, const std::string& command, const std::string& cp) {
                                            : word);
         }
     }
-    std::vector<char*> argv;
-    for (std::string& arg : args) {
-        argv.push_back(arg.data());
-    }
-    argv.push_back(nullptr);
-    return run_program(static_cast<int>(args.size()), argv.data());
+    return run_program(static_cast<int>(args.size()), argv_of(args).data());
 }
 
 }  // namespace
@@ -126,7 +115,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     size_t found = 0;
     for (const auto& entry : fs::directory_iterator(card.dir)) {
         const auto file = files.find(entry.path().filename());
-        FUZZ_CHECK(file != files.end() && content(entry.path()) == file->second);
+        FUZZ_CHECK(file != files.end() && read_text_file(entry.path()) == file->second);
         ++found;
     }
     FUZZ_CHECK(found == files.size());
@@ -136,10 +125,10 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
             const bool is_log = std::string(name).find("-" + cp + "-") != std::string::npos;
             stream += is_log && files.count(name) ? files[name] : "";
         }
-        FUZZ_CHECK(content(card.out()) == stream);
+        FUZZ_CHECK(read_text_file(card.out()) == stream);
     }
     if (command.find("report") == 0 && (status == 0 || status == 3)) {
-        const std::string page = content(card.out());
+        const std::string page = read_text_file(card.out());
         FUZZ_CHECK(page.find("</html>") != std::string::npos);
         FUZZ_CHECK(page.find("<mark of a fuzzer>") == std::string::npos);
     }

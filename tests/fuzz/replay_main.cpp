@@ -4,10 +4,10 @@
 // program stays in a file beside the program, as does the log, a sanitizer's report in it.
 #include <algorithm>
 #include <filesystem>
-#include <sstream>
 #include <vector>
 
 #include "fuzz/fuzz.h"
+#include "sim/files.h"
 
 namespace {
 
@@ -17,9 +17,7 @@ constexpr size_t MAX_PREFIXES = 30;
 std::vector<std::string> read_files(const char* dir) {
     std::vector<std::string> contents;
     for (const auto& entry : std::filesystem::directory_iterator(dir)) {
-        std::ostringstream text;
-        text << std::ifstream(entry.path(), std::ios::binary).rdbuf();
-        contents.push_back(text.str());
+        contents.push_back(read_text_file(entry.path()));
     }
     std::sort(contents.begin(), contents.end());
     return contents;

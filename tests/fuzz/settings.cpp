@@ -5,7 +5,6 @@
 // only the CPs known to it come out, off without the global switch, in the order and number
 // of the file.
 #include <filesystem>
-#include <sstream>
 #include <vector>
 
 #include "config/KestConfig.h"
@@ -13,6 +12,7 @@
 #include "core/system_paths.h"
 #include "fuzz/fuzz.h"
 #include "kestctl/SettingsFile.h"
+#include "sim/files.h"
 #include "support/TestRoot.h"
 
 namespace {
@@ -27,11 +27,6 @@ struct Handset {
     }
     TestRoot root;
     FuzzFile file{system_path(PATH_CONFIG_FILE).string()};
-    std::string text() const {
-        std::ostringstream out;
-        out << std::ifstream(file.path).rdbuf();
-        return out.str();
-    }
 };
 
 FileSettings read_settings() {
@@ -64,14 +59,14 @@ void check_settings(const Handset& handset) {
 }
 
 void check_saved_settings(const Handset& handset) {
-    const std::string saved = handset.text();
+    const std::string saved = read_text_file(handset.file.path);
     LogConfig back(handset.file.path.c_str());
     LogCapture log;
     FUZZ_CHECK(fuzz_read(back) == 0);
     const int zeros =
         (back.log_file_size() << 20 == 0) + (back.data_log_size() == 0) + (back.sd_log_size() == 0);
     FUZZ_CHECK(log.count("\n") == static_cast<size_t>(zeros));
-    FUZZ_CHECK(back.save() == 0 && handset.text() == saved);
+    FUZZ_CHECK(back.save() == 0 && read_text_file(handset.file.path) == saved);
 }
 
 typedef std::vector<std::pair<CpType, bool>> Entries;

@@ -25,16 +25,7 @@ std::string log_name(int number, const char* time = "10-00-00") {
     return std::to_string(number) + "-cp_wcn-2016-03-01_" + time + ".log";
 }
 
-class CpDirectoryTest : public StorageTest {
-protected:
-    // Appends a listed file of that size.
-    LogFile* add(const std::string& name, LogType type, uint32_t size) {
-        LogFile* file = m_dir->create_file(name.c_str(), type);
-        file->close();
-        file->set_size(size);
-        return file;
-    }
-};
+typedef StorageTest CpDirectoryTest;
 
 // A walk along the list for every file would compare two million times.
 TEST_F(CpDirectoryTest, ScanIsNotQuadratic) {
@@ -74,7 +65,8 @@ TEST_F(CpDirectoryTest, NoFileIsEverWrittenOver) {
     first->close();
     EXPECT_EQ(m_root.read_file(DIR_REL + "0-cp_wcn-2016-03-01_09-15-00-2.log"), "first");
     // Listed, but gone: dropped. What cannot be moved keeps its name; the new file has another.
-    ObjectRef<LogFile> gone(add("a.dmp", LT_DUMP, 7));
+    ObjectRef<LogFile> gone(m_dir->create_file("a.dmp", LT_DUMP));
+    gone->set_size(7);
     unlink(m_root.path(DIR_REL + "a.dmp").c_str());
     LogFile* stuck = m_dir->create_file("a.dmp", LT_DUMP);
     EXPECT_FALSE(gone);

@@ -58,8 +58,13 @@ TEST_F(FailingMediumTest, ACardThatKeepsFailingRestsEachTimeLonger) {
     boot_clock::real();
 }
 
-bool on_card(int fd) {
-    return faults::path_of(fd).find("/sd/") != std::string::npos;
+// Writes to the card fail while that is so.
+const bool ALWAYS = true;
+void fail_on_card(int error, const bool& failing = ALWAYS) {
+    faults::instead.write = [error, &failing](int fd, const void* data, size_t len) {
+        const bool fails = failing && faults::path_of(fd).find("/sd/") != std::string::npos;
+        return fails ? (errno = error, ssize_t{-1}) : real::write(fd, data, len);
+    };
 }
 
 // Each block was staged and then lost by a flush, which nobody asked how it went: nothing was
@@ -70,9 +75,7 @@ TEST_F(FailingMediumTest, ACardToWhichBlocksAreOnlyStagedIsLeft) {
         m_mgr.set_sd_size(asked ? 1000000 : 50000);
         EXPECT_EQ(lost_of(1, std::string(20000, 'x')), 0);
         EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
-        faults::instead.write = [](int fd, const void* data, size_t len) {
-            return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
-        };
+        fail_on_card(EIO);
         LogCapture log;
         for (int i = 0; i < 5; ++i) {
             EXPECT_EQ(lost_of(1, std::string(20000, 'x')), 0);
@@ -94,17 +97,14 @@ TEST_F(FailingMediumTest, RoomIsMadeOnAMediumThatIsStillFull) {
     const std::string old = "modem_log/2016-02-01-00-00-00/cp_gnss/old";
     m_root.write_file("data/" + old, "12345678");
     m_root.write_file("sd/" + old, "12345678");
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     m_mgr.set_file_size(16);
     for (const std::string now : {"with room", "pulled", "full"}) {
         plug_card();
         EXPECT_EQ(lost_of(1, "x"), 0);
         EXPECT_EQ(m_mgr.media_type(), MT_EXTERNAL);
         bool full = true;
-        faults::instead.write = [&](int fd, const void* data, size_t len) {
-            return full && on_card(fd) ? (errno = ENOSPC, ssize_t{-1}) : real::write(fd, data, len);
-        };
+        fail_on_card(ENOSPC, full);
         m_store->flush();
         EXPECT_TRUE(m_root.exists("sd/" + old)) << "not by the flush";
         full = now == "full";
@@ -135,9 +135,7 @@ TEST_F(FailingMediumTest, ACardThatFailedOnceIsUsedAgain) {
     faults::fail(faults::WRITE, 1, EIO);
     EXPECT_EQ(lost_of(1, block), 1);
     bool full = true;
-    faults::instead.write = [&](int fd, const void* data, size_t len) {
-        return full && on_card(fd) ? (errno = ENOSPC, ssize_t{-1}) : real::write(fd, data, len);
-    };
+    fail_on_card(ENOSPC, full);
     faults::instead.unlink = [&](const char* path) {
         full = full && !strstr(path, "/old");
         return real::unlink(path);
@@ -152,8 +150,7 @@ TEST_F(FailingMediumTest, WhatCannotBeMadeOnAMedium) {
     for (const char* number : {"1", "2", "3"}) {
         m_root.write_file(old + number + file, "0123456789abcdef");
     }
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     m_mgr.set_file_size(16);
     faults::fail(faults::MKDIR, 1, ENOSPC);  // a set
     EXPECT_EQ(lost_of(1, "x"), 0);
@@ -273,9 +270,7 @@ TEST_F(FailingMediumTest, RoomIsMadeForFilesAndSets) {
     EXPECT_FALSE(m_root.exists("sd/modem_log/2016-02-01-00-00-00"));
     refused = "data/modem_log/2";  // the card fails, and spared files fill the internal medium
     full = true;
-    faults::instead.write = [](int fd, const void* data, size_t len) {
-        return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
-    };
+    fail_on_card(EIO);
     EXPECT_EQ(lost_of(3, block), 1);
     EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
     faults::instead = {};
@@ -288,9 +283,7 @@ TEST_F(FailingMediumTest, ACardThatTakesNoSetIsLeft) {
     m_mgr.set_sd_size(30000);
     EXPECT_EQ(lost_of(2, std::string(20000, 'x')), 0);
     faults::fail(faults::MKDIR, 1, EIO);
-    faults::instead.write = [](int fd, const void* data, size_t len) {
-        return on_card(fd) ? (errno = EIO, ssize_t{-1}) : real::write(fd, data, len);
-    };
+    fail_on_card(EIO);
     EXPECT_EQ(lost_of(3, "x"), 1);
     EXPECT_EQ(m_mgr.media_type(), MT_INTERNAL);
     faults::instead = {};
@@ -326,8 +319,7 @@ TEST_F(FailingMediumTest, WhatCannotBeDeletedIsPassedOver) {
                              "2-00-00-00/cp_gnss/d"}) {
         m_root.write_file(old + file, block);
     }
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     bool stuck = true;
     faults::instead.unlink = [&](const char* path) {
         return stuck && strrchr(path, '/')[1] == 'c' ? (errno = EIO, -1) : real::unlink(path);
@@ -351,8 +343,7 @@ TEST_F(FailingMediumTest, WhatCannotBeDeletedIsPassedOver) {
     for (int i = 0; i < 200; ++i) {
         m_root.write_file(old + "1-00-00-00/cp_gnss/" + std::to_string(i), block);
     }
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     faults::instead = {};
     faults::only_on("/cp_gnss/");
     faults::fail(faults::UNLINK, 1, EIO, faults::FOREVER);
@@ -367,8 +358,7 @@ TEST_F(FailingMediumTest, ManyThatCannotBeDeletedAreTriedNowAndThen) {
     for (int day = 10; day < 40; ++day) {
         m_root.write_file("data/modem_log/2016-02-" + std::to_string(day) + "/cp_gnss/old", block);
     }
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     EXPECT_EQ(lost_of(1, block), 0);
     m_mgr.set_file_size(2000000);
     for (const bool full : {false, true}) {
@@ -405,10 +395,7 @@ TEST_F(FailingMediumTest, ACardOnWhichNothingCanBeDeletedIsLeft) {
             faults::instead.unlink = [&](const char* path) {
                 return strstr(path, "/sd/") ? (errno = error, -1) : real::unlink(path);
             };
-            faults::instead.write = [&](int fd, const void* data, size_t len) {
-                return full && on_card(fd) ? (errno = ENOSPC, ssize_t{-1})
-                                           : real::write(fd, data, len);
-            };
+            fail_on_card(ENOSPC, full);
             const uint64_t inside = internal().size();
             const bool left = error != EPERM;  // that tells nothing of the card
             EXPECT_EQ(lost_of(6, block), left ? 1 : full ? 6 : 5);
@@ -431,8 +418,7 @@ TEST_F(FailingMediumTest, ADirectoryIsNoLogFile) {
         m_root.make_dir(file);
     };
     m_root.write_file(old + "0-cp_gnss-2016-02-01_00-00-00.log", block);
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     replace(old + "0-cp_gnss-2016-02-01_00-00-00.log");
     EXPECT_EQ(lost_of(2, block), 0);
     internal().set_quota(150000);

@@ -45,8 +45,7 @@ TEST_F(MediaStorageTest, WhatVanishedLeavesTheTotals) {
                                        "rm " + set + "/cp/f", "truncate -s 1 " + set + "/cp/f"}) {
         SCOPED_TRACE(command);
         m_root.write_file(ROOT + "2016-02-01-00-00-00/cp/f", "12345678");
-        internal().clear();
-        ASSERT_EQ(internal().stat(), 0);
+        rescan();
         EXPECT_EQ(internal().check_quota(), -1);
         ASSERT_EQ(system(command.c_str()), 0);
         int checks = 0;
@@ -93,8 +92,7 @@ TEST_F(MediaStorageTest, WhatLiesInAnotherTreeCounts) {
     init();
     make("cp")->write("12345678", 8);
     m_root.write_file(ROOT + "2016-01-01-00-00-00/cp/f", "old card");
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     make("cp")->write("1", 1);
     remove_tree(m_root.path(ROOT).c_str());
     m_root.write_file(ROOT + "2016-02-01-00-00-00/cp/f", "123456");
@@ -114,8 +112,7 @@ TEST_F(MediaStorageTest, ARefusedWriteIsCheap) {
     for (int i = 0; i < 1600; ++i) {
         m_root.write_file(ROOT + "2016-02-01-00-00-00/cp/" + std::to_string(i), "x");
     }
-    internal().clear();
-    ASSERT_EQ(internal().stat(), 0);
+    rescan();
     faults::reset();
     for (int i = 0; i < 151; ++i) {
         EXPECT_EQ(internal().check_quota(), -1);

@@ -87,11 +87,10 @@ protected:
     void pull_card() { m_root.set_prop("init.svc.fuse_sdcard0", "stopped"); }
     MediaStorage& internal() { return *m_mgr.get_media(MT_INTERNAL); }
     MediaStorage& external() { return *m_mgr.get_media(MT_EXTERNAL); }
-
-    // Makes a file of a size that takes no space.
-    void put(const std::string& rel, uint64_t size) {
-        m_root.write_file(rel, "");
-        EXPECT_EQ(truncate(m_root.path(rel).c_str(), static_cast<off_t>(size)), 0);
+    // Looks at what lies on the internal medium as a start does.
+    void rescan() {
+        internal().clear();
+        EXPECT_EQ(internal().stat(), 0);
     }
 
     // The store writes in the next second.

@@ -13,8 +13,9 @@ inline std::string raw_frame(const std::string& body) {
     return {wire.begin(), wire.end()};
 }
 
-inline std::string frame(int type, int sub_type, const std::string& payload = "") {
-    const DiagFrame sent = {0, static_cast<uint8_t>(type), static_cast<uint8_t>(sub_type),
+inline std::string frame(int type, int sub_type, const std::string& payload = "",
+                         uint32_t seq = 0) {
+    const DiagFrame sent = {seq, static_cast<uint8_t>(type), static_cast<uint8_t>(sub_type),
                             std::vector<uint8_t>(payload.begin(), payload.end())};
     const std::vector<uint8_t> wire = sent.encode();
     return {wire.begin(), wire.end()};

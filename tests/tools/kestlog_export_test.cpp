@@ -11,12 +11,7 @@ namespace {
 const std::string OLD_MODEM_LOG = MODEM + "1-cp_wcdma-2016-03-01_09-00-00.log";
 
 std::string numbered(uint32_t seq, int type, int sub_type, const std::string& payload) {
-    const DiagFrame sent = {seq,
-                            static_cast<uint8_t>(type),
-                            static_cast<uint8_t>(sub_type),
-                            {payload.begin(), payload.end()}};
-    const std::vector<uint8_t> wire = sent.encode();
-    return {wire.begin(), wire.end()};
+    return ::frame(type, sub_type, payload, seq);
 }
 
 // A capture of the older form, with packets that kestlog does not write.
