@@ -52,6 +52,10 @@ protected:
         m_err = m_root.read_file("err");
         return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
     }
+    // A command of the shell in the root; its status.
+    int sh(const std::string& command) const {
+        return system(("cd " + m_root.root() + "; " + command).c_str());
+    }
     bool said(const std::string& part) const { return m_out.find(part) != std::string::npos; }
 
     void write(const std::string& rel, const std::string& content) {

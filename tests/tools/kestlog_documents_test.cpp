@@ -249,7 +249,7 @@ TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
         "handset/data && cp -a modem_log data && cp -a card media && tar czf card.tar.gz card && "
         "find modem_log -name '*.log' -exec cp {} . ';' && ln -s '" KEST_SOURCE_DIR
         "/share/kestmodem' usr/share";
-    ASSERT_EQ(system(("cd " + m_root.root() + " && " + before).c_str()), 0);
+    ASSERT_EQ(sh(before), 0);
     const std::string tools = std::string(KESTLOG).substr(0, std::string(KESTLOG).rfind('/'));
     write("around", "TOOLS='" + tools + "' DIR=data/" + WCN + "\n" + AROUND);
     bool section = false, example = false;
@@ -268,9 +268,7 @@ TEST_F(KestlogDocuments, TheExamplesOfTheManualPageRun) {
             write("example", std::regex_replace(line, std::regex("(^|[ =:])/(?!dev/)"),
                                                 "$1" + m_root.root() + "/") +
                                  "\n");
-            EXPECT_EQ(system(("cd " + m_root.root() + " && bash around >o 2>&1").c_str()), 0)
-                << line << "\n"
-                << m_root.read_file("o");
+            EXPECT_EQ(sh("bash around >o 2>&1"), 0) << line << "\n" << m_root.read_file("o");
         }
     }
     EXPECT_GE(examples, 8);

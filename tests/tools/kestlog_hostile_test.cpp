@@ -72,7 +72,7 @@ protected:
                       symlink("/etc", path("modem_log/2016-04-02-00-00-00")),
                   0);
         write("pack.py", PACK);
-        ASSERT_EQ(system(("cd " + m_root.root() + " && python3 pack.py 2>/dev/null").c_str()), 0);
+        ASSERT_EQ(sh("python3 pack.py 2>/dev/null"), 0);
         for (const std::string& file : {logs + "6.log", logs + "7.log", BAD + "cp_3mode/x"}) {
             write(file, "x");
         }

@@ -200,8 +200,7 @@ TEST_F(ReportTest, SamplesArePicturesWhereRateAndFormatAreGiven) {
     const Json spectrum =
         only(json["spectra"], {{"samples", 4096}, {"columns", 16}, {"bins", 256}});
     write("levels", spectrum["levels"]);
-    ASSERT_EQ(system(("base64 -d " + m_root.path("levels") + " >" + m_root.path("out")).c_str()),
-              0);
+    ASSERT_EQ(sh("base64 -d levels >out"), 0);
     const std::string levels = m_root.read_file("out");
     ASSERT_EQ(levels.size(), 16 * 256u);
     EXPECT_EQ(levels.substr(0, 256), levels.substr(15 * 256));
@@ -380,9 +379,7 @@ TEST_F(ReportTest, ABundleHoldsOneCrashAndIsReadAsATree) {
               std::string::npos)
         << m_err;
     m_root.make_dir("unpacked");
-    ASSERT_EQ(
-        system(("tar xf " + m_root.path("crash.tar") + " -C " + m_root.path("unpacked")).c_str()),
-        0);
+    ASSERT_EQ(sh("tar xf crash.tar -C unpacked"), 0);
     const std::string modem = "data/modem_log/2016-03-01-08-00-00/cp_wcdma/";
     const std::vector<std::string> FILES = {
         modem + log_at(2, "09-05-00"),

@@ -170,10 +170,7 @@ TEST_F(KestlogStreamsTest, JoinTellsWhatIsMissingDoubledOrCut) {
         for (const char* words : {"started", "two log"}) {
             EXPECT_EQ(complained(words), c.words.find(words) != std::string::npos) << m_err;
         }
-        ASSERT_EQ(
-            system(
-                ("cd " + m_root.root() + " && rm -r data/* storage copy 2>/dev/null; :").c_str()),
-            0);
+        ASSERT_EQ(sh("rm -r data/* storage copy 2>/dev/null; :"), 0);
     }
     // What is said of it never gets into the stream.
     write_log(INTERNAL, "agdsp", 0, "09-00-00", "abc");
@@ -252,7 +249,7 @@ TEST_F(KestlogStreamsTest, AFrameGoesOnWhereItsLogDoes) {
         EXPECT_EQ(run("extract --json --type 0x9d -o all/to" + roots), 0) << m_err;
         EXPECT_EQ(sum("frames"), c.frames);
         EXPECT_EQ(sum("other_bytes"), c.other);
-        ASSERT_EQ(system(("rm -r " + m_root.path("all")).c_str()), 0);
+        ASSERT_EQ(sh("rm -r all"), 0);
     }
 }
 

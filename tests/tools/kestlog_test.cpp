@@ -93,7 +93,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         "python3 -m zipfile -c a.zip modem_log",
         "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " ."};
     for (const std::string& packer : packers) {
-        ASSERT_EQ(system(("cd " + m_root.root() + " && " + packer).c_str()), 0) << packer;
+        ASSERT_EQ(sh(packer), 0) << packer;
     }
     setenv("TMPDIR", m_root.path("temp").c_str(), 1);
     for (const char* args : {"a.tar", "a.tbz2", "a.tgz", "a.zip", "- <a.tgz"}) {
@@ -105,10 +105,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         << m_out;
 
     // An entry that is there twice is left out the second time, and what is cut off is told.
-    ASSERT_EQ(system(("cd " + m_root.root() + " && tar rf a.tar " + WCN_LOG +
-                      " && head -c -1000 a.tgz >short.tgz")
-                         .c_str()),
-              0);
+    ASSERT_EQ(sh("tar rf a.tar " + WCN_LOG + " && head -c -1000 a.tgz >short.tgz"), 0);
     EXPECT_EQ(run("verify a.tar"), 2);
     EXPECT_NE(m_err.find(WCN_LOG + ": left out: another entry has this name\n"), std::string::npos);
     EXPECT_TRUE(said("18 files checked, 0 damages")) << m_out;
@@ -129,7 +126,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     }
     EXPECT_EQ(run("ls --unpack-limit 1 a.tgz"), 0) << m_err;
     write(WCN + "big", std::string(1100000, 'x'));
-    ASSERT_EQ(system(("cd " + m_root.root() + " && tar cf big.tar modem_log").c_str()), 0);
+    ASSERT_EQ(sh("tar cf big.tar modem_log"), 0);
     EXPECT_EQ(run("ls --unpack-limit 1 big.tar"), 2);
     EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos) << m_err;
     EXPECT_TRUE(m_root.list("temp").empty());
@@ -142,7 +139,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
             "' ls - <>pipe & "
             "timeout 60 sh -c 'until ls temp | grep -q kestlog; do :; done'; kill -" +
             signal + " $!";
-        EXPECT_EQ(system(("cd " + m_root.root() + "; " + script).c_str()), 0);
+        EXPECT_EQ(sh(script), 0);
         EXPECT_TRUE(wait_until([&] { return m_root.list("temp").empty(); })) << signal;
     }
     unsetenv("TMPDIR");
@@ -269,9 +266,8 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_EQ(run("--json frames " + DSP_LOG), 0);
     EXPECT_TRUE(said("\"len\":8,\"payload\":0,\"intact\":true,\"kind\":\"pcm\"}\n")) << m_out;
     // Who reads the output may stop: no word, and the end that the signal means.
-    EXPECT_EQ(system(("cd " + m_root.root() + "; (trap '' PIPE; '" KESTLOG "' frames --hex " +
-                      WCN_LOG + " 2>err; echo $? >status) | head -1 >out")
-                         .c_str()),
+    EXPECT_EQ(sh("(trap '' PIPE; '" KESTLOG "' frames --hex " + WCN_LOG +
+                 " 2>err; echo $? >status) | head -1 >out"),
               0);
     EXPECT_EQ(m_root.read_file("status"), std::to_string(128 + SIGPIPE) + "\n");
     EXPECT_EQ(m_root.read_file("err"), "");
@@ -326,10 +322,8 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
     EXPECT_TRUE(said(WCN_LOG + ":\n"));
     EXPECT_TRUE(said("  no header                          2 bytes  wrong length\n")) << m_out;
     EXPECT_TRUE(said("\n    000000  7e 74 77 6f                                      ~two\n"));
-    ASSERT_EQ(system(("cat " + m_root.path(DSP_LOG) + " | (cd " + m_root.root() +
-                      "; '" KESTLOG "' info - >o; cat " + DSP_LOG +
-                      " | '" KESTLOG "' split -) >/dev/null")
-                         .c_str()),
+    ASSERT_EQ(sh("cat " + DSP_LOG + " | ('" KESTLOG "' info - >o; cat " + DSP_LOG +
+                 " | '" KESTLOG "' split -) >/dev/null"),
               0);
     EXPECT_NE(m_root.read_file("o").find("size            1067\n"), std::string::npos);
     EXPECT_EQ(m_root.read_file("stdin.dump.bin"), LOG_DATA);
