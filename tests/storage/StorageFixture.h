@@ -30,15 +30,6 @@ inline Names file_names(const CpDirectory& dir) {
     return names;
 }
 
-// The last components of the sets' paths.
-inline Names set_names(const MediaStorage& media) {
-    Names names;
-    for (const CpSetDirectory* set : media.sets()) {
-        names.push_back(strrchr(set->path().string(), '/') + 1);
-    }
-    return names;
-}
-
 inline mode_t mode_of(const std::string& path) {
     struct stat st;
     return ::lstat(path.c_str(), &st) == 0 ? st.st_mode & 07777u : 0;
