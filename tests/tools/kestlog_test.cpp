@@ -124,6 +124,19 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
                     m_err.find(".log: damaged: ZIP bad CRC") != std::string::npos)
             << args << m_err;
     }
+    // What came before a fault of the disk counts. The end of a pseudo-terminal is such a fault.
+    write("fails.py",
+          "import os, pty, subprocess, sys, tty\n"
+          "master, slave = pty.openpty()\n"
+          "tty.setraw(slave)\n"
+          "os.write(slave, subprocess.check_output(['tar', 'cz', '" +
+              WCN +
+              "']))\n"
+              "os.close(slave)\n"
+              "sys.exit(subprocess.call(['" KESTLOG "', 'verify', '-'], stdin=master))\n");
+    EXPECT_EQ(run("fails.py", "python3"), 2);
+    EXPECT_TRUE(said("2 files checked, 0 damages, 0 notes\n")) << m_out << m_err;
+    EXPECT_EQ(m_err, "kestlog: -: Input/output error\n");
     EXPECT_EQ(run("ls --unpack-limit 1 a.tgz"), 0) << m_err;
     write(WCN + "big", std::string(1100000, 'x'));
     ASSERT_EQ(sh("tar cf big.tar modem_log"), 0);

@@ -55,6 +55,9 @@ bool GzipInput::fill() {
     for (ssize_t n = 1; n != 0 && len < PIECE;) {
         n = ::read(m_fd, m_in.data() + len, PIECE - len);
         if (n < 0 && errno != EINTR) {
+            if (len > 0) {
+                break;  // what came before the fault counts; the next reading meets it again
+            }
             m_error = strerror(errno);
             return false;
         }
