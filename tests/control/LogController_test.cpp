@@ -2,12 +2,36 @@
 
 #include "control/LogController.h"
 
+#include "channels/AgDspLogHandler.h"
+#include "channels/ExtWcnLogHandler.h"
+#include "channels/GnssCpLogHandler.h"
+#include "channels/WanModemLogHandler.h"
 #include "storage/CpStorage.h"
 #include "support/ServiceFixture.h"
 
 namespace {
 
-typedef ChannelFixture LogControllerTest;
+class LogControllerTest : public ChannelFixture {};
+
+TEST_F(LogControllerTest, MakesTheChannelOfEachType) {
+    ASSERT_EQ(boot("stream agdsp off 5 3\nstream cp_gnss on 5 3\nstream cp_wcdma on 5 3\n"
+                   "stream cp_wcn off 5 3\n"),
+              0);
+    ASSERT_EQ(ctrl->log_pipes().size(), 4u);
+    EXPECT_TRUE(dynamic_cast<AgDspLogHandler*>(ctrl->get_cp(CT_AGDSP)));
+    EXPECT_TRUE(dynamic_cast<GnssCpLogHandler*>(ctrl->get_cp(CT_GNSS)));
+    EXPECT_TRUE(dynamic_cast<WanModemLogHandler*>(ctrl->get_cp(CT_WCDMA)));
+    EXPECT_TRUE(dynamic_cast<ExtWcnLogHandler*>(ctrl->get_cp(CT_WCN)));
+    EXPECT_TRUE(ctrl->get_cp(CT_WCDMA)->enabled());
+    EXPECT_FALSE(ctrl->get_cp(CT_WCN)->enabled());
+    EXPECT_EQ(ctrl->get_cp(CT_TD), nullptr);
+    const std::string where =
+        "LogPipeHandler* LogController::create_handler(const LogConfig::ConfigEntry*): ";
+    EXPECT_TRUE(log.has(where + "CP cp_wcdma dev " + root.path("log_w") + " " +
+                        root.path("diag_w") + "\n"));
+    EXPECT_TRUE(log.has(where + "CP cp_gnss dev " + root.path("gnss") + "\n"));
+    EXPECT_EQ(log.count(where), 2u) << "nothing else";
+}
 
 TEST_F(LogControllerTest, ChannelWithoutDevicesWaitsToBeStarted) {
     const Fifo fifo(root.path("td"));
