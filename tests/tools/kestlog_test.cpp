@@ -100,6 +100,8 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         EXPECT_EQ(run(std::string("verify ") + args), 0) << args << m_err << m_out;
         EXPECT_TRUE(said("18 files checked, 0 damages, 0 notes\n")) << args;
     }
+    EXPECT_EQ(run("frames a.tgz"), 2) << m_out;
+    EXPECT_NE(m_err.find("kestlog: a.tgz: It is an archive; ls, "), std::string::npos) << m_err;
     EXPECT_EQ(run("ls --json a.cp.tar"), 0) << m_err;
     EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,\"size\":501000,"))
         << m_out;

@@ -80,6 +80,15 @@ public:
     Unpacker(const Unpacker&) = delete;
     Unpacker& operator=(const Unpacker&) = delete;
 
+    bool begins() {
+        struct archive_entry* entry;
+        if (!open_archive()) {
+            return false;
+        }
+        const int got = archive_read_next_header(m_in, &entry);
+        return got != ARCHIVE_EOF && got != ARCHIVE_FATAL;
+    }
+
     Unpacked run() {
         struct archive_entry* entry;
         if (!open_archive()) {
@@ -280,6 +289,13 @@ private:
 };
 
 }  // namespace
+
+bool is_archive(const std::string& path) {
+    struct stat st;
+    const bool exact = FileName(path.substr(path.rfind('/') + 1)).exact;
+    return !exact && stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) &&
+           Unpacker(path, "", 1).begins();
+}
 
 Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit) {
     const Progress progress(path == "-" ? 0 : total_size({path}));

@@ -20,6 +20,10 @@ struct Unpacked {
     static constexpr size_t MAX_STRAYS = 1000;
 };
 
+// Whether it is such a file, by its beginning. A file of the service is none, and what is no file
+// could wait for ever.
+bool is_archive(const std::string& path);
+
 // Unpacks the file at path, or standard input for "-", into an existing empty directory. limit:
 // the most bytes of all files, or 0 for what is free there less a tenth.
 Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit);

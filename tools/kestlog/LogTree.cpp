@@ -204,11 +204,7 @@ void LogTree::add_file(const std::string& path) {
 }
 
 bool LogTree::add_archive(const std::string& path) {
-    struct stat st;
-    const std::string name = path.substr(path.rfind('/') + 1);
-    // A file of the service is none, and what is no file could wait for ever.
-    if (path != "-" &&
-        (FileName(name).exact || stat(path.c_str(), &st) < 0 || !S_ISREG(st.st_mode))) {
+    if (path != "-" && !is_archive(path)) {
         return false;
     }
     if (!m_unpacked) {

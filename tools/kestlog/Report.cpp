@@ -11,6 +11,7 @@
 #include <nlohmann/json.hpp>
 
 #include "common/text.h"
+#include "kestlog/Archive.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Progress.h"
 
@@ -58,12 +59,14 @@ int failure(int status, const std::string& words) {
 }
 
 int open_input(LogReader& in, const std::string& path) {
+    const std::string hint = "; ls, verify, report, extract and export read it";
+    if (path != "-" && is_archive(path)) {
+        return failure(ES_UNREADABLE, path + ": It is an archive" + hint);
+    }
     if (in.open(path, true)) {
         return ES_OK;
     }
-    const char* const hint =
-        errno == EISDIR ? "; ls, verify, report, extract and export read it" : "";
-    return failure(ES_UNREADABLE, path + ": " + strerror(errno) + hint);
+    return failure(ES_UNREADABLE, path + ": " + strerror(errno) + (errno == EISDIR ? hint : ""));
 }
 
 int for_each_file(const CommandLine& line,
