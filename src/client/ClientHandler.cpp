@@ -40,6 +40,8 @@ void ClientHandler::process(int events) {
         // It hung up: others may have its place. What it has sent waits for the end of the
         // transaction all the same, which a request might end.
         del_events(GONE_EVENTS);
+        m_gone = m_gone || (events & GONE_EVENTS);
+        m_manager->resume_listening();
         return;
     }
     BufferedFdHandler::process(events);

@@ -43,6 +43,9 @@ public:
     // Handles one request, given without its terminator. Never destroys the object.
     void process_req(const uint8_t* req, size_t len);
 
+    // It has hung up, and is there until its transaction has ended and what it sent is carried out.
+    bool gone() const { return m_gone; }
+
     // Sends the line on the CP's dump if the client has subscribed to the CP. 0, or -1
     // when the line could not be written whole.
     int notify_cp_dump(CpType type, CpDumpEvent event);
@@ -122,6 +125,7 @@ private:
     ClientTransType m_trans_type = CTT_NONE;
     ClientTransState m_trans_state = CTS_IDLE;
     ObjectRef<LogPipeHandler> m_trans_channel;
+    bool m_gone = false;
     bool m_dump_subscribed[CP_TYPE_NUM] = {};
 };
 

@@ -16,6 +16,7 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <memory>
 
 #include "client/ClientHandler.h"
@@ -115,6 +116,12 @@ void ClientManager::process(int /*events*/) {
     }
 }
 
+bool ClientManager::full() const {
+    const auto gone = std::count_if(m_clients.begin(), m_clients.end(),
+                                    [](const ClientHandler* client) { return client->gone(); });
+    return m_max_clients && m_clients.size() - static_cast<size_t>(gone) >= m_max_clients;
+}
+
 void ClientManager::process_client_disconn(ClientHandler* client) {
     for (auto it = m_clients.begin(); it != m_clients.end(); ++it) {
         if (*it == client) {
@@ -125,9 +132,7 @@ void ClientManager::process_client_disconn(ClientHandler* client) {
     delete client;
     info_log("client disconnected, remaining %u clients",
              static_cast<unsigned int>(m_clients.size()));
-    if (m_max_clients && !full()) {
-        resume_listening();
-    }
+    resume_listening();
 }
 
 void ClientManager::notify_cp_dump(CpType type, CpDumpEvent event) {
@@ -137,5 +142,7 @@ void ClientManager::notify_cp_dump(CpType type, CpDumpEvent event) {
 }
 
 void ClientManager::resume_listening() {
-    poll_when_room(POLLIN, "server socket");
+    if (!full()) {
+        poll_when_room(POLLIN, "server socket");
+    }
 }

@@ -32,6 +32,8 @@ public:
     // without a reply.
     void process(int events) override;
 
+    // Accepts again if there is a place for another client; one that is gone() has none.
+    void resume_listening();
     // Destroys the handler of a connection that has ended; its code must return at once.
     void process_client_disconn(ClientHandler* client);
 
@@ -41,8 +43,7 @@ public:
     size_t client_num() const { return m_clients.size(); }
 
 private:
-    bool full() const { return m_max_clients && m_clients.size() >= m_max_clients; }
-    void resume_listening();
+    bool full() const;
     static bool may_connect(int fd);
 
     const size_t m_max_clients;
