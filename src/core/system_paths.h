@@ -17,6 +17,8 @@
 #define PATH_DATA_PARTITION "/data"
 #define DIR_KEST "/kest"
 #define DIR_MODEM_LOG "/modem_log"
+// In a log root, for a moment: whether files can be made there.
+#define NAME_WRITE_TEST ".write_test"
 
 // Kernel memory and mini dump files of the modems.
 #define PATH_CPW_MEM "/proc/cpw/mem"

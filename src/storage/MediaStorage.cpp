@@ -202,7 +202,7 @@ bool MediaStorage::can_make_files() {
     if (prepare_top_dir() < 0 || make_log_dir(m_log_root, m_root_links) < 0) {
         return false;
     }
-    const JoinedPath probe(m_log_root, android::String8(".write_test"));
+    const JoinedPath probe(m_log_root, android::String8(NAME_WRITE_TEST));
     if (remove(probe.string()) < 0 && errno == ENOTEMPTY && !m_probe_cleared) {
         m_probe_cleared = true;  // a shell with every block would cost too much
         remove_tree(android::String8(probe.string()));

@@ -242,6 +242,7 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         unlink(m_root.path(WCN + name).c_str());
     }
     m_root.write_file(MODEM_DUMP, frame("in progress"));  // just now
+    write("modem_log/.write_test", "");
     ASSERT_EQ(symlink("/dev/zero", m_root.path(WCN + "smsg_" + STAMP + ".log").c_str()), 0);
     EXPECT_EQ(run("verify ."), 3);
     for (const char* line : {".log: damage: does not belong here\n",
