@@ -59,7 +59,7 @@ int failure(int status, const std::string& words) {
 }
 
 int open_input(LogReader& in, const std::string& path) {
-    const std::string hint = "; ls, verify, report, extract and export read it";
+    const std::string hint = "; ls, verify, report, join, extract, export and bundle read it";
     if (path != "-" && is_archive(path)) {
         return failure(ES_UNREADABLE, path + ": It is an archive" + hint);
     }

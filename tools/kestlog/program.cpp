@@ -100,7 +100,7 @@ constexpr Option OPTIONS[] = {
 constexpr char NOTES[] =
     "ROOT is a handset's root, a medium's top directory, its modem_log, a set or a CP's\n"
     "directory, or a tar or zip of one of them (- for standard input).\n"
-    "FILE may be - for standard input.\n"
+    "FILE may be - for standard input, but not for sigmf.\n"
     "T is a local time of the handset, \"2016-03-01 09:15:00\", \"2016-03-01\" or \"09:15\", or\n"
     "what lies before the newest time in the ROOTs: \"-10m\", \"-2h\".\n"
     "\nExit status:\n"
