@@ -420,9 +420,11 @@ TEST_F(KestlogTest, TheServicesOwnTreeIsFineAndListed) {
 }
 
 TEST_F(KestlogTest, WrongUsageAndCompletion) {
-    for (const char* args : {"", "fly", "ls", "frames --type x a", "frames --limit -1 a", "ls ''",
-                             "--fly ls x", "ls --force x", "info --output d x"}) {
+    for (const char* args :
+         {"", "fly", "ls", "frames --type x a", "frames --limit -1 a", "ls ''", "--fly ls x",
+          "ls --force x", "info --output d x", "info '--\x1b[31m'"}) {
         EXPECT_EQ(run(args), 1) << args;
+        EXPECT_EQ(m_err.find('\x1b'), std::string::npos);
         EXPECT_NE(m_err.find("usage: kestlog "), std::string::npos) << m_err;
     }
     EXPECT_EQ(run("vrify ."), 1);

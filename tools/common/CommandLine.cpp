@@ -76,6 +76,22 @@ size_t distance(const std::string& a, const std::string& b) {
     return row[b.size()];
 }
 
+// Has getopt_long print what is wrong with the options, which may be names of files from anywhere.
+void print_fault(int argc, char** argv, const std::string& letters, const struct option* known) {
+    std::vector<std::string> shown(argv, argv + argc);
+    std::vector<char*> args;
+    for (std::string& arg : shown) {
+        arg = escape_text(arg);
+        args.push_back(arg.data());
+    }
+    args.push_back(nullptr);
+    optind = 0;
+    opterr = 1;
+    for (int opt = 0; opt != -1 && opt != '?';) {
+        opt = getopt_long(argc, args.data(), letters.c_str(), known, nullptr);
+    }
+}
+
 }  // namespace
 
 bool CommandLine::parse(int argc, char** argv) {
@@ -129,9 +145,11 @@ bool CommandLine::read_options(int argc, char** argv) {
     known.push_back({nullptr, 0, nullptr, 0});
     int index = 0;
     optind = 0;  // from the start, whatever was read before
+    opterr = 0;
     for (int opt; (opt = getopt_long(argc, argv, letters.c_str(), known.data(), &index)) != -1;) {
         if (opt == '?') {
-            return end(usage_error(""));  // getopt_long has printed why
+            print_fault(argc, argv, letters, known.data());
+            return end(usage_error(""));
         }
         const auto found = opt == 0
                                ? options.begin() + index
