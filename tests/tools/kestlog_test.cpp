@@ -79,6 +79,12 @@ TEST_F(KestlogTest, SeveralRootsAreOneTreeThatTimesCut) {
     }
     EXPECT_EQ(run("verify handset handset/data/" + MODEM + " nowhere"), 2);
     EXPECT_TRUE(said("4 files"));
+    EXPECT_EQ(run("ls " + ("usb/kest/" + WCN + " ") + "usb/kest/" + WCN), 0);
+    EXPECT_EQ(occurrences(m_out, "files"), 2u) << m_out;
+    // A link of a card may lead anywhere.
+    ASSERT_EQ(sh("mkdir linked; ln -s ../usb/kest linked"), 0);
+    EXPECT_EQ(run("verify linked"), 3);
+    EXPECT_TRUE(said("linked/kest/modem_log: damage: does not belong here\n0 files")) << m_out;
     EXPECT_EQ(run("ls --since noon handset"), 1);
     EXPECT_EQ(run("ls --until 2015-02-29 handset"), 1);
 }

@@ -23,6 +23,11 @@ bool is_dir(const std::string& path) {
     return stat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
 }
 
+bool is_link(const std::string& path) {
+    struct stat st;
+    return lstat(path.c_str(), &st) == 0 && S_ISLNK(st.st_mode);
+}
+
 std::string base_name(const std::string& path) {
     char* real = realpath(path.c_str(), nullptr);
     const std::string full = real ? real : path;
@@ -255,18 +260,27 @@ bool LogTree::add_media(const std::string& path) {
     const std::string name = m_medium;
     const std::string handset = m_roots++ ? name + " " : "";
     const bool medium = add_medium(path, name);
-    const bool internal = add_medium(path + PATH_DATA_PARTITION, handset + MEDIUM_INTERNAL);
+    const bool internal =
+        add_medium(path + PATH_DATA_PARTITION, handset + MEDIUM_INTERNAL, Links::FOLLOW);
     const bool card = !m_card_given && add_medium(path + CARD_IN_ROOT, handset + MEDIUM_CARD);
     return medium || internal || card;
 }
 
-bool LogTree::add_medium(const std::string& path, const std::string& name) {
+bool LogTree::add_medium(const std::string& path, const std::string& name, Links links) {
     bool found = false;
     for (const char* below : {DIR_MODEM_LOG, DIR_KEST DIR_MODEM_LOG}) {
-        if (is_dir(path + below)) {
-            m_medium = name;
+        if (!is_dir(path + below)) {
+            continue;
+        }
+        m_medium = name;
+        found = true;
+        // On a card a link may lead anywhere; in a handset's data partition it is the platform's.
+        const bool kest = below != std::string(DIR_MODEM_LOG);
+        if ((kest && is_link(path + DIR_KEST)) ||
+            ((kest || links == Links::REFUSE) && is_link(path + below))) {
+            strays.push_back(shown(path) + below);
+        } else {
             read_root(path + below);
-            found = true;
         }
     }
     return found;
@@ -308,6 +322,9 @@ bool LogTree::add_directory(const std::string& path) {
     } else {
         sets.push_back({"", &dir, {}, {}});
         read_cp(dir, name, &sets.back());
+        if (sets.back().cps.empty()) {  // it was read before
+            sets.pop_back();
+        }
     }
     return true;
 }

@@ -18,6 +18,7 @@
 #include <utility>
 #include <vector>
 
+#include "core/open_file.h"
 #include "kestlog/FileName.h"
 #include "kestlog/TempDir.h"
 
@@ -149,7 +150,7 @@ private:
     bool add_as(const std::string& medium, const std::string& given, Files files);
     bool add_archive(const std::string& path);
     bool add_media(const std::string& path);
-    bool add_medium(const std::string& path, const std::string& name);
+    bool add_medium(const std::string& path, const std::string& name, Links links = Links::REFUSE);
     bool add_directory(const std::string& path);
     void read_root(const std::string& path);
     void read_set(const TreeDir& dir, const std::string& name);
