@@ -61,6 +61,9 @@ TEST_F(KestlogStreamsTest, JoinGivesWhatWasFed) {
     EXPECT_EQ(m_out, "all: cp_wcdma, 14 files, 700000 bytes\n");
     EXPECT_EQ(m_root.read_file("all"), fed);
     EXPECT_EQ(run("join . -o data --force"), 4);
+    ASSERT_EQ(sh("python3 -c 'import socket; socket.socket(socket.AF_UNIX).bind(\"socket\")'"), 0);
+    EXPECT_EQ(run("join . -o socket --force"), 4);
+    EXPECT_NE(sh("ulimit -c 0; ulimit -f 8; '" KESTLOG "' join . -o cut"), 0);
     EXPECT_EQ(run("join . -o /dev/full"), 4);
     EXPECT_TRUE(m_root.find(".kestlog-").empty());
 

@@ -27,7 +27,7 @@ constexpr int TEMPORARY_NAMES = 100;
 
 bool written_as_it_is(const std::string& path) {
     struct stat st;
-    return stat(path.c_str(), &st) == 0 && (S_ISFIFO(st.st_mode) || S_ISCHR(st.st_mode));
+    return stat(path.c_str(), &st) == 0 && !S_ISREG(st.st_mode) && !S_ISDIR(st.st_mode);
 }
 
 bool exists(const std::string& path) {
@@ -75,7 +75,7 @@ void OutputFile::remove_all(int signal) {
 
 void OutputFile::watch_signals() {
     static bool watched = false;
-    for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGPIPE}) {
+    for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGPIPE, SIGQUIT, SIGXCPU, SIGXFSZ}) {
         struct sigaction action;
         if (!watched && sigaction(signal, nullptr, &action) == 0 && action.sa_handler == SIG_DFL) {
             action.sa_handler = remove_all;
