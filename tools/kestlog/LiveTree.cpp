@@ -141,6 +141,21 @@ void LiveTree::add(Dir& dir, const std::string& name, const File& file, bool tel
     }
 }
 
+// The log file that was counted up to make room for a new one. Those with number 0, which may be
+// very many on a card from anywhere, are not looked at.
+std::string LiveTree::counted_up(const Dir& dir) {
+    std::string before;
+    unsigned long lowest = ULONG_MAX;
+    for (auto it = dir.files.lower_bound("1"); it != dir.files.end(); ++it) {
+        const unsigned long number = strtoul(it->first.c_str(), nullptr, 10);
+        if (number > 0 && number < lowest && FileName(it->first).is_log()) {
+            lowest = number;
+            before = it->first;
+        }
+    }
+    return before;
+}
+
 void LiveTree::tell_new(Dir& dir, const FileName& name) {
     const std::string shown = escape_text(name.text());
     if (name.type == LT_DUMP) {
@@ -150,19 +165,7 @@ void LiveTree::tell_new(Dir& dir, const FileName& name) {
     if (name.is_crash() || !name.exact) {
         return;  // told when it is complete
     }
-    // The one that was counted up to make room for it.
-    std::string before;
-    unsigned long lowest = ULONG_MAX;
-    for (const auto& [other, file] : dir.files) {
-        if (!name.is_log() || name.number != 0) {
-            break;
-        }
-        const unsigned long number = strtoul(other.c_str(), nullptr, 10);
-        if (number > 0 && number < lowest && FileName(other).is_log()) {
-            lowest = number;
-            before = other;
-        }
-    }
+    const std::string before = name.is_log() && name.number == 0 ? counted_up(dir) : std::string();
     if (before.empty()) {
         tell("file", dir, name, std::string("new ") + name.kind() + ": " + shown, Json::object());
         return;

@@ -92,6 +92,7 @@ private:
     void tell_set(const TreeSet& set);
     void take_files(Dir& dir, const std::vector<const TreeFile*>& files, bool tell);
     void add(Dir& dir, const std::string& name, const File& file, bool tell);
+    static std::string counted_up(const Dir& dir);
     void tell_new(Dir& dir, const FileName& name);
     void tell_deleted(Dir& dir);
     void tell_dumps();
