@@ -71,7 +71,7 @@ void Follower::watch_root(const std::string& root, const std::vector<const char*
         return;
     }
     m_log_roots.insert(root);
-    watch(root, DirWatches::PLACE);
+    watch(root, DirWatches::LOGS);  // it may be a log root that has no set yet
     for (const std::string medium : media) {
         for (const std::string logs : {DIR_MODEM_LOG, DIR_KEST DIR_MODEM_LOG}) {
             const std::string way = medium + logs + "/";
