@@ -256,9 +256,17 @@ TEST_F(KestlogFollowTreeTest, ADumpInTheLogOfAnAudioDspIsTold) {
     next << end.substr(21) << std::flush;
     EXPECT_TRUE(follow.says(
         event("crash", "0-agdsp-2016-03-01_09-16-00.*\"size\":65499,\"state\":\"complete\"")));
+    // One ends in a gap, one follows what is no chunk and goes on in the next set.
+    next << chunk(5, DUMP, full) << chunk(7, LOG, "") << "no chunk, and longer than its header"
+         << chunk(8, DUMP, full) << std::flush;
+    EXPECT_TRUE(follow.says(event("crash", "\"begins\"")));
+    EXPECT_TRUE(follow.says(event("crash", "\"begins\"")));
+    m_root.write_file("modem_log/2016-03-01-09-17-00/agdsp/0-agdsp-2016-03-01_09-17-00.log",
+                      chunk(9, DUMP, "end"));
+    EXPECT_TRUE(follow.says(event("crash", "09-17-00.*\"size\":32751,\"state\":\"complete\"")));
     follow.send(SIGINT);
     EXPECT_EQ(follow.finish(), 0);
-    EXPECT_EQ(occurrences(follow.text(), "\"crash\""), 2u) << follow.text();
+    EXPECT_EQ(occurrences(follow.text(), "\"crash\""), 5u) << follow.text();
 }
 
 // By the time it looks, the service has counted up further.

@@ -281,7 +281,7 @@ private:
             memcpy(&header, data, sizeof(header));
             if (const char* fault = chunk_fault(header, &len)) {
                 m_report.add(true, "chunk", std::string("wrong chunk header: ") + fault, here());
-                find_chunk();
+                m_report.other += skip_to_chunk(m_in);
                 continue;
             }
             data = m_in.peek(sizeof(header) + len, got);
@@ -318,31 +318,6 @@ private:
         m_report.add(!newest, "cut",
                      newest ? "the last chunk is unfinished" : "the last chunk is cut off", here());
         m_report.other += left;
-    }
-
-    // Skips to the next valid header, or to the end.
-    void find_chunk() {
-        DspChunkHeader header;
-        size_t len;
-        uint8_t flags[sizeof(header.flags)];
-        memset(flags, DSP_CHUNK_FLAG, sizeof(flags));
-        for (size_t pass = 1;;) {
-            m_in.skip(pass);
-            m_report.other += pass;
-            size_t got;
-            const uint8_t* data = m_in.peek(sizeof(header), got);
-            if (got < sizeof(header)) {
-                m_report.other += got;
-                m_in.skip(got);
-                return;
-            }
-            memcpy(&header, data, sizeof(header));
-            if (!chunk_fault(header, &len)) {
-                return;
-            }
-            const uint8_t* next = find_bytes(data + 1, got - 1, flags, sizeof(flags));
-            pass = next ? static_cast<size_t>(next - data) : got - (sizeof(flags) - 1);
-        }
     }
 
     LogReader& m_in;
@@ -386,6 +361,29 @@ bool is_chunked(LogReader& in, const FileName& name) {
     }
     memcpy(&header, data, sizeof(header));
     return !chunk_fault(header, &len);
+}
+
+uint64_t skip_to_chunk(LogReader& in) {
+    DspChunkHeader header;
+    size_t len;
+    uint8_t flags[sizeof(header.flags)];
+    memset(flags, DSP_CHUNK_FLAG, sizeof(flags));
+    const uint64_t from = in.offset();
+    for (size_t pass = 1;;) {
+        in.skip(pass);
+        size_t got;
+        const uint8_t* data = in.peek(sizeof(header), got);
+        if (got < sizeof(header)) {
+            in.skip(got);
+            return in.offset() - from;
+        }
+        memcpy(&header, data, sizeof(header));
+        if (!chunk_fault(header, &len)) {
+            return in.offset() - from;
+        }
+        const uint8_t* next = find_bytes(data + 1, got - 1, flags, sizeof(flags));
+        pass = next ? static_cast<size_t>(next - data) : got - (sizeof(flags) - 1);
+    }
 }
 
 void scan_file(LogReader& in, const FileName& name, const PieceVisitor& visit, FramePayload payload,

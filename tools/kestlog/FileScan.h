@@ -75,6 +75,8 @@ size_t time_record_len(const uint8_t* data, size_t got, const FileName& name, bo
 // Whether the content is chunks: decided by the file's name or, if that says nothing, by the
 // first header.
 bool is_chunked(LogReader& in, const FileName& name);
+// From a chunk that is none to the next valid header, or to the end. The bytes in between.
+uint64_t skip_to_chunk(LogReader& in);
 
 // Called for every piece in order; returns false to end the scan. May be null.
 typedef std::function<bool(const Piece&)> PieceVisitor;

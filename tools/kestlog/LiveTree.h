@@ -40,7 +40,7 @@ public:
         uint64_t deleted = 0;               // files, not yet told
         uint64_t deleted_size = 0;
         std::string deleted_name;  // of the last of them
-        DumpWatch dumps;
+        size_t handset = 0;
     };
     // Of all files of a CP.
     struct Sum {
@@ -112,9 +112,10 @@ private:
     std::set<std::string> m_roots;
     std::map<std::string, bool> m_sets;  // by path, and whether it is there
     std::map<std::string, Dir> m_dirs;
-    std::set<Place> m_closed;   // to be checked
-    std::set<Place> m_written;  // to be looked at
-    std::set<Place> m_grown;    // to be looked into for dumps
+    std::map<size_t, DumpWatch> m_dumps;  // by handset
+    std::set<Place> m_closed;             // to be checked
+    std::set<Place> m_written;            // to be looked at
+    std::set<Place> m_grown;              // to be looked into for dumps
     std::map<std::string, Sum> m_sums;
 };
 

@@ -39,7 +39,9 @@ void LiveTree::settle() {
 void LiveTree::tell_dumps() {
     std::vector<Place> places(m_grown.begin(), m_grown.end());
     std::stable_sort(places.begin(), places.end(), [](const Place& a, const Place& b) {
-        return FileName(a.second).number > FileName(b.second).number;  // oldest first
+        return a.first->set != b.first->set  // oldest first
+                   ? a.first->set < b.first->set
+                   : FileName(a.second).number > FileName(b.second).number;
     });
     for (const Place& place : places) {
         if (read_dumps(*place.first, FileName(place.second), true)) {
@@ -59,7 +61,7 @@ bool LiveTree::read_dumps(Dir& dir, const FileName& name, bool tell) {
             tell_crash(dir, name, "memory dump", bytes, complete);
         }
     };
-    dir.dumps.read(in, &dir.files.at(name.text()).known, visit);
+    m_dumps[dir.handset].read(in, dir.path, &dir.files.at(name.text()).known, visit);
     return true;
 }
 

@@ -50,6 +50,7 @@ void LiveTree::take(LogTree& tree, const std::set<std::string>& roots) {
             dir.path = path;
             dir.medium = set.medium();
             dir.set = set.name;
+            dir.handset = set.handset;
             dir.cp = file_part(path);
             dir.present = true;
             take_files(dir, all, tell && (!is_new || newest[parent(set.shown())] == set.shown()));
