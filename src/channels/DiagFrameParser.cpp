@@ -26,7 +26,8 @@ void DiagFrameParser::append(const uint8_t* bytes, size_t len) {
     if (m_len + len <= MAX_FRAME) {
         memcpy(m_frame + m_len, bytes, len);
         m_len += static_cast<uint32_t>(len);
-    } else {
+    } else if (m_len <= MAX_FRAME) {
+        memcpy(m_frame + m_len, bytes, MAX_FRAME - m_len);
         m_len = MAX_FRAME + 1;
     }
 }
@@ -101,11 +102,11 @@ bool DiagFrameParser::unescape(const uint8_t* data, size_t len, uint8_t*& frame,
                     m_raw_size = m_body_raw + 2;
                     ++pos;
                     init();
-                    if (body_len > MAX_FRAME) {
+                    if (body_len > MAX_FRAME && m_overlong == Overlong::DROP) {
                         break;
                     }
                     frame = m_frame;
-                    frame_len = body_len;
+                    frame_len = std::min(body_len, MAX_FRAME);
                     consumed = pos;
                     return true;
                 }

@@ -23,7 +23,11 @@ public:
     static constexpr uint8_t FLAG = 0x7E;
     static constexpr uint8_t ESCAPE = 0x7D;
 
-    DiagFrameParser() { init(); }
+    // What becomes of a body of more than MAX_FRAME bytes. The service drops it whole; who looks
+    // for damage gets its first MAX_FRAME bytes, and with them the flag that ended it.
+    enum class Overlong { DROP, CUT };
+
+    explicit DiagFrameParser(Overlong overlong = Overlong::DROP) : m_overlong(overlong) { init(); }
 
     // Forgets a frame in progress.
     void init();
@@ -31,7 +35,7 @@ public:
     // Decodes from len bytes at data until a frame is complete or the input ends. True:
     // frame and frame_len give its body, valid until the next call. consumed tells how
     // many bytes were used. The state survives between calls, so that a frame may be
-    // split anywhere. A body of more than MAX_FRAME bytes is dropped whole.
+    // split anywhere. A body of more than MAX_FRAME bytes is dropped whole, or cut.
     bool unescape(const uint8_t* data, size_t len, uint8_t*& frame, size_t& frame_len,
                   size_t& consumed);
 
@@ -63,9 +67,10 @@ private:
     void append_escaped(uint8_t byte);
     size_t take_body(const uint8_t* data, size_t len);
 
+    const Overlong m_overlong;
     State m_state;
     uint8_t m_frame[MAX_FRAME];
-    uint32_t m_len;     // above MAX_FRAME: too long, to be dropped
+    uint32_t m_len;     // above MAX_FRAME: too long
     size_t m_body_raw;  // of the frame in progress, without its flags
     size_t m_raw_size = 0;
 };

@@ -199,6 +199,7 @@ TEST_F(KestlogTest, EveryDamageIsFoundAndNothingElse) {
         {MODEM_LOG, TIME_RECORD.substr(0, 15), "record", true, 0},
         {MODEM_DUMP, frame(LOG_DATA), "end", true, -1},
         {MODEM_DUMP, frame("x") + altered(frame("\x55"), 9, 0x7e) + DUMP_END, "frame", true, 11},
+        {MODEM_DUMP, frame("x") + "~" + std::string(70000, 'A') + DUMP_END, "frame", true, 11},
         {MODEM_DUMP, frame("x") + "between" + DUMP_END, "frame", false, -1},
         {DSP_LOG, altered(good, 2, 0), "chunk", true, 0},
         {DSP_LOG, altered(good, 4, 0x18), "chunk", true, 0},
@@ -270,10 +271,12 @@ TEST_F(KestlogTest, InfoAndFramesTellWhatTheFileHolds) {
     EXPECT_EQ(run("--json info " + DSP_LOG), 0) << m_err;
     EXPECT_TRUE(said("\"dump_bytes\":1000,\"sequence_gaps\":0,\"payload\":1007,")) << m_out;
 
-    // Frames are found between anything, across every window, and after a lost flag.
+    // Frames are found between anything, across every window, after a lost flag and what is too
+    // long for a frame.
     std::string text = "tail of a frame\x7e" + frame("first") + "~junk~" + pattern_bytes(900000, 2);
     const std::string big(65527, '~');  // the largest
-    text += "~" + frame(big, 3, 4) + frame("lost").substr(1) + frame("last");
+    text += "~" + std::string(70000, 'A') + frame(big, 3, 4);
+    text += frame("lost").substr(1) + frame("last");
     write(WCN_LOG, text);
     EXPECT_EQ(run("frames " + WCN_LOG + " | grep -v wrong"), 0);
     const size_t at = text.find(frame(big, 3, 4).substr(0, 20));

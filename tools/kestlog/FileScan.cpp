@@ -326,7 +326,8 @@ private:
     const FramePayload m_payload;
     FileReport& m_report;
     bool m_stop = false;
-    DiagFrameParser m_parser;
+    // What is too long for a frame is broken, too.
+    DiagFrameParser m_parser{DiagFrameParser::Overlong::CUT};
     FrameIndex m_index;
 };
 

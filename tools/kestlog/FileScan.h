@@ -29,8 +29,8 @@ struct Piece {
     size_t len_field;  // the length in the header
     uint8_t type;
     uint8_t sub_type;
-    const uint8_t* data;  // behind the header; of a frame null unless payload is wanted
-    size_t data_len;
+    const uint8_t* data;    // behind the header; of a frame null unless payload is wanted
+    size_t data_len;        // of what is too long for a frame only its beginning
     bool intact;            // that length is right
     const char* kind;       // of a chunk, else null
     bool headless = false;  // too short for a header: all of it is data
