@@ -371,7 +371,8 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
     std::string text, want[3];
     for (uint32_t seq = 0; seq < 60; ++seq) {
         const std::string data = pattern_bytes(seq * 500, seq) + "~~~~";
-        text += seq == 31 ? altered(chunk(seq, PCM, data), 9, 0) : chunk(seq, KINDS[seq % 3], data);
+        text +=
+            seq == 31 ? altered(chunk(seq, PCM, data), 9, 0) : chunk(seq * 2, KINDS[seq % 3], data);
         want[seq % 3] += seq == 31 ? "" : data;  // that one is lost
     }
     write(OLD_DSP_LOG, text);
@@ -380,7 +381,12 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
     EXPECT_EQ(m_root.read_file(stem + "log.bin"), want[0]);
     EXPECT_EQ(m_root.read_file(stem + "pcm.bin"), want[1]);
     EXPECT_EQ(m_root.read_file(stem + "dump.bin"), want[2]);
-    EXPECT_TRUE(said("1 sequence gaps, 15524 other bytes\n")) << m_out;
+    EXPECT_TRUE(said("58 sequence gaps, 15524 other bytes\n")) << m_out;
+    for (const char* args :
+         {"split -o s ", "extract --type 0 -o s ", "frames ", "export -o s/e "}) {
+        EXPECT_EQ(run(args + OLD_DSP_LOG), 3) << args;
+        EXPECT_NE(m_err.find("damage: wrong chunk header: "), std::string::npos) << args << m_err;
+    }
 
     // Nothing is replaced unasked; with --force a link is replaced, not followed.
     EXPECT_EQ(run("split --output=to " + OLD_DSP_LOG), 4);

@@ -334,12 +334,21 @@ private:
 }  // namespace
 
 void FileReport::add(bool damage, const char* code, const std::string& words, int64_t offset) {
+    const auto is_gap = [](const Finding& finding) {
+        return strcmp(finding.code, "sequence") == 0;
+    };
+    const Finding added = {damage, code, words, offset};
     damaged |= damage;
-    if (findings.size() < MAX_FINDINGS) {
-        findings.push_back({damage, code, words, offset});
-    } else {
+    if (findings.size() == MAX_FINDINGS) {
         ++more_findings;
+        // Any number of gaps must not hide damage, or what is damage once the file is closed.
+        const auto gap = std::find_if(findings.rbegin(), findings.rend(), is_gap);
+        if (is_gap(added) || gap == findings.rend()) {
+            return;
+        }
+        findings.erase(std::next(gap).base());
     }
+    findings.push_back(added);
 }
 
 size_t time_record_len(const uint8_t* data, size_t got, const FileName& name, bool* cut) {

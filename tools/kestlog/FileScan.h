@@ -60,7 +60,8 @@ struct FileReport {
         uint64_t bytes = 0;
     } chunks[CK_NUM];
     uint64_t sequence_gaps = 0;
-    std::vector<Finding> findings;  // the first MAX_FINDINGS
+    // The first MAX_FINDINGS, but gaps in the sequence give way to anything else.
+    std::vector<Finding> findings;
     uint64_t more_findings = 0;
     bool damaged = false;
 
