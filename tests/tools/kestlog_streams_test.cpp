@@ -336,6 +336,13 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     EXPECT_TRUE(m_out.find("part of a memory image, 32749 bytes of 2 chunks in 1 files; left out: "
                            "nothing; missing: 2 chunks\n") != std::string::npos)
         << m_out;
+
+    // FILEs may be links.
+    ASSERT_EQ(sh("mkdir links; ln -sr " + MODEM + "?-* links"), 0);
+    EXPECT_EQ(run("extract links/* -o linked"), 0) << m_err;
+    EXPECT_EQ(m_root.read_file("linked/1" + older + ".sleeplog.bin"), "sleep~");
+    EXPECT_EQ(run("export links/* -o linked/pcapng"), 0) << m_err;
+    EXPECT_TRUE(said(": 3 packets on 1 interfaces")) << m_out;
 }
 
 // As long as the numbers of the chunks follow each other, and those of another handset do not

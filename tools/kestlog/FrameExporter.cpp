@@ -114,8 +114,9 @@ void FrameExporter::end(const LogReader& in) {
         begin();
     }
     uint64_t left = in.size() - std::min(in.size(), m_end);
+    const Links links = m_source->set->given ? Links::FOLLOW : Links::REFUSE;
     if (left > 0 && m_source->next && !m_report->chunked &&
-        m_split.join(file, m_tail, in.size(), *m_source->next)) {
+        m_split.join(file, m_tail, in.size(), *m_source->next, links)) {
         const uint64_t skipped = m_split.begin() - std::min(m_split.begin(), m_end);
         if (skipped > 0) {
             remark_next(outside(skipped, "before this packet"));

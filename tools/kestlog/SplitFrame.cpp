@@ -8,8 +8,6 @@
 
 #include <algorithm>
 
-#include "core/open_file.h"
-
 namespace {
 
 // The longest frame in a file.
@@ -18,9 +16,9 @@ constexpr size_t MAX_RAW = 2 * DiagFrameParser::MAX_FRAME + 2;
 constexpr size_t FIRST_LOOK = 4096;
 
 // Bytes of a file, again; fewer when it has become shorter or cannot be read.
-std::string read_at(const std::string& path, uint64_t offset, size_t len) {
+std::string read_at(const TreeFile& file, Links links, uint64_t offset, size_t len) {
     std::string bytes(len, '\0');
-    const int fd = open_to_read(path.c_str(), Links::REFUSE);
+    const int fd = open_to_read(file.path().c_str(), links);
     size_t got = 0;
     for (ssize_t n; fd >= 0 && got < len; got += static_cast<size_t>(n)) {
         n = pread(fd, &bytes[got], len - got, static_cast<off_t>(offset + got));
@@ -37,9 +35,9 @@ std::string read_at(const std::string& path, uint64_t offset, size_t len) {
 
 // What the file begins with behind its time record, up to the first flag; "" without one. A flag
 // at once that is not followed by another opens a frame of the file's own.
-std::string read_head(const TreeFile& file) {
+std::string read_head(const TreeFile& file, Links links) {
     for (const size_t len : {FIRST_LOOK, MAX_RAW}) {
-        const std::string bytes = read_at(file.path(), 0, len);
+        const std::string bytes = read_at(file, links, 0, len);
         bool cut;
         const size_t record = time_record_len(reinterpret_cast<const uint8_t*>(bytes.data()),
                                               bytes.size(), file.name, &cut);
@@ -58,13 +56,14 @@ std::string read_head(const TreeFile& file) {
 
 }  // namespace
 
-bool SplitFrame::join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next) {
+bool SplitFrame::join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next,
+                      Links links) {
     if (size <= from || size - from > MAX_RAW) {
         return false;
     }
-    std::string bytes = read_at(file.path(), from, static_cast<size_t>(size - from));
+    std::string bytes = read_at(file, links, from, static_cast<size_t>(size - from));
     const size_t tail = bytes.size();
-    const std::string head = read_head(next);
+    const std::string head = read_head(next, links);
     bytes += head;
     size_t used;
     m_parser.init();
@@ -93,11 +92,12 @@ size_t SplitFrame::take_head(const TreeFile& file) {
 }
 
 void SplitFrame::end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
-                          const PieceVisitor& visit, FileReport* report) {
+                          const PieceVisitor& visit, FileReport* report, Links links) {
     const size_t head = take_head(file);
     const uint64_t start = (report->has_record ? sizeof(TimeSyncRecord) : 0) + head;
     report->other -= std::min<uint64_t>(report->other, head);
-    if (!next || report->chunked || !join(file, std::max(report->tail, start), size, *next)) {
+    if (!next || report->chunked ||
+        !join(file, std::max(report->tail, start), size, *next, links)) {
         return;
     }
     const uint64_t raw = size - m_begin;

@@ -12,14 +12,17 @@
 #include <unordered_map>
 
 #include "channels/DiagFrameParser.h"
+#include "core/open_file.h"
 #include "kestlog/FileScan.h"
 #include "kestlog/LogTree.h"
 
 class SplitFrame {
 public:
     // Whether the bytes of the file from that offset to its size, and what the next file begins
-    // with, are an intact frame. Both are opened again for it. A file is joined once.
-    bool join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next);
+    // with, are an intact frame. Both are opened again for it; links: whether that follows them,
+    // as for FILEs that were given. A file is joined once.
+    bool join(const TreeFile& file, uint64_t from, uint64_t size, const TreeFile& next,
+              Links links);
 
     // The bytes that the file begins with, behind its time record, which are the end of a frame
     // that was joined. Told once.
@@ -29,7 +32,7 @@ public:
     // the visitor, if any, as the last one; what ended the frame before does not count as bytes
     // outside frames. next: where the log goes on, or null.
     void end_file(const TreeFile& file, uint64_t size, const TreeFile* next,
-                  const PieceVisitor& visit, FileReport* report);
+                  const PieceVisitor& visit, FileReport* report, Links links = Links::REFUSE);
 
     // Of the frame, until the next call: its header, and what was decoded, header included.
     const DiagHeader& header() const { return m_header; }

@@ -135,13 +135,16 @@ private:
         });
     }
 
+    static Links links_of(const StreamFile& place) {
+        return place.set->given ? Links::FOLLOW : Links::REFUSE;
+    }
+
     bool extract(const StreamFile& place, int* status) {
         const TreeFile& file = *place.file;
-        const bool named = place.set->given;
         if (is_plain(file.name) && !is_chosen()) {
-            return copy(file, named ? Links::FOLLOW : Links::REFUSE, status);
+            return copy(file, links_of(place), status);
         }
-        return !holds_frames(file.name) || scan(place, named, status);
+        return !holds_frames(file.name) || scan(place, status);
     }
 
     std::vector<Content> contents(const FileName& name, bool chunked) const {
@@ -240,11 +243,11 @@ private:
         return !m_dump_failed;
     }
 
-    bool scan(const StreamFile& place, bool named, int* status) {
+    bool scan(const StreamFile& place, int* status) {
         const TreeFile& file = *place.file;
         const std::string path = file.shown();
         LogReader in;
-        if (!in.open(file.path(), named)) {
+        if (!in.open(file.path(), place.set->given)) {
             m_problems.unreadable(path, errno);
             return true;
         }
@@ -282,7 +285,8 @@ private:
                 return piece.kind && !is_chosen() ? take_dump(file, piece) : take_all(piece);
             },
             FP_DATA, &report);
-        m_split.end_file(file, in.size(), failed ? nullptr : m_next, take_all, &report);
+        m_split.end_file(file, in.size(), failed ? nullptr : m_next, take_all, &report,
+                         links_of(place));
         for (Part& part : parts) {
             failed = !failed && part.frames > 0 && !part.out.close() ? &part : failed;
         }
