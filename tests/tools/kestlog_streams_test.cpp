@@ -422,6 +422,13 @@ TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
     EXPECT_EQ(run("--version; TMPDIR=/nowhere '" KESTLOG "' wav . " + sound + "-"), 4);
     EXPECT_TRUE(m_root.find(".kestlog-").empty());
 
+    // A file that does not belong there costs only itself.
+    write(INTERNAL + "agdsp/7-cp_wcdma-2016-03-01_08-00-00.log", "x");
+    EXPECT_EQ(run("wav . " + sound + "c.wav"), 3);
+    EXPECT_EQ(m_root.read_file("c.wav"), wav);
+    EXPECT_EQ(run("join . --kind pcm"), 3) << m_err;
+    EXPECT_EQ(m_out, samples);
+
     if (run("--version >/dev/null && soxi gap.wav") == 127) {
         GTEST_SKIP() << "soxi is not installed";
     }

@@ -164,7 +164,7 @@ bool check_kind(const CommandLine& line, const LogStream& stream, int* status) {
     if (!check_word(line, "kind", {std::begin(CHUNK_KINDS), std::end(CHUNK_KINDS)}, status)) {
         return false;
     }
-    if (stream.files[0].file->name.cp_type != CT_AGDSP) {
+    if (cp_type_of(stream.cp) != CT_AGDSP) {
         *status = line.usage_error("--kind is for the log of an audio DSP");
         return false;
     }

@@ -78,7 +78,7 @@ struct Input {
 std::vector<Input> choose_files(const LogTree& tree, const std::vector<LogStream>& streams) {
     std::vector<Input> inputs;
     for (const LogStream& stream : streams) {
-        if (stream.files[0].file->name.cp_type != CT_AGDSP) {
+        if (cp_type_of(stream.cp) != CT_AGDSP) {
             continue;
         }
         const std::vector<PlannedFile> plan = plan_stream(stream);
