@@ -397,6 +397,11 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
     EXPECT_EQ(run("--json split --force --output to " + OLD_DSP_LOG), 0) << m_err;
     EXPECT_EQ(m_root.read_file(stem + "log.bin"), "log~~~~");
     EXPECT_EQ(m_root.read_file("victim"), "v");
+    // Nor is one output of a run by another.
+    write("x/" + OLD_DSP_LOG, chunk(7, LOG, "x"));
+    EXPECT_EQ(run("split --force --output to " + OLD_DSP_LOG + " x/" + OLD_DSP_LOG), 0) << m_err;
+    EXPECT_EQ(m_root.read_file(stem + "log.bin"), "log~~~~");
+    EXPECT_EQ(m_root.read_file(stem + "log-1.bin"), "x");
 }
 
 // What the service's own storage classes make, after rotation and trimming.

@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 
 #include <nlohmann/json.hpp>
+#include <set>
 
 #include "common/CommandLine.h"
 #include "common/text.h"
@@ -48,7 +49,26 @@ void print_result(bool json, const std::string& path, const OutputFile (&parts)[
     }
 }
 
-int split(const CommandLine& line, const std::string& path) {
+typedef std::set<std::string> Names;
+
+// Names the outputs of a file. Those of one run are never the same, as files from different
+// directories may have one name: further ones get a number.
+void name_parts(const std::string& stem, Names* taken, std::string (&names)[CK_NUM]) {
+    Names added;
+    for (uint64_t number = 0; added.size() < CK_NUM; ++number) {
+        const std::string ending = (number ? "-" + std::to_string(number) : "") + ".bin";
+        added.clear();
+        for (int i = 0; i < CK_NUM; ++i) {
+            names[i] = output_name(stem, std::string(".") + CHUNK_KINDS[i] + ending);
+            if (taken->count(names[i]) == 0) {
+                added.insert(names[i]);
+            }
+        }
+    }
+    taken->insert(added.begin(), added.end());
+}
+
+int split(const CommandLine& line, const std::string& path, Names* taken) {
     LogReader in;
     if (const int status = open_input(in, path)) {
         return status;
@@ -64,10 +84,11 @@ int split(const CommandLine& line, const std::string& path) {
     const std::string dir = line.value("output", ".");
     mkdir(dir.c_str(), 0777);  // if it cannot be made, the files in it cannot either
     const std::string before = dir + "/";
+    std::string names[CK_NUM];
+    name_parts(stem, taken, names);
     OutputFile parts[CK_NUM];
     for (int i = 0; i < CK_NUM; ++i) {
-        const std::string part = output_name(stem, std::string(".") + CHUNK_KINDS[i] + ".bin");
-        if (!parts[i].open(before + part, line.has("force"))) {
+        if (!parts[i].open(before + names[i], line.has("force"))) {
             return parts[i].failed();
         }
     }
@@ -104,5 +125,8 @@ int run_split(const CommandLine& line) {
     if (line.value("output", "") == "-") {
         return line.usage_error("split writes files, not standard output: give -o DIR");
     }
-    return for_each_file(line, split);
+    Names taken;
+    return for_each_file(line, [&taken](const CommandLine& each, const std::string& path) {
+        return split(each, path, &taken);
+    });
 }
