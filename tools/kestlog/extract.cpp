@@ -332,6 +332,10 @@ private:
             *status = out.failed();
             return false;
         }
+        FileReport report;
+        if (error == 0 && copied < file.size) {
+            report.add(true, "cut", "became shorter while it was read");
+        }
         if (m_problems.json()) {
             m_problems.print({{"file", json_text(path)},
                               {"output", json_text(out.path())},
@@ -339,11 +343,11 @@ private:
                               {"framed", false},
                               {"bytes", copied}});
         } else {
-            printf("%s: %s, %llu bytes; it has no frames, nothing was left out\n",
-                   escape_text(out.path()).c_str(), file.name.kind(),
-                   static_cast<unsigned long long>(copied));
+            printf("%s: %s, %llu bytes; it has no frames%s\n", escape_text(out.path()).c_str(),
+                   file.name.kind(), static_cast<unsigned long long>(copied),
+                   copied < file.size ? "" : ", nothing was left out");
         }
-        tell(path, FileReport(), error);
+        tell(path, report, error);
         return true;
     }
 
