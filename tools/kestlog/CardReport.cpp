@@ -141,16 +141,18 @@ LogTime CardReport::last_byte(const FilePlace& place) {
     const TreeFile& log = *place.file;
     const LogTime& start = log.name.time();
     const LogTime written = place.cp->own_times ? local_time(log.modified) : log.end.time();
-    const bool newest = log.name.number == 0;
-    const LogTime last = written < start || log.end.time() < written ? log.end.time() : written;
-    // A set ends where the handset's next begins.
-    const auto later =
-        std::upper_bound(m_tree.sets.begin(), m_tree.sets.end(), start,
-                         [](const LogTime& time, const TreeSet& set) { return time < set.time; });
-    const auto next = std::find_if(later, m_tree.sets.end(), [&place](const TreeSet& set) {
-        return set.handset == place.set->handset;
-    });
-    const LogTime end = newest && next != m_tree.sets.end() ? std::min(last, next->time) : last;
+    LogTime end = written < start || log.end.time() < written ? log.end.time() : written;
+    // A set ends where the handset's next begins. It may lie behind very many of other handsets,
+    // and so is looked for only where it matters.
+    if (log.name.number == 0) {
+        const auto later = std::upper_bound(
+            m_tree.sets.begin(), m_tree.sets.end(), start,
+            [](const LogTime& time, const TreeSet& set) { return time < set.time; });
+        const auto next = std::find_if(later, m_tree.sets.end(), [&place](const TreeSet& set) {
+            return set.handset == place.set->handset;
+        });
+        end = next != m_tree.sets.end() ? std::min(end, next->time) : end;
+    }
     return clock_was_set(start) == clock_was_set(end) ? end : start;
 }
 
