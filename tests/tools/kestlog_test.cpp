@@ -126,11 +126,18 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     bytes = m_root.read_file("a.zip");
     bytes[bytes.find(LOG_DATA)] ^= 1;
     write("bad.zip", bytes);
-    for (const char* args : {"bad.tgz", "- <bad.tgz", "bad.zip"}) {
-        EXPECT_EQ(run(std::string("verify ") + args), 2) << args << m_out;
-        EXPECT_TRUE(m_err.find("gzip: incorrect data check\n") != std::string::npos ||
-                    m_err.find(".log: damaged: ZIP bad CRC") != std::string::npos)
-            << args << m_err;
+    write("short.zip", bytes.substr(0, bytes.find("PK\1\2")));
+    const struct {
+        std::string args, told;
+    } DAMAGED[] = {
+        {"bad.tgz", "kestlog: bad.tgz: gzip: incorrect data check\n"},
+        {"- <bad.tgz", "kestlog: -: gzip: incorrect data check\n"},
+        {"bad.zip", ".log: damaged: ZIP bad CRC"},
+        {"short.zip", "kestlog: short.zip: damaged\n"},
+    };
+    for (const auto& c : DAMAGED) {
+        EXPECT_EQ(run("verify " + c.args), 2) << c.args << m_out;
+        EXPECT_NE(m_err.find(c.told), std::string::npos) << c.args << m_err;
     }
     // What came before a fault of the disk counts. The end of a pseudo-terminal is such a fault.
     write("fails.py",

@@ -97,7 +97,7 @@ public:
         bool whole = true;
         for (int got; !m_full && (got = archive_read_next_header(m_in, &entry)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL) {
-                fail("", archive_error_string(m_in));
+                fail("", reason());
                 whole = false;
                 break;
             }
@@ -137,6 +137,12 @@ private:
         };
         return m_gzip.open(m_name) &&
                archive_read_open(m_in, &m_gzip, nullptr, read, nullptr) == ARCHIVE_OK;
+    }
+
+    // Of what libarchive has just refused; it has no words for some of it.
+    std::string reason() const {
+        const char* const text = archive_error_string(m_in);
+        return text ? text : "damaged";
     }
 
     // entry: its name, or "" for the archive itself.
@@ -214,11 +220,11 @@ private:
         la_int64_t offset;
         for (int got; (got = archive_read_data_block(m_in, &data, &len, &offset)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL || got == ARCHIVE_FAILED) {
-                fail(name, std::string("cut off: ") + archive_error_string(m_in));
+                fail(name, "cut off: " + reason());
                 return size;
             }
             if (got == ARCHIVE_WARN) {  // a wrong sum in a zip
-                fail(name, std::string("damaged: ") + archive_error_string(m_in));
+                fail(name, "damaged: " + reason());
             }
             const uint64_t end = static_cast<uint64_t>(offset) + len;
             if (offset < 0 || !has_room(end)) {
