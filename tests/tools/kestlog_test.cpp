@@ -124,9 +124,13 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     bytes[bytes.size() - 8] ^= 1;
     write("bad.tgz", bytes);
     bytes = m_root.read_file("a.zip");
+    write("short.zip", bytes.substr(0, bytes.find("PK\1\2")));
     bytes[bytes.find(LOG_DATA)] ^= 1;
     write("bad.zip", bytes);
-    write("short.zip", bytes.substr(0, bytes.find("PK\1\2")));
+    // One entry's header is wrong; the entry that it had twice is there once.
+    bytes = m_root.read_file("a.tar");
+    bytes[bytes.find(WCN_LOG)] ^= 1;
+    write("bad.tar", bytes);
     const struct {
         std::string args, told;
     } DAMAGED[] = {
@@ -134,10 +138,12 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         {"- <bad.tgz", "kestlog: -: gzip: incorrect data check\n"},
         {"bad.zip", ".log: damaged: ZIP bad CRC"},
         {"short.zip", "kestlog: short.zip: damaged\n"},
+        {"bad.tar", "bad.tar/?: left out: Damaged tar archive\n"},
     };
     for (const auto& c : DAMAGED) {
         EXPECT_EQ(run("verify " + c.args), 2) << c.args << m_out;
         EXPECT_NE(m_err.find(c.told), std::string::npos) << c.args << m_err;
+        EXPECT_EQ(occurrences(m_err, "\n"), 1u) << c.args << m_err;
     }
     // What came before a fault of the disk counts. The end of a pseudo-terminal is such a fault.
     write("fails.py",

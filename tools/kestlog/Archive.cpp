@@ -95,16 +95,22 @@ public:
             return m_result;
         }
         bool whole = true;
+        bool skipping = false;
         for (int got; !m_full && (got = archive_read_next_header(m_in, &entry)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL) {
                 fail("", reason());
                 whole = false;
                 break;
             }
-            if (got == ARCHIVE_RETRY) {
+            m_result.is_archive = true;
+            if (got == ARCHIVE_RETRY) {  // told of each block up to the next header
+                if (!skipping) {
+                    fail("?", "left out: " + reason());
+                }
+                skipping = true;
                 continue;
             }
-            m_result.is_archive = true;
+            skipping = false;
             if (++m_entries > MAX_ENTRIES) {
                 fail("", "more than " + std::to_string(MAX_ENTRIES) +
                              " entries; the rest is left "
