@@ -93,11 +93,14 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     write_good_tree();
     m_root.make_dir("temp");
     const std::string packers[] = {
-        "tar cf a.tar modem_log", "tar cjf a.tbz2 modem_log",
+        "tar cf a.tar modem_log",
+        "tar cjf a.tbz2 modem_log",
         "mkdir DCIM && truncate -s 2M DCIM/x && tar czf a.tgz --transform 's,^,some/card/,' DCIM "
         "modem_log",
         "python3 -m zipfile -c a.zip modem_log",
-        "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " ."};
+        "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " .",
+        "python3 -c 'import tarfile; name = tarfile.TarInfo(\"modem_log/\" + \"x\" * 5000); "
+        "name.type = tarfile.SYMTYPE; tarfile.open(\"name.tar\", \"w\").addfile(name)'"};
     for (const std::string& packer : packers) {
         ASSERT_EQ(sh(packer), 0) << packer;
     }
@@ -138,6 +141,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         {"- <bad.tgz", "kestlog: -: gzip: incorrect data check\n"},
         {"bad.zip", ".log: damaged: ZIP bad CRC"},
         {"short.zip", "kestlog: short.zip: damaged\n"},
+        {"name.tar", "kestlog: name.tar/?: left out: its name is too long\n"},
         {"bad.tar", "bad.tar/?: left out: Damaged tar archive\n"},
     };
     for (const auto& c : DAMAGED) {

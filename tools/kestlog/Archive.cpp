@@ -6,6 +6,7 @@
 #include <archive_entry.h>
 #include <errno.h>
 #include <fcntl.h>
+#include <limits.h>
 #include <string.h>
 #include <sys/stat.h>
 #include <sys/statvfs.h>
@@ -167,6 +168,9 @@ private:
         text = text ? text : archive_entry_pathname_utf8(entry);
         if (!text || !*text) {
             return fail("?", "left out: its name cannot be read");
+        }
+        if (strlen(text) >= PATH_MAX) {  // a tar may have many of 1 MiB
+            return fail("?", "left out: its name is too long");
         }
         const std::string name = text;
         const std::vector<std::string> parts = safe_parts(name);
