@@ -94,7 +94,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     m_root.make_dir("temp");
     const std::string packers[] = {
         "tar cf a.tar modem_log",
-        "tar cjf a.tbz2 modem_log",
+        "tar cjf a.tbz2 -b 2048 modem_log",
         "mkdir DCIM && truncate -s 2M DCIM/x && tar czf a.tgz --transform 's,^,some/card/,' DCIM "
         "modem_log",
         "python3 -m zipfile -c a.zip modem_log",
@@ -126,6 +126,9 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     std::string bytes = m_root.read_file("a.tgz");
     bytes[bytes.size() - 8] ^= 1;
     write("bad.tgz", bytes);
+    bytes = m_root.read_file("a.tbz2");
+    bytes[bytes.size() - 3] ^= 1;
+    write("bad.tbz2", bytes);
     bytes = m_root.read_file("a.zip");
     write("short.zip", bytes.substr(0, bytes.find("PK\1\2")));
     bytes[bytes.find(LOG_DATA)] ^= 1;
@@ -139,6 +142,8 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     } DAMAGED[] = {
         {"bad.tgz", "kestlog: bad.tgz: gzip: incorrect data check\n"},
         {"- <bad.tgz", "kestlog: -: gzip: incorrect data check\n"},
+        {"bad.tbz2", "kestlog: bad.tbz2: bzip decompression failed\n"},
+        {"- <bad.tbz2", "kestlog: -: bzip decompression failed\n"},
         {"bad.zip", ".log: damaged: ZIP bad CRC"},
         {"short.zip", "kestlog: short.zip: damaged\n"},
         {"name.tar", "kestlog: name.tar/?: left out: its name is too long\n"},

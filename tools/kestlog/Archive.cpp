@@ -26,6 +26,7 @@ namespace {
 constexpr size_t BLOCK = 256 * 1024;
 constexpr uint64_t MIB = 1024 * 1024;
 constexpr uint64_t MAX_ENTRIES = 1000 * 1000;
+constexpr uint64_t MAX_DRAINED = 64 * MIB;
 constexpr size_t MAX_DEPTH = 32;  // of directories; a log tree has few
 
 // The parts of an entry's name; empty when it leads out of the directory.
@@ -62,22 +63,30 @@ bool may_belong(const std::vector<std::string>& parts, bool is_dir) {
 class Unpacker {
 public:
     Unpacker(const std::string& name, const std::string& dir, uint64_t limit)
-        : m_name(name), m_dir(dir), m_limit(limit), m_in(archive_read_new()) {
+        : m_name(name),
+          m_dir(dir),
+          m_limit(limit),
+          m_filters(archive_read_new()),
+          m_in(archive_read_new()) {
         struct statvfs fs;
         if (m_limit == 0 && statvfs(dir.c_str(), &fs) == 0) {
             m_limit = static_cast<uint64_t>(fs.f_bavail) * fs.f_frsize / 10 * 9;
         }
         // None of those that run another program; gzip's is ours.
-        archive_read_support_filter_bzip2(m_in);
-        archive_read_support_filter_xz(m_in);
-        archive_read_support_filter_lzma(m_in);
-        archive_read_support_filter_zstd(m_in);
-        archive_read_support_filter_lz4(m_in);
-        archive_read_support_filter_compress(m_in);
+        archive_read_support_filter_bzip2(m_filters);
+        archive_read_support_filter_xz(m_filters);
+        archive_read_support_filter_lzma(m_filters);
+        archive_read_support_filter_zstd(m_filters);
+        archive_read_support_filter_lz4(m_filters);
+        archive_read_support_filter_compress(m_filters);
+        archive_read_support_format_raw(m_filters);
         archive_read_support_format_tar(m_in);
         archive_read_support_format_zip(m_in);
     }
-    ~Unpacker() { archive_read_free(m_in); }
+    ~Unpacker() {
+        archive_read_free(m_in);
+        archive_read_free(m_filters);
+    }
     Unpacker(const Unpacker&) = delete;
     Unpacker& operator=(const Unpacker&) = delete;
 
@@ -99,14 +108,14 @@ public:
         bool skipping = false;
         for (int got; !m_full && (got = archive_read_next_header(m_in, &entry)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL) {
-                fail("", reason());
+                fail("", reason(m_in));
                 whole = false;
                 break;
             }
             m_result.is_archive = true;
             if (got == ARCHIVE_RETRY) {  // told of each block up to the next header
                 if (!skipping) {
-                    fail("?", "left out: " + reason());
+                    fail("?", "left out: " + reason(m_in));
                 }
                 skipping = true;
                 continue;
@@ -120,8 +129,8 @@ public:
             }
             take(entry);
         }
-        if (whole && !m_full && m_gzip.is_open() && !m_gzip.drain()) {
-            fail("", m_gzip.error());
+        if (whole && !m_full && m_filtered && !drain()) {
+            fail("", reason(m_filters));
         }
         if (m_more) {
             m_result.failures.push_back(m_name + ": " + std::to_string(m_more) +
@@ -132,23 +141,58 @@ public:
 
 private:
     bool open_archive() {
-        if (m_name != "-" && !GzipInput::is_gzip(m_name)) {
-            return archive_read_open_filename(m_in, m_name.c_str(), BLOCK) == ARCHIVE_OK;
-        }
-        const auto read = [](struct archive* in, void* gzip, const void** data) -> la_ssize_t {
+        struct archive_entry* entry;
+        const auto read_gzip = [](struct archive* in, void* gzip, const void** data) -> la_ssize_t {
             const la_ssize_t n = static_cast<GzipInput*>(gzip)->read(data);
             if (n < 0) {
                 archive_set_error(in, EIO, "%s", static_cast<GzipInput*>(gzip)->error().c_str());
             }
             return n;
         };
-        return m_gzip.open(m_name) &&
-               archive_read_open(m_in, &m_gzip, nullptr, read, nullptr) == ARCHIVE_OK;
+        const bool ours = m_name == "-" || GzipInput::is_gzip(m_name);
+        const int opened = !ours ? archive_read_open_filename(m_filters, m_name.c_str(), BLOCK)
+                           : m_gzip.open(m_name)
+                               ? archive_read_open(m_filters, &m_gzip, nullptr, read_gzip, nullptr)
+                               : ARCHIVE_FATAL;
+        if (opened != ARCHIVE_OK || archive_read_next_header(m_filters, &entry) != ARCHIVE_OK) {
+            return false;
+        }
+        m_filtered = ours || archive_filter_code(m_filters, 0) != ARCHIVE_FILTER_NONE;
+        if (!m_filtered) {  // a zip in a file is read from its end
+            return archive_read_open_filename(m_in, m_name.c_str(), BLOCK) == ARCHIVE_OK;
+        }
+        const auto read = [](struct archive*, void* self, const void** data) {
+            return static_cast<Unpacker*>(self)->read_filtered(data);
+        };
+        return archive_read_open(m_in, this, nullptr, read, nullptr) == ARCHIVE_OK;
+    }
+
+    // What the filters make of the file: the number of bytes, 0 at the end, -1 with the error set.
+    la_ssize_t read_filtered(const void** data) {
+        size_t len;
+        la_int64_t offset;
+        const int got = archive_read_data_block(m_filters, data, &len, &offset);
+        if (got < ARCHIVE_WARN) {
+            archive_set_error(m_in, EIO, "%s", reason(m_filters).c_str());
+            return -1;
+        }
+        return got == ARCHIVE_EOF ? 0 : static_cast<la_ssize_t>(len);
+    }
+
+    // Reads on, so that the sum behind the data is seen: what follows the end of an archive is
+    // mostly a few zeros, and no more than some MiB of it are read. False with the error set.
+    bool drain() {
+        const void* data;
+        la_ssize_t n = 1;
+        for (uint64_t done = 0; n > 0 && done < MAX_DRAINED; done += static_cast<uint64_t>(n)) {
+            n = read_filtered(&data);
+        }
+        return n >= 0;
     }
 
     // Of what libarchive has just refused; it has no words for some of it.
-    std::string reason() const {
-        const char* const text = archive_error_string(m_in);
+    static std::string reason(struct archive* in) {
+        const char* const text = archive_error_string(in);
         return text ? text : "damaged";
     }
 
@@ -230,11 +274,11 @@ private:
         la_int64_t offset;
         for (int got; (got = archive_read_data_block(m_in, &data, &len, &offset)) != ARCHIVE_EOF;) {
             if (got == ARCHIVE_FATAL || got == ARCHIVE_FAILED) {
-                fail(name, "cut off: " + reason());
+                fail(name, "cut off: " + reason(m_in));
                 return size;
             }
             if (got == ARCHIVE_WARN) {  // a wrong sum in a zip
-                fail(name, "damaged: " + reason());
+                fail(name, "damaged: " + reason(m_in));
             }
             const uint64_t end = static_cast<uint64_t>(offset) + len;
             if (offset < 0 || !has_room(end)) {
@@ -246,9 +290,9 @@ private:
                 return size;
             }
             size = std::max(size, end);
-            const uint64_t packed = m_gzip.is_open()
-                                        ? m_gzip.offset()
-                                        : static_cast<uint64_t>(archive_filter_bytes(m_in, -1));
+            const uint64_t packed = m_gzip.is_open() ? m_gzip.offset()
+                                                     : static_cast<uint64_t>(archive_filter_bytes(
+                                                           m_filtered ? m_filters : m_in, -1));
             Progress::advance(packed - m_packed);
             m_packed = packed;
         }
@@ -295,7 +339,9 @@ private:
     const std::string m_dir;
     uint64_t m_limit;
     GzipInput m_gzip;
-    struct archive* m_in;
+    struct archive* m_filters;  // a bare reader of what they make of the file
+    struct archive* m_in;       // reads that or, without a filter, the file
+    bool m_filtered = false;
     Unpacked m_result;
     uint64_t m_entries = 0;
     uint64_t m_used = 0;

@@ -10,7 +10,6 @@
 namespace {
 
 constexpr size_t PIECE = 256 * 1024;
-constexpr uint64_t MAX_DRAINED = 64 * 1024 * 1024;
 constexpr uint8_t MAGIC[] = {0x1f, 0x8b};
 constexpr int GZIP_ONLY = 16 + MAX_WBITS;  // zlib's way to say it
 
@@ -108,16 +107,4 @@ ssize_t GzipInput::inflate_some() {
     }
     const size_t len = PIECE - m_stream.avail_out;
     return len == 0 && !m_error.empty() ? -1 : static_cast<ssize_t>(len);
-}
-
-bool GzipInput::drain() {
-    const void* data;
-    ssize_t n = 1;
-    for (uint64_t done = 0; n > 0 && done < MAX_DRAINED; done += static_cast<uint64_t>(n)) {
-        n = read(&data);
-        if (n < 0) {
-            return false;
-        }
-    }
-    return true;
 }

@@ -28,9 +28,6 @@ public:
     // The next bytes, valid until the next call: their number, 0 at the end, -1 with error() set.
     // What stands before an error is given first.
     ssize_t read(const void** data);
-    // Reads on, so that the sum is seen: what follows the end of an archive is mostly a few zeros,
-    // and no more than some MiB of it are read. False with error() set.
-    bool drain();
     const std::string& error() const { return m_error; }
     // Bytes of the file so far.
     uint64_t offset() const { return m_offset; }
