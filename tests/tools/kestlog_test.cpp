@@ -169,9 +169,14 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     EXPECT_EQ(m_err, "kestlog: -: Input/output error\n");
     EXPECT_EQ(run("ls --unpack-limit 1 a.tgz"), 0) << m_err;
     write(WCN + "big", std::string(1100000, 'x'));
-    ASSERT_EQ(sh("tar cf big.tar modem_log"), 0);
-    EXPECT_EQ(run("ls --unpack-limit 1 big.tar"), 2);
-    EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos) << m_err;
+    ASSERT_EQ(sh("tar cf big.tar modem_log && mkdir dirs && cd dirs && "
+                 "seq -f modem_log/%g 256 | xargs mkdir -p && tar cf ../dirs.tar modem_log"),
+              0);
+    for (const std::string name : {"big.tar", "dirs.tar"}) {
+        EXPECT_EQ(run("ls --unpack-limit 1 " + name), 2);
+        EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos)
+            << name << m_err;
+    }
     EXPECT_TRUE(m_root.list("temp").empty());
 
     // It waits for an archive from a pipe when it is ended.

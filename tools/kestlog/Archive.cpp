@@ -27,7 +27,8 @@ constexpr size_t BLOCK = 256 * 1024;
 constexpr uint64_t MIB = 1024 * 1024;
 constexpr uint64_t MAX_ENTRIES = 1000 * 1000;
 constexpr uint64_t MAX_DRAINED = 64 * MIB;
-constexpr size_t MAX_DEPTH = 32;  // of directories; a log tree has few
+constexpr uint64_t DIRECTORY = 4096;  // bytes that one takes in most file systems
+constexpr size_t MAX_DEPTH = 32;      // of directories; a log tree has few
 
 // The parts of an entry's name; empty when it leads out of the directory.
 std::vector<std::string> safe_parts(const std::string& name) {
@@ -243,13 +244,16 @@ private:
         std::string path = m_dir;
         for (size_t i = 0; i < parts.size(); ++i) {
             path += "/" + parts[i];
-            if ((i + 1 < parts.size() || is_dir) && mkdir(path.c_str(), 0700) < 0 &&
-                errno != EEXIST) {
+            if (i + 1 == parts.size() && !is_dir) {
+                write_file(entry, name, path);
+            } else if (mkdir(path.c_str(), 0700) == 0) {
+                m_used += DIRECTORY;
+                if (!has_room(0)) {
+                    return;
+                }
+            } else if (errno != EEXIST) {
                 return fail(name, std::string("left out: ") + strerror(errno));
             }
-        }
-        if (!is_dir) {
-            write_file(entry, name, path);
         }
     }
 

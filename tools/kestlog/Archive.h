@@ -25,7 +25,8 @@ struct Unpacked {
 bool is_archive(const std::string& path);
 
 // Unpacks the file at path, or standard input for "-", into an existing empty directory. limit:
-// the most bytes of all files, or 0 for what is free there less a tenth.
+// the most bytes of all files, where a directory counts as 4 KiB, or 0 for what is free there less
+// a tenth.
 Unpacked unpack_archive(const std::string& path, const std::string& dir, uint64_t limit);
 
 #endif  // KESTLOG_ARCHIVE_H_
