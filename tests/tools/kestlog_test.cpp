@@ -177,6 +177,10 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         EXPECT_NE(m_err.find("larger than the 1 MiB that it may take in"), std::string::npos)
             << name << m_err;
     }
+    EXPECT_EQ(run("big.tar | (trap '' XFSZ; ulimit -f 1; '" KESTLOG "' export -)", "cat"), 2);
+    EXPECT_NE(m_err.find("-: cannot be copied to " + m_root.path("temp") + ": File too large\n"),
+              std::string::npos)
+        << m_err;
     EXPECT_TRUE(m_root.list("temp").empty());
 
     // It waits for an archive from a pipe when it is ended.

@@ -35,8 +35,20 @@ std::string base_name(const std::string& path) {
     return full.substr(full.rfind('/') + 1);
 }
 
+bool write_all(int fd, const char* data, ssize_t len) {
+    while (len > 0) {
+        const ssize_t n = write(fd, data, static_cast<size_t>(len));
+        if (n < 0 && errno != EINTR) {
+            return false;
+        }
+        data += std::max<ssize_t>(n, 0);
+        len -= std::max<ssize_t>(n, 0);
+    }
+    return true;
+}
+
 // Standard input, whose first bytes are needed twice: what comes from a pipe is copied to a file
-// without a name. Where it stands, or -1.
+// without a name. Where it stands, or -1 with errno.
 off_t rewindable_input() {
     const off_t start = lseek(STDIN_FILENO, 0, SEEK_CUR);
     const int copy = start < 0 ? TempDir::open_file() : -1;
@@ -46,10 +58,12 @@ off_t rewindable_input() {
     bool good = true;
     std::vector<char> bytes(256 * 1024);
     for (ssize_t n; good && (n = read(STDIN_FILENO, bytes.data(), bytes.size())) != 0;) {
-        good = n > 0 ? write(copy, bytes.data(), static_cast<size_t>(n)) == n : errno == EINTR;
+        good = n > 0 ? write_all(copy, bytes.data(), n) : errno == EINTR;
     }
     good = good && lseek(copy, 0, SEEK_SET) == 0 && dup2(copy, STDIN_FILENO) >= 0;
+    const int error = errno;
     close(copy);
+    errno = error;
     return good ? 0 : -1;
 }
 
@@ -174,6 +188,11 @@ bool LogTree::add_as(const std::string& medium, const std::string& given, Files 
     if (path == "-" || (stat(path.c_str(), &st) == 0 && !S_ISDIR(st.st_mode))) {
         const bool both = path == "-" && files == FILES_TOO;
         const off_t start = both ? rewindable_input() : 0;
+        if (start < 0) {
+            failures.push_back("-: cannot be copied to " + TempDir::parent() + ": " +
+                               strerror(errno));
+            return false;
+        }
         if (add_archive(path)) {
             return true;
         }
