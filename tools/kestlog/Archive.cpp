@@ -267,7 +267,9 @@ private:
         m_used += size;
         const struct timespec times[2] = {{0, UTIME_OMIT}, {archive_entry_mtime(entry), 0}};
         futimens(fd, times);
-        close(fd);
+        if (close(fd) < 0) {  // NFS writes only now
+            fail(name, std::string("cut off: ") + strerror(errno));
+        }
     }
 
     // The size that the file got.
