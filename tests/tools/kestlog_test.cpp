@@ -181,6 +181,14 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     EXPECT_NE(m_err.find("-: cannot be copied to " + m_root.path("temp") + ": File too large\n"),
               std::string::npos)
         << m_err;
+    // Without a place to unpack it an archive is no file either.
+    for (const std::string root : {"big.tar a.zip", "- <big.tar"}) {
+        EXPECT_EQ(run("export -o none " + root, "TMPDIR=/nowhere '" KESTLOG "'"), 2);
+        EXPECT_EQ(occurrences(m_err, ": cannot be unpacked in /nowhere: No such file"),
+                  root[0] == '-' ? 1u : 2u)
+            << m_err;
+        EXPECT_FALSE(m_root.exists("none"));
+    }
     EXPECT_TRUE(m_root.list("temp").empty());
 
     // It waits for an archive from a pipe when it is ended.

@@ -361,7 +361,7 @@ private:
 bool is_archive(const std::string& path) {
     struct stat st;
     const bool exact = FileName(path.substr(path.rfind('/') + 1)).exact;
-    return !exact && stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) &&
+    return (path == "-" || (!exact && stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode))) &&
            Unpacker(path, "", 1).begins();
 }
 

@@ -21,7 +21,7 @@ struct Unpacked {
 };
 
 // Whether it is such a file, by its beginning. A file of the service is none, and what is no file
-// could wait for ever.
+// could wait for ever; of standard input ("-"), which must have an end, the beginning is used up.
 bool is_archive(const std::string& path);
 
 // Unpacks the file at path, or standard input for "-", into an existing empty directory. limit:

@@ -193,10 +193,15 @@ bool LogTree::add_as(const std::string& medium, const std::string& given, Files 
                                strerror(errno));
             return false;
         }
-        if (add_archive(path)) {
+        const auto to_start = [&] { return !both || lseek(STDIN_FILENO, start, SEEK_SET) >= 0; };
+        // Where standard input cannot be a file, unpacking it shows what it is.
+        const bool archive = (path == "-" && !both) || is_archive(path);
+        const size_t told = failures.size();
+        if (archive && to_start() && add_archive(path)) {
             return true;
         }
-        if (files == DIRECTORIES_ONLY || (both && lseek(STDIN_FILENO, start, SEEK_SET) < 0)) {
+        // An archive about which something was told is no file.
+        if (files == DIRECTORIES_ONLY || failures.size() > told || !to_start()) {
             return false;
         }
         add_file(path);
@@ -228,18 +233,21 @@ void LogTree::add_file(const std::string& path) {
 }
 
 bool LogTree::add_archive(const std::string& path) {
-    if (path != "-" && !is_archive(path)) {
+    const auto no_room = [&] {
+        failures.push_back(path + ": cannot be unpacked in " + TempDir::parent() + ": " +
+                           strerror(errno));
         return false;
-    }
+    };
     if (!m_unpacked) {
-        m_unpacked = std::make_unique<TempDir>();
-        if (!m_unpacked->create()) {
-            failures.push_back(TempDir::parent() + ": " + strerror(errno));
+        auto made = std::make_unique<TempDir>();
+        if (!made->create()) {
+            return no_room();
         }
+        m_unpacked = std::move(made);
     }
     std::string dir = m_unpacked->path() + "/" + std::to_string(m_archives++);
-    if (m_unpacked->path().empty() || mkdir(dir.c_str(), 0700) < 0) {
-        return false;
+    if (mkdir(dir.c_str(), 0700) < 0) {
+        return no_room();
     }
     const Unpacked unpacked = unpack_archive(path, dir, m_unpack_limit);
     if (!unpacked.is_archive) {
