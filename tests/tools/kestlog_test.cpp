@@ -99,6 +99,7 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
         "modem_log",
         "python3 -m zipfile -c a.zip modem_log",
         "truncate -s 500000 " + WCN_LOG + " && tar cSf a.cp.tar -C " + WCN + " .",
+        "mkdir -p up/phone/data && cp -a modem_log up/phone/data && tar cf up.tar up",
         "python3 -c 'import tarfile; name = tarfile.TarInfo(\"modem_log/\" + \"x\" * 5000); "
         "name.type = tarfile.SYMTYPE; tarfile.open(\"name.tar\", \"w\").addfile(name)'"};
     for (const std::string& packer : packers) {
@@ -114,6 +115,9 @@ TEST_F(KestlogTest, AnArchiveIsReadAsADirectoryAndLeavesNothingBehind) {
     EXPECT_EQ(run("ls --json a.cp.tar"), 0) << m_err;
     EXPECT_TRUE(said("\"medium\":\"a.cp.tar\",\"cp\":\"cp_wcn\",\"files\":2,\"size\":501000,"))
         << m_out;
+
+    EXPECT_EQ(run("ls --json up.tar"), 0) << m_err;
+    EXPECT_TRUE(said("\"medium\":\"internal\"")) << m_out;
 
     // An entry that is there twice is left out the second time, and what is cut off is told.
     ASSERT_EQ(sh("tar rf a.tar " + WCN_LOG + " && head -c -1000 a.tgz >short.tgz"), 0);

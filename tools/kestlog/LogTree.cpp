@@ -262,8 +262,10 @@ bool LogTree::add_archive(const std::string& path) {
         }
     }
     m_alias = {dir, path};
-    // It may have been packed together with the directories above it.
+    // It may have been packed together with the directories above it, which are no handsets.
+    const size_t roots = m_roots;
     while (!add_media(dir) && !add_directory(dir)) {
+        m_roots = roots;
         const std::vector<Entry> entries = list_dir(dir);
         if (entries.size() != 1 || !entries[0].dir) {
             return false;
