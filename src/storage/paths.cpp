@@ -102,7 +102,8 @@ int remove_numbered_entries(const android::String8& dir) {
             command.append(shell_path(left[i++]));
             command.append(" ");
         } while (i < left.size() && command.length() < MAX_COMMAND);
-        system(command.string());
+        const int status = system(command.string());
+        result = status != 0 ? status : result;
     }
     return left.empty() || !numbered_entries(dir).empty() ? result : 0;
 }
