@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // kestsim_play: plays a script against the service and prints what came of it.
+#include <errno.h>
 #include <getopt.h>
 #include <signal.h>
 #include <stdio.h>
 #include <stdlib.h>
+#include <string.h>
 
 #include <filesystem>
 
@@ -44,8 +46,7 @@ int main(int argc, char** argv) {
                 keep = true;
                 break;
             case 'h':
-                fputs(USAGE, stdout);
-                return 0;
+                return fputs(USAGE, stdout) >= 0 && fflush(stdout) == 0 ? 0 : 1;
             default:
                 fputs(USAGE, stderr);
                 return 2;
@@ -66,12 +67,15 @@ int main(int argc, char** argv) {
     setenv("TZ", "UTC0", 1);  // time records tell the local time
     ScriptPlayer player(program, keep, &s_interrupted);
     const bool played = player.play(argv[optind]);
-    fputs(player.outcome().c_str(), stdout);
+    const bool printed = fputs(player.outcome().c_str(), stdout) >= 0 && fflush(stdout) == 0;
+    if (!printed) {
+        fprintf(stderr, "standard output: %s\n", strerror(errno));
+    }
     if (!played) {
         fprintf(stderr, "%s\n", player.error().c_str());
     }
     if (keep) {
         fprintf(stderr, "The handset's root is %s\n", player.root().c_str());
     }
-    return played ? 0 : 1;
+    return played && printed ? 0 : 1;
 }
