@@ -41,6 +41,9 @@ const CpKind* find_kind(const std::string& name) {
     return kind == std::end(CP_KINDS) ? nullptr : kind;
 }
 
+// Of a property's value, with the end of the text. A longer one counts as none.
+constexpr size_t PROPERTY_SIZE = 92;
+
 const char SD_STATE_PROP[] = "init.svc.fuse_sdcard0";
 
 // Readers never see half a file: it is written beside the old one and moved over it.
@@ -175,6 +178,10 @@ bool SimHandset::write_config() {
 }
 
 bool SimHandset::set_prop(const std::string& key, const std::string& value) {
+    if (value.size() >= PROPERTY_SIZE) {
+        m_error = "the root is too long for a property with the path of a device: " + m_root;
+        return false;
+    }
     auto prop =
         std::find_if(m_props.begin(), m_props.end(), [&](auto& p) { return p.first == key; });
     if (prop == m_props.end()) {

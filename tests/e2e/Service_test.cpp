@@ -5,6 +5,7 @@
 #include <sstream>
 
 #include "sim/ChildProcess.h"
+#include "sim/SimHandset.h"
 #include "sim/SimModemImage.h"
 #include "sim/SimSupervisor.h"
 #include "support/ServiceFixture.h"
@@ -33,6 +34,13 @@ protected:
 
     ChildProcess process;
 };
+
+// No property holds the paths of its devices.
+TEST_F(ServiceTest, ASimulatedHandsetIsNotMadeTooDeep) {
+    SimHandset handset;
+    ASSERT_TRUE(handset.create(root.path(std::string(50, 'h')), {})) << handset.error();
+    EXPECT_FALSE(handset.add_cp("cp_wcdma"));
+}
 
 TEST_F(ServiceTest, FailedStartsHaveTheirExitStatus) {
     const struct {
