@@ -145,18 +145,23 @@ size_t DiagFrameParser::measure(const uint8_t* data, size_t len, DiagHeader& hea
     }
     if (first >= body + sizeof(header)) {
         memcpy(&header, body, sizeof(header));
-        return raw + 2;
+    } else {
+        header = read_header(body);
     }
-    uint8_t head[sizeof(header)];
-    pos = body;
-    for (uint8_t& byte : head) {
-        const bool escaped = *pos == ESCAPE;
-        pos += escaped;
-        byte = escaped ? *pos ^ ESCAPE_XOR : *pos;
-        ++pos;
-    }
-    memcpy(&header, head, sizeof(header));
     return raw + 2;
+}
+
+DiagHeader DiagFrameParser::read_header(const uint8_t* body) {
+    uint8_t head[sizeof(DiagHeader)];
+    for (uint8_t& byte : head) {
+        const bool escaped = *body == ESCAPE;
+        body += escaped;
+        byte = escaped ? *body ^ ESCAPE_XOR : *body;
+        ++body;
+    }
+    DiagHeader header;
+    memcpy(&header, head, sizeof(header));
+    return header;
 }
 
 size_t DiagFrameParser::escape(const uint8_t* src, size_t len, uint8_t* dst) {

@@ -47,6 +47,8 @@ public:
     // of its decoded body. 0 if the frame is not whole in len bytes, has no header or more than
     // MAX_FRAME bytes, or begins with several flags: unescape() tells then.
     static size_t measure(const uint8_t* data, size_t len, DiagHeader& header, size_t& body_len);
+    // The header that a body begins with; reads up to twice its size, as its bytes may be escaped.
+    static DiagHeader read_header(const uint8_t* body);
 
     // Escapes len bytes to dst, which has room for twice as many; the bytes written.
     static size_t escape(const uint8_t* src, size_t len, uint8_t* dst);

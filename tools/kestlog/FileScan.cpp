@@ -12,7 +12,7 @@
 #include "channels/ModemImage.h"
 #include "channels/modem_dump_end.h"
 #include "core/text.h"
-#include "kestlog/FrameIndex.h"
+#include "kestlog/measure_frame.h"
 
 const char* const CHUNK_KINDS[CK_NUM] = {"log", "pcm", "dump"};
 
@@ -202,15 +202,18 @@ private:
     size_t measure_frames(const uint8_t* data, size_t len) {
         size_t used = 0;
         DiagHeader header;
+        Piece piece{};
+        piece.intact = true;
         for (size_t body_len = 0; !m_stop;) {
-            const size_t size =
-                m_index.measure(data + used, len - used, m_in.offset() + used, header, body_len);
+            const size_t size = measure_frame(data + used, len - used, header, body_len);
             const bool end = m_name.framed_dump && is_end_len(body_len);
             if (size == 0 || header.len != body_len || end) {
                 break;  // to be decoded
             }
-            visit_frame(header, {m_in.offset() + used, size, 0, 0, 0, 0, nullptr,
-                                 body_len - sizeof(header), true, nullptr});
+            piece.offset = m_in.offset() + used;
+            piece.size = size;
+            piece.data_len = body_len - sizeof(header);
+            visit_frame(header, &piece);
             used += size;
         }
         return used;
@@ -239,22 +242,22 @@ private:
             piece.data_len = len;
             piece.headless = true;
         }
-        visit_frame(header, piece);
+        visit_frame(header, &piece);
         return piece.intact;
     }
 
-    // Of the piece, all but what its header says is set.
-    void visit_frame(const DiagHeader& header, Piece piece) {
-        if (piece.intact) {
+    // Sets what the header says of the piece.
+    void visit_frame(const DiagHeader& header, Piece* piece) {
+        if (piece->intact) {
             ++m_report.frames;
-            m_report.payload += piece.data_len;
+            m_report.payload += piece->data_len;
         }
         if (m_visit) {
-            piece.seq_num = header.seq_num;
-            piece.len_field = header.len;
-            piece.type = header.type;
-            piece.sub_type = header.sub_type;
-            m_stop = !m_visit(piece);
+            piece->seq_num = header.seq_num;
+            piece->len_field = header.len;
+            piece->type = header.type;
+            piece->sub_type = header.sub_type;
+            m_stop = !m_visit(*piece);
         }
     }
 
@@ -328,7 +331,6 @@ private:
     bool m_stop = false;
     // What is too long for a frame is broken, too.
     DiagFrameParser m_parser{DiagFrameParser::Overlong::CUT};
-    FrameIndex m_index;
 };
 
 }  // namespace
