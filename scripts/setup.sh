@@ -112,6 +112,11 @@ kest_build() {
     fi
 }
 
+# kest_seen_from CALLER DIR: what a directory of the current one is called in CALLER.
+kest_seen_from() {
+    if [ "$1" -ef . ]; then echo "$2"; else echo "$PWD/$2"; fi
+}
+
 # kest_clean_system PACKAGES SCRIPT: runs a shell script of this tree as root in a new minimal
 # system of this release, below $TMPDIR or /tmp, which also has these packages (a,b,c). What is in
 # build-clean is in /tmp/clean there, and the script beside it. The system is removed at the end.

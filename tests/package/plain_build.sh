@@ -3,7 +3,7 @@
 # scripts/builds --clean runs this in a minimal system with a compiler, beside the sources: what
 # a handset has can be built without the libraries of the reader.
 set -eux
-cd "$(dirname "$0")"
+CDPATH='' cd "$(dirname "$0")"
 cmake -S . -B build >cmake.log
 grep 'kestlog is left out' cmake.log
 cmake --build build -j "$(nproc)" --target all >build.log || {

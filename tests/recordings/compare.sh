@@ -5,7 +5,7 @@
 # difference and exits with another status than 0 when there is one.
 set -euo pipefail
 player=$1
-cd "$(dirname "$0")"
+CDPATH='' cd "$(dirname "$0")"
 "$player" "$2.in" | diff -u --label "$2.expected" --label "as played now" "$2.expected" - || {
     echo "When this is meant to change: scripts/recordings $2, and say why in the commit." >&2
     exit 1
