@@ -51,8 +51,9 @@ void end_root(SimHandset& handset, const DemoOptions& options, bool started, boo
         printf("Everything is in %s (remove it when done).\n", handset.root().c_str());
         return;
     }
-    handset.remove_root();
-    if (started) {
+    if (!handset.remove_root()) {
+        printf("%s could not be removed.\n", handset.root().c_str());
+    } else if (started) {
         printf("%s was removed; --keep keeps it.\n", handset.root().c_str());
     }
 }

@@ -86,6 +86,12 @@ bool ScriptPlayer::read(const std::string& script_file) {
         m_lines.push_back({script_file + ":" + std::to_string(number), line});
         line.clear();
     }
+    if (script.bad()) {
+        return fail("cannot read " + script_file);
+    }
+    if (!line.empty()) {  // the last one ended with a backslash
+        m_lines.push_back({script_file + ":" + std::to_string(number), line});
+    }
     return true;
 }
 

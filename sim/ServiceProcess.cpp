@@ -6,9 +6,11 @@
 #include <stdlib.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <filesystem>
 
 #include "sim/SimHandset.h"
+#include "sim/byte_text.h"
 #include "sim/files.h"
 
 namespace {
@@ -81,5 +83,11 @@ std::string ServiceProcess::last_log_lines(size_t count) const {
             break;
         }
     }
-    return text.substr(at);
+    // What a card has as names may be in it.
+    std::string lines;
+    for (size_t end; at < text.size(); at = end + 1) {
+        end = std::min(text.find('\n', at), text.size());
+        lines += show_name(text.substr(at, end - at)) + "\n";
+    }
+    return lines;
 }

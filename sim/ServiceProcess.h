@@ -20,7 +20,7 @@ public:
     bool start(const std::string& program, const SimHandset& handset,
                const std::vector<std::string>& args = {});
 
-    // The service's log: all of it, or its last lines.
+    // The service's log: all of it, or its last lines as text for a terminal.
     std::string log_text() const;
     std::string last_log_lines(size_t count) const;
 

@@ -236,6 +236,6 @@ bool SimHandset::settle(LogCollector& logs, int timeout_ms) {
     return false;
 }
 
-void SimHandset::remove_root() {
-    remove_dir(m_root);
+bool SimHandset::remove_root() {
+    return remove_dir(m_root);
 }

@@ -84,7 +84,8 @@ public:
     // so that it can be stopped without losing a byte. False when the time is over first.
     bool settle(LogCollector& logs, int timeout_ms);
 
-    void remove_root();
+    // False if something of it is left.
+    bool remove_root();
 
     const std::string& root() const { return m_root; }
     std::string path(const std::string& rel) const { return m_root + "/" + rel; }

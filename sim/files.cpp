@@ -23,8 +23,14 @@ std::string read_text_file(const std::string& path) {
 }
 
 std::string temp_dir() {
+    // Programs that are started elsewhere get it, too.
     const char* tmp = getenv("TMPDIR");
-    return tmp && *tmp ? tmp : "/tmp";
+    if (!tmp || !*tmp) {
+        return "/tmp";
+    }
+    std::error_code ec;
+    const std::string path = std::filesystem::absolute(tmp, ec).string();
+    return ec ? tmp : path;
 }
 
 bool has_room(const std::string& dir, uint64_t needed, std::string* problem) {
@@ -52,9 +58,10 @@ std::string make_temp_dir(const std::string& parent, const std::string& prefix) 
     return mkdtemp(path.data()) ? path : "";
 }
 
-void remove_dir(const std::string& path) {
-    std::error_code ignored;
+bool remove_dir(const std::string& path) {
+    std::error_code ec;
     if (!path.empty()) {
-        std::filesystem::remove_all(path, ignored);
+        std::filesystem::remove_all(path, ec);
     }
+    return !ec;
 }

@@ -10,7 +10,7 @@
 // What the file holds; "" when it cannot be read.
 std::string read_text_file(const std::string& path);
 
-// Where directories for a while are made: $TMPDIR or /tmp.
+// Where directories for a while are made: $TMPDIR or /tmp, as an absolute path.
 std::string temp_dir();
 // Whether so many bytes are free where a directory is or is to be made; "" is for a new one in
 // temp_dir(). What else is wrong with the place shows when the directory is made. False with
@@ -18,8 +18,8 @@ std::string temp_dir();
 bool has_room(const std::string& dir, uint64_t needed, std::string* problem);
 // Makes a directory "prefix.XXXXXX" below the parent. Its path; "" with errno set on failure.
 std::string make_temp_dir(const std::string& parent, const std::string& prefix);
-// Removes the directory with everything below it.
-void remove_dir(const std::string& path);
+// Removes the directory with everything below it. False if something of it is left.
+bool remove_dir(const std::string& path);
 
 // Such a directory as long as the object lives.
 class TempDir {

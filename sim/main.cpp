@@ -14,6 +14,7 @@
 #include "sim/Replay.h"
 #include "sim/Serve.h"
 #include "sim/SimHandset.h"
+#include "sim/stop_signals.h"
 
 namespace fs = std::filesystem;
 
@@ -196,13 +197,7 @@ int main(int argc, char** argv) {
     if (options.reader.empty() && fs::exists(reader, ec)) {
         options.reader = reader.string();
     }
-    struct sigaction action = {};
-    action.sa_handler = on_signal;
-    action.sa_flags = static_cast<int>(SA_RESETHAND);  // a second Ctrl-C ends at once
-    sigaction(SIGINT, &action, nullptr);
-    sigaction(SIGTERM, &action, nullptr);
-    sigaction(SIGHUP, &action, nullptr);  // the terminal was closed: still clear up
-    signal(SIGPIPE, SIG_IGN);
+    handle_stop_signals(on_signal);
     if (!options.replay.empty()) {
         return Replay(options, &s_interrupted).run();
     }

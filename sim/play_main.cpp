@@ -10,6 +10,7 @@
 #include <filesystem>
 
 #include "sim/ScriptPlayer.h"
+#include "sim/stop_signals.h"
 
 namespace {
 
@@ -56,14 +57,7 @@ int main(int argc, char** argv) {
         fputs(USAGE, stderr);
         return 2;
     }
-    // The handset's root is removed first. A second one ends at once.
-    struct sigaction action = {};
-    action.sa_handler = on_signal;
-    action.sa_flags = static_cast<int>(SA_RESETHAND);
-    for (const int signo : {SIGINT, SIGTERM, SIGHUP}) {
-        sigaction(signo, &action, nullptr);
-    }
-    signal(SIGPIPE, SIG_IGN);
+    handle_stop_signals(on_signal);
     setenv("TZ", "UTC0", 1);  // time records tell the local time
     ScriptPlayer player(program, keep, &s_interrupted);
     const bool played = player.play(argv[optind]);
