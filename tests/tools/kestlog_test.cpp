@@ -430,6 +430,8 @@ TEST_F(KestlogTest, SplitSeparatesTheAudioDspsDataAroundDamage) {
         EXPECT_EQ(run(args + OLD_DSP_LOG), 3) << args;
         EXPECT_NE(m_err.find("damage: wrong chunk header: "), std::string::npos) << args << m_err;
     }
+    EXPECT_EQ(run("verify modem_log"), 3);
+    EXPECT_TRUE(said("1 files checked, 1 damages, 21 notes\n")) << m_out;
 
     // Nothing is replaced unasked; with --force a link is replaced, not followed.
     EXPECT_EQ(run("split --output=to " + OLD_DSP_LOG), 4);

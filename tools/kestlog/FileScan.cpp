@@ -346,11 +346,20 @@ void FileReport::add(bool damage, const char* code, const std::string& words, in
         // Any number of gaps must not hide damage, or what is damage once the file is closed.
         const auto gap = std::find_if(findings.rbegin(), findings.rend(), is_gap);
         if (is_gap(added) || gap == findings.rend()) {
+            more_damage |= damage;
             return;
         }
         findings.erase(std::next(gap).base());
     }
     findings.push_back(added);
+}
+
+std::vector<Finding> FileReport::all_findings() const {
+    std::vector<Finding> all = findings;
+    if (more_findings) {
+        all.push_back({more_damage, "more", std::to_string(more_findings) + " more findings", -1});
+    }
+    return all;
 }
 
 size_t time_record_len(const uint8_t* data, size_t got, const FileName& name, bool* cut) {

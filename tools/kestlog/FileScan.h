@@ -63,10 +63,13 @@ struct FileReport {
     // The first MAX_FINDINGS, but gaps in the sequence give way to anything else.
     std::vector<Finding> findings;
     uint64_t more_findings = 0;
+    bool more_damage = false;  // among these
     bool damaged = false;
 
     static constexpr size_t MAX_FINDINGS = 20;
     void add(bool damage, const char* code, const std::string& words, int64_t offset = -1);
+    // The findings, and one that tells how many more there were.
+    std::vector<Finding> all_findings() const;
 };
 
 // The length of the time record in the first bytes of a file, 0 without one. got may be less

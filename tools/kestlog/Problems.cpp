@@ -23,11 +23,7 @@ void Problems::add(const std::string& path, const std::vector<Finding>& findings
 }
 
 void Problems::add(const std::string& path, const FileReport& report, int error) {
-    add(path, report.findings);
-    if (report.more_findings) {
-        add(path, {{report.damaged, "more", std::to_string(report.more_findings) + " more findings",
-                    -1}});
-    }
+    add(path, report.all_findings());
     if (error) {
         unreadable(path, error);
     }

@@ -131,13 +131,8 @@ private:
         if (in.error()) {
             m_visitor.unreadable(file.shown() + ": " + strerror(in.error()));
         }
-        for (const Finding& finding : report->findings) {
+        for (const Finding& finding : report->all_findings()) {
             m_visitor.find(file.shown(), finding);
-        }
-        if (report->more_findings) {
-            m_visitor.find(file.shown(),
-                           {report->damaged, "more",
-                            std::to_string(report->more_findings) + " more findings", -1});
         }
     }
 
