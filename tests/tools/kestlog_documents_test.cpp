@@ -78,17 +78,18 @@ void flatten(const std::string& name, const Json& json, std::map<std::string, st
 const std::string CHANGES = R"(modem_log | {
     upto() { while read -r line; do echo "$line"; case $line in *"$1"*) return;; esac; done; }
     upto ready
-    cd modem_log && touch sha1.txt && cp -r 2016-03-01-09-15-00 2016-03-01-09-16-00
-    upto '"event":"set"'
-    cd 2016-03-01-09-15-00/agdsp && echo x >0-agdsp-2016-03-01_09-16-00.log
+    cd modem_log && touch sha1.txt && cd 2016-03-01-09-15-00/agdsp
+    echo x >0-agdsp-2016-03-01_09-16-00.log
     upto '"offset":'
     echo x >agdsp_memory_2016-03-01_09-15-00.mem
     upto complete
     ln -s x link && mv -T link 1-agdsp-2016-03-01_09-00-00.log
     upto '"event":"notice"'
-    rm 0*
+    rm 0*_09-15-00.log
     upto deleted
-    mv ../../2016-03-01-09-16-00 ../../gone
+    cd ../.. && cp -r 2016-03-01-09-15-00 2016-03-01-09-16-00
+    upto '"event":"set"'
+    mv 2016-03-01-09-16-00 ../gone
     upto '"event":"gone"'
 })";
 
