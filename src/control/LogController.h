@@ -76,7 +76,7 @@ public:
     size_t get_sd_size() const;
     int set_log_overwrite(bool enable);
     bool get_log_overwrite() const;
-    // 0, CR_NO_CHANNEL, or the channel's own result.
+    // 0, CR_NO_CHANNEL, or the channel's own result. That the file cannot be written is not logged.
     int enable_wcdma_iq(CpType type);
     int disable_wcdma_iq(CpType type);
     // Hands the buffered data of every enabled channel to the system. 0.

@@ -2,7 +2,7 @@
 # bash completion for kestlog: the program knows its words, the shell its files.
 _kestlog() {
     # $1 is the command as typed, $2 the word up to the cursor.
-    mapfile -t COMPREPLY < <("${1/#\~\//$HOME/}" --complete \
+    mapfile -t COMPREPLY < <("${1/#\~\//"$HOME"/}" --complete \
         "${COMP_WORDS[@]:1:COMP_CWORD-1}" "$2" 2>/dev/null)
 }
 complete -o default -F _kestlog kestlog
