@@ -93,7 +93,8 @@ kest_progress() {
 
 # kest_build DIR TARGET CMAKE_OPTION...: configures and builds a directory; everything that
 # is printed goes to DIR/build.log and is shown when it fails. Several sources of tests are
-# compiled as one, which takes half the time; an option may say otherwise.
+# compiled as one, which takes half the time; an option may say otherwise. Warnings are errors
+# where the environment has KEST_WERROR=ON, as in .ci/run.
 kest_build() {
     local dir=$1 log=$1/build.log target=$2
     shift 2
@@ -102,7 +103,8 @@ kest_build() {
     if ! (
         set -o pipefail
         {
-            cmake -S . -B "$dir" -UCMAKE_DISABLE_FIND_PACKAGE_GTest -DKEST_UNITY=TESTS "$@" &&
+            cmake -S . -B "$dir" -UCMAKE_DISABLE_FIND_PACKAGE_GTest -DKEST_UNITY=TESTS \
+                "-DKEST_WERROR=${KEST_WERROR:-OFF}" "$@" &&
                 cmake --build "$dir" -j "$(nproc)" --target "$target"
         } 2>&1 | tee "$log" | kest_progress
     ); then

@@ -3,6 +3,7 @@
 #include "kestlog/Waveform.h"
 
 #include <algorithm>
+#include <iterator>
 
 Waveform::Waveform(const SampleFormat& format, size_t channels)
     : m_format(format), m_channels(channels) {
@@ -13,7 +14,7 @@ void Waveform::add(const uint8_t* data, size_t len) {
     const size_t all = m_channels * m_format.bytes;
     if (!m_rest.empty()) {
         const size_t n = std::min(len, all - m_rest.size());
-        m_rest.insert(m_rest.end(), data, data + n);
+        std::copy_n(data, n, std::back_inserter(m_rest));
         data += n;
         len -= n;
         if (m_rest.size() < all) {
