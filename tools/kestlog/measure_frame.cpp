@@ -11,7 +11,8 @@
 
 namespace {
 
-constexpr size_t WORD = 32;  // bytes that are looked at together
+constexpr size_t WORD = 32;         // bytes that are looked at together
+constexpr size_t BLOCK = 8 * WORD;  // what is looked at in vain where no frame is
 constexpr uint32_t HEADER = (1 << sizeof(DiagHeader)) - 1;
 
 // As most processors of the last ten years can; on the others memchr looks for each special byte.
@@ -47,6 +48,9 @@ WITH_AVX2 inline bool count_escapes(const uint8_t* data, size_t len, size_t* esc
         odd = _mm256_or_si256(odd, places(data + at, DiagFrameParser::FLAG));
         odd = _mm256_or_si256(odd, _mm256_and_si256(found, next));
         *escapes += count(bits(found));
+        if (at % BLOCK == BLOCK - WORD && bits(odd)) {
+            return false;
+        }
     }
     const uint32_t rest = (uint32_t{1} << (len - at)) - 1;
     const uint32_t found = bits(places(data + at, DiagFrameParser::ESCAPE)) & rest;

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // How long a frame is, for whoever goes through a log and only counts: what
 // DiagFrameParser::measure() tells, sooner. The length in the frame's header says where it should
-// end, so that its bytes are looked at 64 at a time, and each of them once.
+// end, so that its bytes are looked at 32 at a time, and each of them once.
 #ifndef KESTLOG_MEASURE_FRAME_H_
 #define KESTLOG_MEASURE_FRAME_H_
 
