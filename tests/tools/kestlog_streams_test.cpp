@@ -406,10 +406,22 @@ TEST_F(KestlogStreamsTest, WavHoldsTheSamplesAndSaysWhatIsMissing) {
     EXPECT_EQ(m_root.read_file("b.wav").substr(m_root.read_file("b.wav").size() - 12),
               "one.two.far.");
     EXPECT_EQ(run("wav renamed " + backwards + "b.wav"), 4);
+    // More than an hour of it is damage; and another set begins with the first channel.
+    std::string far;
+    for (uint32_t i = 0; i < 100; ++i) {
+        far += chunk(i * 150, PCM, "far.");
+    }
+    write("renamed", TIME_RECORD + far);
+    EXPECT_EQ(run("wav renamed --force " + backwards + "b.wav"), 0) << m_err;
+    EXPECT_NE(m_out.find(" 99 gaps, 60 of them filled with 3576.000 "), std::string::npos) << m_out;
+    write("a/1-agdsp-2016-03-01_09-00-00.log", chunk(8, PCM, "abc"));
+    write("b/0-agdsp-2016-03-01_09-00-00.log", chunk(1, PCM, "EFgh"));
+    EXPECT_EQ(run("wav ?/*.log --rate 9 --channels 2 --format u8 -o b2.wav"), 0) << m_err;
+    EXPECT_NE(m_root.read_file("b2.wav").find("abEFgh"), std::string::npos);
     write("renamed", "foreign");
     write("short", chunk(1, PCM, "abc"));
     for (const std::string args :
-         {"renamed ", "short ", "nowhere ", "data/modem_log/../.. --until 2015-01-01 "}) {
+         {"renamed ", "short ", "nowhere ", "data/modem_log/../.. --until -99999999d "}) {
         EXPECT_EQ(run("wav " + args + sound + "none.wav"), 2) << args;
     }
     for (const char* args :

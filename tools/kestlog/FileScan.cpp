@@ -376,11 +376,12 @@ bool is_chunked(LogReader& in, const FileName& name) {
     DspChunkHeader header;
     size_t got;
     size_t len;
-    const uint8_t* data = in.peek(sizeof(header), got);
-    if (got < sizeof(header)) {
+    const uint8_t* data = in.peek(sizeof(TimeSyncRecord) + sizeof(header), got);
+    const size_t record = begins_with_magic(data, got) ? sizeof(TimeSyncRecord) : 0;
+    if (got < record + sizeof(header)) {
         return false;
     }
-    memcpy(&header, data, sizeof(header));
+    memcpy(&header, data + record, sizeof(header));
     return !chunk_fault(header, &len);
 }
 

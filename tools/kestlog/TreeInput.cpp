@@ -101,7 +101,8 @@ LogTime time_of(int64_t seconds) {
 bool parse_time(const std::string& text, const LogTime& newest, bool end, LogTime* time) {
     int64_t age;
     if (!text.empty() && parse_age(text, &age)) {
-        *time = time_of(seconds_of(newest) - age);
+        constexpr int64_t FIRST = -62135596800;  // the year 1: no other has a name before it
+        *time = time_of(std::max(seconds_of(newest) - age, FIRST));
         return true;
     }
     for (const TimeForm& form : FORMS) {

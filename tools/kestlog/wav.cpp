@@ -26,6 +26,7 @@ namespace {
 
 // A larger gap is not filled: a wrong sequence number must not become hours of silence.
 constexpr uint64_t MAX_SILENCE_SECONDS = 60;
+constexpr uint64_t MAX_ALL_SILENCE_SECONDS = 60 * 60;  // damage may look like any number of gaps
 
 struct Sound {
     const WavFormat* format;
@@ -142,7 +143,8 @@ public:
         scan_file(
             in, file.name,
             [&](const Piece& piece) {
-                ok = gap(m_sequence.take(piece, &report)) &&
+                const int32_t missing = m_sequence.take(piece, &report);
+                ok = gap(missing, m_sequence.anew()) &&
                      (piece.kind != CHUNK_KINDS[CK_PCM] || sound(piece));
                 return ok;
             },
@@ -188,16 +190,18 @@ private:
 
     // The missing chunks may be of any kind; to be filled they are taken for PCM chunks of the
     // size of the one before. Numbers that go back tell nothing.
-    bool gap(int32_t missing) {
-        if (missing == 0) {
+    bool gap(int32_t missing, bool anew) {
+        if (missing == 0 && !anew) {
             return true;
         }
-        ++m_gaps;
+        // What comes next, of another set perhaps, begins with the first channel.
         m_dropped += m_wav.drop_unfinished();
+        m_gaps += missing != 0;
         const uint64_t frames =
             static_cast<uint64_t>(std::max(missing, 0)) * m_last_len / m_wav.frame_bytes();
-        if (!m_sound.fill_gaps || frames == 0 ||
-            frames > MAX_SILENCE_SECONDS * static_cast<uint64_t>(m_sound.rate)) {
+        const auto rate = static_cast<uint64_t>(m_sound.rate);
+        if (!m_sound.fill_gaps || frames == 0 || frames > MAX_SILENCE_SECONDS * rate ||
+            m_silence + frames > MAX_ALL_SILENCE_SECONDS * rate) {
             return true;
         }
         ++m_filled;
