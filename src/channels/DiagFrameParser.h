@@ -42,6 +42,10 @@ public:
     // The bytes that the last frame took before it was decoded, both flags included.
     size_t raw_size() const { return m_raw_size; }
 
+    // The bytes that a frame has taken which has not ended yet, its flag included; 0 between
+    // frames.
+    size_t pending() const { return m_state == HUNTING ? 0 : m_body_raw + 1; }
+
     // Looks at a frame without decoding more than its header, for who only counts: the bytes of
     // the frame that begins with a flag at data, both flags included, its header and the length
     // of its decoded body. 0 if the frame is not whole in len bytes, has no header or more than

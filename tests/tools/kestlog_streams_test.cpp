@@ -299,7 +299,8 @@ TEST_F(KestlogStreamsTest, ExtractTakesThePayloadOutOfFrames) {
     // From a tree: every image, ring buffer and sleep log, those in logs as well.
     // The last begins in the file before.
     const std::string sleep = frame("sleep~", 0x3b, 0x64), older = "-cp_wcdma-2016-03-01_09-00-00";
-    write(MODEM + "1" + older + ".log", TIME_RECORD + "~junk~" + sleep.substr(0, 9));
+    write(MODEM + "1" + older + ".log",
+          TIME_RECORD + frame("x") + std::string(140000, '\0') + sleep.substr(0, 9));
     write(MODEM_LOG, TIME_RECORD + sleep.substr(9) + frame("ring", 0x3a, 0x64) +
                          frame("end", 0x3a, 1) + "tail");
     write(MODEM_DUMP, frame(LOG_DATA) + DUMP_END);

@@ -163,6 +163,7 @@ private:
             between = m_parser.unescape(data, got, body, len, used);
             if (!between) {
                 m_in.skip(used);
+                m_report.tail = m_in.offset() - m_parser.pending();
                 continue;
             }
             const uint64_t end = m_in.offset() + used;
