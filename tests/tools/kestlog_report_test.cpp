@@ -141,7 +141,8 @@ TEST_F(ReportTest, TheTimeLineTellsWhatIsThereAndWhatIsNot) {
     const Json copy = report("handset", 3);
     only(copy["timeline"], {{"size", 60026}, {"from", day + "09:12:00"}, {"to", day + "09:12:00"}});
     EXPECT_EQ(copy["timeline"].dump().find("silence"), std::string::npos);
-    EXPECT_EQ(only(copy["cps"], {{"rate", 3042 / 720}})["types"][0]["rate"], 0);
+    only(copy["timeline"], {{"kind", "missing"}, {"from", day + "09:05:00"}});
+    EXPECT_EQ(only(copy["cps"], {{"rate", 42 / 300}})["types"][0]["rate"], 0);
     only(report("handset --since 09:31", 3)["timeline"], {{"kind", "log"}, {"medium", "card"}});
     // Of a part nobody can say what was there before.
     const Json part = report("handset --since 09:05", 3);

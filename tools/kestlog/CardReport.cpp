@@ -39,14 +39,15 @@ std::string base64(const std::vector<uint8_t>& bytes) {
     return text;
 }
 
-// Whether it is known how long the log file lasts: not where only its start is known or the clock
-// was set meanwhile.
+// Whether it is known how long the log file lasts: not where only its start is known, what came
+// behind it is missing, or the clock was set meanwhile.
 bool length_is_known(const FilePlace& place) {
     const TreeFile& log = *place.file;
     const LogTime start = log.name.time(), end = log.end.time();
     const bool newest = log.first_missing() == 0;
     return clock_was_set(start) == clock_was_set(end) && !log.disordered &&
-           (!newest || (place.cp->own_times && !(local_time(log.modified) < start)));
+           ((!newest && !log.missing) ||
+            (place.cp->own_times && !(local_time(log.modified) < start)));
 }
 
 size_t count_cps(const LogTree& tree) {
@@ -136,11 +137,14 @@ void CardReport::add_pcm(const Piece& piece) {
     m_waveforms.back().second.add(piece.data, piece.data_len);
 }
 
-// When the file was written to last or, when nothing tells that, when the next one began.
+// When the file was written to last or, when nothing tells that, when the next one began. Where
+// that is missing only its own start is known.
 LogTime CardReport::last_byte(const FilePlace& place) {
     const TreeFile& log = *place.file;
     const LogTime& start = log.name.time();
-    const LogTime written = place.cp->own_times ? local_time(log.modified) : log.end.time();
+    const LogTime written = place.cp->own_times ? local_time(log.modified)
+                            : log.missing       ? start
+                                                : log.end.time();
     LogTime end = written < start || log.end.time() < written ? log.end.time() : written;
     // A set ends where the handset's next begins. It may lie behind very many of other handsets,
     // and so is looked for only where it matters.
@@ -337,6 +341,9 @@ void CardReport::add_spectrum(const FilePlace& place) {
 
 void CardReport::add_crashes() {
     m_dsp_dumps.finish();
+    for (; m_more_dsp_crashes > 0; --m_more_dsp_crashes) {
+        add_row("crashes", 0, nullptr);  // counts it
+    }
     for (const Crash& crash : find_crashes(m_tree, std::move(m_dsp_crashes))) {
         TimelineItem item;
         Json files = Json::array();

@@ -104,7 +104,9 @@ private:
     std::map<size_t, SetSum> m_sets;  // by place in the tree; of all beyond MAX_ROWS one
     std::vector<std::pair<FilePlace, Waveform>> m_waveforms;
     std::vector<Crash> m_dsp_crashes;
-    DspDumps m_dsp_dumps{[this](const DspDump& dump) { add_crash(dump, &m_dsp_crashes); }};
+    uint64_t m_more_dsp_crashes = 0;
+    DspDumps m_dsp_dumps{
+        [this](const DspDump& dump) { m_more_dsp_crashes += !add_crash(dump, &m_dsp_crashes); }};
     uint32_t m_next_seq = 0;                // of PCM data in one file
     const TreeCp* m_no_waveform = nullptr;  // the last one with PCM data that gets none
     uint64_t m_files = 0, m_size = 0;

@@ -73,10 +73,12 @@ Crash crash_of(const DspDump& dump) {
 
 }  // namespace
 
-void add_crash(const DspDump& dump, std::vector<Crash>* crashes) {
-    if (crashes->size() < MAX_DSP_CRASHES) {
-        crashes->push_back(crash_of(dump));
+bool add_crash(const DspDump& dump, std::vector<Crash>* crashes) {
+    if (crashes->size() >= MAX_DSP_CRASHES) {
+        return false;
     }
+    crashes->push_back(crash_of(dump));
+    return true;
 }
 
 std::vector<Crash> find_dsp_crashes(const LogTree& tree) {

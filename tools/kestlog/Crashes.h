@@ -26,8 +26,8 @@ bool of_crash(const TreeFile& file);
 // "memory dump, mini dump, IPC record (3)".
 std::string crash_text(const Crash& crash);
 
-// Adds what an audio DSP left in its log; after the first 10,000 nothing more.
-void add_crash(const DspDump& dump, std::vector<Crash>* crashes);
+// Adds what an audio DSP left in its log; false after the first 10,000.
+bool add_crash(const DspDump& dump, std::vector<Crash>* crashes);
 
 // The crashes of the audio DSP, whose logs are read for that. Prints nothing.
 std::vector<Crash> find_dsp_crashes(const LogTree& tree);
