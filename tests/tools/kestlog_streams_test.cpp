@@ -477,6 +477,8 @@ TEST_F(KestlogStreamsTest, SigmfDescribesACaptureThatStaysWhereItIs) {
     write("caf\u00e9.bin", "12");
     EXPECT_EQ(run("sigmf --json --force caf* --datatype ri8 --rate 1 --frequency 0"), 0) << m_err;
     EXPECT_EQ(Json::parse(m_out)["samples"], 2);
+    EXPECT_EQ(run("sigmf --force caf*n -o caf*.bin --datatype ri8 --rate 1 --frequency 0"), 4);
+    EXPECT_EQ(m_root.read_file("caf\u00e9.bin"), "12");
     EXPECT_EQ(Json::parse(m_root.read_file("caf\u00e9.sigmf-meta")), Json::parse(R"({"global":{
         "core:version":"1.0.0","core:datatype":"ri8","core:sample_rate":1,"core:num_channels":1,
         "core:dataset":"caf\u00e9.bin","core:recorder":"kestmodem","core:description":"I/Q capture"},

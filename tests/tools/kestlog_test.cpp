@@ -401,7 +401,7 @@ TEST_F(KestlogTest, FramesAreChosenOverFilesAndPipes) {
         EXPECT_EQ(run(args), 0) << m_err;
         EXPECT_EQ(m_root.read_file("x/stdin.dump.bin"), LOG_DATA) << args;
     }
-    EXPECT_EQ(run("export -o x/pcapng - <" + DSP_LOG), 0) << m_err;
+    EXPECT_EQ(run("export -o x/pcapng - ./" + DSP_LOG + " <" + DSP_LOG), 0) << m_err;
     EXPECT_TRUE(said(": 3 packets on 1 interfaces")) << m_out;
     EXPECT_EQ(run("sigmf --datatype ci8 --rate 1 --frequency 0 - <" + DSP_LOG), 1);
     EXPECT_EQ(run("frames --since 09:15 " + WCN_LOG + " gone"), 2);

@@ -15,6 +15,7 @@
 #include "core/system_paths.h"
 #include "kestlog/Archive.h"
 #include "kestlog/LogReader.h"
+#include "kestlog/OutputFile.h"
 
 namespace {
 
@@ -217,9 +218,13 @@ void LogTree::add_file(const std::string& path) {
     const size_t slash = path.rfind('/') + 1;
     const std::string dir = path.substr(0, slash);
     const FileName name(path.substr(slash));
-    if (!m_given_files.insert(path).second) {
-        return;
+    struct stat in_dir;
+    if (!m_visited.insert({st.st_dev, st.st_ino}).second ||
+        (name.exact && stat(dir.empty() ? "." : dir.c_str(), &in_dir) == 0 &&
+         m_visited.count({in_dir.st_dev, in_dir.st_ino}) > 0)) {
+        return;  // given already, as it is or with its directory
     }
+    OutputFile::keep(path);
     const auto known =
         name.exact ? m_given.insert({{dir, name.cp()}, sets.size()}).first : m_given.end();
     const size_t index = known == m_given.end() ? sets.size() : known->second;

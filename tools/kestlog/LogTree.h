@@ -161,7 +161,6 @@ private:
     std::pair<std::string, std::string> m_alias;  // the prefix of paths, and what is shown for it
     std::set<std::pair<dev_t, ino_t>> m_visited;
     std::map<std::pair<std::string, std::string>, size_t> m_given;  // sets, by directory and CP
-    std::set<std::string> m_given_files;
     bool m_card_given = false;
     size_t m_roots = 0;
     size_t m_archives = 0;

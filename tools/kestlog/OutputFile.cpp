@@ -12,6 +12,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <set>
 #include <vector>
 
 #include "common/CommandLine.h"
@@ -64,7 +65,28 @@ bool takes_binary(const CommandLine& line, int* status) {
     return false;
 }
 
+namespace {
+
+// Device and number of each.
+std::set<std::pair<dev_t, ino_t>> s_kept;
+
+bool may_replace(const std::string& path) {
+    struct stat st;
+    const bool kept = lstat(path.c_str(), &st) == 0 && s_kept.count({st.st_dev, st.st_ino}) > 0;
+    errno = EBUSY;
+    return !kept;
+}
+
+}  // namespace
+
 OutputFile* OutputFile::s_first = nullptr;
+
+void OutputFile::keep(const std::string& path) {
+    struct stat st;
+    if ((path == "-" ? fstat(STDIN_FILENO, &st) : stat(path.c_str(), &st)) == 0) {
+        s_kept.insert({st.st_dev, st.st_ino});
+    }
+}
 
 void OutputFile::remove_all(int signal) {
     for (const OutputFile* file = s_first; file; file = file->m_next) {
@@ -109,7 +131,7 @@ bool OutputFile::open(const std::string& path, bool force) {
         errno = force ? EISDIR : EEXIST;
         return note_error(false);
     }
-    return open_temporary();
+    return note_error(may_replace(path)) && open_temporary();
 }
 
 bool OutputFile::open_temporary() {
@@ -200,9 +222,10 @@ bool OutputFile::publish() {
             return note_error(false);
         }
     }
-    if (!note_error(result == 0 || rename(from, to) == 0)) {
+    if (!note_error(result == 0 || (may_replace(m_path) && rename(from, to) == 0))) {
         return false;
     }
+    keep(m_path);
     forget();
     return true;
 }
@@ -233,5 +256,7 @@ void OutputFile::discard() {
 int OutputFile::failed() const {
     return failure(ES_OUTPUT, (is_standard() ? "standard output" : m_path) + ": " +
                                   strerror(m_error) +
-                                  (m_error == EEXIST ? "; use --force to replace it" : ""));
+                                  (m_error == EEXIST  ? "; use --force to replace it"
+                                   : m_error == EBUSY ? "; this command reads it or has written it"
+                                                      : ""));
 }

@@ -28,6 +28,10 @@ public:
     OutputFile(const OutputFile&) = delete;
     OutputFile& operator=(const OutputFile&) = delete;
 
+    // Has a file that the command reads, "-" for standard input, stay as it is, whatever is forced.
+    // What has been written stays as well.
+    static void keep(const std::string& path);
+
     // Each is false on failure; failed() then tells why. A FIFO or a device at path is written
     // to as it is; a link to a file is replaced, not followed.
     bool open(const std::string& path, bool force);

@@ -13,6 +13,7 @@
 #include "common/text.h"
 #include "kestlog/Archive.h"
 #include "kestlog/ExitStatus.h"
+#include "kestlog/OutputFile.h"
 #include "kestlog/Progress.h"
 
 std::string json_text(const std::string& text) {
@@ -64,6 +65,7 @@ int open_input(LogReader& in, const std::string& path) {
         return failure(ES_UNREADABLE, path + ": It is an archive" + hint);
     }
     if (in.open(path, true)) {
+        OutputFile::keep(path);
         return ES_OK;
     }
     return failure(ES_UNREADABLE, path + ": " + strerror(errno) + (errno == EISDIR ? hint : ""));
