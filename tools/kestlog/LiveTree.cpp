@@ -210,7 +210,7 @@ void LiveTree::tell_crash(const Dir& dir, const FileName& name, const std::strin
 }
 
 void LiveTree::tell_damage(const Dir& dir, const FileName& name, const Finding& finding) {
-    tell("damage", dir, name, escape_text(name.text()) + ": " + finding_text(finding),
+    tell("damage", dir, name, escape_text(name.text() + ": " + finding_text(finding)),
          finding_json(finding));
 }
 

@@ -49,7 +49,7 @@ Json finding_json(const Finding& finding) {
 }
 
 std::string finding_text(const Finding& finding) {
-    return (finding.damage ? "damage: " : "note: ") + escape_text(finding.words) +
+    return (finding.damage ? "damage: " : "note: ") + finding.words +
            (finding.offset >= 0 ? " (at byte " + std::to_string(finding.offset) + ")" : "");
 }
 

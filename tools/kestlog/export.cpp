@@ -79,7 +79,7 @@ int run_export(const CommandLine& line) {
             break;
         }
     }
-    if (status <= ES_UNREADABLE && writer.good() && exporter.totals().packets == 0) {
+    if (status <= ES_DAMAGE && writer.good() && exporter.totals().packets == 0) {
         if (status == ES_OK) {
             status = failure(ES_UNREADABLE, "found nothing to export");
         }

@@ -88,7 +88,7 @@ void add_findings(Facts* facts, bool json, const FileReport& report) {
         if (json) {
             objects.push_back(finding_json(finding));
         } else {
-            printf("%s\n", finding_text(finding).c_str());
+            printf("%s\n", escape_text(finding_text(finding)).c_str());
         }
     }
     if (json) {

@@ -31,7 +31,7 @@ public:
             print_json(object);
         } else {
             Progress::clear();
-            printf("%s: %s\n", escape_text(path).c_str(), finding_text(finding).c_str());
+            printf("%s\n", escape_text(path + ": " + finding_text(finding)).c_str());
         }
     }
 
