@@ -13,7 +13,9 @@ kest_has() {
     case "$1" in
         g++) command -v c++ >/dev/null ;;
         clang) command -v clang++ >/dev/null ;;
-        chromium) command -v chromium >/dev/null || command -v chromium-browser >/dev/null ;;
+        chromium)  # Ubuntu has a script of that name that only tells of its snap
+            chromium --version >/dev/null 2>&1 || chromium-browser --version >/dev/null 2>&1
+            ;;
         s6) command -v s6-log >/dev/null ;;
         runit) command -v svlogd >/dev/null ;;
         daemontools) command -v multilog >/dev/null ;;
