@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
 
 namespace {
 
@@ -77,17 +78,26 @@ int Serve::run() {
 void Serve::show_place() {
     const SimHandset& handset = m_stage.handset();
     const std::string root = shell_word(handset.root());
+    // Beside this program where they were built with it, else where packages put them.
+    const auto tool = [](const char* name) {
+        std::error_code ec;
+        const auto path =
+            std::filesystem::read_symlink("/proc/self/exe", ec).replace_filename(name);
+        return access(path.c_str(), X_OK) == 0 ? shell_word(path.string()) : std::string(name);
+    };
+    const std::string kestctl = tool("kestctl"), kestlog = tool("kestlog");
     const auto& medium = m_stage.logs().media()[handset.sd_inserted() ? 1 : 0];
     printf(
         "The control socket is ready: local stream socket, abstract, \"kestmodem@%s\".\n"
-        "    KESTMODEM_ROOT=%s kestctl status\n"
-        "    KESTMODEM_ROOT=%s kestctl watch\n"
+        "    KESTMODEM_ROOT=%s %s status\n"
+        "    KESTMODEM_ROOT=%s %s watch\n"
         "    kill -USR1 %d    # the modem crashes\n"
-        "    kestlog ls %s\n"
+        "    %s ls %s\n"
         "The service's messages are in %s.\n"
         "Ctrl-C ends it.\n\n",
-        handset.root().c_str(), root.c_str(), root.c_str(), static_cast<int>(getpid()),
-        shell_word(medium.log_root).c_str(), handset.path("kestmodem.log").c_str());
+        handset.root().c_str(), root.c_str(), kestctl.c_str(), root.c_str(), kestctl.c_str(),
+        static_cast<int>(getpid()), kestlog.c_str(), shell_word(medium.log_root).c_str(),
+        handset.path("kestmodem.log").c_str());
     fflush(stdout);
 }
 
