@@ -7,6 +7,7 @@
 #include <stdlib.h>
 #include <string.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <utility>
 
@@ -14,6 +15,7 @@
 #include "sim/Replay.h"
 #include "sim/Serve.h"
 #include "sim/SimHandset.h"
+#include "sim/byte_text.h"
 #include "sim/stop_signals.h"
 
 namespace fs = std::filesystem;
@@ -99,28 +101,52 @@ bool parse_rate(const std::string& text, DemoOptions& options) {
     return true;
 }
 
+// The names are printed: they have no control bytes.
+bool parse_name(const char* text, std::string* name) {
+    *name = text;
+    return !name->empty() && std::none_of(name->begin(), name->end(),
+                                          [](unsigned char c) { return c < 0x20 || c == 0x7f; });
+}
+
+// For parse_options().
+int refuse(const std::string& arg) {
+    fprintf(stderr, "kestsim: %s: unknown, a wrong value, or not here; see kestsim --help\n",
+            show_name(arg).c_str());
+    return 3;
+}
+
+// Whether options that only one way to run has are given with it.
+bool fits(const DemoOptions& options, bool has_speed) {
+    const auto only_served = [](const auto& rate) {
+        return rate.first == "agdsp" || rate.second == 0;
+    };
+    return !(options.serve && !options.replay.empty()) && !(has_speed && options.replay.empty()) &&
+           (options.serve || std::none_of(options.rates.begin(), options.rates.end(), only_served));
+}
+
 // 0 to go on, otherwise the exit status plus 1.
 int parse_options(int argc, char** argv, DemoOptions& options) {
     double seconds = 0;
     unsigned rate = 0;
     std::swap(options.seconds, seconds);  // 0: not given
     std::swap(options.rate, rate);
+    bool has_speed = false;
+    opterr = 0;  // it would print whatever is in a wrong option
     for (int opt; (opt = getopt_long(argc, argv, "", OPTIONS, nullptr)) != -1;) {
         bool good = true;
         double number = 0;
         switch (opt) {
             case OPT_PROGRAM:
-                options.program = optarg;
+                good = parse_name(optarg, &options.program);
                 break;
             case OPT_READER:
-                options.reader = optarg;
+                good = parse_name(optarg, &options.reader);
                 break;
             case OPT_REPORT:
-                options.report = optarg;
+                good = parse_name(optarg, &options.report);
                 break;
             case OPT_ROOT:
-                options.root = optarg;
-                good = !options.root.empty();
+                good = parse_name(optarg, &options.root);
                 break;
             case OPT_SECONDS:
                 good = parse_number(optarg, 1e6, &number);
@@ -136,6 +162,7 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
             case OPT_SPEED:
                 good = strcmp(optarg, "max") == 0 || parse_number(optarg, 1e6, &number);
                 options.speed = number;
+                has_speed = true;
                 break;
             case OPT_SERVE:
                 options.serve = true;
@@ -159,17 +186,15 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
                 good = false;
         }
         if (!good) {
-            fputs(USAGE, stderr);
-            return 3;
+            return refuse(argv[optind - 1]);
         }
     }
     options.seconds = options.seconds > 0 ? options.seconds : seconds;
     options.rate = options.rate > 0 ? options.rate : rate;
-    if (optind < argc || (options.serve && !options.replay.empty())) {
-        fputs(USAGE, stderr);
-        return 3;
+    if (optind < argc) {
+        return refuse(argv[optind]);
     }
-    return 0;
+    return fits(options, has_speed) ? 0 : refuse(argv[argc - 1]);
 }
 
 }  // namespace
