@@ -60,7 +60,7 @@ int failure(int status, const std::string& words) {
 }
 
 int open_input(LogReader& in, const std::string& path) {
-    const std::string hint = "; ls, verify, report, join, extract, export and bundle read it";
+    const std::string hint = "; ls, verify, report, join, extract, export, wav and bundle read it";
     if (path != "-" && is_archive(path)) {
         return failure(ES_UNREADABLE, path + ": It is an archive" + hint);
     }
@@ -68,7 +68,9 @@ int open_input(LogReader& in, const std::string& path) {
         OutputFile::keep(path);
         return ES_OK;
     }
-    return failure(ES_UNREADABLE, path + ": " + strerror(errno) + (errno == EISDIR ? hint : ""));
+    return failure(ES_UNREADABLE,
+                   path + ": " + (errno == EINVAL ? "neither a file nor a pipe" : strerror(errno)) +
+                       (errno == EISDIR ? hint : ""));
 }
 
 int for_each_file(const CommandLine& line,

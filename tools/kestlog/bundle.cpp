@@ -139,16 +139,19 @@ int run_bundle(const CommandLine& line) {
     if (!read_whole(line, "minutes", 0, DAY_SECONDS / 60, &minutes, &status)) {
         return status;
     }
-    if (!line.has("output")) {
-        return line.usage_error("--output is missing");
+    const bool listed = !line.has("crash");
+    if (!listed && !line.has("output")) {
+        return line.usage_error("-o FILE is missing");
     }
     LogTree tree;
-    if (!takes_binary(line, &status) || !open_tree(line, &tree, &status)) {
+    if ((!listed && !takes_binary(line, &status)) || !open_tree(line, &tree, &status)) {
         return status;
     }
-    if (!line.has("crash")) {
-        tell_crashes(find_crashes(tree, find_dsp_crashes(tree)));
-        return line.usage_error("--crash is missing: the time of one of these");
+    if (listed) {
+        const std::vector<Crash> crashes = find_crashes(tree, find_dsp_crashes(tree));
+        tell_crashes(crashes);
+        return crashes.empty() ? failure(ES_UNREADABLE, "there is no crash at all")
+                               : line.usage_error("--crash is missing: the time of one of these");
     }
     LogTime time;
     if (!parse_time(line.value("crash", ""), tree.newest(), false, &time)) {
