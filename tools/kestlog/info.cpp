@@ -10,6 +10,7 @@
 #include "kestlog/Commands.h"
 #include "kestlog/ExitStatus.h"
 #include "kestlog/Report.h"
+#include "kestlog/small_files.h"
 
 namespace {
 
@@ -105,6 +106,7 @@ int info(const CommandLine& line, const std::string& path) {
         return status;
     }
     const FileName name(file_part(path));
+    const std::string version = peek_version(in);
     FileReport report;
     scan_file(in, name, nullptr, FP_LENGTH, &report);
     in.drain();  // the size of a pipe shows at its end
@@ -121,6 +123,9 @@ int info(const CommandLine& line, const std::string& path) {
         facts.add("started", time_text(name.time()));
     }
     facts.add("size", in.size());
+    if (name.type == LT_VERSION) {
+        facts.add("version", version);
+    }
     add_content(&facts, name, report);
     facts.add("damaged", report.damaged);
     add_findings(&facts, line.has("json"), report);
