@@ -110,7 +110,7 @@ bool parse_name(const char* text, std::string* name) {
 
 // For parse_options().
 int refuse(const std::string& arg) {
-    fprintf(stderr, "kestsim: %s: unknown, a wrong value, or not here; see kestsim --help\n",
+    fprintf(stderr, "kestsim: %s: unknown, or a wrong value; see kestsim --help\n",
             show_name(arg).c_str());
     return 3;
 }
@@ -194,7 +194,11 @@ int parse_options(int argc, char** argv, DemoOptions& options) {
     if (optind < argc) {
         return refuse(argv[optind]);
     }
-    return fits(options, has_speed) ? 0 : refuse(argv[argc - 1]);
+    if (!fits(options, has_speed)) {
+        fputs("kestsim: these options do not go together; see kestsim --help\n", stderr);
+        return 3;
+    }
+    return 0;
 }
 
 }  // namespace
