@@ -705,3 +705,8 @@ FALLIBLE(int, accept4, CALL_ACCEPT, PLACE_SOCKET, (fd, address, len, flags), int
     }
     return client;
 }
+
+bool has_hung_up(int fd) {
+    struct pollfd other = {fd, 0, 0};
+    return __real_poll(&other, 1, 0) == 1;
+}

@@ -87,6 +87,7 @@ struct FdInfo {
 
 constexpr int MAX_FDS = 1024;
 extern FdInfo g_fds[MAX_FDS];
+bool has_hung_up(int fd);  // who is at the other end
 FdInfo& remember_fd(int fd, FdClass cls, Place place);
 extern State* g_state;
 extern __thread bool g_inside;  // the service is running, not the simulation
